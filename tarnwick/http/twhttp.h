@@ -1,0 +1,254 @@
+// An HTTP/1.x client for cameras, devices and web services, and one-call functions for JSON
+// services.
+//
+// A JSON service, in one call:
+//
+//   Json::Value reply;
+//   int result = SendHttpGet("192.0.2.7", 80, "api/info?full=1", reply, 5, false);  // 0: success
+//
+// A device that asks for a login:
+//
+//   TWHttpClient client("192.0.2.7", 80, "cgi/info.cgi", "admin", "secret", 5, false, true, false,
+//                       false, HTTP_VERSION_1_1, "");
+//   client.SendRequest(HTTP_METHOD_GET, "?");
+//   int status = 0;
+//   if (client.CheckResponse(status) == HTTP_RET_OK) {
+//     char piece[8192];
+//     for (int n; (n = client.ReadData(piece, sizeof(piece))) > 0;) Use(piece, n);
+//   }
+//
+// The message syntax is that of RFC 7230, the logins are those of RFC 2617. Failures are logged in
+// category http.
+#ifndef TARNWICK_HTTP_TWHTTP_H_
+#define TARNWICK_HTTP_TWHTTP_H_
+
+#include <json/value.h>
+
+#include <cstdio>
+#include <map>
+#include <string>
+
+#include "tarnwick/net/twsocket.h"
+#include "tarnwick/platform/export.h"
+
+// The response headers that a client keeps.
+enum HTTP_MAP_KEY : int {
+  HTTP_CONTENT_TYPE = 0,
+  HTTP_CONTENT_LENGTH = 1,
+  HTTP_CONTENT_RANGE = 2,
+};
+
+// The protocol version to send. The values are libcurl's.
+enum HTTP_VERSION : int {
+  HTTP_VERSION_NONE = 0,  // HTTP/1.0 on the socket GET, libcurl's default on the libcurl paths
+  HTTP_VERSION_1_0 = 1,
+  HTTP_VERSION_1_1 = 2,
+};
+
+// The request method. Every value but 0 counts as POST.
+enum TW_HTTP_METHOD : int {
+  HTTP_METHOD_GET = 0,
+  HTTP_METHOD_POST = 1,
+};
+
+// Results of the client's operations, and of the last response (TWHttpClient::CheckResponse).
+enum {
+  HTTP_RET_OK = 0,            // success; a status from 200 to 299
+  HTTP_RET_NOT_READY = 1,     // nothing sent yet, or the head is not read yet or malformed
+  HTTP_RET_BAD_KEY = 2,       // no value of HTTP_MAP_KEY
+  HTTP_RET_IO_ERROR = 3,      // connecting, writing or reading failed, or the status line is cut
+  HTTP_RET_UNAUTHORIZED = 4,  // status 401
+  HTTP_RET_BAD_RESPONSE = 5,  // no HTTP/1.0 or HTTP/1.1 reply, or a status not listed here
+  HTTP_RET_NO_CONTENT = 6,    // the response has no such header
+  HTTP_RET_REDIRECT = 7,      // status 302
+  HTTP_RET_URI_TOO_LONG = 8,  // status 414
+  HTTP_RET_CERT_ERROR = 9,    // libcurl could not verify the server's certificate
+};
+
+// One client for one server, path and login.
+//
+// The socket operations connect anew for each request. Authorization, cookie and other texts go
+// onto the wire as they are: it is for the caller to keep line ends out of them.
+// Threads: one thread uses an object at a time; separate objects may run in separate threads.
+class TARNWICK_API TWHttpClient {
+ public:
+  // A client without a server; Init must follow. Until then every operation fails.
+  TWHttpClient();
+
+  // A client that is ready for use; the arguments are those of Init.
+  TWHttpClient(std::string host, int port, std::string path, std::string user, std::string password,
+               int timeout, bool https, bool bufferedRead, bool encodeQuery, bool basicAuth,
+               HTTP_VERSION version, std::string encodeKeep);
+
+  // Closes the connection and frees what the client owns; a response file stays open.
+  virtual ~TWHttpClient();
+
+  TWHttpClient(const TWHttpClient&) = delete;
+  TWHttpClient& operator=(const TWHttpClient&) = delete;
+
+  // Sets up the client and its socket. Call it once on an object: a second call makes a second
+  // socket and does not release the first.
+  //
+  // Arguments: `path` with its query, leading "/" are stripped; `host` a name or a dotted IPv4
+  //   address; `timeout` in seconds for connecting and each wait of the socket operations, negative
+  //   for none; `bufferedRead` reads ahead (wanted for speed; direct reading costs a system call a
+  //   byte of the head); `encodeQuery` percent-encodes the values of the query on the socket GET,
+  //   but the characters of `encodeKeep`; `basicAuth` sends the login with the first GET instead of
+  //   waiting to be asked; `https` uses TLS.
+  void Init(std::string path, std::string host, int port, std::string user, std::string password,
+            int timeout, bool bufferedRead, bool encodeQuery, bool basicAuth, HTTP_VERSION version,
+            std::string encodeKeep, bool https);
+
+  // Creates the socket: TLS when the client uses https. Init calls it.
+  void InitSocket(int timeout, bool bufferedRead);
+
+  // Sets the path of the next request; leading "/" are stripped.
+  void SetPath(std::string path);
+
+  // Sets the local source address of the next connection, in network byte order; 0 for none.
+  void SetSocketRemoteAddr(unsigned int addr);
+
+  // Writes headers and body of SendRequestByCurl's responses to `file`, from its current position;
+  // null collects the body in memory again. The caller keeps the file open during requests and
+  // closes it afterwards.
+  void SetCurlRespFile(FILE* file);
+
+  // Sets the cookie to send, as it stands. A response's head replaces it: with its last Set-Cookie,
+  // or with nothing. Results: 0.
+  int SetCookie(std::string cookie);
+
+  // Copies the cookie to `out`. Results: 0.
+  int GetCookie(std::string& out);
+
+  // The Transfer-Encoding of the last response that had one.
+  std::string GetTransferEncoding();
+
+  // Stores the last response's status code in `status`, 0 when none was read.
+  // Results: HTTP_RET_NOT_READY before the first request, then the outcome of the last one.
+  int CheckResponse(int& status);
+
+  // Copies a header of the last response to `out`.
+  // Results: HTTP_RET_OK; HTTP_RET_BAD_KEY; HTTP_RET_NOT_READY before a head was read;
+  //   HTTP_RET_NO_CONTENT when the response had no such header. `out` stays as it is after a
+  //   failure.
+  int GetHttpContent(HTTP_MAP_KEY key, std::string& out) const;
+
+  // Reads from and writes to the connection behind a response's head, as TWSocket does.
+  // Results: TWSocket's; -1 while no head has been read.
+  int ReadData(char* buf, int len);
+  int WriteData(const char* buf, int len);
+
+  // As TWSocket's, at any time. Without a socket: -1, -1 and false.
+  int ReadToLineEnd(char* buf, int bufLen);
+  int RestoreData(char* data, int len);
+  bool HasDataToRead(int timeout);
+
+  // Sends the request by method.
+  //
+  // HTTP_METHOD_GET: SendRequestByGet, with Basic authorization at once when the client was set up
+  // so. When the reply is a 401 whose challenge names Digest or else Basic, the GET is sent once
+  // more with that login. `arg` is not used. Any other method: SendRequestByPost(arg).
+  // Results: those of the last request made. What the server answered is CheckResponse's to tell: a
+  //   second 401 comes back as HTTP_RET_OK here and HTTP_RET_UNAUTHORIZED there.
+  int SendRequest(TW_HTTP_METHOD method, std::string arg);
+
+  // Sends one GET over the client's socket and reads the head of the reply; the body is left on the
+  // connection for ReadData. A request of over 2,047 bytes is cut there.
+  //
+  // Results: HTTP_RET_OK when the request was written, whatever the server answered;
+  //   HTTP_RET_IO_ERROR when connecting or writing failed, with the last response's results as they
+  //   were.
+  int SendRequestByGet();
+
+  // Sends one request through libcurl, which also follows its proxy settings.
+  //
+  // HTTP_METHOD_GET fetches host and path. Any other method posts the path as a form to the host's
+  // root. The body is collected in memory, for the one-call functions, or written to the response
+  // file.
+  // Arguments: `verifyPeer` false accepts any certificate and host name; `timeout` limits the whole
+  //   transfer, in seconds.
+  // Results: HTTP_RET_OK after a status from 200 to 299; HTTP_RET_CERT_ERROR when the server's
+  //   certificate could not be verified; HTTP_RET_IO_ERROR after anything else.
+  int SendRequestByCurl(TW_HTTP_METHOD method, bool verifyPeer, int timeout);
+
+  // Posts through libcurl over plain HTTP, logging in by Basic or Digest as the server asks.
+  //
+  // The path is split at its first character out of `separators`: what stands before it is the
+  // URL's path, what follows is the body; without such a character the body is empty. The reply's
+  // body is thrown away.
+  // Results: HTTP_RET_OK after a status from 200 to 299; HTTP_RET_IO_ERROR after anything else.
+  // Blocks without a limit.
+  int SendRequestByPost(std::string separators);
+
+  // Reads and parses the head of a reply, after a request has been written.
+  // Results: the codes of the status, HTTP_RET_OK to HTTP_RET_URI_TOO_LONG; HTTP_RET_NOT_READY
+  //   without a request written, or after a header line without name or value; HTTP_RET_IO_ERROR
+  //   after a failed read or half a status line; HTTP_RET_BAD_RESPONSE when it is no HTTP/1.0 or
+  //   HTTP/1.1 reply.
+  int CheckHttpResponse();
+
+  // Reads and parses the header lines, 30 at most; further ones stay unread, in front of the body.
+  // Results: HTTP_RET_OK, HTTP_RET_NOT_READY or HTTP_RET_IO_ERROR, as above. What was parsed before
+  //   a failure stays.
+  int CheckContentType();
+
+  // The Authorization header lines for the client's login, without a line end: Basic, and Digest
+  // (RFC 2617) in answer to the last response's challenge. `body` counts only for qop "auth-int".
+  // GenBasicAccessAuth throws std::logic_error when memory for the encoding runs out.
+  std::string GenBasicAccessAuth();
+  std::string GenDigestAccessAuth(std::string method, std::string body);
+
+  // The body that SendRequestByCurl collected from its last reply, also from one that failed.
+  std::string GetCurlText() const { return m_strCurlText; }
+
+ protected:
+  TWSocket* m_pSocket;  // owned
+  std::map<HTTP_MAP_KEY, std::string> m_mapContent;
+  int m_connState;  // 0 idle, 1 a request is written, 2 the head is read
+  bool m_bHttps;
+  bool m_bEncodeQuery;
+  int m_result;
+  bool m_bBasicAuth;
+  int m_statusCode;
+  int m_port;
+  std::string m_strHost;
+  std::string m_strPath;  // without leading "/"
+  std::string m_strUser;
+  std::string m_strPassword;
+  std::string m_strCookie;
+  std::string m_strAuthenticate;   // the challenge of the last response
+  std::string m_strAuthorization;  // one header line for the next request, which empties it
+  std::string m_strTransferEncoding;
+  std::string m_strEncodeKeep;
+  std::string m_strCurlText;
+  char* m_pRespBuf;  // owned, from malloc; it and m_respLen are one record to libcurl's callbacks
+  unsigned int m_respLen;  // bytes in m_pRespBuf
+  HTTP_VERSION m_httpVersion;
+  FILE* m_pCurlRespFile;  // not owned
+
+ private:
+  std::string BuildGetRequest();
+  bool WriteGetRequest(const std::string& request);
+};
+
+// Fetches `path` from a JSON service over HTTP and parses the reply into `result`.
+//
+// Arguments: `timeout` in seconds for connecting and each wait; `encodeQuery` percent-encodes the
+//   values of the query; without it, line feeds are removed from the path instead.
+// Results: 0 when the reply is JSON whose member "success" is true; -1 when the request, the
+//   status, a read or an empty body made it fail; -2 when the body is no JSON, or "success" is
+//   missing or not true, and `result` may then hold a part of the reply.
+// Throws nothing but std::bad_alloc.
+TARNWICK_API int SendHttpGet(const std::string& host, int port, std::string path,
+                             Json::Value& result, int timeout, bool encodeQuery);
+
+// As SendHttpGet, over TLS through libcurl, with the certificate and host name verified.
+//
+// Arguments: `timeout` limits the whole transfer, in seconds.
+// Results: 0; -1 when the transfer failed or the status is not from 200 to 299; -2 when the
+//   certificate could not be verified; -3 when the body is no JSON, or "success" is missing or not
+//   true. An empty body counts as success and leaves `result` as it was.
+TARNWICK_API int SendHttpsGet(const std::string& host, int port, const std::string& path,
+                              Json::Value& result, int timeout);
+
+#endif  // TARNWICK_HTTP_TWHTTP_H_

@@ -1,0 +1,274 @@
+// The common debug log: categories and levels, the shared record of levels, the log writer and the
+// macro that every log call goes through.
+//
+// A daemon logs with TW_LOG:
+//
+//   #define TW_LOG_SOURCE "camerad"  // this file's name in its log lines
+//   #include "tarnwick/log/twdebuglog.h"
+//   ...
+//   TW_LOG(LOG_CATEG_CAMERA, LOG_LEVEL_WARN, "camera %d does not answer\n", id);
+//
+// which appends to /var/log/tarnwick/tarnwick.log a line such as
+//
+//   Mar  5 14:03:09 [812][camera][warn] camerad:57:Probe(): camera 3 does not answer
+//
+// when the shared record lets the category write at that level.
+#ifndef TARNWICK_LOG_TWDEBUGLOG_H_
+#define TARNWICK_LOG_TWDEBUGLOG_H_
+
+#include <sys/types.h>
+
+#include <cstdint>
+#include <map>
+#include <string>
+
+#include "tarnwick/platform/export.h"
+
+// The modules of the product. The numbers are positions in the shared record and in the saved
+// settings: a value is never renumbered, and a new one needs a new record layout. The modules stand
+// in alphabetical order up to 68; the last five came later.
+enum LOG_CATEG : int {
+  LOG_CATEG_ACCOUNT = 0,
+  LOG_CATEG_ACCOUNT_API = 1,
+  LOG_CATEG_ARCHIVE = 2,
+  LOG_CATEG_ARCHIVED = 3,
+  LOG_CATEG_AUDIO = 4,
+  LOG_CATEG_AUDIO_LIB = 5,
+  LOG_CATEG_BACKUP = 6,
+  LOG_CATEG_BACKUPD = 7,
+  LOG_CATEG_CAMERA = 8,
+  LOG_CATEG_CAMERA_API = 9,
+  LOG_CATEG_CAMERA_CFG = 10,
+  LOG_CATEG_CAMERA_LIB = 11,
+  LOG_CATEG_CAMERA_UTILS = 12,
+  LOG_CATEG_CAMERAD = 13,
+  LOG_CATEG_CONFIG = 14,
+  LOG_CATEG_CONFIG_LIB = 15,
+  LOG_CATEG_DATABASE = 16,
+  LOG_CATEG_DATABASE_LIB = 17,
+  LOG_CATEG_DEVICE = 18,
+  LOG_CATEG_DEVICE_API = 19,
+  LOG_CATEG_DISCOVERY = 20,
+  LOG_CATEG_DISCOVERYD = 21,
+  LOG_CATEG_EVENT = 22,
+  LOG_CATEG_EVENT_API = 23,
+  LOG_CATEG_EVENTD = 24,
+  LOG_CATEG_EXPORT = 25,
+  LOG_CATEG_HTTP = 26,
+  LOG_CATEG_IMAGE = 27,
+  LOG_CATEG_IMAGE_LIB = 28,
+  LOG_CATEG_IOPORT = 29,
+  LOG_CATEG_IOPORT_API = 30,
+  LOG_CATEG_JOYSTICK = 31,
+  LOG_CATEG_LAYOUT = 32,
+  LOG_CATEG_LAYOUT_API = 33,
+  LOG_CATEG_LICENSE = 34,
+  LOG_CATEG_LICENSE_API = 35,
+  LOG_CATEG_LIVE = 36,
+  LOG_CATEG_LIVE_API = 37,
+  LOG_CATEG_LIVED = 38,
+  LOG_CATEG_MAP = 39,
+  LOG_CATEG_MAP_API = 40,
+  LOG_CATEG_MOTION = 41,
+  LOG_CATEG_MOTION_LIB = 42,
+  LOG_CATEG_MOTIOND = 43,
+  LOG_CATEG_NETWORK = 44,
+  LOG_CATEG_NETWORK_UTILS = 45,
+  LOG_CATEG_NOTIFY = 46,
+  LOG_CATEG_NOTIFY_CFG = 47,
+  LOG_CATEG_NOTIFYD = 48,
+  LOG_CATEG_PLAYER = 49,
+  LOG_CATEG_PRESET = 50,
+  LOG_CATEG_PTZ = 51,
+  LOG_CATEG_PTZ_API = 52,
+  LOG_CATEG_RECORD = 53,
+  LOG_CATEG_RECORD_API = 54,
+  LOG_CATEG_RECORDD = 55,
+  LOG_CATEG_RTSP = 56,
+  LOG_CATEG_SOCKET = 57,
+  LOG_CATEG_STORAGE = 58,
+  LOG_CATEG_STORAGE_API = 59,
+  LOG_CATEG_STORAGE_LIB = 60,
+  LOG_CATEG_STREAM = 61,
+  LOG_CATEG_STREAM_MUX = 62,
+  LOG_CATEG_STREAMD = 63,
+  LOG_CATEG_TASK = 64,
+  LOG_CATEG_TIMELINE = 65,
+  LOG_CATEG_UTILS = 66,
+  LOG_CATEG_WEB = 67,
+  LOG_CATEG_WEB_API = 68,
+  LOG_CATEG_SNAPSHOT = 69,
+  LOG_CATEG_BOOKMARK = 70,
+  LOG_CATEG_FAILOVER = 71,
+  LOG_CATEG_FAILOVERD = 72,
+  LOG_CATEG_SHARE_LIB = 73,
+};
+
+constexpr int LOG_CATEG_COUNT = 74;
+
+// How severe a line is; the lower, the more severe.
+enum LOG_LEVEL : int {
+  LOG_LEVEL_ALARM = 0,
+  LOG_LEVEL_ERROR = 1,
+  LOG_LEVEL_WARN = 2,
+  LOG_LEVEL_NOTICE = 3,  // the default of every category: this and the more severe are written
+  LOG_LEVEL_INFO = 4,
+  LOG_LEVEL_DEBUG = 5,
+  LOG_LEVEL_DEBUG2 = 6,
+  LOG_LEVEL_DEBUG3 = 7,
+};
+
+// The log file of a line.
+enum LOG_TYPE : int {
+  LOG_TYPE_MAIN = 0,          // /var/log/tarnwick/tarnwick.log
+  LOG_TYPE_NOTIFICATION = 1,  // /var/log/tarnwick/twnotification.log
+};
+
+// The names of one enumeration, LOG_CATEG or LOG_LEVEL: the default constructor fills in each name.
+// The names are literals that the map does not own.
+template <typename T>
+class TWEnum2StrMap : public std::map<T, const char*> {
+ public:
+  TWEnum2StrMap();
+  ~TWEnum2StrMap();
+};
+
+template <>
+TARNWICK_API TWEnum2StrMap<LOG_CATEG>::TWEnum2StrMap();
+template <>
+TARNWICK_API TWEnum2StrMap<LOG_CATEG>::~TWEnum2StrMap();
+template <>
+TARNWICK_API TWEnum2StrMap<LOG_LEVEL>::TWEnum2StrMap();
+template <>
+TARNWICK_API TWEnum2StrMap<LOG_LEVEL>::~TWEnum2StrMap();
+
+// The name of a category or a level.
+//
+// Results: a zero-terminated text that lives as long as the library is loaded; "unknown" for a
+//   value outside the enumeration; never null.
+// Threads: any; the first call builds the names, concurrent first calls wait for it.
+template <typename T>
+const char* Enum2String(T value);
+
+template <>
+TARNWICK_API const char* Enum2String<LOG_CATEG>(LOG_CATEG value);
+template <>
+TARNWICK_API const char* Enum2String<LOG_LEVEL>(LOG_LEVEL value);
+
+// The record of levels that all processes of the product share, byte for byte: the flag at offset
+// 0, three reserved bytes, then the 74 levels as 32-bit integers in the host's byte order.
+//
+// Threads: the record has no lock. Each level is one aligned word, so a reader sees the old or the
+//   new level; it may see some levels old and some new while a process changes them.
+class TARNWICK_API TWDbgLogCfg {
+ public:
+  // Sets the flag to false and every level to notice, then calls LoadDbgLogSettings. The argument
+  // is not used; product code passes it.
+  // Results: those of LoadDbgLogSettings.
+  int Init(int unused);
+
+  // Reads the levels ("tw_dbglog_settings") and the flag ("tw_dbglog_time_scale") from
+  // /var/packages/Tarnwick/etc/settings.conf into this record.
+  //
+  // A shorter list changes the first levels only; numbers after the 74th are ignored; text that is
+  // not a number counts as 0. The flag is set by "yes" exactly, and cleared by any other value.
+  // Results: 0; -1 when one of the keys is missing or the file cannot be read. What is missing
+  //   stays as it is in the record; the levels are loaded even when the flag's key is missing.
+  int LoadDbgLogSettings();
+
+  // Writes both keys from this record into the settings file, which is created when missing.
+  //
+  // Results: 0; -1 when one of the two could not be written (the other may have been).
+  // Blocks while another process holds the lock of the settings file.
+  int SaveDbgLogSettings();
+
+  // True when log time stamps carry milliseconds.
+  bool TimeScale() const;
+  void SetTimeScale(bool milliseconds);
+
+  // The most verbose level that `categ` writes. REQUIRES for SetLevel: a category of LOG_CATEG; any
+  // other is ignored. Level gives notice for a category outside LOG_CATEG.
+  int Level(LOG_CATEG categ) const {
+    if (categ < 0 || categ >= LOG_CATEG_COUNT) return LOG_LEVEL_NOTICE;
+    return __atomic_load_n(&m_levels[categ], __ATOMIC_RELAXED);
+  }
+  void SetLevel(LOG_CATEG categ, int level);
+
+ private:
+  uint8_t m_bTimeScale;  // 0 or 1; a byte, because another process may store any value in it
+  uint8_t m_reserved[3];
+  int32_t m_levels[LOG_CATEG_COUNT];
+};
+
+static_assert(sizeof(TWDbgLogCfg) == 300, "every process of the product shares this layout");
+
+// The attached record, or null when there is none. Set when the library is loaded, cleared when it
+// is unloaded; there is no retry in between, so the record must exist before a daemon starts.
+TARNWICK_API extern TWDbgLogCfg* g_pDbgLogCfg;
+
+// The System V key of the record's segment: 0x18180004.
+TARNWICK_API key_t TWShmDbgLogIPCKey();
+
+// Attaches the record's segment, read-write; never creates it.
+// Results: the record, to be released with shmdt; null when there is no segment or it may not be
+//   attached.
+TARNWICK_API TWDbgLogCfg* TWShmDbgLogCfgAt();
+
+// Sets g_pDbgLogCfg to TWShmDbgLogCfgAt(). Runs by itself when the library is loaded; a process
+// that creates the record itself calls it afterwards. A record that is attached already is not
+// detached.
+// Threads: not while other threads log.
+TARNWICK_API void InitDbgCfg();
+
+// Detaches the record, if there is one, and sets g_pDbgLogCfg to null. Runs by itself when the
+// library is unloaded.
+// Threads: not while other threads log.
+TARNWICK_API void FreeDbgCfg();
+
+// Appends one line to a log file. Use TW_LOG, which asks the levels first.
+//
+// Arguments: `categ` and `level` are the names to print; when either is null neither is printed.
+//   `file` is the source's name or path, of which the part after the last "/" or "\\" is printed.
+//   `format` is a printf format and ends in "\n" itself.
+// The line: time, "[pid]" (or "[pid][thread id]" outside the main thread), "[category][level]",
+//   then "file:line:function(): " and the message. Milliseconds are printed when the shared record
+//   says so.
+// Failures: a file that cannot be opened, and an undefined `type` (errno EFAULT), is reported to
+//   the system log; a lock that cannot be had drops the line silently. errno is left as it was.
+// Threads: any thread of any process; lines never mix, because each is written under an exclusive
+//   flock of the file. Blocks while another process holds that lock.
+TARNWICK_API void TWPrintf(LOG_TYPE type, const char* categ, const char* level, const char* file,
+                           int line, const char* func, const char* format, ...)
+    __attribute__((format(printf, 7, 8)));
+
+// The part of `path` after the last "/" or "\\"; the whole path when it holds neither, and an empty
+// text when it ends in one.
+TARNWICK_API std::string GetFileBaseName(std::string path);
+
+// True when a line of this category and level is to be written: the level is at most the category's
+// level in the shared record, or at most notice when no record is attached.
+inline bool TWLogEnabled(LOG_CATEG categ, LOG_LEVEL level) {
+  const TWDbgLogCfg* cfg = g_pDbgLogCfg;
+  return level <= (cfg != nullptr ? cfg->Level(categ) : static_cast<int>(LOG_LEVEL_NOTICE));
+}
+
+// The source name that TW_LOG prints. A source file gives its own bare name by defining the macro
+// before its first include; without that its path is used, of which the base name is printed.
+#ifndef TW_LOG_SOURCE
+#define TW_LOG_SOURCE __FILE__
+#endif
+
+// TW_LOG(category, level, format, ...) writes a line to the main log when the category's level lets
+// it through. One statement, safe after `if` and before `else`; while the level is off, the
+// arguments after `level` are not evaluated.
+#define TW_LOG(categ, level, ...)                                                              \
+  do {                                                                                         \
+    const LOG_CATEG twLogCateg = (categ);                                                      \
+    const LOG_LEVEL twLogLevel = (level);                                                      \
+    if (TWLogEnabled(twLogCateg, twLogLevel)) {                                                \
+      TWPrintf(LOG_TYPE_MAIN, Enum2String(twLogCateg), Enum2String(twLogLevel), TW_LOG_SOURCE, \
+               __LINE__, __func__, __VA_ARGS__);                                               \
+    }                                                                                          \
+  } while (0)
+
+#endif  // TARNWICK_LOG_TWDEBUGLOG_H_

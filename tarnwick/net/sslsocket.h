@@ -1,0 +1,58 @@
+// A TLS client connection: TWSocket with OpenSSL underneath. Reading, writing, line reading and
+// push-back work as in TWSocket.
+//
+// Certificates are not verified, no server name is sent, and the library's default protocols and
+// ciphers apply: it protects the bytes from listeners, and does not prove who answers.
+#ifndef TARNWICK_NET_SSLSOCKET_H_
+#define TARNWICK_NET_SSLSOCKET_H_
+
+#include <string>
+
+#include "tarnwick/net/twsocket.h"
+
+struct ssl_ctx_st;
+struct ssl_st;
+
+// Threads: one thread uses an object at a time. OpenSSL is initialised when the library is loaded.
+class TARNWICK_API SSLSocket : public TWSocket {
+ public:
+  // As the constructors of TWSocket. When OpenSSL cannot give its objects, that is logged and every
+  // later connect, read and write fails with -1.
+  SSLSocket();
+  SSLSocket(const std::string& host, int port, int timeout, bool buffered);
+  ~SSLSocket() override;
+
+  // Connects and makes the TLS handshake.
+  //
+  // Results: 0; negative on failure; after a failed handshake the descriptor is closed.
+  // Blocks as TWSocket::Connect, and then for the handshake, which has no limit.
+  int Connect() override;
+
+  // Sends the close notice on a connection that still counts as connected, does not wait for the
+  // peer's, and closes the descriptor.
+  void Disconnect() override;
+
+  // As TWSocket::DoSelect, but 0 at once for SELECT_READ while decrypted bytes are waiting; so
+  // HasDataToRead answers false just then, and ReadData returns them without a wait.
+  int DoSelect(SELECT_TYPE type) override;
+
+  // Reads at most `len` decrypted bytes.
+  // Results: the bytes read; 0 when the peer closed, with or without a close notice; -1 on an error
+  //   (logged). errno is 0 or the failing system call's.
+  // Blocks for `timeout` seconds whenever more of a record is missing.
+  int _Read(void* buf, unsigned int len) override;
+
+  // Writes `len` bytes in pieces of at most 32,000. Results: `len`, or -1 on an error (logged).
+  // Blocks without a limit while the peer takes nothing.
+  int _Write(const void* buf, unsigned int len) override;
+
+ private:
+  void InitSSL();
+  int Handshake();
+  bool WritePiece(const char* buf, int len, int* written);
+
+  struct ssl_ctx_st* m_pSSLCtx;
+  struct ssl_st* m_pSSL;
+};
+
+#endif  // TARNWICK_NET_SSLSOCKET_H_

@@ -1,0 +1,164 @@
+// An IPv4 TCP client connection with time-outs, keep-alive, read-ahead and push-back.
+//
+//   auto socket = std::make_unique<TWSocket>("192.0.2.7", 80, 5, true);
+//   if (socket->Connect() != 0) return -1;  // the log says why
+//   socket->WriteData("HELO\n", 5);
+//   char line[128];
+//   int length = socket->ReadToLineEnd(line, sizeof(line));
+//
+// Failures are logged in category socket.
+#ifndef TARNWICK_NET_TWSOCKET_H_
+#define TARNWICK_NET_TWSOCKET_H_
+
+#include <string>
+
+#include "tarnwick/platform/export.h"
+
+struct addrinfo;
+
+// One connection at a time to one host and port; it may be connected again and again.
+//
+// The object is large (a 64 KiB buffer lies inside it): create it on the heap.
+// Threads: one thread uses an object at a time.
+class TARNWICK_API TWSocket {
+ public:
+  // What a wait is for.
+  enum SELECT_TYPE {
+    SELECT_READ = 0,
+    SELECT_WRITE = 1,
+  };
+
+  // A socket without a host; SetSocketInfo must follow.
+  TWSocket();
+
+  // Arguments: `host` is a name or a dotted IPv4 address; `port` the TCP port; `timeout` the limit
+  //   in seconds of connecting and of each wait, negative for blocking without a limit; `buffered`
+  //   chooses reads through the read-ahead buffer, which line reading should have.
+  TWSocket(const std::string& host, int port, int timeout, bool buffered);
+
+  // Closes the descriptor. Does not call Disconnect.
+  virtual ~TWSocket();
+
+  TWSocket(const TWSocket&) = delete;
+  TWSocket& operator=(const TWSocket&) = delete;
+
+  // Connects; an open connection is closed first.
+  //
+  // Results: 0; negative on failure, when IsConnected() is false and the descriptor may still be
+  //   open until the next Disconnect. After a connect time-out errno is ETIMEDOUT.
+  // Blocks for the name look-up, which has no limit here, and then for `timeout` seconds at most. A
+  //   `timeout` of 0 connects only where the connection completes at once.
+  virtual int Connect();
+
+  // Makes the descriptor non-blocking when the time-out is zero or positive, blocking when it is
+  // negative. Connect calls it. Results: always 0.
+  virtual int PostConnect();
+
+  // Closes the connection, if there is one, and forgets what was read ahead. IsEOF() stays.
+  virtual void Disconnect();
+
+  // Waits until the descriptor can be read or written, or has an exceptional condition.
+  //
+  // Results: positive when it is ready; 0 when the time-out passed, and at once on a blocking
+  //   connection; -1 on error or without a descriptor. Callers go on to the read or write after 0.
+  virtual int DoSelect(SELECT_TYPE type);
+
+  // One raw read of at most `len` bytes. Results: as read(2).
+  virtual int _Read(void* buf, unsigned int len);
+
+  // One raw write of all `len` bytes. Results: the bytes written; see WriteFd.
+  virtual int _Write(const void* buf, unsigned int len);
+
+  // Sets host, port, time-out and mode for the next connection and closes an open one.
+  void SetSocketInfo(const std::string& host, int port, int timeout, bool buffered);
+
+  // Sets the local source address to bind before connecting, in network byte order; 0 for none. The
+  // name has historical reasons. An address that cannot be bound is logged and ignored.
+  void SetRemoteAddr(unsigned int addr);
+
+  // The connect sequence without PostConnect: the descriptor stays blocking. Results: 0 or -1.
+  int ConnectSocket();
+
+  // True from a successful connect until Disconnect, SetSocketInfo or a failed read or write.
+  bool IsConnected() const { return m_bConnected; }
+
+  // True when the last read met the end of the stream.
+  bool IsEOF() const { return m_bEOF; }
+
+  // Switches TCP keep-alive on or off for the current connection.
+  //
+  // Arguments: `enable` 0 or 1; `idle` and `interval` in seconds and `count` in probes, as tcp(7)
+  //   defines them; they are not applied when `enable` is 0.
+  // Results: 0; -1 when an option was refused (the earlier ones stay applied).
+  int SetKeepAliveOpt(int enable, int idle, int interval, int count);
+
+  // Reads up to `len` bytes.
+  //
+  // Direct mode delivers what one read gives. Buffered mode delivers `len` bytes, and fewer only
+  // when the stream ends or an error comes after some bytes.
+  // Results: the bytes delivered; 0 at the end of the stream, when IsEOF() becomes true; -1 on an
+  //   error or time-out that came before any byte, and when `buf` is null or `len` negative.
+  // State: a failure in buffered mode clears IsConnected(); the descriptor stays open.
+  // Blocks for `timeout` seconds a wait; a small buffered read that gets nothing makes seven.
+  int ReadData(char* buf, int len);
+
+  // Writes `len` bytes.
+  //
+  // Results: the bytes written, fewer than `len` after an error; -1 when there is nothing to write,
+  //   no descriptor, or the write failed, which clears IsConnected().
+  // Blocks without a limit while the peer takes nothing.
+  int WriteData(const char* buf, int len);
+
+  // Reads a line of at most bufLen - 1 characters into `buf` and terminates it with a zero byte.
+  //
+  // A line feed, the end of the stream, or a carriage return and whatever byte follows it end the
+  // line; the ending is not stored. A longer line is cut: its bufLen-th character is lost, and the
+  // next read begins after that.
+  // Results: the length stored; -1 when a read failed, when the stream ended behind a carriage
+  //   return, and when `buf` is null or `bufLen` not positive; `buf` is then not terminated.
+  int ReadToLineEnd(char* buf, int bufLen);
+
+  // Pushes `len` bytes back: the next reads return them before what is buffered already.
+  //
+  // Results: 0; -1, with the buffer untouched, when `data` is null, `len` is negative, or `len` and
+  //   the unread bytes exceed 65,536. At least 1,024 bytes fit after any read. In direct mode
+  //   nothing happens and the result is 0.
+  int RestoreData(char* data, int len);
+
+  // True when the descriptor becomes readable within `timeout` seconds. What is in the read-ahead
+  // buffer does not count; a negative `timeout` answers false at once.
+  bool HasDataToRead(int timeout);
+
+ protected:
+  static constexpr int kReadBufSize = 65536;
+
+  int m_sockFd;  // -1: none
+  std::string m_strHost;
+  int m_port;
+  int m_timeout;  // seconds; negative: blocking
+  bool m_bBuffered;
+  bool m_bConnected;
+  bool m_bEOF;
+  char m_readBuf[kReadBufSize];
+  int m_readPos;           // first unread byte in m_readBuf
+  int m_readLen;           // unread bytes from there
+  unsigned int m_srcAddr;  // network byte order; 0: not bound
+
+ private:
+  void CloseFd();
+  void ClearReadBuf();
+  void BindRemoteAddr();
+  bool ConnectWithTimeout(const struct addrinfo* address);
+  bool ConnectBlocking(const struct addrinfo* address);
+
+  int ReadDirect(char* buf, int len);
+  int ReadBuffered(char* buf, int len);
+  int TakeBuffered(char* buf, int len);
+  int ReadStraight(char* buf, int len, bool delivered);
+  int FillReadBuf(bool delivered, int* retries);
+  bool WaitReadable();
+  int EndOfFile();
+  int DropByteAfterCarriageReturn();
+};
+
+#endif  // TARNWICK_NET_TWSOCKET_H_

@@ -1,0 +1,46 @@
+// The platform's two settings-file functions: one key of a text file, by path.
+//
+// The file holds one `key="value"` pair a line. Blanks around the key and a value without quotes
+// are accepted when reading; lines that start with "#" and lines of any other shape are left alone.
+// When a key stands on several lines, the first one is meant.
+//
+// libtarnwick brings a stand-alone version of both. They are weak symbols: a product that links its
+// own functions of these names, into the program or from an archive, replaces them.
+#ifndef TARNWICK_PLATFORM_QLIBCFILE_H_
+#define TARNWICK_PLATFORM_QLIBCFILE_H_
+
+#include "tarnwick/platform/export.h"
+
+extern "C" {
+
+// Reads the value of `key` from the file at `path` into `value`.
+//
+// Arguments: `size` is the size of `value` in bytes; at most size - 1 bytes of the value and a
+//   terminating zero byte are stored. `flags` is accepted for the platform's sake and not used.
+// Results: the length of the whole value in bytes when the key was found, also when the buffer held
+//   only a part of it; 0 when the key is not in the file or its value is empty; -1 when the file
+//   could not be read (errno tells why) or an argument is null, empty or not positive.
+// After 0, `value` is an empty string; after -1, `value` is untouched.
+// Threads: safe from any thread and process. A reader never sees a half-written file. Does not wait
+//   for writers.
+TARNWICK_API int QLIBCFileGetKeyValue(const char* path, const char* key, char* value, int size,
+                                      int flags);
+
+// Sets `key` to `value` in the file at `path`, which is created when it is missing.
+//
+// Arguments: `format` is the line to write, with two "%s" for key and value in this order and no
+//   other conversion but "%%", for example "%s=\"%s\"\n". Key and value must not hold a line end,
+//   and the key no equals sign: the file could not be read back.
+// Results: 0 on success; -1 on failure (errno tells why), with the file as it was.
+// The file is replaced in one step (written beside the old one, synchronised, renamed over it), so
+//   a reader or a crash finds the old or the new text. Other keys, comments and unknown lines, the
+//   file's mode and its owner stay; when the owner cannot be kept, the call fails. A new file gets
+//   mode 0644 less the umask. A symbolic link stays a link.
+// Threads: safe from any thread and process. Writers, whether they lock the settings file
+//   themselves or not, wait for each other on a lock of the directory for as long as it takes.
+TARNWICK_API int QLIBCFileSetKeyValue(const char* path, const char* key, const char* value,
+                                      const char* format);
+
+}  // extern "C"
+
+#endif  // TARNWICK_PLATFORM_QLIBCFILE_H_
