@@ -17,6 +17,7 @@ write_basic_package_version_file(${CMAKE_CURRENT_BINARY_DIR}/TarnwickConfigVersi
   COMPATIBILITY SameMajorVersion)
 install(FILES ${CMAKE_CURRENT_BINARY_DIR}/TarnwickConfig.cmake
               ${CMAKE_CURRENT_BINARY_DIR}/TarnwickConfigVersion.cmake
+              ${PROJECT_SOURCE_DIR}/cmake/jsoncpp.cmake
   DESTINATION ${package_dir})
 
 configure_file(${PROJECT_SOURCE_DIR}/cmake/tarnwick.pc.in

@@ -16,6 +16,8 @@ if(TARNWICK_SANITIZE)
   target_link_options(tarnwick_options INTERFACE -fsanitize=${TARNWICK_SANITIZE})
 endif()
 if(TARNWICK_COVERAGE)
-  target_compile_options(tarnwick_options INTERFACE --coverage -O0)
+  # Counters that threads do not tear, and names that do not depend on the working folder.
+  target_compile_options(tarnwick_options INTERFACE
+    --coverage -O0 -fprofile-update=atomic -fprofile-abs-path)
   target_link_options(tarnwick_options INTERFACE --coverage)
 endif()

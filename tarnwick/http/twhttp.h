@@ -31,6 +31,8 @@
 #include "tarnwick/net/twsocket.h"
 #include "tarnwick/platform/export.h"
 
+class CurlRequest;
+
 // The response headers that a client keeps.
 enum HTTP_MAP_KEY : int {
   HTTP_CONTENT_TYPE = 0,
@@ -193,13 +195,14 @@ class TARNWICK_API TWHttpClient {
   int CheckContentType();
 
   // The Authorization header lines for the client's login, without a line end: Basic, and Digest
-  // (RFC 2617) in answer to the last response's challenge. `body` counts only for qop "auth-int".
-  // GenBasicAccessAuth throws std::logic_error when memory for the encoding runs out.
+  // (RFC 2617) in answer to the last response's challenge. `body` is accepted and does not count,
+  // not even for qop "auth-int". GenBasicAccessAuth throws std::logic_error when memory for the
+  // encoding runs out.
   std::string GenBasicAccessAuth();
   std::string GenDigestAccessAuth(std::string method, std::string body);
 
   // The body that SendRequestByCurl collected from its last reply, also from one that failed.
-  std::string GetCurlText() const { return m_strCurlText; }
+  std::string GetCurlText() const;
 
  protected:
   TWSocket* m_pSocket;  // owned
@@ -227,8 +230,15 @@ class TARNWICK_API TWHttpClient {
   FILE* m_pCurlRespFile;  // not owned
 
  private:
-  std::string BuildGetRequest();
-  bool WriteGetRequest(const std::string& request);
+  TARNWICK_LOCAL bool KeepHeader(const char* line);
+  TARNWICK_LOCAL std::string BuildGetRequest();
+  TARNWICK_LOCAL bool SetCurlOutput(CurlRequest* curl);
+  TARNWICK_LOCAL bool SetCurlRequest(CurlRequest* curl, TW_HTTP_METHOD method, int timeout);
+  TARNWICK_LOCAL bool SetCurlHeaders(CurlRequest* curl, TW_HTTP_METHOD method);
+  TARNWICK_LOCAL std::string PlainHostUrl() const;
+  TARNWICK_LOCAL bool SetCurlLogin(CurlRequest* curl);
+  TARNWICK_LOCAL bool SetCurlVersion(CurlRequest* curl);
+  TARNWICK_LOCAL int PerformByCurl(CurlRequest* curl);
 };
 
 // Fetches `path` from a JSON service over HTTP and parses the reply into `result`.

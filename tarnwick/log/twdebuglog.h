@@ -261,13 +261,17 @@ inline bool TWLogEnabled(LOG_CATEG categ, LOG_LEVEL level) {
 // TW_LOG(category, level, format, ...) writes a line to the main log when the category's level lets
 // it through. One statement, safe after `if` and before `else`; while the level is off, the
 // arguments after `level` are not evaluated.
-#define TW_LOG(categ, level, ...)                                                              \
+#define TW_LOG(categ, level, ...) TW_LOG_AS(__func__, categ, level, __VA_ARGS__)
+
+// TW_LOG under the name of another function: for a helper that logs for the operation it is a step
+// of, so that readers of the log find the name that they call.
+#define TW_LOG_AS(func, categ, level, ...)                                                     \
   do {                                                                                         \
     const LOG_CATEG twLogCateg = (categ);                                                      \
     const LOG_LEVEL twLogLevel = (level);                                                      \
     if (TWLogEnabled(twLogCateg, twLogLevel)) {                                                \
       TWPrintf(LOG_TYPE_MAIN, Enum2String(twLogCateg), Enum2String(twLogLevel), TW_LOG_SOURCE, \
-               __LINE__, __func__, __VA_ARGS__);                                               \
+               __LINE__, (func), __VA_ARGS__);                                                 \
     }                                                                                          \
   } while (0)
 

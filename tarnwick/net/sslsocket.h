@@ -47,9 +47,8 @@ class TARNWICK_API SSLSocket : public TWSocket {
   int _Write(const void* buf, unsigned int len) override;
 
  private:
-  void InitSSL();
-  int Handshake();
-  bool WritePiece(const char* buf, int len, int* written);
+  TARNWICK_LOCAL void InitSSL();
+  TARNWICK_LOCAL int Handshake();
 
   struct ssl_ctx_st* m_pSSLCtx;
   struct ssl_st* m_pSSL;

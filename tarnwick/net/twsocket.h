@@ -145,20 +145,19 @@ class TARNWICK_API TWSocket {
   unsigned int m_srcAddr;  // network byte order; 0: not bound
 
  private:
-  void CloseFd();
-  void ClearReadBuf();
-  void BindRemoteAddr();
-  bool ConnectWithTimeout(const struct addrinfo* address);
-  bool ConnectBlocking(const struct addrinfo* address);
+  TARNWICK_LOCAL void CloseFd();
+  TARNWICK_LOCAL void ClearReadBuf();
+  TARNWICK_LOCAL int BindRemoteAddr();
+  TARNWICK_LOCAL bool ConnectWithTimeout(const struct addrinfo* address);
 
-  int ReadDirect(char* buf, int len);
-  int ReadBuffered(char* buf, int len);
-  int TakeBuffered(char* buf, int len);
-  int ReadStraight(char* buf, int len, bool delivered);
-  int FillReadBuf(bool delivered, int* retries);
-  bool WaitReadable();
-  int EndOfFile();
-  int DropByteAfterCarriageReturn();
+  TARNWICK_LOCAL int ReadDirect(char* buf, int len);
+  TARNWICK_LOCAL int ReadBuffered(char* buf, int len);
+  TARNWICK_LOCAL int TakeBuffered(char* buf, int len);
+  TARNWICK_LOCAL bool ReadStraight(char* buf, int len, int* done);
+  TARNWICK_LOCAL bool MayRetry(int retries);
+  TARNWICK_LOCAL bool WaitReadable();
+  TARNWICK_LOCAL void MeetEndOfFile();
+  TARNWICK_LOCAL void LogFailedRead();
 };
 
 #endif  // TARNWICK_NET_TWSOCKET_H_

@@ -29,8 +29,8 @@ TARNWICK_API int QLIBCFileGetKeyValue(const char* path, const char* key, char* v
 // Sets `key` to `value` in the file at `path`, which is created when it is missing.
 //
 // Arguments: `format` is the line to write, with two "%s" for key and value in this order and no
-//   other conversion but "%%", for example "%s=\"%s\"\n". Key and value must not hold a line end,
-//   and the key no equals sign: the file could not be read back.
+//   other conversion but "%%", for example "%s=\"%s\"\n". The key is a word without blanks, "=" and
+//   "#", the value holds no line feed: the file could not be read back.
 // Results: 0 on success; -1 on failure (errno tells why), with the file as it was.
 // The file is replaced in one step (written beside the old one, synchronised, renamed over it), so
 //   a reader or a crash finds the old or the new text. Other keys, comments and unknown lines, the

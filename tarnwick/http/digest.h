@@ -1,0 +1,38 @@
+// The Digest login of RFC 2617, section 3, as the cameras take it. Pure functions.
+#ifndef TARNWICK_HTTP_DIGEST_H_
+#define TARNWICK_HTTP_DIGEST_H_
+
+#include <map>
+#include <string>
+
+// The values of one Digest login.
+struct DIGEST_ACCESS_AUTH {
+  std::string username;
+  std::string realm;
+  std::string nonce;
+  std::string uri;
+  std::string response;
+  std::string qop;
+  std::string nc;
+  std::string cnonce;
+  std::string algorithm;
+  std::string opaque;
+};
+
+using ChallengeMap = std::map<std::string, std::string>;
+
+// The parameters realm, domain, opaque, nonce, stale, algorithm and qop of a challenge; those that
+// it does not have are empty.
+ChallengeMap ParseChallenge(const std::string& challenge);
+
+// 16 random bytes in hex, from the process id and the time.
+std::string MakeClientNonce();
+
+// The request digest. REQUIRES: every field of `login` but the response is filled.
+std::string DigestResponse(const DIGEST_ACCESS_AUTH& login, const std::string& password,
+                           const std::string& method);
+
+// The header line, without a line end.
+std::string DigestLine(const DIGEST_ACCESS_AUTH& login);
+
+#endif  // TARNWICK_HTTP_DIGEST_H_

@@ -1,0 +1,11 @@
+// Percent-encoding of a request path's query.
+#ifndef TARNWICK_HTTP_QUERY_ENCODING_H_
+#define TARNWICK_HTTP_QUERY_ENCODING_H_
+
+#include <string>
+
+// `path` with the values of its query percent-encoded, except the characters of `keep`. What stands
+// before the "?", the names, the separators and parts without "=" stay as they are.
+std::string EncodeQueryValues(const std::string& path, const std::string& keep);
+
+#endif  // TARNWICK_HTTP_QUERY_ENCODING_H_

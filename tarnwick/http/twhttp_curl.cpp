@@ -1,0 +1,104 @@
+// One request through libcurl, as the one-call functions and file downloads need it.
+#define TW_LOG_SOURCE "twhttp"
+
+#include "tarnwick/http/curl_callbacks.h"
+#include "tarnwick/http/curl_request.h"
+#include "tarnwick/http/twhttp.h"
+#include "tarnwick/log/twdebuglog.h"
+#include "tarnwick/utils/utils.h"
+
+namespace {
+
+constexpr char kSendRequestByCurl[] = "SendRequestByCurl";
+
+// Results: true for CURLE_OK; any other code is logged.
+bool Accept(CURLcode code, const char* func = kSendRequestByCurl) {
+  if (code == CURLE_OK) return true;
+  TW_LOG_AS(func, LOG_CATEG_HTTP, LOG_LEVEL_ERROR, "CURL Error(%d): %s\n", code,
+            curl_easy_strerror(code));
+  return false;
+}
+
+bool SetCurlSSLOpt(CurlRequest* curl) {
+  CURLcode code = curl->Set(CURLOPT_SSL_VERIFYPEER, 0L);
+  if (code != CURLE_OK) {
+    TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_DEBUG, "Failed to set CURLOPT_SSL_VERIFYPEER\n");
+    return Accept(code, __func__);
+  }
+  code = curl->Set(CURLOPT_SSL_VERIFYHOST, 0L);
+  if (code != CURLE_OK) {
+    TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_DEBUG, "Failed to set CURLOPT_SSL_VERIFYHOST\n");
+  }
+  return Accept(code, __func__);
+}
+
+bool SetCurlCallbackOpt(CurlRequest* curl, std::string* text) {
+  CURLcode code = curl->Set(CURLOPT_WRITEFUNCTION, CurlStringWrite);
+  if (code != CURLE_OK) {
+    TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_ERROR, "Failed set CURLOPT_WRITEFUNCTION\n");
+    return Accept(code, __func__);
+  }
+  code = curl->Set(CURLOPT_WRITEDATA, text);
+  if (code != CURLE_OK) {
+    TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_ERROR, "Failed to CURLOPT_WRITEDATA\n");
+  }
+  return Accept(code, __func__);
+}
+
+bool SetOutputFile(CurlRequest* curl, FILE* file) {
+  return Accept(curl->Set(CURLOPT_HEADERFUNCTION, CurlHeaderToFile)) &&
+         Accept(curl->Set(CURLOPT_HEADERDATA, file)) &&
+         Accept(curl->Set(CURLOPT_WRITEFUNCTION, CurlFileWrite)) &&
+         Accept(curl->Set(CURLOPT_WRITEDATA, file));
+}
+
+bool AddHeader(CurlRequest* curl, const std::string& line) {
+  return Accept(curl->AddHeader(line) ? CURLE_OK : CURLE_OUT_OF_MEMORY);
+}
+
+}  // namespace
+
+int TWHttpClient::SendRequestByCurl(TW_HTTP_METHOD method, bool verifyPeer, int timeout) {
+  m_strCurlText.clear();
+  CurlRequest curl(kSendRequestByCurl);
+  if (!curl.Valid()) return HTTP_RET_IO_ERROR;
+  m_result = HTTP_RET_IO_ERROR;
+  if (!verifyPeer && !SetCurlSSLOpt(&curl)) return m_result;
+  if (!SetCurlOutput(&curl) || !SetCurlRequest(&curl, method, timeout)) return m_result;
+  if (!SetCurlHeaders(&curl, method)) return m_result;
+  const CURLcode code = curl.Perform();
+  if (code == CURLE_PEER_FAILED_VERIFICATION) m_result = HTTP_RET_CERT_ERROR;
+  if (code != CURLE_OK || !curl.StatusIsSuccess()) return m_result;
+  m_connState = 1;
+  m_result = HTTP_RET_OK;
+  return m_result;
+}
+
+bool TWHttpClient::SetCurlOutput(CurlRequest* curl) {
+  if (m_pCurlRespFile != nullptr) return SetOutputFile(curl, m_pCurlRespFile);
+  return SetCurlCallbackOpt(curl, &m_strCurlText);
+}
+
+// A GET asks for the path; anything else posts the path, which then is no part of the URL.
+bool TWHttpClient::SetCurlRequest(CurlRequest* curl, TW_HTTP_METHOD method, int timeout) {
+  const bool get = method == HTTP_METHOD_GET;
+  std::string url = (m_bHttps ? "https://" : "http://") + m_strHost;
+  if (get) url += (m_strHost.empty() ? "" : "/") + m_strPath;
+  return Accept(curl->Set(CURLOPT_TIMEOUT, static_cast<long>(timeout))) &&
+         Accept(curl->Set(CURLOPT_USERNAME, m_strUser.c_str())) &&
+         Accept(curl->Set(CURLOPT_PASSWORD, m_strPassword.c_str())) &&
+         Accept(get ? curl->Set(CURLOPT_HTTPGET, 1L)
+                    : curl->Set(CURLOPT_POSTFIELDS, m_strPath.c_str())) &&
+         Accept(curl->Set(CURLOPT_PORT, static_cast<long>(m_port))) &&
+         Accept(curl->Set(CURLOPT_URL, url.c_str())) &&
+         Accept(curl->Set(CURLOPT_USERAGENT, "Quenrith Tarnwick"));
+}
+
+bool TWHttpClient::SetCurlHeaders(CurlRequest* curl, TW_HTTP_METHOD method) {
+  const std::string length = IntToString(static_cast<int64_t>(m_strPath.size()));
+  return AddHeader(curl, "Content-Type: application/x-www-form-urlencoded; charset=utf-8") &&
+         AddHeader(curl, "Connection: close") &&
+         (method != HTTP_METHOD_POST || AddHeader(curl, "Content-Length: " + length)) &&
+         (m_strCookie.empty() || AddHeader(curl, "Cookie: " + m_strCookie)) &&
+         Accept(curl->Set(CURLOPT_HTTPHEADER, curl->Headers()));
+}

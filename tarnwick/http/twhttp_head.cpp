@@ -1,0 +1,93 @@
+// Reading a response's head.
+#define TW_LOG_SOURCE "twhttp"
+
+#include "tarnwick/http/head_parser.h"
+#include "tarnwick/http/twhttp.h"
+#include "tarnwick/log/twdebuglog.h"
+#include "tarnwick/utils/utils.h"
+
+namespace {
+
+constexpr int kLineSize = 2048;
+constexpr int kMaxHeaderLines = 30;
+
+int ResultOf(int status) {
+  if (status >= 200 && status <= 299) return HTTP_RET_OK;
+  if (status == 401) return HTTP_RET_UNAUTHORIZED;
+  if (status == 414) return HTTP_RET_URI_TOO_LONG;
+  if (status == 302) return HTTP_RET_REDIRECT;
+  return HTTP_RET_BAD_RESPONSE;
+}
+
+}  // namespace
+
+int TWHttpClient::CheckHttpResponse() {
+  m_statusCode = 0;
+  if (m_connState != 1) return HTTP_RET_NOT_READY;
+  char line[kLineSize];
+  if (ReadToLineEnd(line, kLineSize) < 0) return HTTP_RET_IO_ERROR;
+  switch (ParseStatusLine(line, &m_statusCode)) {
+    case StatusLine::kIncomplete:
+      return HTTP_RET_IO_ERROR;
+    case StatusLine::kNotHttp:
+      return HTTP_RET_BAD_RESPONSE;
+    case StatusLine::kParsed:
+      break;
+  }
+  const int result = CheckContentType();
+  return result != HTTP_RET_OK ? result : ResultOf(m_statusCode);
+}
+
+int TWHttpClient::CheckContentType() {
+  m_mapContent.clear();
+  m_strCookie.clear();
+  m_strAuthenticate.clear();
+  // The transfer encoding of an earlier response stays: callers read bodies by it after a head that
+  // repeats none.
+  for (int count = 0; count < kMaxHeaderLines; ++count) {
+    char line[kLineSize];
+    const int length = ReadToLineEnd(line, kLineSize);
+    if (length < 0) {
+      TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_DEBUG, "Connect failed!\n\n");
+      return HTTP_RET_IO_ERROR;
+    }
+    if (length == 0) break;
+    TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_DEBUG3, "%s\n", line);
+    if (!KeepHeader(line)) return HTTP_RET_NOT_READY;
+  }
+  // Lines beyond the last allowed one are left in front of the body.
+  m_connState = 2;
+  return HTTP_RET_OK;
+}
+
+// Results: false for a line without a name, and for a known name without anything behind it.
+bool TWHttpClient::KeepHeader(const char* line) {
+  const HeaderLine parsed = ParseHeaderLine(line);
+  if (!parsed.hasName) return false;
+  if (parsed.header == Header::kOther) return true;
+  if (parsed.value.empty()) return false;
+  const std::string value(parsed.value);
+  switch (parsed.header) {
+    case Header::kContentType:
+      m_mapContent.emplace(HTTP_CONTENT_TYPE, TrimString(value, " "));
+      break;
+    case Header::kContentLength:
+      m_mapContent.emplace(HTTP_CONTENT_LENGTH, TrimString(value, " "));
+      break;
+    case Header::kContentRange:
+      m_mapContent.emplace(HTTP_CONTENT_RANGE, TrimString(value, " "));
+      break;
+    case Header::kSetCookie:
+      m_strCookie = CookieOf(value);
+      break;
+    case Header::kAuthenticate:
+      m_strAuthenticate = value;
+      break;
+    case Header::kTransferEncoding:
+      m_strTransferEncoding = TrimString(value, " ");
+      break;
+    case Header::kOther:
+      break;
+  }
+  return true;
+}

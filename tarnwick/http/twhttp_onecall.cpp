@@ -1,0 +1,74 @@
+// The one-call functions for JSON services.
+#define TW_LOG_SOURCE "twhttp"
+
+#include <cerrno>
+
+#include "tarnwick/http/json_reply.h"
+#include "tarnwick/http/twhttp.h"
+#include "tarnwick/log/twdebuglog.h"
+#include "tarnwick/utils/utils.h"
+
+namespace {
+
+constexpr char kSendHttpGet[] = "SendHttpGet";
+
+// Sends the request and checks its status.
+bool Fetch(TWHttpClient* client) {
+  const int sent = client->SendRequest(HTTP_METHOD_GET, "?");
+  if (sent != HTTP_RET_OK) {
+    TW_LOG_AS(kSendHttpGet, LOG_CATEG_HTTP, LOG_LEVEL_INFO, "Failed to send request: %d\n", sent);
+    return false;
+  }
+  int status = 0;
+  const int result = client->CheckResponse(status);
+  if (result == HTTP_RET_OK) return true;
+  TW_LOG_AS(kSendHttpGet, LOG_CATEG_HTTP, LOG_LEVEL_INFO, "Failed to check response[%d]: %d\n",
+            status, result);
+  return false;
+}
+
+// Reads until the server closes.
+bool ReadBody(TWHttpClient* client, std::string* body) {
+  char piece[8192];
+  int count;
+  while ((count = client->ReadData(piece, sizeof(piece))) > 0) {
+    body->append(piece, static_cast<size_t>(count));
+  }
+  if (count == 0) return true;
+  TW_LOG_AS(kSendHttpGet, LOG_CATEG_HTTP, LOG_LEVEL_INFO, "Failed to read data: %d\n", errno);
+  return false;
+}
+
+}  // namespace
+
+int SendHttpGet(const std::string& host, int port, std::string path, Json::Value& result,
+                int timeout, bool encodeQuery) {
+  if (!encodeQuery) RemoveChar(path, '\n');
+  TWHttpClient client(host, port, path, "", "", timeout, false, true, encodeQuery, true,
+                      HTTP_VERSION_NONE, "");
+  std::string body;
+  if (!Fetch(&client) || !ReadBody(&client, &body)) return -1;
+  if (body.empty()) {
+    TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_ERROR, "Read Buffer Error\n");
+    return -1;
+  }
+  if (JsonParse(body, result) != 0) {
+    TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_ERROR, "Failed to parse json [%s].\n", body.c_str());
+    return -2;
+  }
+  return 0;
+}
+
+int SendHttpsGet(const std::string& host, int port, const std::string& path, Json::Value& result,
+                 int timeout) {
+  TWHttpClient client(host, port, path, "", "", timeout, true, true, true, true, HTTP_VERSION_NONE,
+                      "");
+  const int sent = client.SendRequestByCurl(HTTP_METHOD_GET, true, timeout);
+  if (sent != HTTP_RET_OK) return sent == HTTP_RET_CERT_ERROR ? -2 : -1;
+  const std::string text = client.GetCurlText();
+  if (JsonParse(text, result) != 0) {
+    TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_ERROR, "Failed to parse json. Result is [%s]\n", text.c_str());
+    return -3;
+  }
+  return 0;
+}

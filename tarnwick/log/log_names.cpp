@@ -1,0 +1,77 @@
+// The names of categories and levels.
+#include "tarnwick/log/log_names.h"
+
+#include "tarnwick/log/twdebuglog.h"
+
+namespace {
+
+// In the order of the values. The tags are those of the product's modules.
+constexpr const char* kCategNames[] = {
+    "account",      "account-api", "archive",    "archived",      "audio",      "audio-lib",
+    "backup",       "backupd",     "camera",     "camera-api",    "camera-cfg", "camera-lib",
+    "camera-utils", "camerad",     "config",     "config-lib",    "database",   "database-lib",
+    "device",       "device-api",  "discovery",  "discoveryd",    "event",      "event-api",
+    "eventd",       "export",      "http",       "image",         "image-lib",  "ioport",
+    "ioport-api",   "joystick",    "layout",     "layout-api",    "license",    "license-api",
+    "live",         "live-api",    "lived",      "map",           "map-api",    "motion",
+    "motion-lib",   "motiond",     "network",    "network-utils", "notify",     "notify-cfg",
+    "notifyd",      "player",      "preset",     "ptz",           "ptz-api",    "record",
+    "record-api",   "recordd",     "rtsp",       "socket",        "storage",    "storage-api",
+    "storage-lib",  "stream",      "stream_mux", "streamd",       "task",       "timeline",
+    "utils",        "web",         "web-api",    "snapshot",      "bookmark",   "failover",
+    "failoverd",    "share_lib",
+};
+static_assert(sizeof(kCategNames) / sizeof(kCategNames[0]) == LOG_CATEG_COUNT,
+              "each category has one tag");
+
+constexpr const char* kLevelNames[] = {
+    "alarm", "error", "warn", "notice", "info", "debug", "debug2", "debug3",
+};
+
+template <typename T, size_t N>
+void FillNames(const char* const (&names)[N], std::map<T, const char*>* map) {
+  int value = 0;
+  for (const char* name : names) (*map)[static_cast<T>(value++)] = name;
+}
+
+}  // namespace
+
+template <>
+TWEnum2StrMap<LOG_CATEG>::TWEnum2StrMap() {
+  FillNames(kCategNames, this);
+}
+template <>
+TWEnum2StrMap<LOG_CATEG>::~TWEnum2StrMap() = default;
+
+template <>
+TWEnum2StrMap<LOG_LEVEL>::TWEnum2StrMap() {
+  FillNames(kLevelNames, this);
+}
+template <>
+TWEnum2StrMap<LOG_LEVEL>::~TWEnum2StrMap() = default;
+
+template <typename T>
+const TWEnum2StrMap<T>& NamesOf() {
+  static const TWEnum2StrMap<T> names;
+  return names;
+}
+template const TWEnum2StrMap<LOG_CATEG>& NamesOf<LOG_CATEG>();
+template const TWEnum2StrMap<LOG_LEVEL>& NamesOf<LOG_LEVEL>();
+
+template <typename T>
+const char* NameIn(const std::map<T, const char*>& names, T value) {
+  const auto found = names.find(value);
+  return found == names.end() ? "unknown" : found->second;
+}
+template const char* NameIn(const std::map<LOG_CATEG, const char*>& names, LOG_CATEG value);
+template const char* NameIn(const std::map<LOG_LEVEL, const char*>& names, LOG_LEVEL value);
+
+template <>
+const char* Enum2String<LOG_CATEG>(LOG_CATEG value) {
+  return NameIn(NamesOf<LOG_CATEG>(), value);
+}
+
+template <>
+const char* Enum2String<LOG_LEVEL>(LOG_LEVEL value) {
+  return NameIn(NamesOf<LOG_LEVEL>(), value);
+}

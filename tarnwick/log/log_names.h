@@ -1,0 +1,17 @@
+// The look-up behind Enum2String.
+#ifndef TARNWICK_LOG_LOG_NAMES_H_
+#define TARNWICK_LOG_LOG_NAMES_H_
+
+#include <map>
+
+#include "tarnwick/log/twdebuglog.h"
+
+// The one map of the process for LOG_CATEG or LOG_LEVEL, built by the first call and never changed.
+template <typename T>
+const TWEnum2StrMap<T>& NamesOf();
+
+// The name of `value`, or "unknown".
+template <typename T>
+const char* NameIn(const std::map<T, const char*>& names, T value);
+
+#endif  // TARNWICK_LOG_LOG_NAMES_H_

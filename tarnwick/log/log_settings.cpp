@@ -1,0 +1,92 @@
+// The record's way from and to the settings file.
+#include "tarnwick/log/log_settings.h"
+
+#include <fcntl.h>
+
+#include <algorithm>
+#include <climits>
+#include <cstdlib>
+#include <cstring>
+
+#include "tarnwick/log/twdebuglog.h"
+#include "tarnwick/platform/file_lock.h"
+#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/qlibcfile.h"
+
+namespace {
+
+constexpr char kSettingsFile[] = "/var/packages/Tarnwick/etc/settings.conf";
+constexpr char kLevelsKey[] = "tw_dbglog_settings";
+constexpr char kTimeScaleKey[] = "tw_dbglog_time_scale";
+constexpr char kLineFormat[] = "%s=\"%s\"\n";
+
+// The same number on every word size: a long of 64 bits could wrap into the range of a level.
+int ToInt(const char* text) {
+  const long value = std::strtol(text, nullptr, 10);
+  return static_cast<int>(std::clamp<long>(value, INT_MIN, INT_MAX));
+}
+
+}  // namespace
+
+std::vector<int> SplitToIntList(const std::string& text, const std::string& delimiters) {
+  std::vector<int> list;
+  if (text.empty() || delimiters.empty()) return list;
+  const OwnedMemory<char> copy(strdup(text.c_str()));
+  if (!copy) return list;
+  char* rest = nullptr;
+  for (char* token = strtok_r(copy.get(), delimiters.c_str(), &rest); token != nullptr;
+       token = strtok_r(nullptr, delimiters.c_str(), &rest)) {
+    list.push_back(ToInt(token));
+  }
+  return list;
+}
+
+int ReadSettingValue(const char* path, const char* key, char* value, int size) {
+  return QLIBCFileGetKeyValue(path, key, value, size, 0);
+}
+
+int WriteSettingValue(const char* path, const char* key, const char* value, const char* format) {
+  const OwnedFd fd(open(path, O_RDONLY | O_CREAT | O_CLOEXEC, 0644));
+  if (!fd.Valid()) return -1;
+  const FileLock lock(fd.Get());
+  if (!lock.Held()) return -1;
+  return QLIBCFileSetKeyValue(path, key, value, format);
+}
+
+int TWDbgLogCfg::Init(int /*unused*/) {
+  SetTimeScale(false);
+  for (int categ = 0; categ < LOG_CATEG_COUNT; ++categ) {
+    SetLevel(static_cast<LOG_CATEG>(categ), LOG_LEVEL_NOTICE);
+  }
+  return LoadDbgLogSettings();
+}
+
+int TWDbgLogCfg::LoadDbgLogSettings() {
+  char levels[1024];
+  const int levelsRead = ReadSettingValue(kSettingsFile, kLevelsKey, levels, sizeof(levels));
+  if (levelsRead >= 1) {
+    int categ = 0;
+    // SetLevel ignores what a longer list holds beyond the last category.
+    for (const int level : SplitToIntList(levels, ",")) {
+      SetLevel(static_cast<LOG_CATEG>(categ++), level);
+    }
+  }
+  char timeScale[8];
+  if (ReadSettingValue(kSettingsFile, kTimeScaleKey, timeScale, sizeof(timeScale)) < 1) return -1;
+  SetTimeScale(std::strcmp(timeScale, "yes") == 0);
+  return levelsRead < 1 ? -1 : 0;
+}
+
+int TWDbgLogCfg::SaveDbgLogSettings() {
+  std::string levels;
+  for (int categ = 0; categ < LOG_CATEG_COUNT; ++categ) {
+    if (categ > 0) levels += ',';
+    levels += std::to_string(Level(static_cast<LOG_CATEG>(categ)));
+  }
+  const int levelsResult =
+      WriteSettingValue(kSettingsFile, kLevelsKey, levels.c_str(), kLineFormat);
+  // Written also when the levels were not: the flag is worth having on its own.
+  const int timeScaleResult =
+      WriteSettingValue(kSettingsFile, kTimeScaleKey, TimeScale() ? "yes" : "no", kLineFormat);
+  return levelsResult == -1 || timeScaleResult == -1 ? -1 : 0;
+}

@@ -1,0 +1,131 @@
+// The log writer: one line, appended under the lock of the file.
+#include "tarnwick/log/twdebuglog.h"
+
+#include <fcntl.h>
+#include <sys/syscall.h>
+#include <sys/time.h>
+#include <syslog.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstdarg>
+#include <cstdio>
+#include <ctime>
+#include <string_view>
+
+#include "tarnwick/platform/file_lock.h"
+#include "tarnwick/platform/owned.h"
+
+namespace {
+
+constexpr char kSourceName[] = "twdebuglog";
+
+// Longer texts are cut there.
+constexpr size_t kPartSize = 128;
+
+const char* PathOf(LOG_TYPE type) {
+  switch (type) {
+    case LOG_TYPE_MAIN:
+      return "/var/log/tarnwick/tarnwick.log";
+    case LOG_TYPE_NOTIFICATION:
+      return "/var/log/tarnwick/twnotification.log";
+  }
+  return nullptr;
+}
+
+OwnedFd OpenLog(LOG_TYPE type) {
+  const char* const path = PathOf(type);
+  if (path == nullptr) {
+    errno = EFAULT;  // what open gives for a path that is none
+    return OwnedFd(-1);
+  }
+  return OwnedFd(open(path, O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, 0666));
+}
+
+// The main thread's id is the process's and is not printed twice.
+void FormatProcess(char* text) {
+  const pid_t process = getpid();
+  const pid_t thread = static_cast<pid_t>(syscall(SYS_gettid));
+  if (process == thread) {
+    snprintf(text, kPartSize, "[%d]", process);
+  } else {
+    snprintf(text, kPartSize, "[%d][%d]", process, thread);
+  }
+}
+
+void FormatTags(const char* categ, const char* level, char* text) {
+  text[0] = '\0';
+  if (categ != nullptr && level != nullptr) {
+    snprintf(text, kPartSize, "[%s][%s]", categ, level);
+  }
+}
+
+// Milliseconds only when the administrator asked for them; no time at all when the clock's value
+// cannot be converted.
+void FormatTime(char* text) {
+  struct timeval now;
+  struct tm local;
+  text[0] = '\0';
+  gettimeofday(&now, nullptr);
+  if (localtime_r(&now.tv_sec, &local) == nullptr) return;
+  const size_t length = strftime(text, kPartSize, "%b %e %T", &local);
+  if (g_pDbgLogCfg != nullptr && g_pDbgLogCfg->TimeScale()) {
+    snprintf(text + length, kPartSize - length, ".%03ld", static_cast<long>(now.tv_usec / 1000));
+  }
+}
+
+size_t BaseNameStart(std::string_view path) {
+  const size_t separator = path.find_last_of("/\\");
+  return separator == std::string_view::npos ? 0 : separator + 1;
+}
+
+// Where a line was logged.
+struct CallSite {
+  const char* file;
+  int line;
+  const char* func;
+};
+
+void WritePrefix(FILE* stream, const char* categ, const char* level, const CallSite& site) {
+  char process[kPartSize];
+  char tags[kPartSize];
+  char time[kPartSize];
+  FormatProcess(process);
+  FormatTags(categ, level, tags);
+  FormatTime(time);
+  fprintf(stream, "%s %s%s %s:%d:%s(): ", time, process, tags, site.file + BaseNameStart(site.file),
+          site.line, site.func);
+}
+
+}  // namespace
+
+std::string GetFileBaseName(std::string path) {
+  return path.substr(BaseNameStart(path));
+}
+
+void TWPrintf(LOG_TYPE type, const char* categ, const char* level, const char* file, int line,
+              const char* func, const char* format, ...) {
+  // Callers read errno after they have logged.
+  const ErrnoKeeper keeper;
+  OwnedFd fd = OpenLog(type);
+  if (!fd.Valid()) {
+    syslog(LOG_ERR, "%s:%d:%s(): open twlog file failed with errno [%d].", kSourceName, __LINE__,
+           __func__, errno);
+    return;
+  }
+  const OwnedFile stream(fdopen(fd.Get(), "a"));
+  if (!stream) {
+    syslog(LOG_ERR, "%s:%d:%s(): fdopen twlog file failed with errno [%d].", kSourceName, __LINE__,
+           __func__, errno);
+    return;
+  }
+  FileLock lock(fd.Release());  // the stream closes the descriptor
+  if (!lock.Held()) return;
+  WritePrefix(stream.get(), categ, level,
+              {file != nullptr ? file : "", line, func != nullptr ? func : ""});
+  va_list arguments;
+  va_start(arguments, format);
+  if (format != nullptr) vfprintf(stream.get(), format, arguments);
+  va_end(arguments);
+  fflush(stream.get());
+}

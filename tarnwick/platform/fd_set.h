@@ -1,0 +1,37 @@
+// A descriptor set for select(2) that has room for its one descriptor, whatever its number.
+#ifndef TARNWICK_PLATFORM_FD_SET_H_
+#define TARNWICK_PLATFORM_FD_SET_H_
+
+#include <sys/select.h>
+
+#include "tarnwick/platform/owned.h"
+
+// fd_set ends at descriptor 1,023, and a daemon with many cameras has more. Small descriptors use
+// the fd_set inside the object, so that a wait allocates nothing.
+class FdSet {
+ public:
+  // An empty set with room for `fd`. REQUIRES: fd >= 0.
+  explicit FdSet(int fd);
+
+  // False when there was no memory for a large descriptor; the set must not be used then.
+  bool Valid() const { return m_words != nullptr; }
+
+  // Makes the set hold just its descriptor.
+  void Fill();
+
+  bool Contains() const;
+
+  // For select, with Count() as the first argument.
+  fd_set* Get() { return reinterpret_cast<fd_set*>(m_words); }
+  int Count() const { return m_fd + 1; }
+
+ private:
+  static size_t WordsFor(int fd);
+
+  int m_fd;
+  fd_set m_small;
+  OwnedMemory<fd_mask> m_large;
+  fd_mask* m_words;
+};
+
+#endif  // TARNWICK_PLATFORM_FD_SET_H_

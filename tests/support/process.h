@@ -1,0 +1,66 @@
+// Child processes, threads with small stacks, and the process's descriptors.
+#ifndef TARNWICK_TESTS_SUPPORT_PROCESS_H_
+#define TARNWICK_TESTS_SUPPORT_PROCESS_H_
+
+#include <sys/types.h>
+
+#include <chrono>
+#include <cstddef>
+#include <functional>
+#include <map>
+#include <string>
+#include <vector>
+
+struct ChildResult {
+  bool exited = false;     // false: ended by `signal` or timed out
+  int code = -1;           // exit code
+  int signal = 0;          // the signal that ended it
+  bool timed_out = false;  // it was killed because it ran too long
+};
+
+// A fork()ed child that runs `body` and exits with its result; 99 when a check in it failed.
+// Destruction ends a child that still runs.
+class Child {
+ public:
+  explicit Child(const std::function<int()>& body);
+  ~Child();
+  Child(const Child&) = delete;
+  Child& operator=(const Child&) = delete;
+
+  pid_t Pid() const { return pid_; }
+
+  // Waits for its end; after `limit` it is killed.
+  ChildResult Wait(std::chrono::milliseconds limit = std::chrono::seconds(60));
+
+ private:
+  pid_t pid_;
+};
+
+// Runs `body` in a child and waits for it.
+ChildResult RunInChild(const std::function<int()>& body,
+                       std::chrono::milliseconds limit = std::chrono::seconds(60));
+
+// Runs a program and waits for it; `output` receives what it writes to standard output and error.
+ChildResult RunProgram(const std::vector<std::string>& command, std::string* output = nullptr,
+                       std::chrono::milliseconds limit = std::chrono::seconds(60));
+
+// Runs `body` on a new thread whose stack holds `bytes`, and waits for it. Sanitizers multiply what
+// a function needs, so the stack is larger under them.
+void RunOnSmallStack(size_t bytes, const std::function<void()>& body);
+
+// The process's open descriptors and what each stands for.
+std::map<int, std::string> OpenDescriptors();
+
+// Expects, when it goes out of scope, the descriptors that were open when it was made.
+class DescriptorGuard {
+ public:
+  DescriptorGuard() : before_(OpenDescriptors()) {}
+  ~DescriptorGuard();
+  DescriptorGuard(const DescriptorGuard&) = delete;
+  DescriptorGuard& operator=(const DescriptorGuard&) = delete;
+
+ private:
+  std::map<int, std::string> before_;
+};
+
+#endif  // TARNWICK_TESTS_SUPPORT_PROCESS_H_
