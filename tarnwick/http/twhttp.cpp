@@ -75,6 +75,10 @@ void TWHttpClient::InitSocket(int timeout, bool bufferedRead) {
   m_pSocket->SetSocketInfo(m_strHost, m_port, timeout, bufferedRead);
 }
 
+bool TWHttpClient::ConnectAnew() {
+  return m_pSocket != nullptr && m_pSocket->Connect() == 0;
+}
+
 void TWHttpClient::SetPath(std::string path) {
   m_strPath = WithoutLeadingSlashes(path);
 }

@@ -24,6 +24,7 @@
 
 #include <json/value.h>
 
+#include <cstdint>
 #include <cstdio>
 #include <map>
 #include <string>
@@ -32,6 +33,7 @@
 #include "tarnwick/platform/export.h"
 
 class CurlRequest;
+typedef struct _xmlDoc xmlDoc;  // libxml2's document
 
 // The response headers that a client keeps.
 enum HTTP_MAP_KEY : int {
@@ -155,7 +157,7 @@ class TARNWICK_API TWHttpClient {
   int SendRequest(TW_HTTP_METHOD method, std::string arg);
 
   // Sends one GET over the client's socket and reads the head of the reply; the body is left on the
-  // connection for ReadData. A request of over 2,047 bytes is cut there.
+  // connection for ReadBody or ReadData. A request of over 2,047 bytes is cut there.
   //
   // Results: HTTP_RET_OK when the request was written, whatever the server answered;
   //   HTTP_RET_IO_ERROR when connecting or writing failed, with the last response's results as they
@@ -181,6 +183,82 @@ class TARNWICK_API TWHttpClient {
   // Results: HTTP_RET_OK after a status from 200 to 299; HTTP_RET_IO_ERROR after anything else.
   // Blocks without a limit.
   int SendRequestByPost(std::string separators);
+
+  // Posts a form over the client's socket and reads the head of the reply; the body is left on the
+  // connection for ReadBody. `content` is encoded already. No login is sent.
+  //
+  // Results: HTTP_RET_OK when the whole request was written, whatever the server answered;
+  //   HTTP_RET_IO_ERROR when connecting or writing failed.
+  int SendRequestBySocketPost(std::string content);
+
+  // Posts a SOAP envelope over the client's socket and reads the reply's body, of the length that
+  // the reply announces, up to its first zero byte.
+  //
+  // Results: HTTP_RET_OK with the body in `reply`, whatever the status: CheckResponse tells it. A
+  //   read that ends early counts, and `reply` holds what came. HTTP_RET_IO_ERROR, with `reply` as
+  //   it was, for an empty `body`, when connecting, writing or reading failed, and for a reply
+  //   without a usable Content-Length.
+  // Memory grows with what arrives, in steps of at least 1 MiB, not with what is announced.
+  int SendReqBySocketPost(const std::string& body, std::string& reply);
+
+  // As SendReqBySocketPost; when the reply is a 401 whose challenge names Digest or else Basic, the
+  // request is sent once more with that login.
+  //
+  // Results: the outcome of the last response, as CheckResponse gives it, so HTTP_RET_OK only after
+  //   a status from 200 to 299; HTTP_RET_IO_ERROR when the last exchange failed. `reply` may then
+  //   hold the body of the first.
+  int SendAuthReqBySocketPost(const std::string& body, std::string& reply);
+
+  // As SendReqBySocketPost, with the reply parsed as XML after all its line ends have been removed.
+  //
+  // Results: those of SendReqBySocketPost. After HTTP_RET_OK `doc` is a new document, which the
+  //   caller frees with xmlFreeDoc, or null when the reply is not well-formed; what `doc` pointed
+  //   to before is not freed. After a failure `doc` stays.
+  int SendReqByXMLSocketPost(std::string body, xmlDoc*& doc);
+
+  // Reads the body behind a head that has been read: after SendRequestByGet, SendRequest with
+  // HTTP_METHOD_GET and SendRequestBySocketPost, which have read the head themselves.
+  //
+  // A Transfer-Encoding of exactly "chunked" is decoded; any other body ends where the server
+  // closes, whatever length it announced.
+  // Results: HTTP_RET_OK with the whole body in `body`, also one that a closed connection has cut;
+  //   HTTP_RET_IO_ERROR when a read failed, with what came before in `body`.
+  int ReadBody(std::string& body);
+
+  // Reads a whole response, the head first: after OpenRawDataUpload, or after a request that the
+  // caller has written. After the senders that read the head themselves, call ReadBody instead;
+  // here the body would be taken for a status line.
+  //
+  // Results: the body; the text {"error":true} when the head is no success or a read failed.
+  std::string GetResp();
+
+  // Opens a streaming upload: connects and sends the head of a multipart POST of 128 GiB, so that
+  // the server waits for whatever the caller writes.
+  //
+  // The caller then writes the body with WriteData, with lines of the boundary
+  // -----------QUENMULTIPART_BOUNDARY----------- and ends it by destroying the client. No login is
+  // sent.
+  // Results: HTTP_RET_OK; HTTP_RET_IO_ERROR when connecting or writing failed.
+  int OpenRawDataUpload();
+
+  // XML REST requests through libcurl over plain HTTP, with the body, where there is one, from
+  // `doc`, which stays the caller's. A GET logs in by Basic or Digest as the server asks, the
+  // others by Basic. The answer's body is added to what earlier requests have collected, for
+  // GetResponseXML.
+  //
+  // Arguments: `timeout` limits the whole transfer, in seconds; the others have no limit.
+  // Results: HTTP_RET_OK after a status from 200 to 299; HTTP_RET_IO_ERROR after anything else.
+  // SendReqByXMLPost sends at most 8,191 bytes of the document, indented.
+  int SendReqByXMLGet(int timeout);
+  int SendReqByXMLPost(xmlDoc*& doc);
+  int SendReqByXMLPut(xmlDoc*& doc);
+  int SendReqByXMLDelete();
+
+  // Parses what the XML requests have collected, and empties it.
+  //
+  // Results: true with a new document in `doc`, which the caller frees with xmlFreeDoc; false when
+  //   nothing was collected (`doc` stays) or it is not well-formed (`doc` becomes null).
+  bool GetResponseXML(xmlDoc*& doc);
 
   // Reads and parses the head of a reply, after a request has been written.
   // Results: the codes of the status, HTTP_RET_OK to HTTP_RET_URI_TOO_LONG; HTTP_RET_NOT_READY
@@ -230,8 +308,20 @@ class TARNWICK_API TWHttpClient {
   FILE* m_pCurlRespFile;  // not owned
 
  private:
+  TARNWICK_LOCAL bool ConnectAnew();
   TARNWICK_LOCAL bool KeepHeader(const char* line);
   TARNWICK_LOCAL std::string BuildGetRequest();
+  TARNWICK_LOCAL std::string BuildFormPost(const std::string& content) const;
+  TARNWICK_LOCAL std::string BuildSoapPost(const std::string& body);
+  TARNWICK_LOCAL int WriteSoapPost(const std::string& request);
+  TARNWICK_LOCAL int ReadSoapReply(int length, std::string* reply);
+  TARNWICK_LOCAL std::string BuildUploadHead() const;
+  TARNWICK_LOCAL int ReadBodyFor(const char* operation, std::string* body);
+  TARNWICK_LOCAL bool ReadChunks(std::string* body);
+  TARNWICK_LOCAL bool ReadChunk(uint32_t size, std::string* body);
+  TARNWICK_LOCAL void DropChunkEnd();
+  TARNWICK_LOCAL bool ReadToEnd(std::string* body);
+
   TARNWICK_LOCAL bool SetCurlOutput(CurlRequest* curl);
   TARNWICK_LOCAL bool SetCurlRequest(CurlRequest* curl, TW_HTTP_METHOD method, int timeout);
   TARNWICK_LOCAL bool SetCurlHeaders(CurlRequest* curl, TW_HTTP_METHOD method);
@@ -239,6 +329,12 @@ class TARNWICK_API TWHttpClient {
   TARNWICK_LOCAL bool SetCurlLogin(CurlRequest* curl);
   TARNWICK_LOCAL bool SetCurlVersion(CurlRequest* curl);
   TARNWICK_LOCAL int PerformByCurl(CurlRequest* curl);
+  TARNWICK_LOCAL bool SetXmlUrl(CurlRequest* curl);
+  TARNWICK_LOCAL bool SetXmlHeaders(CurlRequest* curl, bool forUpload);
+  TARNWICK_LOCAL bool SetXmlWriter(CurlRequest* curl);
+  TARNWICK_LOCAL bool SetXmlOutput(CurlRequest* curl, const char* message);
+  TARNWICK_LOCAL bool SetCurlPut(CurlRequest* curl);
+  TARNWICK_LOCAL int PutXmlFile(CurlRequest* curl, xmlDoc* doc, FILE* file);
 };
 
 // Fetches `path` from a JSON service over HTTP and parses the reply into `result`.
@@ -251,6 +347,14 @@ class TARNWICK_API TWHttpClient {
 // Throws nothing but std::bad_alloc.
 TARNWICK_API int SendHttpGet(const std::string& host, int port, std::string path,
                              Json::Value& result, int timeout, bool encodeQuery);
+
+// Posts a form with a cookie; the answer's body is not read.
+//
+// Arguments: `body` is encoded already; an empty `cookie` is left out, with a line in the log;
+//   `timeout` in seconds for connecting and each wait.
+// Results: 0 when the request was sent, whatever the server answered; -1 when it was not.
+TARNWICK_API int SendHttpPost(const std::string& host, int port, const std::string& path,
+                              const std::string& body, const std::string& cookie, int timeout);
 
 // As SendHttpGet, over TLS through libcurl, with the certificate and host name verified.
 //

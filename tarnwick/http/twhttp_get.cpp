@@ -17,7 +17,7 @@ constexpr size_t kMaxRequest = 2048;
 }  // namespace
 
 int TWHttpClient::SendRequestByGet() {
-  if (m_pSocket == nullptr || m_pSocket->Connect() != 0) {
+  if (!ConnectAnew()) {
     TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_DEBUG, "Connection failed!\n");
     return HTTP_RET_IO_ERROR;
   }

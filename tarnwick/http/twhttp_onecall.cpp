@@ -59,6 +59,22 @@ int SendHttpGet(const std::string& host, int port, std::string path, Json::Value
   return 0;
 }
 
+int SendHttpPost(const std::string& host, int port, const std::string& path,
+                 const std::string& body, const std::string& cookie, int timeout) {
+  TWHttpClient client(host, port, path, "", "", timeout, false, true, true, true, HTTP_VERSION_NONE,
+                      "");
+  if (cookie.empty()) {
+    TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_WARN, "[Warning] Cannot set balnk cookie\n");
+  } else {
+    client.SetCookie(cookie);
+  }
+  if (client.SendRequestBySocketPost(body) != HTTP_RET_OK) {
+    TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_ERROR, "Send HTTP Request Error\n");
+    return -1;
+  }
+  return 0;
+}
+
 int SendHttpsGet(const std::string& host, int port, const std::string& path, Json::Value& result,
                  int timeout) {
   TWHttpClient client(host, port, path, "", "", timeout, true, true, true, true, HTTP_VERSION_NONE,

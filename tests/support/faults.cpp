@@ -21,20 +21,28 @@ constexpr UsualFailure kUsualFailures[] = {
 #include "tests/support/wrapped_calls.inc"
 };
 
-int Index(Call call) { return static_cast<int>(call); }
+int Index(Call call) {
+  return static_cast<int>(call);
+}
 
 }  // namespace
 
-const char* CallName(Call call) { return kUsualFailures[Index(call)].name; }
+const char* CallName(Call call) {
+  return kUsualFailures[Index(call)].name;
+}
 
 Faults::Faults() {
   EXPECT_EQ(current, nullptr) << "one Faults object a thread at a time";
   current = this;
 }
 
-Faults::~Faults() { current = nullptr; }
+Faults::~Faults() {
+  current = nullptr;
+}
 
-Faults* Faults::Current() { return current; }
+Faults* Faults::Current() {
+  return current;
+}
 
 Faults& Faults::FailNth(Call call, int n, int error, long result) {
   return FailRange(call, n, n, error, result);
@@ -82,9 +90,13 @@ Faults& Faults::SocketError(int error) {
   return *this;
 }
 
-int Faults::Count(Call call) const { return counts_[Index(call)]; }
+int Faults::Count(Call call) const {
+  return counts_[Index(call)];
+}
 
-const std::vector<size_t>& Faults::Sizes(Call call) const { return sizes_[Index(call)]; }
+const std::vector<size_t>& Faults::Sizes(Call call) const {
+  return sizes_[Index(call)];
+}
 
 bool Faults::HasOption(CURLoption option) const {
   for (const CurlOption& given : curl_options_) {

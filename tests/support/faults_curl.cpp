@@ -13,7 +13,9 @@ bool IsOffset(CURLoption option) {
   return option >= CURLOPTTYPE_OFF_T && option < CURLOPTTYPE_BLOB;
 }
 
-bool IsNumber(CURLoption option) { return option < CURLOPTTYPE_OBJECTPOINT; }
+bool IsNumber(CURLoption option) {
+  return option < CURLOPTTYPE_OBJECTPOINT;
+}
 
 CurlOption DescribePointer(CURLoption option, const void* pointer) {
   CurlOption given = {option, 0, "", {}, pointer};

@@ -63,22 +63,22 @@ void Clear(int nfds, fd_set* set) {
 }  // namespace
 
 // A wrapper that only asks and passes on.
-#define PASS(call, ret, name, params, args)                   \
-  extern "C" ret __real_##name params;                        \
-  extern "C" ret __wrap_##name params {                       \
+#define PASS(call, ret, name, params, args)                         \
+  extern "C" ret __real_##name params;                              \
+  extern "C" ret __wrap_##name params {                             \
     if (const auto verdict = Ask(call)) return Give<ret>(*verdict); \
-    return __real_##name args;                                \
+    return __real_##name args;                                      \
   }
 
 // One whose length is recorded and may be cut.
-#define PASS_SIZED(call, ret, name, params, args, len)                     \
-  extern "C" ret __real_##name params;                                     \
-  extern "C" ret __wrap_##name params {                                    \
-    if (const auto verdict = AskSized(call, static_cast<size_t>(len))) {   \
-      return Give<ret>(*verdict);                                          \
-    }                                                                      \
+#define PASS_SIZED(call, ret, name, params, args, len)                         \
+  extern "C" ret __real_##name params;                                         \
+  extern "C" ret __wrap_##name params {                                        \
+    if (const auto verdict = AskSized(call, static_cast<size_t>(len))) {       \
+      return Give<ret>(*verdict);                                              \
+    }                                                                          \
     len = static_cast<decltype(len)>(Allowed(call, static_cast<size_t>(len))); \
-    return __real_##name args;                                             \
+    return __real_##name args;                                                 \
   }
 
 PASS(Call::kSocket, int, socket, (int domain, int type, int protocol), (domain, type, protocol))
@@ -215,15 +215,15 @@ extern "C" time_t __wrap_time(time_t* out) {
 
 // The variadic calls: each takes one more argument at most, which fits a register.
 
-#define PASS_OPEN(name)                                                  \
-  extern "C" int __real_##name(const char* path, int flags, ...);        \
-  extern "C" int __wrap_##name(const char* path, int flags, ...) {       \
+#define PASS_OPEN(name)                                                    \
+  extern "C" int __real_##name(const char* path, int flags, ...);          \
+  extern "C" int __wrap_##name(const char* path, int flags, ...) {         \
     if (const auto verdict = Ask(Call::kOpen)) return Give<int>(*verdict); \
-    va_list args;                                                        \
-    va_start(args, flags);                                               \
-    const mode_t mode = va_arg(args, mode_t);                            \
-    va_end(args);                                                        \
-    return __real_##name(path, flags, mode);                             \
+    va_list args;                                                          \
+    va_start(args, flags);                                                 \
+    const mode_t mode = va_arg(args, mode_t);                              \
+    va_end(args);                                                          \
+    return __real_##name(path, flags, mode);                               \
   }
 
 PASS_OPEN(open)
@@ -231,15 +231,15 @@ PASS_OPEN(open64)
 PASS(Call::kOpen, int, __open_2, (const char* path, int flags), (path, flags))
 PASS(Call::kOpen, int, __open64_2, (const char* path, int flags), (path, flags))
 
-#define PASS_ONE_MORE(call, name, type)                              \
-  extern "C" int __real_##name(int fd, type request, ...);           \
-  extern "C" int __wrap_##name(int fd, type request, ...) {          \
-    if (const auto verdict = Ask(call)) return Give<int>(*verdict);  \
-    va_list args;                                                    \
-    va_start(args, request);                                         \
-    void* argument = va_arg(args, void*);                            \
-    va_end(args);                                                    \
-    return __real_##name(fd, request, argument);                     \
+#define PASS_ONE_MORE(call, name, type)                             \
+  extern "C" int __real_##name(int fd, type request, ...);          \
+  extern "C" int __wrap_##name(int fd, type request, ...) {         \
+    if (const auto verdict = Ask(call)) return Give<int>(*verdict); \
+    va_list args;                                                   \
+    va_start(args, request);                                        \
+    void* argument = va_arg(args, void*);                           \
+    va_end(args);                                                   \
+    return __real_##name(fd, request, argument);                    \
   }
 
 PASS_ONE_MORE(Call::kFcntl, fcntl, int)

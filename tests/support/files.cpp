@@ -25,7 +25,9 @@ void WriteFile(const std::string& path, const std::string& content) {
   if (!file) ADD_FAILURE() << "cannot write " << path;
 }
 
-bool FileExists(const std::string& path) { return fs::symlink_status(path).type() != fs::file_type::not_found; }
+bool FileExists(const std::string& path) {
+  return fs::symlink_status(path).type() != fs::file_type::not_found;
+}
 
 std::vector<std::string> ListFolder(const std::string& path) {
   std::vector<std::string> names;

@@ -20,7 +20,7 @@ constexpr int kCategories = 74;
 const std::regex& LineHead() {
   static const std::regex head(
       R"(([A-Z][a-z]{2} [ \d]\d \d\d:\d\d:\d\d(?:\.\d{3})?|) \[(\d+)\](?:\[(\d+)\])?)"
-      R"((?:\[([^\]\n]*)\]\[([^\]\n]*)\])? ([^:\n]*):(-?\d+):([^(\n]*)\(\): )",
+      R"((?:\[([^\]\n]*)\]\[([^\]\n]*)\])? ([^:\n]*):(-?\d+):([^\n]*?)\(\): )",
       std::regex::optimize);
   return head;
 }
@@ -48,8 +48,8 @@ bool ParseLine(const std::string& text, LogLine* line) {
 
 std::ostream& operator<<(std::ostream& out, const LogLine& line) {
   return out << "[" << line.category << "][" << line.level << "] " << line.source << ":"
-             << line.line << ":" << line.function << "(): "
-             << ::testing::PrintToString(line.message);
+             << line.line << ":" << line.function
+             << "(): " << ::testing::PrintToString(line.message);
 }
 
 std::vector<LogLine> ParseLog(const std::string& text) {
@@ -125,9 +125,13 @@ LogCapture::LogCapture(int level) : record_(level) {
   Clear();
 }
 
-LogCapture::~LogCapture() { FreeDbgCfg(); }
+LogCapture::~LogCapture() {
+  FreeDbgCfg();
+}
 
-std::vector<LogLine> LogCapture::Lines() const { return ParseLog(Text()); }
+std::vector<LogLine> LogCapture::Lines() const {
+  return ParseLog(Text());
+}
 
 std::vector<LogLine> LogCapture::Lines(const std::string& category) const {
   std::vector<LogLine> lines = Lines();
@@ -143,6 +147,10 @@ std::vector<std::string> LogCapture::Messages() const {
   return messages;
 }
 
-std::string LogCapture::Text() const { return ReadFile(kMainLog); }
+std::string LogCapture::Text() const {
+  return ReadFile(kMainLog);
+}
 
-void LogCapture::Clear() { unlink(kMainLog); }
+void LogCapture::Clear() {
+  unlink(kMainLog);
+}

@@ -24,13 +24,13 @@ inline constexpr int kRecordSize = 300;
 struct LogLine {
   std::string time;  // "Mar  5 14:03:09", with ".417" behind it when it carries milliseconds
   int pid = 0;
-  int tid = 0;            // 0: the main thread
-  std::string category;   // empty when the line has no tags
-  std::string level;      // empty when the line has no tags
+  int tid = 0;           // 0: the main thread
+  std::string category;  // empty when the line has no tags
+  std::string level;     // empty when the line has no tags
   std::string source;
   int line = 0;
   std::string function;
-  std::string message;    // with its line end; further lines of the message included
+  std::string message;  // with its line end; further lines of the message included
 };
 
 std::ostream& operator<<(std::ostream& out, const LogLine& line);

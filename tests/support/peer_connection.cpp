@@ -46,7 +46,9 @@ const char* ReadName(PeerConnection::Read read) {
 PeerConnection::PeerConnection(int fd, Transcript* transcript, std::function<bool()> stopped)
     : transcript_(transcript), fd_(fd), stopped_(std::move(stopped)), deadline_(Clock::now()) {}
 
-PeerConnection::~PeerConnection() { CloseRaw(); }
+PeerConnection::~PeerConnection() {
+  CloseRaw();
+}
 
 bool PeerConnection::WaitFor(short events) {
   while (!DeadlinePassed()) {
@@ -64,7 +66,9 @@ PeerConnection::Read PeerConnection::ReadMore() {
   return read;
 }
 
-PeerConnection::Read PeerConnection::ReadDecoded(std::string* bytes) { return ReadRaw(bytes); }
+PeerConnection::Read PeerConnection::ReadDecoded(std::string* bytes) {
+  return ReadRaw(bytes);
+}
 
 PeerConnection::Read PeerConnection::ReadRaw(std::string* bytes) {
   char buf[65536];
@@ -101,9 +105,13 @@ bool PeerConnection::SendRaw(const std::string& bytes) {
   return true;
 }
 
-bool PeerConnection::Write(const std::string& bytes) { return SendRaw(bytes); }
+bool PeerConnection::Write(const std::string& bytes) {
+  return SendRaw(bytes);
+}
 
-bool PeerConnection::Handshake(std::string*) { return true; }
+bool PeerConnection::Handshake(std::string*) {
+  return true;
+}
 
 bool PeerConnection::SendRecordByteByByte(const std::string&, std::string* error) {
   *error = "the connection is not a TLS one";
@@ -134,4 +142,6 @@ void PeerConnection::Reset() {
   CloseRaw();
 }
 
-void PeerConnection::ShutdownWrite() { shutdown(fd_, SHUT_WR); }
+void PeerConnection::ShutdownWrite() {
+  shutdown(fd_, SHUT_WR);
+}

@@ -51,6 +51,7 @@ class PeerConnection {
   // The layer under TLS, when there is one; each fails the step when the connection is plain.
   virtual bool Handshake(std::string* error);
   virtual bool SendRecordByteByByte(const std::string& bytes, std::string* error);
+  virtual bool SawCloseNotice() const { return false; }
 
   // Sends all bytes; false when the client closed or the deadline passed.
   virtual bool Write(const std::string& bytes);

@@ -125,6 +125,17 @@ Step ExpectEof() {
           }};
 }
 
+Step ExpectCloseNotice() {
+  Step step = ExpectEof();
+  step.name = "ExpectCloseNotice()";
+  step.play = [eof = step.play](PeerConnection& peer, std::string* error) {
+    if (!eof(peer, error)) return false;
+    if (!peer.SawCloseNotice()) *error = "closed without a notice";
+    return peer.SawCloseNotice();
+  };
+  return step;
+}
+
 Step DiscardUntilEnd() {
   return {"DiscardUntilEnd()", [](PeerConnection& peer, std::string* error) {
             Read read = Read::kData;
@@ -278,7 +289,9 @@ Step SendRecordByteByByte(const std::string& bytes) {
           }};
 }
 
-Script Exchange(const std::string& reply) { return {ExpectRequest(), Send(reply), Close()}; }
+Script Exchange(const std::string& reply) {
+  return {ExpectRequest(), Send(reply), Close()};
+}
 
 Script ExchangeByteByByte(const std::string& reply) {
   return {ExpectRequest(), SendByteByByte(reply), Close()};
@@ -288,6 +301,10 @@ Script ExchangeInPieces(const std::vector<std::string>& pieces) {
   return {ExpectRequest(), SendPieces(pieces), Close()};
 }
 
-Script RequestThenClose() { return {ExpectRequest(), Close()}; }
+Script RequestThenClose() {
+  return {ExpectRequest(), Close()};
+}
 
-Script SendThenClose(const std::string& bytes) { return {Send(bytes), Close()}; }
+Script SendThenClose(const std::string& bytes) {
+  return {Send(bytes), Close()};
+}

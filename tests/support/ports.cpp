@@ -36,9 +36,13 @@ int BindLoopback(int* port) {
   return fd;
 }
 
-ClosedPort::ClosedPort() : fd_(-1), port_(0) { fd_ = BindLoopback(&port_); }
+ClosedPort::ClosedPort() : fd_(-1), port_(0) {
+  fd_ = BindLoopback(&port_);
+}
 
-ClosedPort::~ClosedPort() { close(fd_); }
+ClosedPort::~ClosedPort() {
+  close(fd_);
+}
 
 BlackHolePort::BlackHolePort() : fd_(-1), port_(0) {
   fd_ = BindLoopback(&port_);

@@ -30,7 +30,9 @@ ScriptedPeer::ScriptedPeer(std::vector<Script> connections, PeerOptions options,
   thread_ = std::thread([this] { Run(); });
 }
 
-ScriptedPeer::~ScriptedPeer() { Finish(); }
+ScriptedPeer::~ScriptedPeer() {
+  Finish();
+}
 
 void ScriptedPeer::Listen() {
   listener_ = BindLoopback(&port_);
@@ -116,7 +118,8 @@ int ScriptedPeer::Accept() {
 }
 
 void ScriptedPeer::RefuseUnexpected() {
-  for (int fd; (fd = Accept()) >= 0; close(fd)) Fail("a connection came for which there is no script");
+  for (int fd; (fd = Accept()) >= 0; close(fd))
+    Fail("a connection came for which there is no script");
 }
 
 void ScriptedPeer::Play(size_t i, PeerConnection& peer) {

@@ -32,7 +32,7 @@
 
 struct PeerOptions {
   int backlog = 16;
-  int receive_buffer = 0;                  // SO_RCVBUF in bytes; 0 leaves the system's
+  int receive_buffer = 0;                     // SO_RCVBUF in bytes; 0 leaves the system's
   std::chrono::milliseconds deadline{10000};  // of each step
 };
 

@@ -29,6 +29,9 @@ class TlsConnection : public PeerConnection {
 
   bool Handshake(std::string* error) override;
   bool SendRecordByteByByte(const std::string& bytes, std::string* error) override;
+  bool SawCloseNotice() const override {
+    return (SSL_get_shutdown(ssl_) & SSL_RECEIVED_SHUTDOWN) != 0;
+  }
   bool Write(const std::string& bytes) override;
   void Close() override;
 

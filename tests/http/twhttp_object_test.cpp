@@ -1,0 +1,405 @@
+// The client object: construction, settings, accessors, the forwards to its socket.
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <cstdlib>
+#include <type_traits>
+
+#include "tarnwick/http/curl_callbacks.h"
+#include "tarnwick/net/sslsocket.h"
+#include "tests/http/http_test_util.h"
+#include "tests/support/faults.h"
+#include "tests/support/tls_scripted_peer.h"
+
+namespace {
+
+using ::testing::IsEmpty;
+using ::testing::SizeIs;
+
+constexpr char kPlainReply[] = "HTTP/1.1 200 OK\r\nContent-Length: 4\r\n\r\nbody";
+
+// The shape that other programs are compiled against.
+static_assert(std::has_virtual_destructor_v<TWHttpClient>);
+static_assert(sizeof(HTTP_MAP_KEY) == sizeof(int) && sizeof(HTTP_VERSION) == sizeof(int));
+static_assert(HTTP_CONTENT_TYPE == 0 && HTTP_CONTENT_LENGTH == 1 && HTTP_CONTENT_RANGE == 2);
+static_assert(HTTP_METHOD_GET == 0 && HTTP_METHOD_POST == 1);
+static_assert(HTTP_RET_OK == 0 && HTTP_RET_NOT_READY == 1 && HTTP_RET_BAD_KEY == 2);
+static_assert(HTTP_RET_IO_ERROR == 3 && HTTP_RET_UNAUTHORIZED == 4 && HTTP_RET_BAD_RESPONSE == 5);
+static_assert(HTTP_RET_NO_CONTENT == 6 && HTTP_RET_REDIRECT == 7 && HTTP_RET_URI_TOO_LONG == 8);
+static_assert(HTTP_RET_CERT_ERROR == 9);
+static_assert(int{HTTP_VERSION_NONE} == int{CURL_HTTP_VERSION_NONE});
+static_assert(int{HTTP_VERSION_1_0} == int{CURL_HTTP_VERSION_1_0});
+static_assert(int{HTTP_VERSION_1_1} == int{CURL_HTTP_VERSION_1_1});
+static_assert(std::is_same_v<decltype(ClientProbe::m_pRespBuf), char*>);
+static_assert(std::is_same_v<decltype(ClientProbe::m_respLen), unsigned int>);
+static_assert(std::is_same_v<decltype(ClientProbe::m_connState), int>);
+static_assert(std::is_same_v<decltype(ClientProbe::m_result), int>);
+static_assert(std::is_same_v<decltype(ClientProbe::m_statusCode), int>);
+static_assert(std::is_same_v<decltype(ClientProbe::m_port), int>);
+static_assert(std::is_same_v<decltype(ClientProbe::m_httpVersion), HTTP_VERSION>);
+
+void ExpectNewClient(const ClientProbe& client) {
+  EXPECT_THAT(client.m_mapContent, IsEmpty());
+  EXPECT_EQ(client.m_connState, 0);
+  EXPECT_EQ(client.m_result, HTTP_RET_NOT_READY);
+  EXPECT_EQ(client.m_statusCode, 0);
+  EXPECT_EQ(client.m_strCookie, "");
+  EXPECT_EQ(client.m_strAuthenticate, "");
+  EXPECT_EQ(client.m_strAuthorization, "");
+  EXPECT_EQ(client.m_strTransferEncoding, "");
+  EXPECT_EQ(client.m_strCurlText, "");
+  EXPECT_EQ(client.m_pRespBuf, nullptr);
+  EXPECT_EQ(client.m_respLen, 0u);
+  EXPECT_EQ(client.m_pCurlRespFile, nullptr);
+}
+
+template <typename T>
+const char* Address(const T& field) {
+  return reinterpret_cast<const char*>(&field);
+}
+
+}  // namespace
+
+TEST(TWHttpClientObject, APathOfTwoLeadingSlashesIsStoredWithoutBoth) {
+  const ClientProbe client(80, {"//cgi/a//b/"});
+  EXPECT_EQ(client.m_strPath, "cgi/a//b/");
+}
+
+TEST(TWHttpClientObject, APathOfSlashesOnlyBecomesEmpty) {
+  const ClientProbe client(80, {"///"});
+  EXPECT_EQ(client.m_strPath, "");
+}
+
+TEST(TWHttpClientObject, KeyThreeIsABadKeyAndKeyZeroIsNotReadyBeforeAnyRequest) {
+  const ClientProbe client(80);
+  std::string out = "kept";
+  EXPECT_EQ(client.GetHttpContent(static_cast<HTTP_MAP_KEY>(3), out), HTTP_RET_BAD_KEY);
+  EXPECT_EQ(client.GetHttpContent(HTTP_CONTENT_TYPE, out), HTTP_RET_NOT_READY);
+  EXPECT_EQ(out, "kept");
+}
+
+TEST(TWHttpClientObject, AHeaderThatTheResponseDidNotHaveIsNoContentAndLeavesOutUntouched) {
+  const auto client = ClientAfter(kPlainReply);
+  std::string out = "kept";
+  EXPECT_EQ(client->GetHttpContent(HTTP_CONTENT_RANGE, out), HTTP_RET_NO_CONTENT);
+  EXPECT_EQ(out, "kept");
+  EXPECT_EQ(client->GetHttpContent(HTTP_CONTENT_LENGTH, out), HTTP_RET_OK);
+  EXPECT_EQ(out, "4");
+}
+
+TEST(TWHttpClientObject, CheckResponseOfANewObjectIsNotReadyWithStatusZero) {
+  TWHttpClient client;
+  int status = -7;
+  EXPECT_EQ(client.CheckResponse(status), HTTP_RET_NOT_READY);
+  EXPECT_EQ(status, 0);
+}
+
+TEST(TWHttpClientObject, WithHttpsTheSocketIsTlsAndTheSourceAddressIsBoundBeneathIt) {
+  TlsScriptedPeer peer({Exchange(kPlainReply)});
+  ClientSettings settings;
+  settings.https = true;
+  ClientProbe client(peer.Port(), settings);
+  EXPECT_NE(dynamic_cast<SSLSocket*>(client.m_pSocket), nullptr);
+  client.SetSocketRemoteAddr(htonl(0x7f000005));
+  Faults faults;
+  sockaddr_in local = {};
+  faults.Before(Call::kClose, [](int) {});
+  EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
+  EXPECT_EQ(faults.Count(Call::kBind), 1);
+  socklen_t size = sizeof(local);
+  for (const auto& [fd, target] : OpenDescriptors()) {
+    sockaddr_in address = {};
+    size = sizeof(address);
+    if (target.rfind("socket:", 0) != 0) continue;
+    if (getsockname(fd, reinterpret_cast<sockaddr*>(&address), &size) != 0) continue;
+    if (address.sin_addr.s_addr == htonl(0x7f000005)) local = address;
+  }
+  EXPECT_EQ(local.sin_addr.s_addr, htonl(0x7f000005));
+  EXPECT_EQ(client.m_result, HTTP_RET_OK);
+}
+
+TEST(TWHttpClientObject, WithoutHttpsTheSocketIsPlain) {
+  const ClientProbe client(80);
+  ASSERT_NE(client.m_pSocket, nullptr);
+  EXPECT_EQ(dynamic_cast<SSLSocket*>(client.m_pSocket), nullptr);
+}
+
+TEST(TWHttpClientObject, TheDefaultConstructorMakesNoSocketAndEmptyFields) {
+  const ClientProbe client;
+  ExpectNewClient(client);
+  EXPECT_EQ(client.m_pSocket, nullptr);
+  EXPECT_FALSE(client.m_bHttps || client.m_bEncodeQuery || client.m_bBasicAuth);
+  EXPECT_EQ(client.m_port, 0);
+  EXPECT_EQ(client.m_strHost + client.m_strPath + client.m_strUser + client.m_strPassword, "");
+  EXPECT_EQ(client.m_strEncodeKeep, "");
+  EXPECT_EQ(client.m_httpVersion, HTTP_VERSION_NONE);
+}
+
+TEST(TWHttpClientObject, TheLongConstructorStoresEachSettingInItsField) {
+  const ClientProbe client(
+      8080, {"/p?q=1", HTTP_VERSION_1_1, "u", "w", true, true, "/:", 3, true, true, "cam"});
+  ExpectNewClient(client);
+  EXPECT_EQ(client.m_strHost, "cam");
+  EXPECT_EQ(client.m_port, 8080);
+  EXPECT_EQ(client.m_strPath, "p?q=1");
+  EXPECT_EQ(client.m_strUser, "u");
+  EXPECT_EQ(client.m_strPassword, "w");
+  EXPECT_EQ(client.m_strEncodeKeep, "/:");
+  EXPECT_TRUE(client.m_bHttps && client.m_bEncodeQuery && client.m_bBasicAuth);
+  EXPECT_EQ(client.m_httpVersion, HTTP_VERSION_1_1);
+}
+
+TEST(TWHttpClientObject, InitStoresTheSameSettingsAsTheLongConstructor) {
+  ClientProbe client;
+  client.Init("//p", "cam", 81, "u", "w", 3, true, false, true, HTTP_VERSION_1_0, "k", false);
+  ExpectNewClient(client);
+  EXPECT_NE(client.m_pSocket, nullptr);
+  EXPECT_EQ(client.m_strHost, "cam");
+  EXPECT_EQ(client.m_port, 81);
+  EXPECT_EQ(client.m_strPath, "p");
+  EXPECT_EQ(client.m_strUser, "u");
+  EXPECT_EQ(client.m_strPassword, "w");
+  EXPECT_EQ(client.m_strEncodeKeep, "k");
+  EXPECT_FALSE(client.m_bHttps || client.m_bEncodeQuery);
+  EXPECT_TRUE(client.m_bBasicAuth);
+  EXPECT_EQ(client.m_httpVersion, HTTP_VERSION_1_0);
+}
+
+TEST(TWHttpClientObject, InitResetsOutcomeCookieAndCurlOutputWithoutFreeing) {
+  ClientProbe client;
+  char* lost = static_cast<char*>(malloc(8));
+  client.m_pRespBuf = lost;
+  client.m_respLen = 7;
+  client.m_result = HTTP_RET_OK;
+  client.m_statusCode = 200;
+  client.m_connState = 2;
+  client.SetCookie("s=1");
+  client.SetCurlRespFile(stdout);
+  client.Init("p", "h", 1, "", "", 1, true, false, false, HTTP_VERSION_NONE, "", false);
+  ExpectNewClient(client);
+  free(lost);  // were it freed already, this would be the second time
+}
+
+TEST(TWHttpClientObject, ASecondInitDoesNotReleaseTheFirstSocket) {
+  ClientProbe client(80);
+  TWSocket* first = client.m_pSocket;
+  client.Init("p", "h", 1, "", "", 1, true, false, false, HTTP_VERSION_NONE, "", false);
+  EXPECT_NE(client.m_pSocket, first);
+  EXPECT_FALSE(first->IsConnected());
+  delete first;
+}
+
+TEST(TWHttpClientObject, TheSocketGetsHostPortTimeoutAndReadAhead) {
+  const BlackHolePort port;
+  LogCapture log;
+  ClientSettings settings;
+  settings.timeout = 0;
+  ClientProbe client(port.Port(), settings);
+  EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_IO_ERROR);
+  EXPECT_THAT(log.Messages(), ::testing::Contains("Socket connect timeout (0)\n"));
+}
+
+TEST(TWHttpClientObject, SetPathStripsLeadingSlashes) {
+  ClientProbe client(80);
+  client.SetPath("//x/y");
+  EXPECT_EQ(client.m_strPath, "x/y");
+  client.SetPath("/");
+  EXPECT_EQ(client.m_strPath, "");
+}
+
+TEST(TWHttpClientObject, CookieAndTransferEncodingAreReadBack) {
+  ClientProbe client(80);
+  EXPECT_EQ(client.SetCookie("s=1"), 0);
+  std::string cookie;
+  EXPECT_EQ(client.GetCookie(cookie), 0);
+  EXPECT_EQ(cookie, "s=1");
+  client.m_strTransferEncoding = "chunked";
+  EXPECT_EQ(client.GetTransferEncoding(), "chunked");
+}
+
+TEST(TWHttpClientObject, CheckResponseGivesTheLastResultAndStatus) {
+  ClientProbe client(80);
+  client.m_result = HTTP_RET_REDIRECT;
+  client.m_statusCode = 302;
+  int status = 0;
+  EXPECT_EQ(client.CheckResponse(status), HTTP_RET_REDIRECT);
+  EXPECT_EQ(status, 302);
+}
+
+TEST(TWHttpClientObject, ANegativeKeyIsABadKey) {
+  const auto client = ClientAfter(kPlainReply);
+  std::string out = "kept";
+  EXPECT_EQ(client->GetHttpContent(static_cast<HTTP_MAP_KEY>(-1), out), HTTP_RET_BAD_KEY);
+  EXPECT_EQ(client->GetHttpContent(static_cast<HTTP_MAP_KEY>(INT_MIN), out), HTTP_RET_BAD_KEY);
+  EXPECT_EQ(out, "kept");
+}
+
+TEST(TWHttpClientObject, TheKeyIsTestedBeforeTheState) {
+  ClientProbe client(80);
+  client.m_connState = 1;
+  client.m_mapContent[HTTP_CONTENT_TYPE] = "x";
+  std::string out;
+  EXPECT_EQ(client.GetHttpContent(static_cast<HTTP_MAP_KEY>(4), out), HTTP_RET_BAD_KEY);
+  EXPECT_EQ(client.GetHttpContent(HTTP_CONTENT_TYPE, out), HTTP_RET_NOT_READY);
+  client.m_connState = 2;
+  EXPECT_EQ(client.GetHttpContent(HTTP_CONTENT_TYPE, out), HTTP_RET_OK);
+  EXPECT_EQ(out, "x");
+}
+
+TEST(TWHttpClientObject, ReadDataAndWriteDataAreRefusedUntilTheHeadIsRead) {
+  ScriptedPeer peer({{ExpectExactly("ping"), Send("pong"), Close()}});
+  ClientProbe client(peer.Port());
+  ASSERT_EQ(client.m_pSocket->Connect(), 0);
+  char buf[8] = "";
+  for (const int state : {0, 1}) {
+    client.m_connState = state;
+    EXPECT_EQ(client.ReadData(buf, 4), -1);
+    EXPECT_EQ(client.WriteData("ping", 4), -1);
+  }
+  client.m_connState = 2;
+  EXPECT_EQ(client.WriteData("ping", 4), 4);
+  EXPECT_EQ(client.ReadData(buf, 4), 4);
+  EXPECT_STREQ(buf, "pong");
+}
+
+TEST(TWHttpClientObject, LineReadingPushBackAndTheReadinessProbeNeedNoState) {
+  ScriptedPeer peer({SendThenClose("line\r\nrest")});
+  ClientProbe client(peer.Port());
+  ASSERT_EQ(client.m_pSocket->Connect(), 0);
+  EXPECT_TRUE(client.HasDataToRead(5));
+  char buf[16] = "";
+  EXPECT_EQ(client.ReadToLineEnd(buf, sizeof(buf)), 4);
+  EXPECT_STREQ(buf, "line");
+  char back[] = "back";
+  EXPECT_EQ(client.RestoreData(back, 4), 0);
+  EXPECT_EQ(client.ReadToLineEnd(buf, sizeof(buf)), 8);
+  EXPECT_STREQ(buf, "backrest");
+}
+
+TEST(TWHttpClientObject, TheDestructorFreesTheBufferAndClosesTheConnectionButNoFile) {
+  const DescriptorGuard guard;
+  ScriptedPeer peer({{ExpectRequest(), Send("HTTP/1.1 200 OK\r\n\r\n"), ExpectEof()}});
+  FILE* file = tmpfile();
+  {
+    ClientProbe client(peer.Port());
+    client.SetCurlRespFile(file);
+    client.m_pRespBuf = static_cast<char*>(malloc(4));
+    client.SendRequestByGet();
+  }
+  peer.Finish();
+  EXPECT_EQ(fputs("open", file), 1);
+  EXPECT_EQ(fclose(file), 0);
+}
+
+TEST(TWHttpClientObject, TheFieldsStandInTheOrderThatOtherProgramsCountOn) {
+  const ClientProbe c;
+  const std::vector<const char*> places = {Address(c.m_pSocket),
+                                           Address(c.m_mapContent),
+                                           Address(c.m_connState),
+                                           Address(c.m_bHttps),
+                                           Address(c.m_bEncodeQuery),
+                                           Address(c.m_result),
+                                           Address(c.m_bBasicAuth),
+                                           Address(c.m_statusCode),
+                                           Address(c.m_port),
+                                           Address(c.m_strHost),
+                                           Address(c.m_strPath),
+                                           Address(c.m_strUser),
+                                           Address(c.m_strPassword),
+                                           Address(c.m_strCookie),
+                                           Address(c.m_strAuthenticate),
+                                           Address(c.m_strAuthorization),
+                                           Address(c.m_strTransferEncoding),
+                                           Address(c.m_strEncodeKeep),
+                                           Address(c.m_strCurlText),
+                                           Address(c.m_pRespBuf),
+                                           Address(c.m_respLen),
+                                           Address(c.m_httpVersion),
+                                           Address(c.m_pCurlRespFile)};
+  for (size_t i = 1; i < places.size(); ++i) EXPECT_LT(places[i - 1], places[i]) << i;
+  EXPECT_EQ(places.front() - reinterpret_cast<const char*>(&c), long{sizeof(void*)});
+}
+
+TEST(TWHttpClientObject, BufferAndLengthAreOneRecordForTheCurlCallbacks) {
+  ClientProbe client;
+  auto* record = reinterpret_cast<CurlMemBuffer*>(&client.m_pRespBuf);
+  EXPECT_EQ(Address(client.m_respLen) - Address(client.m_pRespBuf),
+            Address(record->size) - Address(record->data));
+  EXPECT_EQ(Address(record->data), Address(client.m_pRespBuf));
+  char text[] = "abc";
+  EXPECT_EQ(CurlBufferWrite(text, 1, 3, &client.m_pRespBuf), 3u);
+  EXPECT_STREQ(client.m_pRespBuf, "abc");
+  EXPECT_EQ(client.m_respLen, 3u);
+}
+
+// Before Init every operation fails with its own failure value.
+
+TEST(TWHttpClientBeforeInit, TheForwardsFail) {
+  ClientProbe client;
+  char buf[8] = "kept";
+  for (const int state : {0, 1, 2}) {
+    client.m_connState = state;
+    EXPECT_EQ(client.ReadData(buf, 4), -1);
+    EXPECT_EQ(client.WriteData(buf, 4), -1);
+    EXPECT_EQ(client.ReadToLineEnd(buf, sizeof(buf)), -1);
+    EXPECT_EQ(client.RestoreData(buf, 4), -1);
+    EXPECT_FALSE(client.HasDataToRead(0));
+  }
+  EXPECT_STREQ(buf, "kept");
+  client.SetSocketRemoteAddr(htonl(INADDR_LOOPBACK));
+  EXPECT_EQ(client.m_pSocket, nullptr);
+}
+
+TEST(TWHttpClientBeforeInit, TheRequestsFail) {
+  ClientProbe client;
+  EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_IO_ERROR);
+  EXPECT_EQ(client.SendRequest(HTTP_METHOD_GET, "?"), HTTP_RET_IO_ERROR);
+  EXPECT_EQ(client.SendRequest(HTTP_METHOD_POST, "?"), HTTP_RET_IO_ERROR);
+  EXPECT_EQ(client.SendRequestByPost("?"), HTTP_RET_IO_ERROR);
+  EXPECT_EQ(client.SendRequestByCurl(HTTP_METHOD_GET, true, 5), HTTP_RET_IO_ERROR);
+  EXPECT_EQ(client.SendRequestByCurl(HTTP_METHOD_POST, true, 5), HTTP_RET_IO_ERROR);
+}
+
+TEST(TWHttpClientBeforeInit, TheParsersFail) {
+  ClientProbe client;
+  EXPECT_EQ(client.CheckHttpResponse(), HTTP_RET_NOT_READY);
+  EXPECT_EQ(client.CheckContentType(), HTTP_RET_IO_ERROR);
+  client.m_connState = 1;
+  EXPECT_EQ(client.CheckHttpResponse(), HTTP_RET_IO_ERROR);
+}
+
+TEST(TWHttpClientBeforeInit, TheAccessorsWork) {
+  ClientProbe client;
+  std::string text;
+  EXPECT_EQ(client.SetCookie("s=1"), 0);
+  EXPECT_EQ(client.GetCookie(text), 0);
+  EXPECT_EQ(client.GetTransferEncoding(), "");
+  EXPECT_EQ(client.GetHttpContent(HTTP_CONTENT_TYPE, text), HTTP_RET_NOT_READY);
+  EXPECT_EQ(client.GenBasicAccessAuth(), "Authorization: Basic Og==");
+  client.SetPath("/p");
+  client.SetCurlRespFile(nullptr);
+  EXPECT_EQ(client.m_strPath, "p");
+}
+
+TEST(TWHttpClientBadInput, NullAndNegativeArgumentsAreRefused) {
+  const auto client = ClientAfter(kPlainReply);
+  char buf[8] = "kept";
+  EXPECT_EQ(client->ReadData(nullptr, 4), -1);
+  EXPECT_EQ(client->ReadData(buf, -1), -1);
+  EXPECT_EQ(client->WriteData(nullptr, 4), -1);
+  EXPECT_EQ(client->WriteData(buf, -1), -1);
+  EXPECT_EQ(client->ReadToLineEnd(nullptr, 8), -1);
+  EXPECT_EQ(client->ReadToLineEnd(buf, 0), -1);
+  EXPECT_EQ(client->RestoreData(nullptr, 4), -1);
+  EXPECT_EQ(client->RestoreData(buf, -1), -1);
+  EXPECT_STREQ(buf, "kept");
+  EXPECT_EQ(ReadBody(*client), "body");
+}
+
+TEST(TWHttpClientBadInput, RestoreDataBeyondTheBufferIsRefusedAndLosesNothing) {
+  const auto client = ClientAfter(kPlainReply);
+  std::string large(65536, 'x');
+  EXPECT_EQ(client->RestoreData(large.data(), 65536), -1);
+  EXPECT_EQ(client->RestoreData(large.data(), 65532), 0);
+  EXPECT_EQ(ReadBody(*client), large.substr(0, 65532) + "body");
+}

@@ -1,0 +1,493 @@
+// Reading and writing over TLS.
+#include <openssl/err.h>
+#include <openssl/ssl.h>
+
+#include <algorithm>
+#include <csignal>
+#include <memory>
+#include <random>
+#include <thread>
+
+#include "tests/net/net_test_util.h"
+#include "tests/support/faults.h"
+#include "tests/support/process.h"
+#include "tests/support/tls_scripted_peer.h"
+
+namespace {
+
+using ::testing::Each;
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+using ::testing::MatchesRegex;
+using ::testing::SizeIs;
+
+constexpr char kLoopback[] = "127.0.0.1";
+const char kReadWaitFailed[] = "Select read op error.\n";
+
+// A connected TLS socket and its peer. The peer has sent a first byte and the socket has read it, so
+// that the session tickets, which no test asks about, are out of the way when the script begins.
+struct TlsPair {
+  TlsPair(Script script, int timeout, bool buffered, PeerOptions options = {})
+      : peer({Greeted(std::move(script))}, {}, options),
+        socket(kLoopback, peer.Port(), timeout < 0 ? timeout : 5, buffered) {
+    EXPECT_EQ(socket.Connect(), 0);
+    EXPECT_EQ(ReadSome(socket, 1), (Delivered{1, "+"}));
+    socket.m_timeout = timeout;
+  }
+  ~TlsPair() { socket.Disconnect(); }
+
+  static Script Greeted(Script script) {
+    script.insert(script.begin(), Send("+"));
+    return script;
+  }
+
+  TlsScriptedPeer peer;
+  TlsSocket socket;
+};
+
+std::string EmptyQueueText() {
+  char text[256];
+  ERR_error_string_n(0, text, sizeof(text));
+  return text;
+}
+
+class TlsBothModes : public ::testing::TestWithParam<bool> {};
+INSTANTIATE_TEST_SUITE_P(Tls, TlsBothModes, ::testing::Bool());
+
+TEST_P(TlsBothModes, ReadsLines) {
+  TlsPair tls({Send("first\r\nsecond\n"), ExpectEof()}, 5, GetParam());
+  EXPECT_EQ(ReadLine(tls.socket), (Delivered{5, "first"}));
+  EXPECT_EQ(ReadLine(tls.socket), (Delivered{6, "second"}));
+}
+
+TEST_P(TlsBothModes, ReadsTheWholeStreamToTheCloseNotice) {
+  const std::string stream = Pattern(150000);
+  TlsPair tls({Send(stream), Close()}, 5, GetParam());
+  std::mt19937 random(1);
+  std::string got;
+  for (Delivered read = {1, ""}; read.result > 0; got += read.bytes) {
+    read = ReadSome(tls.socket, 1 + random() % 5000);
+  }
+  EXPECT_TRUE(tls.socket.IsEOF());
+  EXPECT_TRUE(got == stream);
+}
+
+TEST_P(TlsBothModes, ReadsPiecesOfAnySize) {
+  std::vector<std::string> pieces;
+  std::string stream;
+  std::mt19937 random(2);
+  for (int i = 0; i < 100; ++i) {
+    pieces.push_back(Pattern(1 + random() % 3000, stream.size()));
+    stream += pieces.back();
+  }
+  TlsPair tls({SendPieces(pieces), CloseWithoutNotice()}, 5, GetParam());
+  std::string got;
+  for (Delivered read = {1, ""}; read.result > 0; got += read.bytes) {
+    read = ReadSome(tls.socket, 1 + random() % 4000);
+  }
+  EXPECT_TRUE(got == stream);
+}
+
+TEST_P(TlsBothModes, ACloseWithANoticeIsTheEndOfTheStreamAgainAndAgain) {
+  LogCapture log;
+  TlsPair tls({Send("bye"), Close()}, 5, GetParam());
+  EXPECT_EQ(ReadSome(tls.socket, 3), (Delivered{3, "bye"}));
+  for (int i = 0; i < 3; ++i) {
+    EXPECT_EQ(ReadSome(tls.socket, 10), (Delivered{0, ""}));
+    EXPECT_TRUE(tls.socket.IsEOF());
+    EXPECT_TRUE(tls.socket.IsConnected());
+  }
+  const auto line = SocketLine("info", "ReadData", "Reach end of file!\n");
+  EXPECT_THAT(log.Lines(), ElementsAre(line, line, line));
+}
+
+TEST_P(TlsBothModes, ACloseWithoutANoticeIsTheEndOfTheStreamAgainAndAgain) {
+  LogCapture log;
+  TlsPair tls({Send("bye"), CloseWithoutNotice()}, 5, GetParam());
+  EXPECT_EQ(ReadSome(tls.socket, 3), (Delivered{3, "bye"}));
+  for (int i = 0; i < 3; ++i) {
+    errno = EAGAIN;  // of another call; must not be taken for the read's
+    EXPECT_EQ(ReadSome(tls.socket, 10), (Delivered{0, ""}));
+    EXPECT_TRUE(tls.socket.IsEOF());
+  }
+  const auto line = SocketLine("info", "ReadData", "Reach end of file!\n");
+  EXPECT_THAT(log.Lines(), ElementsAre(line, line, line));
+}
+
+TEST_P(TlsBothModes, ACloseInTheMiddleOfARecordIsTheEndOfTheStream) {
+  // The head of a record of 256 bytes, and 3 of these.
+  TlsPair tls({SendRaw(std::string("\x17\x03\x03\x01\x00", 5) + "abc"), CloseWithoutNotice()}, 5,
+              GetParam());
+  EXPECT_EQ(ReadSome(tls.socket, 10), (Delivered{0, ""}));
+  EXPECT_TRUE(tls.socket.IsEOF());
+}
+
+TEST(TlsRead, TheNextCallReturnsTheRestOfARecord) {
+  TlsPair tls({Send(Pattern(1000)), ExpectEof()}, 5, false);
+  std::string got;
+  while (got.size() < 1000) {
+    const Delivered read = ReadSome(tls.socket, 64);
+    ASSERT_GT(read.result, 0);
+    got += read.bytes;
+  }
+  EXPECT_TRUE(got == Pattern(1000));
+}
+
+TEST(TlsRead, WaitingBytesNeedNoWaitInTheBufferedModeEither) {
+  TlsPair tls({Send(Pattern(5000)), ExpectEof()}, 5, true);
+  ASSERT_EQ(ReadSome(tls.socket, 1100).result, 1100);
+  Faults faults;
+  EXPECT_EQ(tls.socket.DoSelect(TWSocket::SELECT_READ), 0);
+  EXPECT_EQ(ReadSome(tls.socket, 3900), (Delivered{3900, Pattern(3900, 1100)}));
+  EXPECT_EQ(faults.Count(Call::kSelect), 0);
+}
+
+TEST(TlsRead, WaitingBytesAreNoReasonToBeWritable) {
+  TlsPair tls({Send(Pattern(100)), ExpectEof()}, 5, false);
+  ASSERT_EQ(ReadSome(tls.socket, 1).result, 1);
+  Faults faults;
+  EXPECT_GT(tls.socket.DoSelect(TWSocket::SELECT_WRITE), 0);
+  EXPECT_EQ(faults.Count(Call::kSelect), 1);
+}
+
+TEST(TlsRead, WithoutASocketTheWaitGivesMinusOneSilently) {
+  LogCapture log;
+  TlsSocket socket;
+  EXPECT_EQ(socket.DoSelect(TWSocket::SELECT_READ), -1);
+  EXPECT_EQ(socket.DoSelect(TWSocket::SELECT_WRITE), -1);
+  EXPECT_THAT(log.Lines(), IsEmpty());
+}
+
+TEST(TlsRead, BeforeAConnectionFails) {
+  TlsSocket socket(kLoopback, 1, 5, true);
+  EXPECT_EQ(ReadSome(socket, 10).result, -1);
+  EXPECT_EQ(socket.WriteData("hello", 5), -1);
+  EXPECT_EQ(ReadLine(socket).result, -1);
+  char byte = 0;
+  EXPECT_EQ(socket._Read(&byte, 1), -1);
+  EXPECT_EQ(socket._Write(&byte, 1), -1);
+}
+
+TEST(TlsRead, ALargeRecordThatComesByteByByteFitsASmallStack) {
+  const std::string record = Pattern(16384);
+  TlsPair tls({SendRecordByteByByte(record), ExpectEof()}, 10, true);
+  RunOnSmallStack(64 << 10, [&] {
+    auto buf = std::make_unique<char[]>(record.size());
+    EXPECT_EQ(tls.socket.ReadData(buf.get(), 16384), 16384);
+    EXPECT_TRUE(std::equal(record.begin(), record.end(), buf.get()));
+  });
+}
+
+TEST(TlsRead, ATimeOutGivesMinusOneWithEagainAndIsLogged) {
+  LogCapture log;
+  TlsPair tls({ExpectEof()}, 0, false);
+  EXPECT_EQ(ReadSome(tls.socket, 10), (Delivered{-1, ""}));
+  EXPECT_EQ(errno, EAGAIN);
+  EXPECT_TRUE(tls.socket.IsConnected());
+  EXPECT_THAT(log.Lines(), ElementsAre(TlsLine("error", "_Read", kReadWaitFailed)));
+}
+
+TEST(TlsRead, WaitsForTheTimeOutWhenARecordIsMissing) {
+  TlsPair tls({ExpectEof()}, 1, false);
+  char byte;
+  const Stopwatch watch;
+  EXPECT_EQ(tls.socket._Read(&byte, 1), -1);
+  EXPECT_EQ(errno, EAGAIN);
+  EXPECT_GE(watch.Seconds(), 0.95);
+  EXPECT_LT(watch.Seconds(), 3.0);
+}
+
+TEST(TlsRead, SevenEmptyAttemptsEndASmallBufferedRead) {
+  LogCapture log;
+  TlsPair tls({ExpectEof()}, 0, true);
+  EXPECT_EQ(ReadSome(tls.socket, 10), (Delivered{-1, ""}));
+  EXPECT_FALSE(tls.socket.IsConnected());
+  auto lines = log.Lines();
+  ASSERT_THAT(lines, SizeIs(8));
+  EXPECT_THAT(lines.back(), SocketLine("info", "ReadData",
+                                       "Read socket [" + Fd(tls.socket) +
+                                           "] failed with errno [11], retry [6].\n"));
+  lines.pop_back();
+  EXPECT_THAT(lines, Each(TlsLine("error", "_Read", kReadWaitFailed)));
+}
+
+TEST(TlsRead, AnOldErrorInTheQueueDoesNotTurnATimeOutIntoAnError) {
+  LogCapture log;
+  TlsPair tls({ExpectEof()}, 0, false);
+  ERR_raise(ERR_LIB_USER, 7);
+  EXPECT_EQ(ReadSome(tls.socket, 10).result, -1);
+  ERR_clear_error();
+  EXPECT_EQ(log.Messages(), std::vector<std::string>{kReadWaitFailed});
+}
+
+TEST(TlsRead, GarbageIsAnErrorWithItsReason) {
+  LogCapture log;
+  TlsPair tls({SendRaw("this is no TLS record"), StallUntilFinish()}, 5, true);
+  errno = EAGAIN;  // of another call; must not make the read try again
+  EXPECT_EQ(ReadSome(tls.socket, 10), (Delivered{-1, ""}));
+  EXPECT_FALSE(tls.socket.IsConnected());
+  EXPECT_THAT(
+      log.Lines(),
+      ElementsAre(
+          TlsLine("error", "_Read",
+                  "Read error [1] [error:0A00010B:SSL routines::wrong version number].\n"),
+          SocketLine("info", "ReadData",
+                     "Read socket [" + Fd(tls.socket) + "] failed with errno [0], retry [0].\n")));
+}
+
+TEST(TlsRead, AResetIsAnErrorWithItsErrno) {
+  LogCapture log;
+  TlsPair tls({ExpectExactly("x"), Reset()}, 5, true);
+  ASSERT_EQ(tls.socket.WriteData("x", 1), 1);
+  EXPECT_EQ(ReadSome(tls.socket, 10), (Delivered{-1, ""}));
+  EXPECT_EQ(errno, ECONNRESET);
+  EXPECT_FALSE(tls.socket.IsConnected());
+  EXPECT_THAT(log.Lines(),
+              ElementsAre(TlsLine("error", "_Read", "Read error [5] [" + EmptyQueueText() + "].\n"),
+                          SocketLine("info", "ReadData",
+                                     "Read socket [" + Fd(tls.socket) +
+                                         "] failed with errno [104], retry [0].\n")));
+}
+
+// A read of the library that OpenSSL answers with `code`, `times` times.
+void AnswerReads(Faults& faults, int times, int code) {
+  faults.FailRange(Call::kSslRead, 1, times, EAGAIN);
+  faults.Return(Call::kSslGetError, 1, times, code);
+}
+
+TEST(TlsRead, WaitsForTheDescriptorAndReadsAgain) {
+  for (const int code : {SSL_ERROR_WANT_READ, SSL_ERROR_WANT_WRITE}) {
+    LogCapture log;
+    TlsPair tls({Send("data"), ExpectEof()}, 5, false);
+    Faults faults;
+    AnswerReads(faults, 3, code);
+    char buf[8] = {};
+    EXPECT_EQ(tls.socket._Read(buf, sizeof(buf)), 4);
+    EXPECT_STREQ(buf, "data");
+    EXPECT_THAT(log.Lines(), IsEmpty());
+  }
+}
+
+TEST(TlsRead, ABlockingConnectionEndsAfterOneAttempt) {
+  LogCapture log;
+  TlsPair tls({ExpectEof()}, -1, false);
+  Faults faults;
+  AnswerReads(faults, 1, SSL_ERROR_WANT_READ);
+  char buf[8];
+  EXPECT_EQ(tls.socket._Read(buf, sizeof(buf)), -1);
+  EXPECT_EQ(faults.Count(Call::kSslRead), 1);
+  EXPECT_EQ(faults.Count(Call::kSelect), 0);
+  EXPECT_THAT(log.Lines(), ElementsAre(TlsLine("error", "_Read", kReadWaitFailed)));
+}
+
+TEST(TlsRead, AFailedWaitEndsTheRead) {
+  LogCapture log;
+  TlsPair tls({ExpectEof()}, 5, false);
+  Faults faults;
+  AnswerReads(faults, 1, SSL_ERROR_WANT_READ);
+  faults.FailNth(Call::kSelect, 1, ENOMEM);
+  char buf[8];
+  EXPECT_EQ(tls.socket._Read(buf, sizeof(buf)), -1);
+  EXPECT_THAT(
+      log.Messages(),
+      ElementsAre("Select Fd [" + Fd(tls.socket) + "] failed with errno [12]\n", kReadWaitFailed));
+}
+
+// Writing.
+
+TEST(TlsWrite, NoBytesGiveZero) {
+  TlsPair tls({ExpectEof()}, 5, true);
+  Faults faults;
+  EXPECT_EQ(tls.socket._Write("x", 0), 0);
+  EXPECT_EQ(faults.Count(Call::kSslWrite), 0);
+  EXPECT_EQ(faults.Count(Call::kSelect), 0);
+}
+
+TEST(TlsWrite, APieceHoldsAtMost32000Bytes) {
+  const std::string bytes = Pattern(32001);
+  TlsPair tls({ExpectExactly(bytes), ExpectEof()}, -1, true);
+  Faults faults;
+  EXPECT_EQ(tls.socket.WriteData(bytes.data(), 32001), 32001);
+  EXPECT_THAT(faults.Sizes(Call::kSslWrite), ElementsAre(32000, 1));
+  EXPECT_THAT(faults.Count(Call::kSelect), 0);
+}
+
+TEST(TlsWrite, WaitsBeforeEachPiece) {
+  const std::string bytes = Pattern(64000);
+  TlsPair tls({ExpectExactly(bytes), ExpectEof()}, 5, true);
+  Faults faults;
+  EXPECT_EQ(tls.socket._Write(bytes.data(), 64000), 64000);
+  EXPECT_GE(faults.Count(Call::kSelect), 2);
+  EXPECT_EQ(faults.Count(Call::kSelect), faults.Count(Call::kSslWrite));
+}
+
+TEST(TlsWrite, GoesOnWhenThePeerTakesTheBytesLate) {
+  for (const int timeout : {5, -1}) {
+    const Flag go;
+    const std::string bytes = Pattern(6000000);
+    PeerOptions options;
+    options.receive_buffer = 4096;
+    TlsPair tls({WaitFor(go), ExpectExactly(bytes), ExpectEof()}, timeout, true, options);
+    std::thread later([&] {
+      usleep(100000);
+      go.Set();
+    });
+    ERR_raise(ERR_LIB_USER, 7);  // must not turn "not now" into an error
+    EXPECT_EQ(tls.socket.WriteData(bytes.data(), 6000000), 6000000);
+    ERR_clear_error();
+    later.join();
+    EXPECT_TRUE(tls.socket.IsConnected());
+  }
+}
+
+TEST(TlsWrite, TriesTheSamePieceAgain) {
+  for (const int code : {SSL_ERROR_WANT_READ, SSL_ERROR_WANT_WRITE}) {
+    LogCapture log;
+    const std::string bytes = Pattern(40000);
+    TlsPair tls({ExpectExactly(bytes), ExpectEof()}, 5, true);
+    Faults faults;
+    faults.FailRange(Call::kSslWrite, 1, 2, EAGAIN);
+    faults.Return(Call::kSslGetError, 1, 2, code);
+    EXPECT_EQ(tls.socket.WriteData(bytes.data(), 40000), 40000);
+    const auto& sizes = faults.Sizes(Call::kSslWrite);
+    ASSERT_GE(sizes.size(), 4u);
+    EXPECT_EQ(sizes[0], 32000u);
+    EXPECT_EQ(sizes[1], 32000u);
+    EXPECT_EQ(sizes[2], 32000u);
+    EXPECT_EQ(sizes.back(), 8000u);
+    EXPECT_THAT(log.Lines(), IsEmpty());
+  }
+}
+
+TEST(TlsWrite, CountsWhatAPartialWriteTook) {
+  const std::string bytes = Pattern(1000);
+  TlsPair tls({ExpectExactly(bytes), ExpectEof()}, -1, true);
+  Faults faults;
+  faults.Limit(Call::kSslWrite, 300);
+  EXPECT_EQ(tls.socket.WriteData(bytes.data(), 1000), 1000);
+  EXPECT_THAT(faults.Sizes(Call::kSslWrite), ElementsAre(1000, 700, 400, 100));
+}
+
+TEST(TlsWrite, AFailedWaitIsLoggedAndFails) {
+  LogCapture log;
+  TlsPair tls({DiscardUntilEnd()}, 5, true);
+  {
+    Faults faults;
+    faults.FailFrom(Call::kSelect, 1, ENOMEM);
+    EXPECT_EQ(tls.socket._Write("hello", 5), -1);
+    EXPECT_EQ(faults.Count(Call::kSslWrite), 0);
+  }
+  EXPECT_THAT(log.Lines(),
+              ElementsAre(SocketLine("error", "DoSelect",
+                                     "Select Fd [" + Fd(tls.socket) + "] failed with errno [12]\n"),
+                          TlsLine("error", "_Write", "Select write op error.\n")));
+}
+
+TEST(TlsWrite, AnErrorIsLoggedAndClearsConnected) {
+  LogCapture log;
+  TlsPair tls({DiscardUntilEnd()}, 5, true);
+  Faults faults;
+  faults.FailNth(Call::kSslWrite, 1, ECONNRESET);
+  EXPECT_EQ(tls.socket.WriteData("hello", 5), -1);
+  EXPECT_FALSE(tls.socket.IsConnected());
+  EXPECT_TRUE(IsOpenFd(tls.socket.m_sockFd));
+  EXPECT_THAT(log.Lines(), ElementsAre(TlsLine("error", "_Write",
+                                               "Write error [5] [" + EmptyQueueText() + "].\n")));
+}
+
+TEST(TlsWrite, AnErrorAfterTheFirstPieceGivesMinusOneToo) {
+  const std::string bytes = Pattern(40000);
+  TlsPair tls({DiscardUntilEnd()}, -1, true);
+  Faults faults;
+  faults.FailNth(Call::kSslWrite, 2, ECONNRESET);
+  EXPECT_EQ(tls.socket.WriteData(bytes.data(), 40000), -1);
+}
+
+// A peer that has gone does not end the process: SIGPIPE is at its default in these children.
+
+void DefaultSigpipe() {
+  signal(SIGPIPE, SIG_DFL);
+  sigset_t set;
+  sigemptyset(&set);
+  sigaddset(&set, SIGPIPE);
+  pthread_sigmask(SIG_UNBLOCK, &set, nullptr);
+}
+
+void ExpectDefaultSigpipe() {
+  sigset_t mask;
+  pthread_sigmask(SIG_SETMASK, nullptr, &mask);
+  EXPECT_EQ(sigismember(&mask, SIGPIPE), 0);
+  struct sigaction now = {};
+  sigaction(SIGPIPE, nullptr, &now);
+  EXPECT_EQ(now.sa_handler, SIG_DFL);
+}
+
+TEST(TlsGonePeer, AWriteFails) {
+  LogCapture log;
+  TlsScriptedPeer peer({{Handshake(), CloseWithoutNotice()}});
+  const ChildResult child = RunInChild([&] {
+    DefaultSigpipe();
+    TlsSocket socket(kLoopback, peer.Port(), 5, true);
+    EXPECT_EQ(socket.Connect(), 0);
+    EXPECT_EQ(ReadSome(socket, 1).result, 0);  // the peer has closed now
+    int result = 5;
+    for (int i = 0; i < 100 && result == 5; ++i) {
+      usleep(5000);
+      result = socket.WriteData("hello", 5);
+    }
+    EXPECT_EQ(result, -1);
+    EXPECT_FALSE(socket.IsConnected());
+    ExpectDefaultSigpipe();
+    return 7;
+  });
+  EXPECT_EQ(child.code, 7) << "signal " << child.signal;
+  const auto lines = log.Lines();
+  ASSERT_THAT(lines, SizeIs(2));
+  EXPECT_THAT(lines[0], SocketLine("info", "ReadData", "Reach end of file!\n"));
+  EXPECT_THAT(lines[1], TlsLine("error", "_Write", lines[1].message));
+  EXPECT_THAT(lines[1].message, MatchesRegex("Write error .[0-9]. .error:.*.\\.\n"));
+}
+
+TEST(TlsGonePeer, ADisconnectReturns) {
+  TlsScriptedPeer peer({{Handshake(), DiscardUntilEnd()}});
+  const ChildResult child = RunInChild([&] {
+    DefaultSigpipe();
+    TlsSocket socket(kLoopback, peer.Port(), 5, true);
+    EXPECT_EQ(socket.Connect(), 0);
+    shutdown(socket.m_sockFd, SHUT_RDWR);  // the close notice meets a broken pipe
+    socket.Disconnect();
+    ExpectDefaultSigpipe();
+    return 7;
+  });
+  EXPECT_EQ(child.code, 7) << "signal " << child.signal;
+}
+
+TEST(TlsGonePeer, AHandshakeFails) {
+  ScriptedPeer peer({{ExpectEof()}});
+  const ChildResult child = RunInChild([&] {
+    DefaultSigpipe();
+    TlsSocket socket(kLoopback, peer.Port(), 5, true);
+    Faults faults;
+    faults.Before(Call::kSslConnect, [&](int) { shutdown(socket.m_sockFd, SHUT_RDWR); });
+    EXPECT_EQ(socket.Connect(), -1);
+    ExpectDefaultSigpipe();
+    return 7;
+  });
+  EXPECT_EQ(child.code, 7) << "signal " << child.signal;
+}
+
+TEST(TlsGonePeer, AReadFailsOrEnds) {
+  TlsScriptedPeer peer({{Handshake(), DiscardUntilEnd()}});
+  const ChildResult child = RunInChild([&] {
+    DefaultSigpipe();
+    TlsSocket socket(kLoopback, peer.Port(), 5, false);
+    EXPECT_EQ(socket.Connect(), 0);
+    shutdown(socket.m_sockFd, SHUT_RDWR);
+    EXPECT_LE(ReadSome(socket, 10).result, 0);
+    ExpectDefaultSigpipe();
+    return 7;
+  });
+  EXPECT_EQ(child.code, 7) << "signal " << child.signal;
+}
+
+}  // namespace

@@ -1,0 +1,92 @@
+// The owners that release what a function acquired.
+#include "tarnwick/platform/file_lock.h"
+
+#include <fcntl.h>
+#include <gtest/gtest.h>
+#include <sys/file.h>
+
+#include <cerrno>
+#include <utility>
+
+#include "tarnwick/platform/owned.h"
+#include "tests/support/faults.h"
+#include "tests/support/files.h"
+
+namespace {
+
+int OpenFile(const TempDir& folder) {
+  return open(folder.File("lock").c_str(), O_RDWR | O_CREAT | O_CLOEXEC, 0600);
+}
+
+bool CanLock(const TempDir& folder) {
+  const OwnedFd other(OpenFile(folder));
+  return flock(other.Get(), LOCK_EX | LOCK_NB) == 0;
+}
+
+TEST(FileLock, ExcludesOthersUntilTheScopeEnds) {
+  TempDir folder;
+  const OwnedFd fd(OpenFile(folder));
+  {
+    const FileLock lock(fd.Get());
+    EXPECT_TRUE(lock.Held());
+    EXPECT_FALSE(CanLock(folder));
+  }
+  EXPECT_TRUE(CanLock(folder));
+}
+
+TEST(FileLock, AnInterruptedWaitGoesOn) {
+  TempDir folder;
+  const OwnedFd fd(OpenFile(folder));
+  Faults faults;
+  faults.FailRange(Call::kFlock, 1, 3, EINTR);
+  const FileLock lock(fd.Get());
+  EXPECT_TRUE(lock.Held());
+  EXPECT_EQ(faults.Count(Call::kFlock), 4);
+}
+
+TEST(FileLock, ALockThatCannotBeHadIsNotReleased) {
+  TempDir folder;
+  const OwnedFd fd(OpenFile(folder));
+  Faults faults;
+  faults.FailNth(Call::kFlock, 1, ENOLCK);
+  {
+    const FileLock lock(fd.Get());
+    EXPECT_FALSE(lock.Held());
+  }
+  EXPECT_EQ(faults.Count(Call::kFlock), 1);
+}
+
+TEST(FileLock, ReleasingLeavesErrno) {
+  TempDir folder;
+  const OwnedFd fd(OpenFile(folder));
+  FileLock lock(fd.Get());
+  Faults faults;
+  faults.FailNth(Call::kFlock, 1, ENOLCK);
+  errno = ETIMEDOUT;
+  lock.Unlock();
+  EXPECT_EQ(errno, ETIMEDOUT);
+}
+
+TEST(OwnedFd, ClosesOnceAndLeavesErrno) {
+  TempDir folder;
+  const int fd = OpenFile(folder);
+  Faults faults;
+  faults.FailNth(Call::kClose, 1, EIO);
+  errno = ETIMEDOUT;
+  {
+    OwnedFd first(fd);
+    const OwnedFd second(std::move(first));
+    EXPECT_TRUE(second.Valid());
+  }
+  EXPECT_EQ(faults.Count(Call::kClose), 1);
+  EXPECT_EQ(errno, ETIMEDOUT);
+  close(fd);  // the failed close was not a real one
+}
+
+TEST(OwnedFd, NoDescriptorIsNotClosed) {
+  Faults faults;
+  { const OwnedFd none(-1); }
+  EXPECT_EQ(faults.Count(Call::kClose), 0);
+}
+
+}  // namespace

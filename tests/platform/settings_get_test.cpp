@@ -1,0 +1,187 @@
+// Reading a key of a settings file.
+#include <gtest/gtest.h>
+#include <sys/stat.h>
+
+#include <cerrno>
+#include <cstring>
+#include <string>
+
+#include "tarnwick/platform/qlibcfile.h"
+#include "tests/support/faults.h"
+#include "tests/support/files.h"
+#include "tests/support/process.h"
+
+namespace {
+
+// What a read of `key` from a file with this text gives.
+struct Got {
+  int result;
+  std::string value;
+};
+
+Got Get(const std::string& text, const char* key, int size = 64) {
+  TempDir folder;
+  WriteFile(folder.File("conf"), text);
+  char value[64];
+  memset(value, '#', sizeof(value));
+  const int result = QLIBCFileGetKeyValue(folder.File("conf").c_str(), key, value, size, 0);
+  return {result, result < 0 ? "" : value};
+}
+
+void ExpectGot(const std::string& text, const char* key, const std::string& expected) {
+  SCOPED_TRACE(text);
+  const Got got = Get(text, key);
+  EXPECT_EQ(got.result, static_cast<int>(expected.size()));
+  EXPECT_EQ(got.value, expected);
+}
+
+TEST(GetKeyValue, GivesTheLengthAndTheTextBetweenTheQuotes) {
+  ExpectGot("first=\"1\"\nname=\"value\"\nlast=\"2\"\n", "name", "value");
+}
+
+TEST(GetKeyValue, AMissingKeyGivesZeroAndAnEmptyText) {
+  ExpectGot("other=\"x\"\n", "name", "");
+  ExpectGot("", "name", "");
+}
+
+TEST(GetKeyValue, AnEmptyValueGivesZeroAndAnEmptyText) {
+  ExpectGot("name=\"\"\n", "name", "");
+  ExpectGot("name=\n", "name", "");
+}
+
+TEST(GetKeyValue, AKeyThatBeginsOrEndsAnotherIsNotThatKey) {
+  ExpectGot("names=\"x\"\nmy_name=\"y\"\nname=\"z\"\n", "name", "z");
+  ExpectGot("Name=\"x\"\n", "name", "");
+}
+
+TEST(GetKeyValue, TheFirstOfSeveralLinesCounts) {
+  ExpectGot("name=\"1\"\nname=\"2\"\n", "name", "1");
+}
+
+TEST(GetKeyValue, BlanksAroundTheKeyAndTheValueDoNotCount) {
+  ExpectGot(" \tname \t= \"value\" \n", "name", "value");
+}
+
+TEST(GetKeyValue, BlanksInsideTheQuotesCount) {
+  ExpectGot("name=\" a b \"\n", "name", " a b ");
+}
+
+TEST(GetKeyValue, AValueWithoutQuotesIsAccepted) {
+  ExpectGot("name=value\n", "name", "value");
+}
+
+TEST(GetKeyValue, ACarriageReturnBeforeTheLineEndDoesNotCount) {
+  ExpectGot("name=\"value\"\r\n", "name", "value");
+}
+
+TEST(GetKeyValue, AValueMayHoldQuotesAndEqualsSigns) {
+  ExpectGot("name=\"a\"b=c\"\n", "name", "a\"b=c");
+}
+
+TEST(GetKeyValue, ALastLineWithoutItsEndCounts) {
+  ExpectGot("other=\"x\"\nname=\"value\"", "name", "value");
+}
+
+TEST(GetKeyValue, ACommentIsNotAKey) {
+  ExpectGot("#name=\"x\"\n# name=\"y\"\nname=\"z\"\n", "name", "z");
+}
+
+TEST(GetKeyValue, LinesOfAnyOtherShapeAreSkipped) {
+  ExpectGot("name\n\n[section]\n=\"x\"\nname: y\nname=\"z\"\n", "name", "z");
+}
+
+TEST(GetKeyValue, ASmallBufferGetsTheStartAndTheWholeLengthIsToldToTheCaller) {
+  const Got got = Get("name=\"value\"\n", "name", 4);
+  EXPECT_EQ(got.result, 5);
+  EXPECT_EQ(got.value, "val");
+}
+
+TEST(GetKeyValue, ABufferOfOneByteGetsTheZeroByteAlone) {
+  const Got got = Get("name=\"value\"\n", "name", 1);
+  EXPECT_EQ(got.result, 5);
+  EXPECT_EQ(got.value, "");
+}
+
+TEST(GetKeyValue, NothingIsStoredBehindTheBuffer) {
+  TempDir folder;
+  WriteFile(folder.File("conf"), "name=\"value\"\n");
+  char value[8] = "#######";
+  QLIBCFileGetKeyValue(folder.File("conf").c_str(), "name", value, 4, 0);
+  EXPECT_EQ(std::string(value, sizeof(value)), std::string("val\0###\0", 8));
+}
+
+TEST(GetKeyValue, TheFlagsChangeNothing) {
+  TempDir folder;
+  WriteFile(folder.File("conf"), "name=\"value\"\n");
+  for (const int flags : {0, 1, -1}) {
+    char value[8];
+    EXPECT_EQ(QLIBCFileGetKeyValue(folder.File("conf").c_str(), "name", value, 8, flags), 5);
+  }
+}
+
+TEST(GetKeyValue, AMissingFileGivesMinusOneAndLeavesTheBufferAlone) {
+  TempDir folder;
+  char value[8] = "before";
+  errno = 0;
+  EXPECT_EQ(QLIBCFileGetKeyValue(folder.File("none").c_str(), "name", value, 8, 0), -1);
+  EXPECT_EQ(errno, ENOENT);
+  EXPECT_STREQ(value, "before");
+}
+
+TEST(GetKeyValue, AFolderInPlaceOfTheFileGivesMinusOne) {
+  TempDir folder;
+  char value[8] = "before";
+  EXPECT_EQ(QLIBCFileGetKeyValue(folder.Path().c_str(), "name", value, 8, 0), -1);
+  EXPECT_STREQ(value, "before");
+}
+
+TEST(GetKeyValue, ArgumentsThatAreNullEmptyOrNotPositiveAreRefused) {
+  TempDir folder;
+  WriteFile(folder.File("conf"), "name=\"value\"\n");
+  const std::string path = folder.File("conf");
+  char value[8] = "before";
+  errno = 0;
+  EXPECT_EQ(QLIBCFileGetKeyValue(nullptr, "name", value, 8, 0), -1);
+  EXPECT_EQ(errno, EINVAL);
+  EXPECT_EQ(QLIBCFileGetKeyValue(path.c_str(), nullptr, value, 8, 0), -1);
+  EXPECT_EQ(QLIBCFileGetKeyValue(path.c_str(), "", value, 8, 0), -1);
+  EXPECT_EQ(QLIBCFileGetKeyValue(path.c_str(), "name", nullptr, 8, 0), -1);
+  EXPECT_EQ(QLIBCFileGetKeyValue(path.c_str(), "name", value, 0, 0), -1);
+  EXPECT_EQ(QLIBCFileGetKeyValue(path.c_str(), "name", value, -1, 0), -1);
+  EXPECT_STREQ(value, "before");
+}
+
+TEST(GetKeyValue, AFileOfSeveralReadsIsReadWhole) {
+  std::string text;
+  for (int i = 0; i < 5000; ++i) text += "filler" + std::to_string(i) + "=\"x\"\n";
+  ExpectGot(text + "name=\"value\"\n", "name", "value");
+}
+
+TEST(GetKeyValue, ShortAndInterruptedReadsAreContinued) {
+  TempDir folder;
+  WriteFile(folder.File("conf"), "other=\"x\"\nname=\"value\"\n");
+  Faults faults;
+  faults.Limit(Call::kRead, 1).FailNth(Call::kRead, 2, EINTR);
+  char value[8];
+  EXPECT_EQ(QLIBCFileGetKeyValue(folder.File("conf").c_str(), "name", value, 8, 0), 5);
+  EXPECT_STREQ(value, "value");
+}
+
+TEST(GetKeyValue, EachSystemCallMayFailAndNothingIsLeftBehind) {
+  TempDir folder;
+  WriteFile(folder.File("conf"), "name=\"value\"\n");
+  DescriptorGuard descriptors;
+  for (const Call call : {Call::kOpen, Call::kRead}) {
+    const int runs = ForEachFailingCall(call, [&](Faults& faults) {
+      char value[8] = "before";
+      errno = 0;
+      const int result = QLIBCFileGetKeyValue(folder.File("conf").c_str(), "name", value, 8, 0);
+      EXPECT_EQ(result, faults.Struck() ? -1 : 5);
+      EXPECT_STREQ(value, faults.Struck() ? "before" : "value");
+      EXPECT_NE(faults.Struck() && errno == 0, true);
+    });
+    EXPECT_GE(runs, 1);
+  }
+}
+
+}  // namespace
