@@ -34,9 +34,9 @@ bool ReadAll(int fd, std::string* text) {
 bool WriteAll(int fd, std::string_view text) {
   while (!text.empty()) {
     const ssize_t count = write(fd, text.data(), text.size());
-    if (count >= 0) {
+    if (count > 0) {
       text.remove_prefix(static_cast<size_t>(count));
-    } else if (errno != EINTR) {
+    } else if (count == 0 || errno != EINTR) {
       return false;
     }
   }
@@ -81,10 +81,12 @@ bool ReplaceFile(const std::string& path, const OldFile& old, std::string_view t
 }
 
 // The file behind symbolic links, so that the rename replaces the file and not the link. A path
-// that does not exist yet stays as it is.
+// that does not exist yet stays as it is. Results: empty for a link to nowhere.
 std::string ResolvePath(const char* path) {
   const OwnedMemory<char> real(realpath(path, nullptr));
-  return real ? real.get() : path;
+  if (real) return real.get();
+  struct stat attributes;
+  return lstat(path, &attributes) == 0 ? "" : path;
 }
 
 std::string FolderOf(const std::string& path) {
@@ -138,5 +140,6 @@ __attribute__((weak)) int QLIBCFileSetKeyValue(const char* path, const char* key
   if (strchr(value, '\n') != nullptr || !FormatSettingsLine(format, key, value, &line)) {
     return Refuse();
   }
-  return RewriteKey(ResolvePath(path), key, line) ? 0 : -1;
+  const std::string file = ResolvePath(path);
+  return !file.empty() && RewriteKey(file, key, line) ? 0 : -1;
 }

@@ -4,8 +4,10 @@
 // are accepted when reading; lines that start with "#" and lines of any other shape are left alone.
 // When a key stands on several lines, the first one is meant.
 //
-// libtarnwick brings a stand-alone version of both. They are weak symbols: a product that links its
-// own functions of these names, into the program or from an archive, replaces them.
+// libtarnwick brings a stand-alone version of both. They are weak symbols: a program that has
+// functions of these names in its own objects replaces them, whether it links the shared library or
+// the archive. Functions that stand in another archive must be pulled into the program, with
+// --whole-archive for example, because a linker does not look for what it has already.
 #ifndef TARNWICK_PLATFORM_QLIBCFILE_H_
 #define TARNWICK_PLATFORM_QLIBCFILE_H_
 

@@ -131,6 +131,14 @@ TEST(SendHttpGet, AReplyCutAtEveryByteHasADocumentedResult) {
   }
 }
 
+TEST(SendHttpGet, ItReadsAhead) {
+  ScriptedPeer peer({Exchange(Ok("{\"success\":true}"))});
+  Json::Value result;
+  Faults faults;
+  EXPECT_EQ(SendHttpGet("127.0.0.1", peer.Port(), "api", result, 5, false), 0);
+  EXPECT_EQ(faults.Sizes(Call::kRead).front(), 64512u);
+}
+
 TEST(SendHttpGet, AReplyByteByByteIsReadWhole) {
   ScriptedPeer peer({ExchangeByteByByte(Ok("{\"success\":true}"))});
   Json::Value result;
@@ -301,12 +309,12 @@ TEST(SendHttpsGet, AMissingHandleGivesMinusOne) {
 // The n-th call fails.
 
 TEST(SendHttpGetFaults, WhicheverSystemCallFailsTheResultIsDocumentedAndNothingIsLeft) {
+  const DescriptorGuard guard;
   ReplyServer server(Ok("{\"success\":true}"));
   const Call calls[] = {Call::kSocket, Call::kGetaddrinfo, Call::kFcntl,         Call::kConnect,
                         Call::kSelect, Call::kGetsockopt,  Call::kSetsockopt,    Call::kIoctl,
                         Call::kWrite,  Call::kRead,        Call::kPthreadSigmask};
   for (const Call call : calls) {
-    const DescriptorGuard guard;
     ForEachFailingCall(call, [&](Faults& faults) {
       Json::Value result;
       const int code = SendHttpGet("127.0.0.1", server.Port(), "api", result, 5, false);
@@ -329,9 +337,9 @@ TEST(SendHttpGetFaults, AFailingSocketLookupConnectWriteOrReadFailsTheCall) {
 }
 
 TEST(SendHttpGetFaults, WhicheverAllocationFailsTheResultIsDocumentedAndNothingIsThrown) {
+  const DescriptorGuard guard;
   ReplyServer server(Ok("{\"success\":true}"));
   for (const Call call : {Call::kMalloc, Call::kCalloc, Call::kRealloc, Call::kStrdup}) {
-    const DescriptorGuard guard;
     ForEachFailingCall(call, [&](Faults& faults) {
       Json::Value result;
       int code = 1;

@@ -267,9 +267,9 @@ TEST(SendRequestByPost, TheBodyOfTheReplyIsThrownAway) {
 }
 
 TEST(SendRequestByPost, EachFailingCallOfLibcurlIsAnIoErrorAndReleasesTheHandle) {
+  const DescriptorGuard guard;
   ReplyServer server(kOk);
   for (const Call call : {Call::kCurlEasySetopt, Call::kCurlEasyPerform, Call::kCurlEasyGetinfo}) {
-    const DescriptorGuard guard;
     ForEachFailingCall(call, [&](Faults& faults) {
       ClientProbe client(server.Port(), {"x"});
       const int result = client.SendRequestByPost("?");

@@ -230,42 +230,47 @@ TEST(SendRequestByGetBadInput, PercentSignsInThePathAreNoFormat) {
   EXPECT_THAT(RequestOf({"%s%n%d"}), ::testing::StartsWith("GET /%s%n%d HTTP/1.0\r\n"));
 }
 
+namespace {
+
+constexpr struct {
+  const char* path;
+  const char* keep;
+  const char* encoded;
+} kPaths[] = {
+    {"cgi/a.cgi?name=a b&x=1/2", "", "cgi/a.cgi?name=a%20b&x=1%2F2"},
+    {"cgi/a.cgi?name=a b&x=1/2", "/", "cgi/a.cgi?name=a%20b&x=1/2"},
+    {"", "", ""},
+    {"p", "", "p"},
+    {"a b=c d", "", "a b=c d"},
+    {"p?", "", "p?"},
+    {"p?x y", "", "p?x y"},
+    {"p?x y&a=1 2", "", "p?x y&a=1%202"},
+    {"p?a=", "", "p?a="},
+    {"p?a=&b=", "", "p?a=&b="},
+    {"p?a=&b=x y", "", "p?a=&b=x%20y"},
+    {"p?=v w", "", "p?=v w"},
+    {"p?=v=w x", "", "p?=v=w%20x"},
+    {"p?a=1&=2 3", "", "p?a=1&=2%203"},
+    {"p?a=1&", "", "p?a=1&"},
+    {"p?a=1&&b=2 3", "", "p?a=1&&b=2%203"},
+    {"p?a=1 2&b c", "", "p?a=1%202&b c"},
+    {"p?a b=1", "", "p?a b=1"},
+    {"p?a=b=c", "", "p?a=b%3Dc"},
+    {"p?a=b=c", "=", "p?a=b=c"},
+    {"p?a=b?c", "", "p?a=b%3Fc"},
+    {"p?a=b?c", "?", "p?a=b?c"},
+    {"p?a=100%", "", "p?a=100%25"},
+    {"p?a=100%", "%", "p?a=100%"},
+    {"p?a=x\ty\nz", "\t\n ", "p?a=x%20y%20z"},
+    {"p?a=\xc3\xa4", "", "p?a=%C3%A4"},
+    {"p?a=_~()*,-.", "", "p?a=_~()*,-."},
+    {"?a= ", "", "?a=%20"},
+};
+
+}  // namespace
+
 TEST(EncodeQueryValues, TheTableOfPaths) {
-  const struct {
-    const char* path;
-    const char* keep;
-    const char* encoded;
-  } table[] = {
-      {"cgi/a.cgi?name=a b&x=1/2", "", "cgi/a.cgi?name=a%20b&x=1%2F2"},
-      {"cgi/a.cgi?name=a b&x=1/2", "/", "cgi/a.cgi?name=a%20b&x=1/2"},
-      {"", "", ""},
-      {"p", "", "p"},
-      {"a b=c d", "", "a b=c d"},
-      {"p?", "", "p?"},
-      {"p?x y", "", "p?x y"},
-      {"p?x y&a=1 2", "", "p?x y&a=1%202"},
-      {"p?a=", "", "p?a="},
-      {"p?a=&b=", "", "p?a=&b="},
-      {"p?a=&b=x y", "", "p?a=&b=x%20y"},
-      {"p?=v w", "", "p?=v w"},
-      {"p?=v=w x", "", "p?=v=w%20x"},
-      {"p?a=1&=2 3", "", "p?a=1&=2%203"},
-      {"p?a=1&", "", "p?a=1&"},
-      {"p?a=1&&b=2 3", "", "p?a=1&&b=2%203"},
-      {"p?a=1 2&b c", "", "p?a=1%202&b c"},
-      {"p?a b=1", "", "p?a b=1"},
-      {"p?a=b=c", "", "p?a=b%3Dc"},
-      {"p?a=b=c", "=", "p?a=b=c"},
-      {"p?a=b?c", "", "p?a=b%3Fc"},
-      {"p?a=b?c", "?", "p?a=b?c"},
-      {"p?a=100%", "", "p?a=100%25"},
-      {"p?a=100%", "%", "p?a=100%"},
-      {"p?a=x\ty\nz", "\t\n ", "p?a=x%20y%20z"},
-      {"p?a=\xc3\xa4", "", "p?a=%C3%A4"},
-      {"p?a=_~()*,-.", "", "p?a=_~()*,-."},
-      {"?a= ", "", "?a=%20"},
-  };
-  for (const auto& row : table) {
+  for (const auto& row : kPaths) {
     EXPECT_EQ(EncodeQueryValues(row.path, row.keep), row.encoded) << row.path;
   }
 }

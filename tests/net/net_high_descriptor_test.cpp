@@ -107,17 +107,20 @@ TEST_F(HighDescriptor, ARepeatedWaitHasItsSetsAnew) {
 TEST_F(HighDescriptor, NoMemoryForTheSetsFailsAWait) {
   PairedSocket socket(5, true);
   socket.PeerSends("x");
+  int failures = 0;
   for (const Call call : {Call::kMalloc, Call::kCalloc}) {
-    ForEachFailingCall(call, [&](Faults& faults) {
+    failures += ForEachFailingCall(call, [&](Faults& faults) {
       const int result = socket.DoSelect(TWSocket::SELECT_READ);
       EXPECT_EQ(result < 0, faults.Struck());
     });
   }
+  EXPECT_EQ(failures, 2);  // one for each of the two sets
 }
 
 TEST_F(HighDescriptor, NoMemoryForTheSetsFailsAConnect) {
+  int failures = 0;
   for (const Call call : {Call::kMalloc, Call::kCalloc}) {
-    ForEachFailingCall(call, [&](Faults& faults) {
+    failures += ForEachFailingCall(call, [&](Faults& faults) {
       int port = 0;
       const int listener = BindLoopback(&port);
       listen(listener, 1);
@@ -128,6 +131,7 @@ TEST_F(HighDescriptor, NoMemoryForTheSetsFailsAConnect) {
       close(listener);
     });
   }
+  EXPECT_EQ(failures, 2);  // one for each of the two sets
 }
 
 }  // namespace

@@ -6,10 +6,12 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <sys/socket.h>
+#include <sys/time.h>
 #include <unistd.h>
 
 #include <cerrno>
 #include <chrono>
+#include <csignal>
 #include <cstdint>
 #include <string>
 #include <utility>
@@ -237,6 +239,37 @@ class Stopwatch {
  private:
   std::chrono::steady_clock::time_point start_ = std::chrono::steady_clock::now();
 };
+
+// Sends the process a signal every 50 milliseconds. Its handler does nothing and does not restart
+// system calls.
+class SignalStorm {
+ public:
+  SignalStorm() {
+    struct sigaction action = {};
+    action.sa_handler = [](int) {};
+    sigaction(SIGALRM, &action, &before_);
+    const struct itimerval often = {{0, 50000}, {0, 50000}};
+    setitimer(ITIMER_REAL, &often, nullptr);
+  }
+  ~SignalStorm() {
+    const struct itimerval never = {};
+    setitimer(ITIMER_REAL, &never, nullptr);
+    sigaction(SIGALRM, &before_, nullptr);
+  }
+  SignalStorm(const SignalStorm&) = delete;
+  SignalStorm& operator=(const SignalStorm&) = delete;
+
+ private:
+  struct sigaction before_ = {};
+};
+
+// The value of a socket option that is a number.
+inline int SocketOption(int fd, int level, int name) {
+  int value = -1;
+  socklen_t length = sizeof(value);
+  EXPECT_EQ(getsockopt(fd, level, name, &value, &length), 0);
+  return value;
+}
 
 // A log line of the two sources.
 inline auto SocketLine(const char* level, const char* function, const std::string& message) {

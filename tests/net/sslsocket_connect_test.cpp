@@ -81,6 +81,15 @@ TEST(TlsConnect, DoesNotAskWhoAnswers) {
   }
 }
 
+TEST(TlsConnect, DoesNotNameTheServerItWants) {
+  ScriptedPeer peer({{ExpectBytes(200), Reset()}});
+  TlsSocket socket("localhost", peer.Port(), 5, true);
+  EXPECT_EQ(socket.Connect(), -1);
+  const std::string hello = peer.Received(0);
+  EXPECT_EQ(hello.substr(0, 2), "\x16\x03");  // it is the client's first message
+  EXPECT_EQ(hello.find("localhost"), std::string::npos);
+}
+
 TEST(TlsConnect, NegotiatesTheProtocol) {
   TlsScriptedPeer peer({{Send("old"), ExpectEof()}}, {false, false, TLS1_2_VERSION});
   TlsSocket socket(kLoopback, peer.Port(), 5, true);

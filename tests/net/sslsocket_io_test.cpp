@@ -24,7 +24,7 @@ using ::testing::SizeIs;
 constexpr char kLoopback[] = "127.0.0.1";
 const char kReadWaitFailed[] = "Select read op error.\n";
 
-// A connected TLS socket and its peer. The peer has sent a first byte and the socket has read it, so
+// A connected TLS socket and its peer. The peer has sent a byte and the socket has read it, so
 // that the session tickets, which no test asks about, are out of the way when the script begins.
 struct TlsPair {
   TlsPair(Script script, int timeout, bool buffered, PeerOptions options = {})

@@ -91,13 +91,6 @@ TEST(ConnectEdges, AConnectionThatIsRefusedAtOnceIsLoggedAsConnected) {
                           SocketLine("info", "ConnectSocket", "Socket connect timeout (5)\n")));
 }
 
-int Option(int fd, int level, int name) {
-  int value = -1;
-  socklen_t length = sizeof(value);
-  EXPECT_EQ(getsockopt(fd, level, name, &value, &length), 0);
-  return value;
-}
-
 TEST(ConnectEdges, KeepAliveWithEnableZeroIsSwitchedOffWithoutTouchingTheThreeOptions) {
   ScriptedPeer peer({{ExpectEof()}});
   PlainSocket socket("127.0.0.1", peer.Port(), 5, true);
@@ -108,10 +101,10 @@ TEST(ConnectEdges, KeepAliveWithEnableZeroIsSwitchedOffWithoutTouchingTheThreeOp
     EXPECT_EQ(socket.SetKeepAliveOpt(0, 21, 22, 23), 0);
     EXPECT_EQ(faults.Count(Call::kSetsockopt), 1);
   }
-  EXPECT_EQ(Option(socket.m_sockFd, SOL_SOCKET, SO_KEEPALIVE), 0);
-  EXPECT_EQ(Option(socket.m_sockFd, IPPROTO_TCP, TCP_KEEPIDLE), 11);
-  EXPECT_EQ(Option(socket.m_sockFd, IPPROTO_TCP, TCP_KEEPINTVL), 12);
-  EXPECT_EQ(Option(socket.m_sockFd, IPPROTO_TCP, TCP_KEEPCNT), 13);
+  EXPECT_EQ(SocketOption(socket.m_sockFd, SOL_SOCKET, SO_KEEPALIVE), 0);
+  EXPECT_EQ(SocketOption(socket.m_sockFd, IPPROTO_TCP, TCP_KEEPIDLE), 11);
+  EXPECT_EQ(SocketOption(socket.m_sockFd, IPPROTO_TCP, TCP_KEEPINTVL), 12);
+  EXPECT_EQ(SocketOption(socket.m_sockFd, IPPROTO_TCP, TCP_KEEPCNT), 13);
   socket.Disconnect();
 }
 

@@ -4,10 +4,6 @@
 #include <netinet/in.h>
 #include <netinet/tcp.h>
 #include <sys/mount.h>
-#include <sys/time.h>
-
-#include <csignal>
-#include <memory>
 
 #include "tarnwick/log/twdebuglog.h"
 #include "tests/net/net_test_util.h"
@@ -309,27 +305,6 @@ TEST(ConnectWithTimeout, GivesUpAfterTheTimeOut) {
   EXPECT_THAT(log.Lines(), StepAndSummary("info", "Socket connect timeout.\n", 1));
 }
 
-// Sends the process a signal every 50 milliseconds whose handler does nothing and does not restart
-// system calls.
-class SignalStorm {
- public:
-  SignalStorm() {
-    struct sigaction action = {};
-    action.sa_handler = [](int) {};
-    sigaction(SIGALRM, &action, &before_);
-    const struct itimerval often = {{0, 50000}, {0, 50000}};
-    setitimer(ITIMER_REAL, &often, nullptr);
-  }
-  ~SignalStorm() {
-    const struct itimerval never = {};
-    setitimer(ITIMER_REAL, &never, nullptr);
-    sigaction(SIGALRM, &before_, nullptr);
-  }
-
- private:
-  struct sigaction before_ = {};
-};
-
 TEST(ConnectWithTimeout, SignalsNeitherEndNorProlongTheWait) {
   LogCapture log;
   const BlackHolePort hole;
@@ -493,13 +468,6 @@ TEST(ConnectWithTimeout, LogsItsErrorsAtTheDefaultLevelAndItsInformationNot) {
   EXPECT_THAT(log.Messages(), ElementsAre("Invalid parameters!\n"));
 }
 
-int Option(int fd, int level, int name) {
-  int value = -1;
-  socklen_t length = sizeof(value);
-  EXPECT_EQ(getsockopt(fd, level, name, &value, &length), 0);
-  return value;
-}
-
 // A TCP socket that is not connected: options can be set on it as well.
 class TcpSocket : public PlainSocket {
  public:
@@ -510,10 +478,10 @@ TEST(SetKeepAliveOpt, SetsAllFourOptions) {
   LogCapture log;
   TcpSocket socket;
   EXPECT_EQ(socket.SetKeepAliveOpt(1, 31, 32, 33), 0);
-  EXPECT_EQ(Option(socket.m_sockFd, SOL_SOCKET, SO_KEEPALIVE), 1);
-  EXPECT_EQ(Option(socket.m_sockFd, IPPROTO_TCP, TCP_KEEPIDLE), 31);
-  EXPECT_EQ(Option(socket.m_sockFd, IPPROTO_TCP, TCP_KEEPINTVL), 32);
-  EXPECT_EQ(Option(socket.m_sockFd, IPPROTO_TCP, TCP_KEEPCNT), 33);
+  EXPECT_EQ(SocketOption(socket.m_sockFd, SOL_SOCKET, SO_KEEPALIVE), 1);
+  EXPECT_EQ(SocketOption(socket.m_sockFd, IPPROTO_TCP, TCP_KEEPIDLE), 31);
+  EXPECT_EQ(SocketOption(socket.m_sockFd, IPPROTO_TCP, TCP_KEEPINTVL), 32);
+  EXPECT_EQ(SocketOption(socket.m_sockFd, IPPROTO_TCP, TCP_KEEPCNT), 33);
   EXPECT_THAT(log.Lines(), IsEmpty());
 }
 
@@ -529,9 +497,9 @@ TEST(SetKeepAliveOpt, EachRefusedOptionHasItsLineAndEndsTheCall) {
     EXPECT_THAT(log.Lines(), ElementsAre(SocketLine(
                                  "info", "SetKeepAliveOpt",
                                  std::string("Failed to set ") + messages[n - 1] + " option.\n")));
-    EXPECT_EQ(Option(socket.m_sockFd, SOL_SOCKET, SO_KEEPALIVE), n > 1 ? 1 : 0);
-    EXPECT_EQ(Option(socket.m_sockFd, IPPROTO_TCP, TCP_KEEPIDLE) == 31, n > 2);
-    EXPECT_EQ(Option(socket.m_sockFd, IPPROTO_TCP, TCP_KEEPINTVL) == 32, n > 3);
+    EXPECT_EQ(SocketOption(socket.m_sockFd, SOL_SOCKET, SO_KEEPALIVE), n > 1 ? 1 : 0);
+    EXPECT_EQ(SocketOption(socket.m_sockFd, IPPROTO_TCP, TCP_KEEPIDLE) == 31, n > 2);
+    EXPECT_EQ(SocketOption(socket.m_sockFd, IPPROTO_TCP, TCP_KEEPINTVL) == 32, n > 3);
   }
 }
 

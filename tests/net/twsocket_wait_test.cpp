@@ -1,9 +1,7 @@
 // The wait before each read and write, and the probe for readiness.
 #include <arpa/inet.h>
 #include <netinet/in.h>
-#include <sys/time.h>
 
-#include <csignal>
 #include <thread>
 
 #include "tests/net/net_test_util.h"
@@ -98,26 +96,6 @@ TEST(DoSelect, LogsEachInterruptionAndGoesOn) {
       SocketLine("info", "DoSelect", "Got EINTR while select socket [" + Fd(socket) + "].\n");
   EXPECT_THAT(log.Lines(), ElementsAre(line, line));
 }
-
-// Sends the process a signal every 100 milliseconds, without restarted system calls.
-class SignalStorm {
- public:
-  SignalStorm() {
-    struct sigaction action = {};
-    action.sa_handler = [](int) {};
-    sigaction(SIGALRM, &action, &before_);
-    const struct itimerval often = {{0, 100000}, {0, 100000}};
-    setitimer(ITIMER_REAL, &often, nullptr);
-  }
-  ~SignalStorm() {
-    const struct itimerval never = {};
-    setitimer(ITIMER_REAL, &never, nullptr);
-    sigaction(SIGALRM, &before_, nullptr);
-  }
-
- private:
-  struct sigaction before_ = {};
-};
 
 TEST(DoSelect, SignalsDoNotProlongTheWait) {
   LogCapture log;

@@ -181,6 +181,16 @@ TEST_F(SetKeyValue, ASymbolicLinkStaysALink) {
   EXPECT_EQ(ReadFile(folder_.File("real")), "name=\"new\"\n");
 }
 
+TEST_F(SetKeyValue, ALinkToNowhereIsRefusedAndStays) {
+  ASSERT_EQ(symlink("nowhere", Path().c_str()), 0);
+  errno = 0;
+  EXPECT_EQ(Set("name", "new"), -1);
+  EXPECT_EQ(errno, ENOENT);
+  struct stat status = {};
+  ASSERT_EQ(lstat(Path().c_str(), &status), 0);
+  EXPECT_TRUE(S_ISLNK(status.st_mode));
+}
+
 TEST_F(SetKeyValue, AMissingFolderGivesMinusOne) {
   errno = 0;
   EXPECT_EQ(QLIBCFileSetKeyValue(folder_.File("none/conf").c_str(), "name", "v", kFormat), -1);

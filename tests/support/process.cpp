@@ -63,7 +63,6 @@ std::string Drain(int fd, steady_clock::time_point deadline) {
   for (const std::string& word : command) argv.push_back(const_cast<char*>(word.c_str()));
   argv.push_back(nullptr);
   dup2(output, STDOUT_FILENO);
-  dup2(output, STDERR_FILENO);
   execv(argv[0], argv.data());
   _exit(127);
 }

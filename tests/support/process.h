@@ -40,7 +40,8 @@ class Child {
 ChildResult RunInChild(const std::function<int()>& body,
                        std::chrono::milliseconds limit = std::chrono::seconds(60));
 
-// Runs a program and waits for it; `output` receives what it writes to standard output and error.
+// Runs a program and waits for it; `output` receives what it writes to standard output. Its error
+// output is the test's own, because the sanitizers and the coverage counters write there too.
 ChildResult RunProgram(const std::vector<std::string>& command, std::string* output = nullptr,
                        std::chrono::milliseconds limit = std::chrono::seconds(60));
 
