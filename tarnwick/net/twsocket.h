@@ -104,8 +104,8 @@ class TARNWICK_API TWSocket {
 
   // Writes `len` bytes.
   //
-  // Results: the bytes written, fewer than `len` after an error; -1 when there is nothing to write,
-  //   no descriptor, or the write failed, which clears IsConnected().
+  // Results: the bytes written: fewer than `len`, and 0 too, when a plain connection failed; -1 when
+  //   there is nothing to write or no descriptor, and when TLS failed, which clears IsConnected().
   // Blocks without a limit while the peer takes nothing.
   int WriteData(const char* buf, int len);
 

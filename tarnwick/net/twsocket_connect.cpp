@@ -6,6 +6,7 @@
 #include <netinet/in.h>
 #include <sys/socket.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <cstring>
 #include <memory>
@@ -26,13 +27,15 @@ struct AddressListDeleter {
 };
 using AddressList = std::unique_ptr<struct addrinfo, AddressListDeleter>;
 
-AddressList LookUp(const std::string& host, int port) {
+// Results: false when the look-up failed. A look-up that succeeds may still give no address.
+bool LookUp(const std::string& host, int port, AddressList* addresses) {
   struct addrinfo hints = {};
   hints.ai_family = AF_INET;
   hints.ai_socktype = SOCK_STREAM;
   struct addrinfo* list = nullptr;
-  if (getaddrinfo(host.c_str(), IntToString(port).c_str(), &hints, &list) != 0) return nullptr;
-  return AddressList(list);
+  if (getaddrinfo(host.c_str(), IntToString(port).c_str(), &hints, &list) != 0) return false;
+  addresses->reset(list);
+  return true;
 }
 
 // Why a connect with a time-out did not succeed, with the error number behind it.
@@ -96,7 +99,8 @@ bool TWSocket::ConnectWithTimeout(const struct addrinfo* address) {
     TW_LOG(LOG_CATEG_SOCKET, LOG_LEVEL_ERROR, "Invalid parameters!\n");
     return false;
   }
-  const int flags = fcntl(m_sockFd, F_GETFL);
+  // A new socket has no flags, should they not be readable.
+  const int flags = std::max(fcntl(m_sockFd, F_GETFL), 0);
   if (fcntl(m_sockFd, F_SETFL, flags | O_NONBLOCK) == -1) {
     TW_LOG(LOG_CATEG_SOCKET, LOG_LEVEL_ERROR, "Set nonblock flag failed.\n");
   }
@@ -143,13 +147,13 @@ int TWSocket::ConnectSocket() {
   if (m_srcAddr != 0 && BindRemoteAddr() != 0) {
     TW_LOG(LOG_CATEG_SOCKET, LOG_LEVEL_INFO, "Failed to bind src ip, ignore it.\n");
   }
-  const AddressList addresses = LookUp(m_strHost, m_port);
-  if (!addresses) {
+  AddressList addresses;
+  if (!LookUp(m_strHost, m_port, &addresses)) {
     TW_LOG(LOG_CATEG_SOCKET, LOG_LEVEL_INFO, "Scoket getaddrinfo incomplete.\n");
     return -1;
   }
   if (m_timeout < 0) {
-    m_bConnected = connect(m_sockFd, addresses->ai_addr, addresses->ai_addrlen) == 0;
+    m_bConnected = addresses && connect(m_sockFd, addresses->ai_addr, addresses->ai_addrlen) == 0;
     if (!m_bConnected) TW_LOG(LOG_CATEG_SOCKET, LOG_LEVEL_INFO, "Socket connect failed.\n");
   } else {
     m_bConnected = ConnectWithTimeout(addresses.get());

@@ -12,7 +12,7 @@
 #include "tests/support/process.h"
 
 // Calls `done` until it is true; false, with a failed test, when that takes longer than `seconds`.
-bool WaitUntilTrue(const char* what, const std::function<bool()>& done, int seconds = 15);
+bool WaitUntilTrue(const char* what, const std::function<bool()>& done, int seconds = 10);
 
 class ServerProcess {
  public:

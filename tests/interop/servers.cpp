@@ -60,7 +60,7 @@ WebServer& Lighttpd() {
         std::make_unique<WebServer>(WebServerSetup{"lighttpd",
                                                    {"/usr/sbin/lighttpd", "-D", "-f", "@CONFIG@"},
                                                    {"lighttpd.conf"},
-                                                   {"PORT", "TLS_PORT", "LENIENT_PORT"},
+                                                   {"PORT", "TLS_PORT"},
                                                    {}});
   }
   return *g_lighttpd;
