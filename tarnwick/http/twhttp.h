@@ -344,7 +344,7 @@ class TARNWICK_API TWHttpClient {
 // Results: 0 when the reply is JSON whose member "success" is true; -1 when the request, the
 //   status, a read or an empty body made it fail; -2 when the body is no JSON, or "success" is
 //   missing or not true, and `result` may then hold a part of the reply.
-// Throws nothing but std::bad_alloc.
+// Throws nothing; so the other two.
 TARNWICK_API int SendHttpGet(const std::string& host, int port, std::string path,
                              Json::Value& result, int timeout, bool encodeQuery);
 

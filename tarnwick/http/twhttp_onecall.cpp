@@ -2,6 +2,7 @@
 #define TW_LOG_SOURCE "twhttp"
 
 #include <cerrno>
+#include <exception>
 
 #include "tarnwick/http/json_reply.h"
 #include "tarnwick/http/twhttp.h"
@@ -11,6 +12,8 @@
 namespace {
 
 constexpr char kSendHttpGet[] = "SendHttpGet";
+constexpr char kSendHttpPost[] = "SendHttpPost";
+constexpr char kSendHttpsGet[] = "SendHttpsGet";
 
 // Sends the request and checks its status.
 bool Fetch(TWHttpClient* client) {
@@ -39,52 +42,79 @@ bool ReadBody(TWHttpClient* client, std::string* body) {
   return false;
 }
 
-}  // namespace
-
-int SendHttpGet(const std::string& host, int port, std::string path, Json::Value& result,
-                int timeout, bool encodeQuery) {
+int GetJson(const std::string& host, int port, std::string path, Json::Value& result, int timeout,
+            bool encodeQuery) {
   if (!encodeQuery) RemoveChar(path, '\n');
   TWHttpClient client(host, port, path, "", "", timeout, false, true, encodeQuery, true,
                       HTTP_VERSION_NONE, "");
   std::string body;
   if (!Fetch(&client) || !ReadBody(&client, &body)) return -1;
   if (body.empty()) {
-    TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_ERROR, "Read Buffer Error\n");
+    TW_LOG_AS(kSendHttpGet, LOG_CATEG_HTTP, LOG_LEVEL_ERROR, "Read Buffer Error\n");
     return -1;
   }
   if (JsonParse(body, result) != 0) {
-    TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_ERROR, "Failed to parse json [%s].\n", body.c_str());
+    TW_LOG_AS(kSendHttpGet, LOG_CATEG_HTTP, LOG_LEVEL_ERROR, "Failed to parse json [%s].\n",
+              body.c_str());
     return -2;
   }
   return 0;
 }
 
-int SendHttpPost(const std::string& host, int port, const std::string& path,
-                 const std::string& body, const std::string& cookie, int timeout) {
+int PostForm(const std::string& host, int port, const std::string& path, const std::string& body,
+             const std::string& cookie, int timeout) {
   TWHttpClient client(host, port, path, "", "", timeout, false, true, true, true, HTTP_VERSION_NONE,
                       "");
   if (cookie.empty()) {
-    TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_WARN, "[Warning] Cannot set balnk cookie\n");
+    TW_LOG_AS(kSendHttpPost, LOG_CATEG_HTTP, LOG_LEVEL_WARN, "[Warning] Cannot set balnk cookie\n");
   } else {
     client.SetCookie(cookie);
   }
   if (client.SendRequestBySocketPost(body) != HTTP_RET_OK) {
-    TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_ERROR, "Send HTTP Request Error\n");
+    TW_LOG_AS(kSendHttpPost, LOG_CATEG_HTTP, LOG_LEVEL_ERROR, "Send HTTP Request Error\n");
     return -1;
   }
   return 0;
 }
 
-int SendHttpsGet(const std::string& host, int port, const std::string& path, Json::Value& result,
-                 int timeout) {
+int GetJsonOverTls(const std::string& host, int port, const std::string& path, Json::Value& result,
+                   int timeout) {
   TWHttpClient client(host, port, path, "", "", timeout, true, true, true, true, HTTP_VERSION_NONE,
                       "");
   const int sent = client.SendRequestByCurl(HTTP_METHOD_GET, true, timeout);
   if (sent != HTTP_RET_OK) return sent == HTTP_RET_CERT_ERROR ? -2 : -1;
   const std::string text = client.GetCurlText();
   if (JsonParse(text, result) != 0) {
-    TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_ERROR, "Failed to parse json. Result is [%s]\n", text.c_str());
+    TW_LOG_AS(kSendHttpsGet, LOG_CATEG_HTTP, LOG_LEVEL_ERROR,
+              "Failed to parse json. Result is [%s]\n", text.c_str());
     return -3;
   }
   return 0;
+}
+
+// Memory that runs out fails the call like anything else: no exception reaches a caller.
+template <typename Operation>
+int WithoutExceptions(Operation operation) {
+  try {
+    return operation();
+  } catch (const std::exception&) {
+    return -1;
+  }
+}
+
+}  // namespace
+
+int SendHttpGet(const std::string& host, int port, std::string path, Json::Value& result,
+                int timeout, bool encodeQuery) {
+  return WithoutExceptions([&] { return GetJson(host, port, path, result, timeout, encodeQuery); });
+}
+
+int SendHttpPost(const std::string& host, int port, const std::string& path,
+                 const std::string& body, const std::string& cookie, int timeout) {
+  return WithoutExceptions([&] { return PostForm(host, port, path, body, cookie, timeout); });
+}
+
+int SendHttpsGet(const std::string& host, int port, const std::string& path, Json::Value& result,
+                 int timeout) {
+  return WithoutExceptions([&] { return GetJsonOverTls(host, port, path, result, timeout); });
 }

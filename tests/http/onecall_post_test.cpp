@@ -81,12 +81,12 @@ TEST(SendHttpPost, AFailedConnectIsMinusOneAndLoggedAtError) {
   const ClosedPort port;
   LogCapture log;
   EXPECT_EQ(PostTo(port.Port()), -1);
-  EXPECT_THAT(log.Lines("http"),
-              ElementsAre(IsHttpLog("info", "SendRequestBySocketPost",
-                                    "Connection failed. host [127.0.0.1:" +
-                                        std::to_string(port.Port()) +
-                                        "], path [api/set], content [a=1].\n"),
-                          IsHttpLog("error", "SendHttpPost", "Send HTTP Request Error\n")));
+  EXPECT_THAT(
+      log.Lines("http"),
+      ElementsAre(IsHttpLog("info", "SendRequestBySocketPost",
+                            "Connection failed. host [127.0.0.1:" + std::to_string(port.Port()) +
+                                "], path [api/set], content [a=1].\n"),
+                  IsHttpLog("error", "SendHttpPost", "Send HTTP Request Error\n")));
 }
 
 TEST(SendHttpPost, AFailedWriteIsMinusOneAndLoggedAtError) {

@@ -77,9 +77,9 @@ TEST(SendRequestBySocketPost, WithHttp10AndACookieTheCookieFollowsTheHostAndNoth
 }
 
 TEST(SendRequestBySocketPost, EmptyContentIsSentWithALengthOfZero) {
-  EXPECT_EQ(RequestOf(WithPath("x"), ""),
-            "POST /x HTTP/1.1\r\nHost: cam\r\n" + std::string(kFormType) +
-                "Content-Length: 0\r\nConnection: close;\r\n\r\n");
+  EXPECT_EQ(RequestOf(WithPath("x"), ""), "POST /x HTTP/1.1\r\nHost: cam\r\n" +
+                                              std::string(kFormType) +
+                                              "Content-Length: 0\r\nConnection: close;\r\n\r\n");
 }
 
 TEST(SendRequestBySocketPost, Http11IsSentForNoneAndHttp11AndHttp10ForEveryOther) {
@@ -185,8 +185,7 @@ TEST(SendRequestBySocketPost, OverTlsTheSameBytesAreSent) {
     EXPECT_EQ(client.SendRequestBySocketPost("a=1"), HTTP_RET_OK);
     EXPECT_EQ(client.m_result, HTTP_RET_OK);
     EXPECT_EQ(ReadBody(client), "body");
-    EXPECT_EQ(peer.Received(0), "POST /x HTTP/1.1\r\nHost: 127.0.0.1\r\n" +
-                                    std::string(kFormType) +
+    EXPECT_EQ(peer.Received(0), "POST /x HTTP/1.1\r\nHost: 127.0.0.1\r\n" + std::string(kFormType) +
                                     "Content-Length: 3\r\nConnection: close;\r\n\r\na=1");
   }
 }
@@ -198,11 +197,11 @@ TEST(SendRequestBySocketPost, AFailedConnectIsLoggedAtInfoAndChangesNoField) {
   LogCapture log;
   EXPECT_EQ(client->SendRequestBySocketPost("a=%s%n"), HTTP_RET_IO_ERROR);
   ExpectEarlierResults(*client);
-  EXPECT_THAT(log.Lines("http"),
-              ElementsAre(IsHttpLog("info", "SendRequestBySocketPost",
-                                    "Connection failed. host [127.0.0.1:" +
-                                        std::to_string(port.Port()) +
-                                        "], path [x%s], content [a=%s%n].\n")));
+  EXPECT_THAT(
+      log.Lines("http"),
+      ElementsAre(IsHttpLog("info", "SendRequestBySocketPost",
+                            "Connection failed. host [127.0.0.1:" + std::to_string(port.Port()) +
+                                "], path [x%s], content [a=%s%n].\n")));
 }
 
 TEST(SendRequestBySocketPost, BelowInfoAFailedConnectIsNotLogged) {
@@ -213,7 +212,7 @@ TEST(SendRequestBySocketPost, BelowInfoAFailedConnectIsNotLogged) {
   EXPECT_THAT(log.Lines("http"), IsEmpty());
 }
 
-TEST(SendRequestBySocketPost, AFailedWriteIsLoggedWithItsResultAndTheLength) {
+TEST(SendRequestBySocketPost, AFailedWriteIsLoggedWithItsCountAndTheLength) {
   ScriptedPeer peer({{DiscardUntilEnd()}});
   const auto client = UsedClient(peer.Port());
   LogCapture log(3);
@@ -225,10 +224,24 @@ TEST(SendRequestBySocketPost, AFailedWriteIsLoggedWithItsResultAndTheLength) {
   client->m_pSocket->Disconnect();
   ExpectEarlierResults(*client);
   const size_t length = RequestOf(WithPath("a.cgi"), "a=1").size() + strlen("127.0.0.1") - 3;
-  EXPECT_THAT(log.Lines("http"),
-              ElementsAre(IsHttpLog("error", "SendRequestBySocketPost",
-                                    "Write data faild, write -1/" + std::to_string(length) +
-                                        ".\n")));
+  EXPECT_THAT(log.Lines("http"), ElementsAre(IsHttpLog("error", "SendRequestBySocketPost",
+                                                       "Write data faild, write 0/" +
+                                                           std::to_string(length) + ".\n")));
+}
+
+TEST(SendRequestBySocketPost, AShortWriteIsAFailureAndLoggedWithItsCount) {
+  ScriptedPeer peer({{DiscardUntilEnd()}});
+  const auto client = UsedClient(peer.Port());
+  LogCapture log(3);
+  {
+    Faults faults;
+    faults.Limit(Call::kWrite, 10).FailRange(Call::kWrite, 2, 2, EIO);
+    EXPECT_EQ(client->SendRequestBySocketPost("a=1"), HTTP_RET_IO_ERROR);
+  }
+  client->m_pSocket->Disconnect();
+  ExpectEarlierResults(*client);
+  ASSERT_EQ(log.Lines("http").size(), 1u);
+  EXPECT_THAT(log.Lines("http")[0].message, ::testing::StartsWith("Write data faild, write 10/1"));
 }
 
 TEST(SendRequestBySocketPost, AFailedTlsWriteIsLoggedInTheSameWay) {

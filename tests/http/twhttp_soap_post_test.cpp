@@ -163,8 +163,7 @@ TEST(SendReqBySocketPost, AnEmptyBodyIsAnErrorAndOpensNoConnection) {
   EXPECT_EQ(faults.Count(Call::kConnect), 0);
   EXPECT_EQ(reply, "old");
   EXPECT_EQ(client.m_result, HTTP_RET_NOT_READY);
-  EXPECT_THAT(log.Lines(),
-              ElementsAre(IsHttpLog("debug", "SendReqBySocketPost", "Empty msg.\n")));
+  EXPECT_THAT(log.Lines(), ElementsAre(IsHttpLog("debug", "SendReqBySocketPost", "Empty msg.\n")));
 }
 
 TEST(SendReqBySocketPost, AReplyWithALengthOfZeroOrNoneIsAnErrorWithTheResultOk) {
@@ -239,9 +238,8 @@ TEST(SendReqBySocketPost, AnEnvelopeOfSeveralMebibytesIsSentWhole) {
 }
 
 TEST(SendReqBySocketPost, AfterAZeroByteNothingOfTheBodyIsSent) {
-  const std::string sent =
-      "POST /a.cgi HTTP/1.1\r\nHost: 127.0.0.1\r\n" + std::string(kSoapType) +
-      "Content-Length: 4\r\n\r\nab";
+  const std::string sent = "POST /a.cgi HTTP/1.1\r\nHost: 127.0.0.1\r\n" + std::string(kSoapType) +
+                           "Content-Length: 4\r\n\r\nab";
   ScriptedPeer peer({{ExpectUntil("\r\n\r\nab"), Send(Soap("ok")), DiscardUntilEnd()}});
   {
     ClientProbe client(peer.Port());
@@ -260,7 +258,7 @@ TEST(SendReqBySocketPost, AShortWriteCountsAsSuccess) {
   std::string reply;
   {
     Faults faults;
-    faults.Return(Call::kWrite, 2, 2, 0).Limit(Call::kWrite, 10);
+    faults.Limit(Call::kWrite, 10).FailRange(Call::kWrite, 2, 2, EIO);
     EXPECT_EQ(client.SendReqBySocketPost("x", reply), HTTP_RET_OK);
   }
   client.m_pSocket->Disconnect();
@@ -395,9 +393,9 @@ TEST(SendReqBySocketPost, AnErrorBehindTheFirstMebibyteKeepsWhatCame) {
 }
 
 TEST(SendReqBySocketPost, ALengthThatDoesNotFitIsAnErrorAndTakesNoMemory) {
-  for (const std::string& length : {"2147483647"s, "2147483648"s, "4294967295"s, "4294967297"s,
-                                    "9223372036854775807"s, std::string(30, '9'),
-                                    "-"s + std::string(30, '9'), "-4294967292"s}) {
+  for (const std::string& length :
+       {"2147483647"s, "2147483648"s, "4294967295"s, "4294967297"s, "9223372036854775807"s,
+        std::string(30, '9'), "-"s + std::string(30, '9'), "-4294967292"s}) {
     ScriptedPeer peer({Exchange(Announcing(length, "body"))});
     EXPECT_EQ(InLittleMemory([&] {
                 ClientProbe client(peer.Port());
@@ -523,10 +521,9 @@ TEST(SendReqBySocketPost, WithoutMemoryForTheRequestALineNamesItsLengthAndOne) {
   client.m_pSocket->Disconnect();
   EXPECT_EQ(reply, "old");
   const size_t needed = RequestText("", "x").size() + 1;
-  EXPECT_THAT(
-      log.Lines("http"),
-      ElementsAre(IsHttpLog("error", "SendReqBySocketPost",
-                            "Out of memory. Need " + std::to_string(needed) + " bytes.\n")));
+  EXPECT_THAT(log.Lines("http"), ElementsAre(IsHttpLog("error", "SendReqBySocketPost",
+                                                       "Out of memory. Need " +
+                                                           std::to_string(needed) + " bytes.\n")));
 }
 
 TEST(SendReqBySocketPost, WithoutMemoryForTheReplyALineNamesItsLengthAndOne) {
@@ -543,7 +540,7 @@ TEST(SendReqBySocketPost, WithoutMemoryForTheRestOfTheReplyNothingOfItIsShown) {
   LogCapture log(3);
   for (const Call call : {Call::kMalloc, Call::kRealloc}) {
     ForEachFailingCall(call, [&](Faults& faults) {
-      ScriptedPeer peer({{ExpectUntil("\r\n\r\n"), SendEndlessly(Soap(body), body.size())}});
+      ScriptedPeer peer({{SendEndlessly(Soap(body), body.size())}});
       ClientProbe client(peer.Port());
       std::string reply = "old";
       log.Clear();
@@ -556,6 +553,22 @@ TEST(SendReqBySocketPost, WithoutMemoryForTheRestOfTheReplyNothingOfItIsShown) {
   }
 }
 
+TEST(SendReqBySocketPost, TheLineOfALaterPieceNamesTheAnnouncedLengthAndOne) {
+  ScriptedPeer peer({{ExpectRequest(), SendEndlessly(Soap(std::string(3 * kMebibyte, 'b')), 1)}});
+  ClientProbe client(peer.Port());
+  std::string reply = "old";
+  LogCapture log(3);
+  {
+    Faults faults;
+    faults.FailFrom(Call::kRealloc, 1).FailFrom(Call::kMalloc, 3);
+    EXPECT_EQ(client.SendReqBySocketPost("x", reply), HTTP_RET_IO_ERROR);
+  }
+  client.m_pSocket->Disconnect();
+  EXPECT_EQ(reply, "old");
+  EXPECT_THAT(log.Lines("http"), ElementsAre(IsHttpLog("error", "SendReqBySocketPost",
+                                                       "Out of memory. Need 3145729 bytes.\n")));
+}
+
 // The login.
 
 TEST(SendAuthReqBySocketPost, AReplyThatIsNo401EndsIt) {
@@ -564,8 +577,8 @@ TEST(SendAuthReqBySocketPost, AReplyThatIsNo401EndsIt) {
                                                {"403 No", HTTP_RET_BAD_RESPONSE},
                                                {"414 Long", HTTP_RET_URI_TOO_LONG}};
   for (const auto& [status, expected] : table) {
-    ScriptedPeer peer({Exchange(
-        Soap("body", std::string(status) + "\r\nWWW-Authenticate: " + kDigest))});
+    ScriptedPeer peer(
+        {Exchange(Soap("body", std::string(status) + "\r\nWWW-Authenticate: " + kDigest))});
     ClientSettings settings = WithLogin();
     settings.basic_auth = true;  // plays no part here
     ClientProbe client(peer.Port(), settings);
@@ -625,10 +638,10 @@ TEST(SendAuthReqBySocketPost, ASecond401GoesBackToTheCaller) {
 }
 
 TEST(SendAuthReqBySocketPost, AnUnreadFirstBodyIsClosedWithItsConnection) {
-  ScriptedPeer peer({{ExpectRequest(),
-                      Send("HTTP/1.1 401 No\r\nWWW-Authenticate: Basic x\r\n\r\nunread"),
-                      DiscardUntilEnd()},
-                     Exchange(Soap("second"))});
+  ScriptedPeer peer(
+      {{ExpectRequest(), Send("HTTP/1.1 401 No\r\nWWW-Authenticate: Basic x\r\n\r\nunread"),
+        DiscardUntilEnd()},
+       Exchange(Soap("second"))});
   ClientProbe client(peer.Port(), WithLogin());
   EXPECT_EQ(AuthOf(client), (Outcome{HTTP_RET_OK, "second", HTTP_RET_OK}));
 }
@@ -717,8 +730,8 @@ TEST(SendReqByXMLSocketPost, SixteenMebibytesOfShortLinesAreJoined) {
   const std::string line(48, 'x');
   std::string lines;
   while (lines.size() < 4 * kMebibyte) lines += line + "\r\n";
-  const std::string body = "<r><a>" + lines + "</a><a>" + lines + "</a><a>" + lines + "</a><a>" +
-                           lines + "</a></r>";
+  const std::string body =
+      "<r><a>" + lines + "</a><a>" + lines + "</a><a>" + lines + "</a><a>" + lines + "</a></r>";
   const std::string text = XmlTextOf(body);
   EXPECT_EQ(text.size(), 4 * (lines.size() / 50) * 48);
   EXPECT_EQ(text.find_first_not_of('x'), std::string::npos);

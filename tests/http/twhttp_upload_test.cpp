@@ -162,7 +162,7 @@ TEST(OpenRawDataUpload, AShortWriteCountsAsSuccess) {
   ScriptedPeer peer({{DiscardUntilEnd()}});
   ClientProbe client(peer.Port());
   Faults faults;
-  faults.Return(Call::kWrite, 2, 2, 0).Limit(Call::kWrite, 10);
+  faults.Limit(Call::kWrite, 10).FailRange(Call::kWrite, 2, 2, EIO);
   EXPECT_EQ(client.OpenRawDataUpload(), HTTP_RET_OK);
   EXPECT_EQ(client.m_connState, 2);
   client.m_pSocket->Disconnect();

@@ -34,7 +34,9 @@ constexpr Kind kKinds[] = {{"good", "IP:127.0.0.1", false, false},
                            {"wrong-host", "DNS:elsewhere.invalid", false, false},
                            {"self-signed", "IP:127.0.0.1", false, true}};
 
-Key NewKey() { return Key(EVP_EC_gen("P-256")); }
+Key NewKey() {
+  return Key(EVP_EC_gen("P-256"));
+}
 
 Certificate NewCertificate(EVP_PKEY* key, const char* name, long serial, bool expired) {
   Certificate certificate(X509_new());

@@ -49,9 +49,7 @@ class TableWriter : public ::testing::EmptyTestEventListener {
 
 class AddTableWriter : public ::testing::Environment {
  public:
-  void SetUp() override {
-    ::testing::UnitTest::GetInstance()->listeners().Append(new TableWriter);
-  }
+  void SetUp() override { ::testing::UnitTest::GetInstance()->listeners().Append(new TableWriter); }
 };
 
 const auto* const kAddTableWriter = ::testing::AddGlobalTestEnvironment(new AddTableWriter);
@@ -62,9 +60,13 @@ std::string NameOf(const Mode& mode) {
   return std::string(mode.tls ? "Tls" : "Plain") + (mode.buffered ? "Buffered" : "Direct");
 }
 
-std::ostream& operator<<(std::ostream& out, const Mode& mode) { return out << NameOf(mode); }
+std::ostream& operator<<(std::ostream& out, const Mode& mode) {
+  return out << NameOf(mode);
+}
 
-void AddRow(const Row& row) { g_rows.push_back(row); }
+void AddRow(const Row& row) {
+  g_rows.push_back(row);
+}
 
 void Worked(const std::string& operation, const std::string& server, const std::string& login,
             const Mode& mode) {

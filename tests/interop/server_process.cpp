@@ -41,6 +41,7 @@ bool Accepts(int port) {
   std::vector<char*> argv;
   for (const std::string& word : command) argv.push_back(const_cast<char*>(word.c_str()));
   argv.push_back(nullptr);
+  setpgid(0, 0);  // Apache httpd ends its process group with itself
   const int out = open(output.c_str(), O_WRONLY | O_CREAT | O_APPEND, 0644);
   dup2(out, STDOUT_FILENO);
   dup2(out, STDERR_FILENO);
