@@ -2,6 +2,9 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <cstdio>
+#include <cstring>
+
 #include "tests/http/http_test_util.h"
 #include "tests/support/faults.h"
 #include "tests/support/tls_scripted_peer.h"
@@ -93,7 +96,7 @@ Body BodyOfReply(const std::string& reply, const Transport& transport = {false, 
   return BodyOf(client);
 }
 
-// Makes every read of the body fail once `text`, which stands right behind the head, has come. A
+// Makes every read of the body fail once the bytes right behind the head have come. A
 // buffered client has it already; a direct one has read just the head.
 void FailReadsBehind(Faults& faults, const Transport& transport) {
   faults.FailFrom(transport.tls ? Call::kSslRead : Call::kRead, transport.buffered ? 1 : 2);
@@ -184,6 +187,15 @@ TEST(ReadBody, WithoutAHeadItIsAnIoError) {
   EXPECT_EQ(BodyOf(unconnected), (Body{HTTP_RET_IO_ERROR, ""}));
   EXPECT_EQ(BodyOfReply("HTTP/1.1 200 OK\r\nContent-Type:\r\n\r\nbody"),
             (Body{HTTP_RET_IO_ERROR, ""}));
+}
+
+TEST(ReadBody, WithoutAHeadAnEarlierRepliesChunkedCodingDoesNotMakeItSucceed) {
+  ScriptedPeer peer({Exchange(Chunked(kWikipedia)), RequestThenClose()});
+  ClientProbe client(peer.Port());
+  EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
+  EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
+  EXPECT_EQ(client.m_result, HTTP_RET_IO_ERROR);
+  EXPECT_EQ(BodyOf(client), (Body{HTTP_RET_IO_ERROR, ""}));
 }
 
 TEST(GetResp, ItServesAfterARequestThatTheCallerHasWritten) {

@@ -349,12 +349,17 @@ TEST(SendReqBySocketPost, TheReplyEndsAtItsFirstZeroByte) {
 }
 
 TEST(SendReqBySocketPost, ADirectReadIsNotRepeated) {
-  ScriptedPeer peer({{ExpectRequest(), Send(Announcing("6", "abc")), DiscardUntilEnd()}});
+  const std::string head = Announcing("6", "");
+  ScriptedPeer peer({{ExpectRequest(), Send(head + "abc"), DiscardUntilEnd()}});
   ClientSettings settings;
   settings.buffered = false;
   ClientProbe client(peer.Port(), settings);
   std::string reply;
-  EXPECT_EQ(client.SendReqBySocketPost("x", reply), HTTP_RET_OK);
+  {
+    Faults faults;
+    EXPECT_EQ(client.SendReqBySocketPost("x", reply), HTTP_RET_OK);
+    EXPECT_EQ(faults.Count(Call::kRead), static_cast<int>(head.size()) + 1);
+  }
   EXPECT_EQ(reply, "abc");
   client.m_pSocket->Disconnect();
 }

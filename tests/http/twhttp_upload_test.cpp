@@ -2,6 +2,8 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <algorithm>
+
 #include "tests/http/http_test_util.h"
 #include "tests/support/faults.h"
 #include "tests/support/tls_scripted_peer.h"

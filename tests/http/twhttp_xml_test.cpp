@@ -4,8 +4,8 @@
 #include <libxml/parser.h>
 #include <libxml/tree.h>
 
-#include <algorithm>
 #include <cstdlib>
+#include <map>
 
 #include "tarnwick/http/curl_callbacks.h"
 #include "tests/http/http_test_util.h"

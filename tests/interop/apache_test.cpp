@@ -226,11 +226,11 @@ TEST_P(ApacheTest, ParsesTheEnvelopeWithItsLinesJoined) {
 // ---- a whole reply, its head included
 
 TEST_P(ApacheTest, AnswersASecondRequestOnTheSameConnection) {
-  if (GetParam().tls) return;  // the lenient port is a plain one
+  if (GetParam().tls) return;  // the port that keeps connections is a plain one
   Worked("GetResp", kApache, "none", GetParam());
   ClientSettings settings = LoginTo(GetParam(), "cgi/cookies.cgi");
   settings.version = HTTP_VERSION_1_1;
-  ClientProbe client(Apache().Port("LENIENT_PORT"), settings);
+  ClientProbe client(Apache().Port("KEEP_PORT"), settings);
   ASSERT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
   char body[64];
   ASSERT_EQ(client.ReadData(body, 7), 7);  // "cookie ", all that was announced

@@ -13,7 +13,9 @@ constexpr char kLighttpd[] = "lighttpd";
 class LighttpdTest : public ::testing::TestWithParam<Mode> {
  protected:
   std::unique_ptr<ClientProbe> Client(const std::string& path) {
-    return NewClient(Lighttpd(), LoginTo(GetParam(), path));
+    ClientSettings settings = LoginTo(GetParam(), path);
+    settings.timeout = 1;
+    return NewClient(Lighttpd(), settings);
   }
 };
 

@@ -86,7 +86,9 @@ class SServer : public ::testing::TestWithParam<TlsCase> {
   }
 
   ClientSettings Settings(const std::string& path) {
-    return LoginTo({true, GetParam().buffered}, path);
+    ClientSettings settings = LoginTo({true, GetParam().buffered}, path);
+    settings.timeout = 1;
+    return settings;
   }
 };
 
@@ -138,7 +140,7 @@ class SServerCertificate : public ::testing::TestWithParam<CertificateCase> {
             accepted ? "passed" : "passed: the certificate is refused"});
   }
 
-  ClientSettings Settings() { return LoginTo({true, true}, "info.json"); }
+  ClientSettings Settings() { return LoginTo({true, false}, "info.json"); }
 
   TlsServer server_{GetParam().kind, {"-WWW"}};
 };
@@ -162,7 +164,7 @@ TEST_P(SServerCertificate, IsVerifiedByLibcurl) {
 
 TEST_P(SServerCertificate, DoesNotMatterWithoutVerification) {
   AddCertificateRow("SendRequestByCurl, not verified", "libcurl", true);
-  AddCertificateRow("SendRequestByGet", "buffered", true);
+  AddCertificateRow("SendRequestByGet", "direct", true);
   ClientProbe client(server_.Port(), Settings());
   EXPECT_EQ(client.SendRequestByCurl(HTTP_METHOD_GET, false, 10), HTTP_RET_OK);
   EXPECT_EQ(client.GetCurlText(), "{\"success\":true}");

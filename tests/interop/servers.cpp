@@ -35,7 +35,7 @@ WebServer& Apache() {
         WebServerSetup{"Apache httpd",
                        {"/usr/sbin/apache2", "-D", "FOREGROUND", "-f", "@CONFIG@"},
                        {"apache.conf"},
-                       {"PORT", "TLS_PORT", "LENIENT_PORT"},
+                       {"PORT", "TLS_PORT", "KEEP_PORT"},
                        {}});
   }
   return *g_apache;
