@@ -37,6 +37,7 @@ int TWSocket::ReadDirect(char* buf, int len) {
 }
 
 int TWSocket::ReadBuffered(char* buf, int len) {
+  if (len == 0) return 0;
   int done = 0;
   for (int retries = 0; m_readLen < len - done;) {
     done += TakeBuffered(buf + done, m_readLen);
@@ -63,7 +64,7 @@ int TWSocket::ReadBuffered(char* buf, int len) {
 
 // Moves `len` buffered bytes to the caller. REQUIRES: len <= m_readLen.
 int TWSocket::TakeBuffered(char* buf, int len) {
-  if (len > 0) std::memcpy(buf, m_readBuf + m_readPos, static_cast<size_t>(len));
+  std::memcpy(buf, m_readBuf + m_readPos, static_cast<size_t>(len));
   m_readPos += len;
   m_readLen -= len;
   return len;

@@ -9,10 +9,8 @@ using namespace std::string_literals;
 
 namespace {
 
-using ::testing::Contains;
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
-using ::testing::Not;
 
 // The result code of a response's head.
 int ResultOf(const std::string& reply) {

@@ -13,7 +13,6 @@
 namespace {
 
 using ::testing::IsEmpty;
-using ::testing::SizeIs;
 
 constexpr char kPlainReply[] = "HTTP/1.1 200 OK\r\nContent-Length: 4\r\n\r\nbody";
 

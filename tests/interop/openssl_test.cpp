@@ -11,8 +11,6 @@
 
 namespace {
 
-using ::testing::HasSubstr;
-
 constexpr char kServer[] = "openssl s_server";
 
 // With "-WWW" in `options` it serves the files of its folder, and closes with a notice. Without, it

@@ -1,0 +1,44 @@
+// Asks a JSON service over TLS in one call, and believes no stranger: SendHttpsGet.
+//
+//   op_json_get_tls HOST PORT PATH
+#include <json/json.h>
+
+#include <cstdio>
+#include <cstdlib>
+#include <string>
+
+#include "tarnwick/http/twhttp.h"
+
+namespace {
+
+// The results of SendHttpsGet.
+const char* Reason(int result) {
+  switch (result) {
+    case -1:
+      return "no reply";
+    case -2:
+      return "the server's certificate cannot be verified";
+    default:
+      return "the service did not succeed, or its reply is no JSON";
+  }
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+  if (argc != 4) {
+    std::fprintf(stderr, "usage: op_json_get_tls HOST PORT PATH\n");
+    return 2;
+  }
+  Json::Value reply;
+  const int timeout = 10;  // seconds, for the whole transfer
+  const int result = SendHttpsGet(argv[1], std::atoi(argv[2]), argv[3], reply, timeout);
+  if (result != 0) {
+    std::fprintf(stderr, "%s\n", Reason(result));
+    return 1;
+  }
+  Json::StreamWriterBuilder builder;
+  builder["indentation"] = "";
+  std::puts(Json::writeString(builder, reply).c_str());
+  return 0;
+}
