@@ -33,7 +33,8 @@ class TARNWICK_API SSLSocket : public TWSocket {
   void Disconnect() override;
 
   // As TWSocket::DoSelect, but 0 at once for SELECT_READ while decrypted bytes are waiting; so
-  // HasDataToRead answers false just then, and ReadData returns them without a wait.
+  // HasDataToRead answers false just then, and ReadData returns them without a wait. Behind the
+  // peer's close notice it looks, but does not wait.
   int DoSelect(SELECT_TYPE type) override;
 
   // Reads at most `len` decrypted bytes.
@@ -49,6 +50,7 @@ class TARNWICK_API SSLSocket : public TWSocket {
  private:
   TARNWICK_LOCAL void InitSSL();
   TARNWICK_LOCAL int Handshake();
+  TARNWICK_LOCAL bool StreamHasEnded() const;
 
   struct ssl_ctx_st* m_pSSLCtx;
   struct ssl_st* m_pSSL;

@@ -49,7 +49,16 @@ int SSLSocket::DoSelect(SELECT_TYPE type) {
   if (m_sockFd < 0) return -1;
   // 0, not the count: what is decrypted already makes the descriptor no more readable.
   if (type == SELECT_READ && m_pSSL != nullptr && SSL_pending(m_pSSL) > 0) return 0;
-  return TWSocket::DoSelect(type);
+  const int configured = m_timeout;
+  // A peer may keep the connection open behind its close notice, and nothing is worth a wait there.
+  if (type == SELECT_READ && StreamHasEnded() && m_timeout > 0) m_timeout = 0;
+  const int ready = TWSocket::DoSelect(type);
+  m_timeout = configured;
+  return ready;
+}
+
+bool SSLSocket::StreamHasEnded() const {
+  return m_pSSL != nullptr && (SSL_get_shutdown(m_pSSL) & SSL_RECEIVED_SHUTDOWN) != 0;
 }
 
 int SSLSocket::_Read(void* buf, unsigned int len) {

@@ -101,6 +101,15 @@ TEST_P(TlsBothModes, ACloseWithANoticeIsTheEndOfTheStreamAgainAndAgain) {
   EXPECT_THAT(log.Lines(), ElementsAre(line, line, line));
 }
 
+TEST_P(TlsBothModes, BehindACloseNoticeNothingWaitsForThePeerToClose) {
+  // Devices keep the connection open there. A wait would outlast the test's own time.
+  TlsPair tls({Send("bye"), SendCloseNotice(), StallUntilFinish()}, 3600, GetParam());
+  EXPECT_EQ(ReadSome(tls.socket, 3), (Delivered{3, "bye"}));
+  EXPECT_EQ(ReadSome(tls.socket, 2000), (Delivered{0, ""}));
+  EXPECT_EQ(ReadSome(tls.socket, 2000), (Delivered{0, ""}));
+  EXPECT_FALSE(tls.socket.HasDataToRead(3600));
+}
+
 TEST_P(TlsBothModes, ACloseWithoutANoticeIsTheEndOfTheStreamAgainAndAgain) {
   LogCapture log;
   TlsPair tls({Send("bye"), CloseWithoutNotice()}, 5, GetParam());

@@ -52,6 +52,7 @@ class PeerConnection {
   virtual bool Handshake(std::string* error);
   virtual bool SendRecordByteByByte(const std::string& bytes, std::string* error);
   virtual bool SawCloseNotice() const { return false; }
+  virtual void SendCloseNotice() {}
 
   // Sends all bytes; false when the client closed or the deadline passed.
   virtual bool Write(const std::string& bytes);

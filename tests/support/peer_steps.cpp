@@ -250,6 +250,13 @@ Step Handshake() {
   return {"Handshake()", [](PeerConnection&, std::string*) { return true; }};
 }
 
+Step SendCloseNotice() {
+  return {"SendCloseNotice()", [](PeerConnection& peer, std::string*) {
+            peer.SendCloseNotice();
+            return true;
+          }};
+}
+
 Step CloseWithoutNotice() {
   return {"CloseWithoutNotice()", [](PeerConnection& peer, std::string* error) {
             peer.TakeArrived();

@@ -75,6 +75,9 @@ Step SendEndlessly(const std::string& bytes, size_t most);
 // Over TLS: makes the handshake now.
 Step Handshake();
 
+// Over TLS: sends the close notice and keeps the TCP connection open.
+Step SendCloseNotice();
+
 // Over TLS: closes the TCP connection without a close notice.
 Step CloseWithoutNotice();
 

@@ -33,6 +33,7 @@ class TlsConnection : public PeerConnection {
     return (SSL_get_shutdown(ssl_) & SSL_RECEIVED_SHUTDOWN) != 0;
   }
   bool Write(const std::string& bytes) override;
+  void SendCloseNotice() override;
   void Close() override;
 
  protected:
@@ -131,12 +132,15 @@ bool TlsConnection::SendRecordByteByByte(const std::string& bytes, std::string* 
   return true;
 }
 
+void TlsConnection::SendCloseNotice() {
+  if (SSL_is_init_finished(ssl_) != 1) return;
+  SSL_shutdown(ssl_);
+  Flush();
+}
+
 void TlsConnection::Close() {
   TakeArrived();
-  if (SSL_is_init_finished(ssl_) == 1) {
-    SSL_shutdown(ssl_);
-    Flush();
-  }
+  SendCloseNotice();
   CloseRaw();
 }
 
