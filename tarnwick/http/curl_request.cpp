@@ -2,8 +2,21 @@
 
 #include "tarnwick/http/curl_request.h"
 
+#include <sys/socket.h>
+
 #include "tarnwick/http/twcurl.h"
 #include "tarnwick/log/twdebuglog.h"
+#include "tarnwick/platform/sigpipe_guard.h"
+
+namespace {
+
+// Connections that programs started meanwhile do not inherit.
+curl_socket_t OpenSocket(void* /*unused*/, curlsocktype /*purpose*/,
+                         struct curl_sockaddr* address) {
+  return socket(address->family, address->socktype | SOCK_CLOEXEC, address->protocol);
+}
+
+}  // namespace
 
 CurlRequest::CurlRequest(const char* operation)
     : m_operation(operation), m_curl(TWCurlInit()), m_headers(nullptr) {
@@ -12,7 +25,11 @@ CurlRequest::CurlRequest(const char* operation)
 }
 
 CurlRequest::~CurlRequest() {
-  if (m_curl != nullptr) curl_easy_cleanup(m_curl);
+  if (m_curl != nullptr) {
+    SigpipeGuard guard;
+    curl_easy_cleanup(m_curl);  // says goodbye to a TLS peer, who may be gone
+    guard.TakeBack();
+  }
   curl_slist_free_all(m_headers);
 }
 
@@ -22,8 +39,20 @@ bool CurlRequest::AddHeader(const std::string& line) {
   return longer != nullptr;
 }
 
+// libcurl would else ignore SIGPIPE for the whole process while it works, and requests of several
+// threads could leave that behind.
+CURLcode CurlRequest::KeepProcessUntouched() {
+  const CURLcode code = Set(CURLOPT_NOSIGNAL, 1L);
+  return code != CURLE_OK ? code : Set(CURLOPT_OPENSOCKETFUNCTION, OpenSocket);
+}
+
 CURLcode CurlRequest::Perform() {
-  const CURLcode code = curl_easy_perform(m_curl);
+  CURLcode code = KeepProcessUntouched();
+  if (code == CURLE_OK) {
+    SigpipeGuard guard;
+    code = curl_easy_perform(m_curl);
+    guard.TakeBack();
+  }
   Accept(code, "Failed to make http connection", "");
   return code;
 }

@@ -37,13 +37,15 @@ class CurlRequest {
     return m_headers;
   }
 
-  // Performs the transfer. Results: libcurl's code; a failure is logged.
+  // Performs the transfer. Results: libcurl's code; a failure is logged. The signal handlers of the
+  // process and the mask of the thread stay as they are.
   CURLcode Perform();
 
   // The status of the reply was from 200 to 299; any other is logged.
   bool StatusIsSuccess();
 
  private:
+  CURLcode KeepProcessUntouched();
   bool Accept(CURLcode code, const char* message, const char* detail);
 
   const char* m_operation;

@@ -18,10 +18,13 @@ constexpr int kShallowDepth = 16;
 constexpr size_t kStackPerLevel = 640;
 constexpr size_t kStackReserve = 16384;
 
-// Bytes between here and the end of the thread's stack; 0 when the system does not tell.
+// What is assumed where the system does not tell, without /proc for example.
+constexpr size_t kUnknownStack = 65536;
+
+// Bytes between here and the end of the thread's stack.
 size_t StackLeft() {
   pthread_attr_t attributes;
-  if (pthread_getattr_np(pthread_self(), &attributes) != 0) return 0;
+  if (pthread_getattr_np(pthread_self(), &attributes) != 0) return kUnknownStack;
   void* lowest = nullptr;
   size_t size = 0;
   pthread_attr_getstack(&attributes, &lowest, &size);

@@ -44,7 +44,8 @@ enum HTTP_MAP_KEY : int {
 
 // The protocol version to send. The values are libcurl's.
 enum HTTP_VERSION : int {
-  HTTP_VERSION_NONE = 0,  // HTTP/1.0 on the socket GET, libcurl's default on the libcurl paths
+  // HTTP/1.0 on the socket GET, HTTP/1.1 on the form POST, libcurl's default on the libcurl paths
+  HTTP_VERSION_NONE = 0,
   HTTP_VERSION_1_0 = 1,
   HTTP_VERSION_1_1 = 2,
 };
@@ -198,7 +199,7 @@ class TARNWICK_API TWHttpClient {
   //   read that ends early counts, and `reply` holds what came. HTTP_RET_IO_ERROR, with `reply` as
   //   it was, for an empty `body`, when connecting, writing or reading failed, and for a reply
   //   without a usable Content-Length.
-  // Memory grows with what arrives, in steps of at least 1 MiB, not with what is announced.
+  // Memory grows with what arrives: over 1 MiB, an announced length alone does not take any.
   int SendReqBySocketPost(const std::string& body, std::string& reply);
 
   // As SendReqBySocketPost; when the reply is a 401 whose challenge names Digest or else Basic, the
@@ -221,8 +222,9 @@ class TARNWICK_API TWHttpClient {
   //
   // A Transfer-Encoding of exactly "chunked" is decoded; any other body ends where the server
   // closes, whatever length it announced.
-  // Results: HTTP_RET_OK with the whole body in `body`, also one that a closed connection has cut;
-  //   HTTP_RET_IO_ERROR when a read failed, with what came before in `body`.
+  // Results: HTTP_RET_OK with the body in `body`: the whole of it, or what came of one that a
+  //   closed connection, or a failed read in place of a chunk's size, has cut; HTTP_RET_IO_ERROR
+  //   when another read failed, with what came before in `body`.
   int ReadBody(std::string& body);
 
   // Reads a whole response, the head first: after OpenRawDataUpload, or after a request that the

@@ -172,8 +172,9 @@ class TARNWICK_API TWDbgLogCfg {
   //
   // A shorter list changes the first levels only; numbers after the 74th are ignored; text that is
   // not a number counts as 0. The flag is set by "yes" exactly, and cleared by any other value.
-  // Results: 0; -1 when one of the keys is missing or the file cannot be read. What is missing
-  //   stays as it is in the record; the levels are loaded even when the flag's key is missing.
+  // Results: 0; -1 when one of the keys is missing or empty, or the file unreadable. What is
+  //   missing stays as it is in the record; the levels are loaded even when the flag's key is
+  //   missing.
   int LoadDbgLogSettings();
 
   // Writes both keys from this record into the settings file, which is created when missing.

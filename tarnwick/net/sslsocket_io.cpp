@@ -63,8 +63,10 @@ bool SSLSocket::StreamHasEnded() const {
 
 int SSLSocket::_Read(void* buf, unsigned int len) {
   for (;;) {
-    const TlsResult result =
-        RunTls(m_pSSL, [&](SSL* ssl) { return SSL_read(ssl, buf, static_cast<int>(len)); });
+    // Behind a disconnect OpenSSL's object still holds the number of a descriptor that is gone.
+    const TlsResult result = RunTls(m_sockFd < 0 ? nullptr : m_pSSL, [&](SSL* ssl) {
+      return SSL_read(ssl, buf, static_cast<int>(len));
+    });
     if (WantsToWait(result.error)) {
       // A loop, because a record that comes byte by byte takes thousands of rounds.
       if (DoSelect(SELECT_READ) > 0) continue;

@@ -79,7 +79,8 @@ class TARNWICK_API TWSocket {
   // The connect sequence without PostConnect: the descriptor stays blocking. Results: 0 or -1.
   int ConnectSocket();
 
-  // True from a successful connect until Disconnect, SetSocketInfo or a failed read or write.
+  // True from a successful connect until Disconnect, SetSocketInfo, a buffered read that failed
+  // with nothing delivered, or a TLS write that failed. Other failures leave it as it is.
   bool IsConnected() const { return m_bConnected; }
 
   // True when the last read met the end of the stream.
@@ -98,14 +99,16 @@ class TARNWICK_API TWSocket {
   // when the stream ends or an error comes after some bytes.
   // Results: the bytes delivered; 0 at the end of the stream, when IsEOF() becomes true; -1 on an
   //   error or time-out that came before any byte, and when `buf` is null or `len` negative.
-  // State: a failure in buffered mode clears IsConnected(); the descriptor stays open.
+  // State: a buffered read that failed clears IsConnected(), a wait that failed does not; the
+  //   descriptor stays open.
   // Blocks for `timeout` seconds a wait; a small buffered read that gets nothing makes seven.
   int ReadData(char* buf, int len);
 
   // Writes `len` bytes.
   //
-  // Results: the bytes written: fewer than `len`, and 0 too, when a plain connection failed; -1 when
-  //   there is nothing to write or no descriptor, and when TLS failed, which clears IsConnected().
+  // Results: the bytes written: fewer than `len`, and 0 too, when a plain connection failed; -1
+  //   when there is nothing to write or no descriptor, and when TLS failed, which clears
+  //   IsConnected().
   // Blocks without a limit while the peer takes nothing.
   int WriteData(const char* buf, int len);
 
@@ -121,8 +124,8 @@ class TARNWICK_API TWSocket {
   // Pushes `len` bytes back: the next reads return them before what is buffered already.
   //
   // Results: 0; -1, with the buffer untouched, when `data` is null, `len` is negative, or `len` and
-  //   the unread bytes exceed 65,536. At least 1,024 bytes fit after any read. In direct mode
-  //   nothing happens and the result is 0.
+  //   the unread bytes exceed 65,536. Behind a read there is room for 1,024 bytes, until some are
+  //   pushed back. In direct mode nothing happens and the result is 0.
   int RestoreData(char* data, int len);
 
   // True when the descriptor becomes readable within `timeout` seconds. What is in the read-ahead

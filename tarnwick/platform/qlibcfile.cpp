@@ -16,7 +16,7 @@ namespace {
 
 // The name under which the new text is written: fixed, because writers exclude each other, and so a
 // crashed writer's leftover is found and removed by the next.
-constexpr char kNewSuffix[] = ".new";
+constexpr char kNewSuffix[] = ".tarnwick-new";
 
 bool ReadAll(int fd, std::string* text) {
   char piece[4096];

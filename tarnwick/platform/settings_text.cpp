@@ -68,6 +68,9 @@ std::string ReplaceSettingsLine(std::string_view text, std::string_view key,
   // A last line without its line feed must not swallow the new one.
   if (!result.empty() && result.back() != '\n') result.push_back('\n');
   result.append(line);
-  if (old.found) result.append(text.substr(old.end));
+  if (!old.found || old.end == text.size()) return result;
+  // Nor must a line format without one swallow the next key.
+  if (line.back() != '\n') result.push_back('\n');
+  result.append(text.substr(old.end));
   return result;
 }

@@ -23,6 +23,7 @@ bool FormatSettingsLine(std::string_view format, std::string_view key, std::stri
                         std::string* line);
 
 // `text` with `line` in the place of the key's first line, or at its end when the key has none.
+// REQUIRES: `line` is not empty.
 std::string ReplaceSettingsLine(std::string_view text, std::string_view key, std::string_view line);
 
 #endif  // TARNWICK_PLATFORM_SETTINGS_TEXT_H_

@@ -37,10 +37,9 @@ int DelayTimer::Delay() {
     BeginTiming();
     return sched_yield();  // pthread_yield by its standard name
   }
-  m_mark.tv_usec += m_delay;
-  while (m_mark.tv_usec >= kMicrosecondsPerSecond) {
-    m_mark.tv_usec -= kMicrosecondsPerSecond;
-    ++m_mark.tv_sec;
-  }
+  // In 64 bits: the sum of a long period overflows a 32-bit long.
+  const int64_t end = int64_t{m_mark.tv_usec} + m_delay;
+  m_mark.tv_sec += static_cast<time_t>(end / kMicrosecondsPerSecond);
+  m_mark.tv_usec = static_cast<suseconds_t>(end % kMicrosecondsPerSecond);
   return usleep(static_cast<useconds_t>(m_delay - elapsed));
 }

@@ -35,10 +35,15 @@ class FileInMemory {
   FILE* file_ = tmpfile();
 };
 
-// The options that were set, in their order.
+// The options that were set, in their order, but for the two that each transfer ends them with: those
+// keep it from the process's signals and children (see curl_process_test.cpp).
 inline std::vector<CURLoption> OptionsOf(const Faults& faults) {
   std::vector<CURLoption> options;
-  for (const CurlOption& given : faults.CurlOptions()) options.push_back(given.option);
+  for (const CurlOption& given : faults.CurlOptions()) {
+    const bool ends =
+        given.option == CURLOPT_NOSIGNAL || given.option == CURLOPT_OPENSOCKETFUNCTION;
+    if (!ends) options.push_back(given.option);
+  }
   return options;
 }
 

@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 
 #include "tarnwick/http/curl_callbacks.h"
+#include "tests/http/curl_test_util.h"
 #include "tests/http/http_test_util.h"
 #include "tests/support/faults.h"
 
@@ -117,9 +118,7 @@ TEST(SendRequestByPost, TheOptionsAreSetInOrder) {
     if (version != HTTP_VERSION_NONE) expected.push_back(CURLOPT_HTTP_VERSION);
     expected.insert(expected.end(),
                     {CURLOPT_URL, CURLOPT_POSTFIELDS, CURLOPT_HTTPAUTH, CURLOPT_WRITEFUNCTION});
-    std::vector<CURLoption> given;
-    for (const CurlOption& option : faults.CurlOptions()) given.push_back(option.option);
-    EXPECT_THAT(given, ElementsAreArray(expected));
+    EXPECT_THAT(OptionsOf(faults), ElementsAreArray(expected));
     EXPECT_EQ(faults.OptionGiven(CURLOPT_USERNAME).text, "u");
     EXPECT_EQ(faults.OptionGiven(CURLOPT_PASSWORD).text, "secret");
     EXPECT_EQ(faults.OptionGiven(CURLOPT_HTTPAUTH).number, 3);

@@ -8,6 +8,7 @@
 #include <map>
 
 #include "tarnwick/http/curl_callbacks.h"
+#include "tests/http/curl_test_util.h"
 #include "tests/http/http_test_util.h"
 #include "tests/support/faults.h"
 
@@ -107,12 +108,6 @@ std::string RefusalOf(const Sender& sender, CURLoption option) {
       {CURLOPT_CUSTOMREQUEST, "Failed to setopt, "},
       {CURLOPT_WRITEDATA, of_delete ? "Failed to set WRITEDATA, " : "Failed to set file, "}};
   return messages.at(option) + code;
-}
-
-std::vector<CURLoption> OptionsOf(const Faults& faults) {
-  std::vector<CURLoption> options;
-  for (const CurlOption& given : faults.CurlOptions()) options.push_back(given.option);
-  return options;
 }
 
 std::string Reply(const std::string& body, const std::string& status = "200 OK") {

@@ -499,4 +499,13 @@ TEST(TlsGonePeer, AReadFailsOrEnds) {
   EXPECT_EQ(child.code, 7) << "signal " << child.signal;
 }
 
+TEST(TlsRead, BehindADisconnectItFailsAndReadsFromNoOtherFile) {
+  TlsPair tls({Send("bye"), StallUntilFinish()}, 5, false);
+  tls.socket.Disconnect();
+  LogCapture log;
+  char byte = 0;
+  EXPECT_EQ(tls.socket._Read(&byte, 1), -1);
+  EXPECT_THAT(log.Lines(), SizeIs(1));
+}
+
 }  // namespace

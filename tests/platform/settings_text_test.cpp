@@ -57,4 +57,9 @@ TEST(FormatSettingsLine, PercentSignsInTheValueAreText) {
   EXPECT_EQ(line, "%s:%n%%%\n");
 }
 
+TEST(ReplaceSettingsLine, ALineWithoutItsEndDoesNotSwallowTheNextKey) {
+  EXPECT_EQ(ReplaceSettingsLine("a=\"1\"\nb=\"2\"\n", "a", "a=\"3\""), "a=\"3\"\nb=\"2\"\n");
+  EXPECT_EQ(ReplaceSettingsLine("a=\"1\"\nb=\"2\"\n", "b", "b=\"3\""), "a=\"1\"\nb=\"3\"");
+}
+
 }  // namespace
