@@ -9,6 +9,7 @@
 #include <cstdlib>
 #include <ctime>
 #include <initializer_list>
+#include <string_view>
 
 #include "tarnwick/utils/utils.h"
 
@@ -16,8 +17,8 @@ namespace {
 
 constexpr char kAuthInt[] = "auth-int";
 
-void Feed(MD5_CTX* context, std::initializer_list<std::string> texts) {
-  for (const std::string& text : texts) MD5_Update(context, text.data(), text.size());
+void Feed(MD5_CTX* context, std::initializer_list<std::string_view> texts) {
+  for (const std::string_view text : texts) MD5_Update(context, text.data(), text.size());
 }
 
 std::string Finish(MD5_CTX* context) {
@@ -26,7 +27,7 @@ std::string Finish(MD5_CTX* context) {
   return Md5ToHex(digest);
 }
 
-std::string HexOfMd5(std::initializer_list<std::string> texts) {
+std::string HexOfMd5(std::initializer_list<std::string_view> texts) {
   MD5_CTX context;
   MD5_Init(&context);
   Feed(&context, texts);

@@ -26,14 +26,9 @@ int TWHttpClient::CheckHttpResponse() {
   if (m_connState != 1) return HTTP_RET_NOT_READY;
   char line[kLineSize];
   if (ReadToLineEnd(line, kLineSize) < 0) return HTTP_RET_IO_ERROR;
-  switch (ParseStatusLine(line, &m_statusCode)) {
-    case StatusLine::kIncomplete:
-      return HTTP_RET_IO_ERROR;
-    case StatusLine::kNotHttp:
-      return HTTP_RET_BAD_RESPONSE;
-    case StatusLine::kParsed:
-      break;
-  }
+  const StatusLine parsed = ParseStatusLine(line, &m_statusCode);
+  if (parsed == StatusLine::kIncomplete) return HTTP_RET_IO_ERROR;
+  if (parsed == StatusLine::kNotHttp) return HTTP_RET_BAD_RESPONSE;
   const int result = CheckContentType();
   return result != HTTP_RET_OK ? result : ResultOf(m_statusCode);
 }
@@ -64,8 +59,7 @@ int TWHttpClient::CheckContentType() {
 bool TWHttpClient::KeepHeader(const char* line) {
   const HeaderLine parsed = ParseHeaderLine(line);
   if (!parsed.hasName) return false;
-  if (parsed.header == Header::kOther) return true;
-  if (parsed.value.empty()) return false;
+  if (parsed.header != Header::kOther && parsed.value.empty()) return false;
   const std::string value(parsed.value);
   switch (parsed.header) {
     case Header::kContentType:
