@@ -6,6 +6,7 @@
 #include <json/json.h>
 
 #include "tarnwick/log/twdebuglog.h"
+#include "tests/support/faults.h"
 #include "tests/support/files.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/process.h"
@@ -182,6 +183,14 @@ TEST(JsonParse, NoDepthOverflowsASmallStack) {
 TEST(JsonParse, BracketsInStringsAndCommentsAreNoNesting) {
   EXPECT_EQ(ResultOf("{\"success\":true,\"x\":\"" + std::string(5000, '[') + "\"}"), 0);
   EXPECT_EQ(ResultOf("/*" + std::string(5000, '{') + "*/{\"success\":true}"), 0);
+}
+
+TEST(JsonParse, WhereTheSystemDoesNotTellTheStackSixtyLevelsParseAndThousandsDoNot) {
+  Faults faults;
+  faults.FailFrom(Call::kPthreadGetattrNp, 1);
+  EXPECT_EQ(ResultOf(Nested(60)), 0);
+  EXPECT_EQ(ResultOf(Nested(900)), -1);
+  EXPECT_EQ(faults.Count(Call::kPthreadGetattrNp), 2);
 }
 
 TEST(JsonParse, AWideReplyIsParsed) {

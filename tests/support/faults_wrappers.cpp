@@ -134,6 +134,8 @@ PASS(Call::kPthreadCreate, int, pthread_create,
      (thread, attr, start, arg))
 PASS(Call::kPthreadAttrSetstacksize, int, pthread_attr_setstacksize,
      (pthread_attr_t * attr, size_t size), (attr, size))
+PASS(Call::kPthreadGetattrNp, int, pthread_getattr_np, (pthread_t thread, pthread_attr_t* attr),
+     (thread, attr))
 PASS(Call::kPthreadSigmask, int, pthread_sigmask, (int how, const sigset_t* set, sigset_t* old),
      (how, set, old))
 PASS(Call::kSigtimedwait, int, sigtimedwait,
