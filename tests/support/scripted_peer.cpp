@@ -28,6 +28,9 @@ ScriptedPeer::ScriptedPeer(std::vector<Script> connections, PeerOptions options,
   }
   Listen();
   thread_ = std::thread([this] { Run(); });
+  // A test may fork next, and its child would keep for ever a lock of the allocator that the new
+  // thread holds just then. From here on the thread sleeps until a connection comes.
+  running_.Wait();
 }
 
 ScriptedPeer::~ScriptedPeer() {
@@ -85,6 +88,7 @@ void ScriptedPeer::Fail(const std::string& message) {
 // The thread.
 
 void ScriptedPeer::Run() {
+  running_.Set();
   for (size_t i = 0; i < scripts_.size(); ++i) {
     const int fd = Accept();
     if (fd < 0) {

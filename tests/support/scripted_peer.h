@@ -26,6 +26,7 @@
 #include <thread>
 #include <vector>
 
+#include "tests/support/flag.h"
 #include "tests/support/peer_connection.h"
 #include "tests/support/peer_steps.h"
 #include "tests/support/ports.h"
@@ -88,6 +89,7 @@ class ScriptedPeer {
   size_t accepted_ = 0;
   size_t ended_ = 0;
   std::vector<std::string> failures_;
+  Flag running_;
   std::thread thread_;
 };
 
