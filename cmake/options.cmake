@@ -23,6 +23,9 @@ if(TARNWICK_SANITIZE)
   target_compile_options(tarnwick_library_options INTERFACE -fsanitize=${sanitizers})
   target_link_options(tarnwick_options INTERFACE -fsanitize=${sanitizers})
 endif()
+if(TARNWICK_FUZZ)
+  target_compile_options(tarnwick_library_options INTERFACE -fsanitize=fuzzer-no-link)
+endif()
 if(TARNWICK_COVERAGE)
   # Counters that threads do not tear, and names that do not depend on the working folder.
   target_compile_options(tarnwick_library_options INTERFACE
