@@ -40,14 +40,16 @@ bool CurlRequest::AddHeader(const std::string& line) {
 }
 
 // libcurl would else ignore SIGPIPE for the whole process while it works, and requests of several
-// threads could leave that behind.
-CURLcode CurlRequest::KeepProcessUntouched() {
-  const CURLcode code = Set(CURLOPT_NOSIGNAL, 1L);
-  return code != CURLE_OK ? code : Set(CURLOPT_OPENSOCKETFUNCTION, OpenSocket);
+// threads could leave that behind. And it would keep the TLS session for a next request of the
+// handle, which there is never: version 7.88 frees a name twice when memory runs out in doing so.
+CURLcode CurlRequest::SetOwnOptions() {
+  CURLcode code = Set(CURLOPT_NOSIGNAL, 1L);
+  if (code == CURLE_OK) code = Set(CURLOPT_OPENSOCKETFUNCTION, OpenSocket);
+  return code == CURLE_OK ? Set(CURLOPT_SSL_SESSIONID_CACHE, 0L) : code;
 }
 
 CURLcode CurlRequest::Perform() {
-  CURLcode code = KeepProcessUntouched();
+  CURLcode code = SetOwnOptions();
   if (code == CURLE_OK) {
     SigpipeGuard guard;
     code = curl_easy_perform(m_curl);

@@ -45,7 +45,7 @@ class CurlRequest {
   bool StatusIsSuccess();
 
  private:
-  CURLcode KeepProcessUntouched();
+  CURLcode SetOwnOptions();
   bool Accept(CURLcode code, const char* message, const char* detail);
 
   const char* m_operation;

@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <cstdint>
+#include <exception>
 
 #include "tarnwick/http/chunk_size.h"
 #include "tarnwick/http/twhttp.h"
@@ -15,7 +16,7 @@ constexpr char kErrorText[] = "{\"error\":true}";
 
 }  // namespace
 
-std::string TWHttpClient::GetResp() {
+std::string TWHttpClient::GetResp() try {
   m_connState = 1;
   if (CheckHttpResponse() != HTTP_RET_OK) {
     TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_DEBUG, "Http Resp error\n");
@@ -23,11 +24,15 @@ std::string TWHttpClient::GetResp() {
   }
   std::string body;
   return ReadBodyFor(__func__, &body) == HTTP_RET_OK ? body : kErrorText;
+} catch (const std::exception&) {  // memory ran out
+  return kErrorText;
 }
 
-int TWHttpClient::ReadBody(std::string& body) {
+int TWHttpClient::ReadBody(std::string& body) try {
   body.clear();
   return ReadBodyFor(__func__, &body);
+} catch (const std::exception&) {  // memory ran out
+  return HTTP_RET_IO_ERROR;
 }
 
 int TWHttpClient::ReadBodyFor(const char* operation, std::string* body) {

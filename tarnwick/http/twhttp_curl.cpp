@@ -1,6 +1,9 @@
 // One request through libcurl, as the one-call functions and file downloads need it.
 #define TW_LOG_SOURCE "twhttp"
 
+#include <cstdio>
+#include <exception>
+
 #include "tarnwick/http/curl_callbacks.h"
 #include "tarnwick/http/curl_request.h"
 #include "tarnwick/http/twhttp.h"
@@ -52,13 +55,19 @@ bool SetOutputFile(CurlRequest* curl, FILE* file) {
          Accept(curl->Set(CURLOPT_WRITEDATA, file));
 }
 
+// A full disk shows when stdio writes, which may be later than libcurl has handed over the bytes.
+bool IsWritten(FILE* file) {
+  if (file == nullptr || (fflush(file) == 0 && ferror(file) == 0)) return true;
+  return Accept(CURLE_WRITE_ERROR);
+}
+
 bool AddHeader(CurlRequest* curl, const std::string& line) {
   return Accept(curl->AddHeader(line) ? CURLE_OK : CURLE_OUT_OF_MEMORY);
 }
 
 }  // namespace
 
-int TWHttpClient::SendRequestByCurl(TW_HTTP_METHOD method, bool verifyPeer, int timeout) {
+int TWHttpClient::SendRequestByCurl(TW_HTTP_METHOD method, bool verifyPeer, int timeout) try {
   m_strCurlText.clear();
   CurlRequest curl(kSendRequestByCurl);
   if (!curl.Valid()) return HTTP_RET_IO_ERROR;
@@ -68,10 +77,12 @@ int TWHttpClient::SendRequestByCurl(TW_HTTP_METHOD method, bool verifyPeer, int 
   if (!SetCurlHeaders(&curl, method)) return m_result;
   const CURLcode code = curl.Perform();
   if (code == CURLE_PEER_FAILED_VERIFICATION) m_result = HTTP_RET_CERT_ERROR;
-  if (code != CURLE_OK || !curl.StatusIsSuccess()) return m_result;
+  if (code != CURLE_OK || !curl.StatusIsSuccess() || !IsWritten(m_pCurlRespFile)) return m_result;
   m_connState = 1;
   m_result = HTTP_RET_OK;
   return m_result;
+} catch (const std::exception&) {  // memory ran out
+  return HTTP_RET_IO_ERROR;
 }
 
 bool TWHttpClient::SetCurlOutput(CurlRequest* curl) {

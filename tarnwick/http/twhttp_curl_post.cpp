@@ -1,12 +1,13 @@
 // A POST through libcurl that logs in as the server asks and wants only the status.
 #include <algorithm>
+#include <exception>
 
 #include "tarnwick/http/curl_callbacks.h"
 #include "tarnwick/http/curl_request.h"
 #include "tarnwick/http/twhttp.h"
 #include "tarnwick/utils/utils.h"
 
-int TWHttpClient::SendRequestByPost(std::string separators) {
+int TWHttpClient::SendRequestByPost(std::string separators) try {
   CurlRequest curl(__func__);
   if (!curl.Valid()) return HTTP_RET_IO_ERROR;
   m_result = HTTP_RET_IO_ERROR;
@@ -21,6 +22,8 @@ int TWHttpClient::SendRequestByPost(std::string separators) {
     return m_result;
   }
   return PerformByCurl(&curl);
+} catch (const std::exception&) {  // memory ran out
+  return HTTP_RET_IO_ERROR;
 }
 
 // Scheme, host and port, up to the path. Never TLS.

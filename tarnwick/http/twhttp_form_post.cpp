@@ -3,12 +3,13 @@
 
 #include <algorithm>
 #include <climits>
+#include <exception>
 
 #include "tarnwick/http/twhttp.h"
 #include "tarnwick/log/twdebuglog.h"
 #include "tarnwick/utils/utils.h"
 
-int TWHttpClient::SendRequestBySocketPost(std::string content) {
+int TWHttpClient::SendRequestBySocketPost(std::string content) try {
   if (!ConnectAnew()) {
     TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_INFO,
            "Connection failed. host [%s:%d], path [%s], content [%s].\n", m_strHost.c_str(), m_port,
@@ -25,6 +26,8 @@ int TWHttpClient::SendRequestBySocketPost(std::string content) {
   m_connState = 1;
   m_result = CheckHttpResponse();
   return HTTP_RET_OK;
+} catch (const std::exception&) {  // memory ran out
+  return HTTP_RET_IO_ERROR;
 }
 
 std::string TWHttpClient::BuildFormPost(const std::string& content) const {

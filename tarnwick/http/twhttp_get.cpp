@@ -3,6 +3,7 @@
 
 #include <cstdio>
 #include <cstring>
+#include <exception>
 
 #include "tarnwick/http/challenge_words.h"
 #include "tarnwick/http/query_encoding.h"
@@ -16,7 +17,7 @@ constexpr size_t kMaxRequest = 2048;
 
 }  // namespace
 
-int TWHttpClient::SendRequestByGet() {
+int TWHttpClient::SendRequestByGet() try {
   if (!ConnectAnew()) {
     TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_DEBUG, "Connection failed!\n");
     return HTTP_RET_IO_ERROR;
@@ -30,6 +31,8 @@ int TWHttpClient::SendRequestByGet() {
   m_connState = 1;
   m_result = CheckHttpResponse();
   return HTTP_RET_OK;
+} catch (const std::exception&) {  // memory ran out
+  return HTTP_RET_IO_ERROR;
 }
 
 // The stored authorization is for one request and is gone afterwards.
@@ -48,7 +51,7 @@ std::string TWHttpClient::BuildGetRequest() {
   return request;
 }
 
-int TWHttpClient::SendRequest(TW_HTTP_METHOD method, std::string arg) {
+int TWHttpClient::SendRequest(TW_HTTP_METHOD method, std::string arg) try {
   if (method != HTTP_METHOD_GET) return SendRequestByPost(arg);
   if (m_bBasicAuth) m_strAuthorization = GenBasicAccessAuth();
   const int result = SendRequestByGet();
@@ -62,4 +65,6 @@ int TWHttpClient::SendRequest(TW_HTTP_METHOD method, std::string arg) {
     return SendRequestByGet();
   }
   return result;
+} catch (const std::exception&) {  // memory ran out
+  return HTTP_RET_IO_ERROR;
 }

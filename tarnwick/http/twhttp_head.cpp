@@ -1,6 +1,8 @@
 // Reading a response's head.
 #define TW_LOG_SOURCE "twhttp"
 
+#include <exception>
+
 #include "tarnwick/http/head_parser.h"
 #include "tarnwick/http/twhttp.h"
 #include "tarnwick/log/twdebuglog.h"
@@ -21,7 +23,7 @@ int ResultOf(int status) {
 
 }  // namespace
 
-int TWHttpClient::CheckHttpResponse() {
+int TWHttpClient::CheckHttpResponse() try {
   m_statusCode = 0;
   if (m_connState != 1) return HTTP_RET_NOT_READY;
   char line[kLineSize];
@@ -31,9 +33,11 @@ int TWHttpClient::CheckHttpResponse() {
   if (parsed == StatusLine::kNotHttp) return HTTP_RET_BAD_RESPONSE;
   const int result = CheckContentType();
   return result != HTTP_RET_OK ? result : ResultOf(m_statusCode);
+} catch (const std::exception&) {  // memory ran out
+  return HTTP_RET_IO_ERROR;
 }
 
-int TWHttpClient::CheckContentType() {
+int TWHttpClient::CheckContentType() try {
   m_mapContent.clear();
   m_strCookie.clear();
   m_strAuthenticate.clear();
@@ -53,6 +57,8 @@ int TWHttpClient::CheckContentType() {
   // Lines beyond the last allowed one are left in front of the body.
   m_connState = 2;
   return HTTP_RET_OK;
+} catch (const std::exception&) {  // memory ran out
+  return HTTP_RET_IO_ERROR;
 }
 
 // Results: false for a line without a name, and for a known name without anything behind it.

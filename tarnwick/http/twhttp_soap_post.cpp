@@ -1,16 +1,16 @@
 // SOAP POSTs over the client's socket: plain, with a login, and with the reply as XML.
 #define TW_LOG_SOURCE "twhttp"
 
-#include <libxml/parser.h>
-
 #include <algorithm>
 #include <climits>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <exception>
 
 #include "tarnwick/http/challenge_words.h"
 #include "tarnwick/http/twhttp.h"
+#include "tarnwick/http/xml_reply.h"
 #include "tarnwick/log/twdebuglog.h"
 #include "tarnwick/platform/owned.h"
 #include "tarnwick/utils/utils.h"
@@ -65,7 +65,7 @@ class ReplyBuffer {
 
 }  // namespace
 
-int TWHttpClient::SendReqBySocketPost(const std::string& body, std::string& reply) {
+int TWHttpClient::SendReqBySocketPost(const std::string& body, std::string& reply) try {
   if (body.empty()) {
     TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_DEBUG, "Empty msg.\n");
     return HTTP_RET_IO_ERROR;
@@ -80,6 +80,8 @@ int TWHttpClient::SendReqBySocketPost(const std::string& body, std::string& repl
   std::string length;
   GetHttpContent(HTTP_CONTENT_LENGTH, length);
   return ReadSoapReply(ToLength(length), &reply);
+} catch (const std::exception&) {  // memory ran out
+  return HTTP_RET_IO_ERROR;
 }
 
 // The stored authorization is for one request and is gone afterwards.
@@ -126,7 +128,7 @@ int TWHttpClient::ReadSoapReply(int length, std::string* reply) {
   return HTTP_RET_OK;
 }
 
-int TWHttpClient::SendAuthReqBySocketPost(const std::string& body, std::string& reply) {
+int TWHttpClient::SendAuthReqBySocketPost(const std::string& body, std::string& reply) try {
   int result = SendReqBySocketPost(body, reply);
   // Asked of the last response, not of the result: a 401 without a body has failed above.
   if (m_result == HTTP_RET_UNAUTHORIZED) {
@@ -141,15 +143,19 @@ int TWHttpClient::SendAuthReqBySocketPost(const std::string& body, std::string& 
   if (result != HTTP_RET_OK) return result;
   int status = 0;
   return CheckResponse(status);
+} catch (const std::exception&) {  // memory ran out
+  return HTTP_RET_IO_ERROR;
 }
 
-int TWHttpClient::SendReqByXMLSocketPost(std::string body, xmlDoc*& doc) {
+int TWHttpClient::SendReqByXMLSocketPost(std::string body, xmlDoc*& doc) try {
   std::string reply;
   const int result = SendReqBySocketPost(body, reply);
   if (result != HTTP_RET_OK) return result;
   // Devices break lines in the middle of values; callers compare the joined text.
   RemoveChar(reply, '\r');
   RemoveChar(reply, '\n');
-  doc = xmlParseMemory(reply.data(), static_cast<int>(reply.size()));
+  doc = ParseXml(reply.data(), static_cast<int>(reply.size()));
   return result;
+} catch (const std::exception&) {  // memory ran out
+  return HTTP_RET_IO_ERROR;
 }

@@ -1,6 +1,8 @@
 // Opening a streaming upload.
 #define TW_LOG_SOURCE "twhttp"
 
+#include <exception>
+
 #include "tarnwick/http/twhttp.h"
 #include "tarnwick/log/twdebuglog.h"
 #include "tarnwick/utils/utils.h"
@@ -12,7 +14,7 @@ constexpr int64_t kEndless = int64_t{1} << 37;
 
 }  // namespace
 
-int TWHttpClient::OpenRawDataUpload() {
+int TWHttpClient::OpenRawDataUpload() try {
   if (!ConnectAnew()) {
     TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_ERROR, "Connection failed!\n");
     return HTTP_RET_IO_ERROR;
@@ -24,6 +26,8 @@ int TWHttpClient::OpenRawDataUpload() {
   }
   m_connState = 2;  // opens WriteData for the caller's pieces
   return HTTP_RET_OK;
+} catch (const std::exception&) {  // memory ran out
+  return HTTP_RET_IO_ERROR;
 }
 
 std::string TWHttpClient::BuildUploadHead() const {

@@ -2,15 +2,17 @@
 #define TW_LOG_SOURCE "twhttp"
 
 #include <fcntl.h>
-#include <libxml/parser.h>
+#include <libxml/tree.h>
 
 #include <climits>
 #include <cstdio>
 #include <cstdlib>
+#include <exception>
 
 #include "tarnwick/http/curl_callbacks.h"
 #include "tarnwick/http/curl_request.h"
 #include "tarnwick/http/twhttp.h"
+#include "tarnwick/http/xml_reply.h"
 #include "tarnwick/log/twdebuglog.h"
 #include "tarnwick/platform/owned.h"
 
@@ -44,7 +46,7 @@ constexpr char kSetFile[] = "Failed to set file";
 
 }  // namespace
 
-int TWHttpClient::SendReqByXMLGet(int timeout) {
+int TWHttpClient::SendReqByXMLGet(int timeout) try {
   CurlRequest curl(__func__);
   if (!curl.Valid()) return HTTP_RET_IO_ERROR;
   m_result = HTTP_RET_IO_ERROR;
@@ -55,9 +57,11 @@ int TWHttpClient::SendReqByXMLGet(int timeout) {
     return m_result;
   }
   return PerformByCurl(&curl);
+} catch (const std::exception&) {  // memory ran out
+  return HTTP_RET_IO_ERROR;
 }
 
-int TWHttpClient::SendReqByXMLPost(xmlDoc*& doc) {
+int TWHttpClient::SendReqByXMLPost(xmlDoc*& doc) try {
   char body[kMaxPostBody];
   if (!SerialiseXml(doc, body)) {
     TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_DEBUG, "Empty xml document\n");
@@ -72,9 +76,11 @@ int TWHttpClient::SendReqByXMLPost(xmlDoc*& doc) {
     return m_result;
   }
   return PerformByCurl(&curl);
+} catch (const std::exception&) {  // memory ran out
+  return HTTP_RET_IO_ERROR;
 }
 
-int TWHttpClient::SendReqByXMLPut(xmlDoc*& doc) {
+int TWHttpClient::SendReqByXMLPut(xmlDoc*& doc) try {
   CurlRequest curl(__func__);
   if (!curl.Valid()) return HTTP_RET_IO_ERROR;
   m_result = HTTP_RET_IO_ERROR;
@@ -93,6 +99,8 @@ int TWHttpClient::SendReqByXMLPut(xmlDoc*& doc) {
     return m_result;
   }
   return PutXmlFile(&curl, doc, file.get());
+} catch (const std::exception&) {  // memory ran out
+  return HTTP_RET_IO_ERROR;
 }
 
 // REQUIRES: `file` is open for writing and reading.
@@ -113,7 +121,7 @@ int TWHttpClient::PutXmlFile(CurlRequest* curl, xmlDoc* doc, FILE* file) {
   return PerformByCurl(curl);
 }
 
-int TWHttpClient::SendReqByXMLDelete() {
+int TWHttpClient::SendReqByXMLDelete() try {
   CurlRequest curl(__func__);
   if (!curl.Valid()) return HTTP_RET_IO_ERROR;
   m_result = HTTP_RET_IO_ERROR;
@@ -123,6 +131,8 @@ int TWHttpClient::SendReqByXMLDelete() {
     return m_result;
   }
   return PerformByCurl(&curl);
+} catch (const std::exception&) {  // memory ran out
+  return HTTP_RET_IO_ERROR;
 }
 
 bool TWHttpClient::GetResponseXML(xmlDoc*& doc) {
@@ -132,7 +142,7 @@ bool TWHttpClient::GetResponseXML(xmlDoc*& doc) {
     return false;
   }
   const bool fits = m_respLen <= INT_MAX;
-  doc = fits ? xmlParseMemory(text.get(), static_cast<int>(m_respLen)) : nullptr;
+  doc = fits ? ParseXml(text.get(), static_cast<int>(m_respLen)) : nullptr;
   m_pRespBuf = nullptr;
   m_respLen = 0;
   if (doc != nullptr) return true;

@@ -2,6 +2,7 @@
 #include "tarnwick/log/log_names.h"
 
 #include "tarnwick/log/twdebuglog.h"
+#include "tarnwick/platform/owned.h"
 
 namespace {
 
@@ -52,6 +53,9 @@ TWEnum2StrMap<LOG_LEVEL>::~TWEnum2StrMap() = default;
 
 template <typename T>
 const TWEnum2StrMap<T>& NamesOf() {
+  // A thread that waits for another one to build the names may find errno changed, and a log line
+  // must not change its caller's.
+  const ErrnoKeeper keeper;
   static const TWEnum2StrMap<T> names;
   return names;
 }

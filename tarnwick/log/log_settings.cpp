@@ -7,6 +7,7 @@
 #include <climits>
 #include <cstdlib>
 #include <cstring>
+#include <exception>
 
 #include "tarnwick/log/twdebuglog.h"
 #include "tarnwick/platform/file_lock.h"
@@ -61,7 +62,7 @@ int TWDbgLogCfg::Init(int /*unused*/) {
   return LoadDbgLogSettings();
 }
 
-int TWDbgLogCfg::LoadDbgLogSettings() {
+int TWDbgLogCfg::LoadDbgLogSettings() try {
   char levels[1024];
   const int levelsRead = ReadSettingValue(kSettingsFile, kLevelsKey, levels, sizeof(levels));
   if (levelsRead >= 1) {
@@ -75,9 +76,11 @@ int TWDbgLogCfg::LoadDbgLogSettings() {
   if (ReadSettingValue(kSettingsFile, kTimeScaleKey, timeScale, sizeof(timeScale)) < 1) return -1;
   SetTimeScale(std::strcmp(timeScale, "yes") == 0);
   return levelsRead < 1 ? -1 : 0;
+} catch (const std::exception&) {  // memory ran out
+  return -1;
 }
 
-int TWDbgLogCfg::SaveDbgLogSettings() {
+int TWDbgLogCfg::SaveDbgLogSettings() try {
   std::string levels;
   for (int categ = 0; categ < LOG_CATEG_COUNT; ++categ) {
     if (categ > 0) levels += ',';
@@ -89,4 +92,6 @@ int TWDbgLogCfg::SaveDbgLogSettings() {
   const int timeScaleResult =
       WriteSettingValue(kSettingsFile, kTimeScaleKey, TimeScale() ? "yes" : "no", kLineFormat);
   return levelsResult == -1 || timeScaleResult == -1 ? -1 : 0;
+} catch (const std::exception&) {  // memory ran out
+  return -1;
 }

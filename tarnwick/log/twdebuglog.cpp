@@ -8,13 +8,16 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <csignal>
 #include <cstdarg>
 #include <cstdio>
 #include <ctime>
 #include <string_view>
 
 #include "tarnwick/platform/file_lock.h"
+#include "tarnwick/platform/fork_hold.h"
 #include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/signal_guard.h"
 
 namespace {
 
@@ -31,15 +34,6 @@ const char* PathOf(LOG_TYPE type) {
       return "/var/log/tarnwick/twnotification.log";
   }
   return nullptr;
-}
-
-OwnedFd OpenLog(LOG_TYPE type) {
-  const char* const path = PathOf(type);
-  if (path == nullptr) {
-    errno = EFAULT;  // what open gives for a path that is none
-    return OwnedFd(-1);
-  }
-  return OwnedFd(open(path, O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, 0666));
 }
 
 // The main thread's id is the process's and is not printed twice.
@@ -63,10 +57,13 @@ void FormatTags(const char* categ, const char* level, char* text) {
 // Milliseconds only when the administrator asked for them; no time at all when the clock's value
 // cannot be converted.
 void FormatTime(char* text) {
-  struct timeval now;
+  struct timeval now = {};
   struct tm local;
   text[0] = '\0';
   gettimeofday(&now, nullptr);
+  // The C library has a lock for the time zone, which a fork in the middle of it would leave held
+  // in the child.
+  const ForkHold hold;
   if (localtime_r(&now.tv_sec, &local) == nullptr) return;
   const size_t length = strftime(text, kPartSize, "%b %e %T", &local);
   if (g_pDbgLogCfg != nullptr && g_pDbgLogCfg->TimeScale()) {
@@ -86,15 +83,15 @@ struct CallSite {
   const char* func;
 };
 
-void WritePrefix(FILE* stream, const char* categ, const char* level, const CallSite& site) {
+bool WritePrefix(FILE* stream, const char* categ, const char* level, const CallSite& site) {
   char process[kPartSize];
   char tags[kPartSize];
   char time[kPartSize];
   FormatProcess(process);
   FormatTags(categ, level, tags);
   FormatTime(time);
-  fprintf(stream, "%s %s%s %s:%d:%s(): ", time, process, tags, site.file + BaseNameStart(site.file),
-          site.line, site.func);
+  return fprintf(stream, "%s %s%s %s:%d:%s(): ", time, process, tags,
+                 site.file + BaseNameStart(site.file), site.line, site.func) >= 0;
 }
 
 }  // namespace
@@ -107,25 +104,27 @@ void TWPrintf(LOG_TYPE type, const char* categ, const char* level, const char* f
               const char* func, const char* format, ...) {
   // Callers read errno after they have logged.
   const ErrnoKeeper keeper;
-  OwnedFd fd = OpenLog(type);
-  if (!fd.Valid()) {
+  UninheritedFile log(PathOf(type), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, 0666);
+  if (!log.Valid()) {
     syslog(LOG_ERR, "%s:%d:%s(): open twlog file failed with errno [%d].", kSourceName, __LINE__,
            __func__, errno);
     return;
   }
-  const OwnedFile stream(fdopen(fd.Get(), "a"));
-  if (!stream) {
+  if (!log.MakeStream("a")) {
     syslog(LOG_ERR, "%s:%d:%s(): fdopen twlog file failed with errno [%d].", kSourceName, __LINE__,
            __func__, errno);
     return;
   }
-  FileLock lock(fd.Release());  // the stream closes the descriptor
+  const FileLock lock(log.Get());
   if (!lock.Held()) return;
-  WritePrefix(stream.get(), categ, level,
-              {file != nullptr ? file : "", line, func != nullptr ? func : ""});
+  SignalGuard sizeLimit(SIGXFSZ);  // at the process's file size limit a write ends it otherwise
   va_list arguments;
   va_start(arguments, format);
-  if (format != nullptr) vfprintf(stream.get(), format, arguments);
+  // A message whose prefix did not fit would stand behind another line.
+  const bool written =
+      WritePrefix(log.Stream(), categ, level,
+                  {file != nullptr ? file : "", line, func != nullptr ? func : ""}) &&
+      (format == nullptr || vfprintf(log.Stream(), format, arguments) >= 0);
   va_end(arguments);
-  fflush(stream.get());
+  if (!written) sizeLimit.TakeBack();
 }

@@ -20,6 +20,7 @@
 
 #include <cstdint>
 #include <map>
+#include <new>
 #include <string>
 
 #include "tarnwick/platform/export.h"
@@ -235,9 +236,11 @@ TARNWICK_API void FreeDbgCfg();
 //   then "file:line:function(): " and the message. Milliseconds are printed when the shared record
 //   says so.
 // Failures: a file that cannot be opened, and an undefined `type` (errno EFAULT), is reported to
-//   the system log; a lock that cannot be had drops the line silently. errno is left as it was.
+//   the system log; a lock that cannot be had drops the line silently. A full disk and the
+//   process's limit on file sizes cut the line or lose it; no SIGXFSZ comes of it. errno is kept.
 // Threads: any thread of any process; lines never mix, because each is written under an exclusive
-//   flock of the file. Blocks while another process holds that lock.
+//   flock of the file. Blocks while another process holds that lock. A process may fork meanwhile:
+//   the child has none of the open log files and may log itself.
 TARNWICK_API void TWPrintf(LOG_TYPE type, const char* categ, const char* level, const char* file,
                            int line, const char* func, const char* format, ...)
     __attribute__((format(printf, 7, 8)));
@@ -253,6 +256,17 @@ inline bool TWLogEnabled(LOG_CATEG categ, LOG_LEVEL level) {
   return level <= (cfg != nullptr ? cfg->Level(categ) : static_cast<int>(LOG_LEVEL_NOTICE));
 }
 
+// Enum2String for TW_LOG: "unknown" when there is no memory for the names, which the first call of a
+// process builds. A log call throws nothing.
+template <typename T>
+const char* TWLogName(T value) {
+  try {
+    return Enum2String(value);
+  } catch (const std::bad_alloc&) {
+    return "unknown";
+  }
+}
+
 // The source name that TW_LOG prints. A source file gives its own bare name by defining the macro
 // before its first include; without that its path is used, of which the base name is printed.
 #ifndef TW_LOG_SOURCE
@@ -266,14 +280,14 @@ inline bool TWLogEnabled(LOG_CATEG categ, LOG_LEVEL level) {
 
 // TW_LOG under the name of another function: for a helper that logs for the operation it is a step
 // of, so that readers of the log find the name that they call.
-#define TW_LOG_AS(func, categ, level, ...)                                                     \
-  do {                                                                                         \
-    const LOG_CATEG twLogCateg = (categ);                                                      \
-    const LOG_LEVEL twLogLevel = (level);                                                      \
-    if (TWLogEnabled(twLogCateg, twLogLevel)) {                                                \
-      TWPrintf(LOG_TYPE_MAIN, Enum2String(twLogCateg), Enum2String(twLogLevel), TW_LOG_SOURCE, \
-               __LINE__, (func), __VA_ARGS__);                                                 \
-    }                                                                                          \
+#define TW_LOG_AS(func, categ, level, ...)                                                 \
+  do {                                                                                     \
+    const LOG_CATEG twLogCateg = (categ);                                                  \
+    const LOG_LEVEL twLogLevel = (level);                                                  \
+    if (TWLogEnabled(twLogCateg, twLogLevel)) {                                            \
+      TWPrintf(LOG_TYPE_MAIN, TWLogName(twLogCateg), TWLogName(twLogLevel), TW_LOG_SOURCE, \
+               __LINE__, (func), __VA_ARGS__);                                             \
+    }                                                                                      \
   } while (0)
 
 #endif  // TARNWICK_LOG_TWDEBUGLOG_H_

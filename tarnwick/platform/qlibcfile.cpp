@@ -5,6 +5,7 @@
 
 #include <climits>
 #include <cstring>
+#include <exception>
 #include <string>
 #include <string_view>
 
@@ -114,32 +115,39 @@ bool IsKey(const char* key) {
   return key != nullptr && key[0] != '\0' && strpbrk(key, "=# \t\r\n") == nullptr;
 }
 
-int Refuse() {
-  errno = EINVAL;
+int RefuseFor(int error) {
+  errno = error;
   return -1;
 }
 
 }  // namespace
 
 __attribute__((weak)) int QLIBCFileGetKeyValue(const char* path, const char* key, char* value,
-                                               int size, int /*flags*/) {
-  if (path == nullptr || !IsKey(key) || value == nullptr || size < 1) return Refuse();
+                                               int size, int /*flags*/) try {
+  if (path == nullptr || key == nullptr || key[0] == '\0' || value == nullptr || size < 1) {
+    return RefuseFor(EINVAL);
+  }
   const OwnedFd fd(open(path, O_RDONLY | O_CLOEXEC));
   std::string text;
   if (!fd.Valid() || !ReadAll(fd.Get(), &text)) return -1;
-  const SettingsLine line = FindSettingsLine(text, key);
+  const SettingsLine line = IsKey(key) ? FindSettingsLine(text, key) : SettingsLine();
   const size_t stored = line.value.copy(value, static_cast<size_t>(size) - 1);
   value[stored] = '\0';
   return line.value.size() > INT_MAX ? INT_MAX : static_cast<int>(line.value.size());
+} catch (const std::exception&) {
+  return RefuseFor(ENOMEM);
 }
 
 __attribute__((weak)) int QLIBCFileSetKeyValue(const char* path, const char* key, const char* value,
-                                               const char* format) {
-  if (path == nullptr || !IsKey(key) || value == nullptr || format == nullptr) return Refuse();
+                                               const char* format) try {
+  if (path == nullptr || !IsKey(key) || value == nullptr || format == nullptr)
+    return RefuseFor(EINVAL);
   std::string line;
   if (strchr(value, '\n') != nullptr || !FormatSettingsLine(format, key, value, &line)) {
-    return Refuse();
+    return RefuseFor(EINVAL);
   }
   const std::string file = ResolvePath(path);
   return !file.empty() && RewriteKey(file, key, line) ? 0 : -1;
+} catch (const std::exception&) {
+  return RefuseFor(ENOMEM);
 }

@@ -2,25 +2,11 @@
 #ifndef TARNWICK_PLATFORM_SIGPIPE_GUARD_H_
 #define TARNWICK_PLATFORM_SIGPIPE_GUARD_H_
 
-#include <csignal>
+#include "tarnwick/platform/signal_guard.h"
 
-// SIGPIPE is raised in the thread that writes. The guard blocks it there, and takes it back when a
-// write has raised it; the disposition of the process is not touched, and the thread's mask is as
-// before afterwards. A SIGPIPE that was pending before stays pending. errno is kept.
-class SigpipeGuard {
+class SigpipeGuard : public SignalGuard {
  public:
-  SigpipeGuard();
-  ~SigpipeGuard();
-  SigpipeGuard(const SigpipeGuard&) = delete;
-  SigpipeGuard& operator=(const SigpipeGuard&) = delete;
-
-  // Call it after each failed write in the guard's scope: takes back what the write raised.
-  void TakeBack();
-
- private:
-  sigset_t m_sigpipe;
-  sigset_t m_before;
-  bool m_pendingBefore;
+  SigpipeGuard() : SignalGuard(SIGPIPE) {}
 };
 
 #endif  // TARNWICK_PLATFORM_SIGPIPE_GUARD_H_

@@ -9,7 +9,7 @@ constexpr int kMicrosecondsPerSecond = 1000000;
 
 // Signed and 32 bits wide: a clock that was set far away counts like any other elapsed time.
 int ElapsedSince(const struct timeval& mark) {
-  struct timeval now;
+  struct timeval now = {};
   gettimeofday(&now, nullptr);
   const int64_t elapsed = (static_cast<int64_t>(now.tv_usec) - mark.tv_usec) +
                           (static_cast<int64_t>(now.tv_sec) - mark.tv_sec) * kMicrosecondsPerSecond;
@@ -37,9 +37,9 @@ int DelayTimer::Delay() {
     BeginTiming();
     return sched_yield();  // pthread_yield by its standard name
   }
-  // In 64 bits: the sum of a long period overflows a 32-bit long.
+  // In 64 bits: a long period or the year 2038 overflows a 32-bit long.
   const int64_t end = int64_t{m_mark.tv_usec} + m_delay;
-  m_mark.tv_sec += static_cast<time_t>(end / kMicrosecondsPerSecond);
+  m_mark.tv_sec = static_cast<time_t>(int64_t{m_mark.tv_sec} + end / kMicrosecondsPerSecond);
   m_mark.tv_usec = static_cast<suseconds_t>(end % kMicrosecondsPerSecond);
   return usleep(static_cast<useconds_t>(m_delay - elapsed));
 }

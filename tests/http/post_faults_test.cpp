@@ -4,6 +4,7 @@
 #include <libxml/parser.h>
 #include <libxml/tree.h>
 
+#include <cstdint>
 #include <stdexcept>
 
 #include "tests/http/http_test_util.h"
@@ -105,7 +106,7 @@ class RequestServer {
     if (head == std::string::npos) return false;
     const size_t line = request.find("Content-Length: ");
     if (line > head) return true;
-    const size_t length = std::stoull(request.substr(line + 16));
+    const uint64_t length = std::stoull(request.substr(line + 16));
     return length >= kEndless || request.size() >= head + 4 + length;
   }
 

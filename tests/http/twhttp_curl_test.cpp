@@ -10,6 +10,7 @@
 namespace {
 
 using ::testing::AllOf;
+using ::testing::Contains;
 using ::testing::ElementsAre;
 using ::testing::EndsWith;
 using ::testing::HasSubstr;
@@ -239,6 +240,18 @@ TEST(SendRequestByCurl, AFileThatTakesNothingFailsTheTransfer) {
   ClientProbe client(peer.Port());
   client.SetCurlRespFile(file);
   EXPECT_EQ(client.SendRequestByCurl(HTTP_METHOD_GET, true, 10), HTTP_RET_IO_ERROR);
+  fclose(file);
+}
+
+TEST(SendRequestByCurl, AFileOnAFullDiskIsAnIoErrorThoughStdioTookTheBytes) {
+  ScriptedPeer peer({Exchange(kOk)});
+  FILE* file = fopen("/dev/full", "we");
+  ClientProbe client(peer.Port());
+  client.SetCurlRespFile(file);
+  LogCapture log;
+  EXPECT_EQ(client.SendRequestByCurl(HTTP_METHOD_GET, true, 10), HTTP_RET_IO_ERROR);
+  EXPECT_EQ(client.m_result, HTTP_RET_IO_ERROR);
+  EXPECT_THAT(log.Messages(), Contains(StartsWith("CURL Error(23): ")));
   fclose(file);
 }
 

@@ -3,7 +3,9 @@
 #include <gtest/gtest.h>
 #include <libxml/parser.h>
 #include <libxml/tree.h>
+#include <sys/resource.h>
 
+#include <csignal>
 #include <cstdlib>
 #include <map>
 
@@ -417,6 +419,19 @@ TEST(SendReqByXMLPut, ADocumentOfSeveralMebibytesIsSentWhole) {
   EXPECT_EQ(client.SendReqByXMLPut(document.doc), HTTP_RET_OK);
   const std::string request = peer.Received(0);
   EXPECT_TRUE(request.substr(request.find("\r\n\r\n") + 4) == text);
+}
+
+TEST(SendReqByXMLPut, ADocumentThatTheDiskDoesNotTakeIsNotSent) {
+  ScriptedPeer peer({});  // a connection would fail the test
+  const ChildResult child = RunInChild([&] {
+    const rlimit nothing = {0, 0};
+    setrlimit(RLIMIT_FSIZE, &nothing);
+    signal(SIGXFSZ, SIG_IGN);
+    ClientProbe client(peer.Port());
+    OwnedDoc document("<r/>");
+    return client.SendReqByXMLPut(document.doc);
+  });
+  EXPECT_EQ(child.code, HTTP_RET_IO_ERROR);
 }
 
 TEST(SendReqByXMLGet, AChallengeOfDigestOrBasicIsAnswered) {

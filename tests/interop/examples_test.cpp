@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 
 #include <set>
+#include <utility>
 
 #include "tests/interop/certificates.h"
 #include "tests/interop/servers.h"
@@ -92,9 +93,10 @@ const std::vector<ExampleCase>& Cases() {
 // Runs an example; `output` receives what it writes to standard output and error.
 ChildResult RunExample(const std::string& program, const std::vector<std::string>& arguments,
                        std::string* output) {
-  std::vector<std::string> command = {"/bin/sh", "-c", "exec \"$0\" \"$@\" 2>&1",
-                                      TARNWICK_EXAMPLES_FOLDER "/" + program};
-  command.insert(command.end(), arguments.begin(), arguments.end());
+  std::vector<std::string> example = {TARNWICK_EXAMPLES_FOLDER "/" + program};
+  example.insert(example.end(), arguments.begin(), arguments.end());
+  std::vector<std::string> command = {"/bin/sh", "-c", "exec \"$0\" \"$@\" 2>&1"};
+  for (std::string& word : Runnable(example)) command.push_back(std::move(word));
   return RunProgram(command, output);
 }
 

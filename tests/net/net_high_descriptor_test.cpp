@@ -4,6 +4,7 @@
 #include "tests/net/net_test_util.h"
 #include "tests/support/faults.h"
 #include "tests/support/ports.h"
+#include "tests/support/process.h"
 #include "tests/support/scripted_peer.h"
 #include "tests/support/tls_scripted_peer.h"
 
@@ -41,6 +42,10 @@ class TakenDescriptors {
 
 class HighDescriptor : public ::testing::Test {
  protected:
+  void SetUp() override {
+    if (IsEmulated()) GTEST_SKIP() << kNoHighSelect;
+  }
+
   TakenDescriptors taken_;
 };
 

@@ -7,6 +7,7 @@
 #include "tests/net/net_test_util.h"
 #include "tests/support/faults.h"
 #include "tests/support/ports.h"
+#include "tests/support/process.h"
 
 namespace {
 
@@ -98,6 +99,7 @@ TEST(DoSelect, LogsEachInterruptionAndGoesOn) {
 }
 
 TEST(DoSelect, SignalsDoNotProlongTheWait) {
+  if (IsEmulated()) GTEST_SKIP() << kNoCountdown;
   LogCapture log;
   PairedSocket socket(1, true);
   const Stopwatch watch;

@@ -151,6 +151,12 @@ TEST(GetKeyValue, ArgumentsThatAreNullEmptyOrNotPositiveAreRefused) {
   EXPECT_STREQ(value, "before");
 }
 
+// Such lines are no settings, so the key is one that the file does not have.
+TEST(GetKeyValue, AKeyThatIsNoWordIsNotInTheFile) {
+  const std::string text = "two words=\"1\"\n#name=\"2\"\na=b=\"3\"\n";
+  for (const char* key : {"two words", "#name", "a=b", " ", "two\nwords"}) ExpectGot(text, key, "");
+}
+
 TEST(GetKeyValue, AFileOfSeveralReadsIsReadWhole) {
   std::string text;
   for (int i = 0; i < 5000; ++i) text += "filler" + std::to_string(i) + "=\"x\"\n";

@@ -1,6 +1,7 @@
 #include "tests/support/process.h"
 
 #include <dirent.h>
+#include <elf.h>
 #include <fcntl.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -14,9 +15,14 @@
 #include <cerrno>
 #include <cstdio>
 #include <cstdlib>
+#include <filesystem>
+#include <fstream>
 
 #ifdef TARNWICK_COVERAGE
 extern "C" void __gcov_dump();
+#endif
+#ifndef TARNWICK_TEST_EMULATOR
+#define TARNWICK_TEST_EMULATOR
 #endif
 
 namespace {
@@ -25,6 +31,21 @@ using std::chrono::milliseconds;
 using std::chrono::steady_clock;
 
 constexpr int kFailedCheck = 99;
+
+// The words in front of an emulated program's name.
+const std::vector<std::string>& Emulator() {
+  static const std::vector<std::string> words = {TARNWICK_TEST_EMULATOR};
+  return words;
+}
+
+// The processor that a program is built for; EM_NONE for a script. The header begins alike for
+// all word sizes.
+Elf32_Half MachineOf(const std::string& program) {
+  Elf32_Ehdr header = {};
+  std::ifstream(program, std::ios::binary).read(reinterpret_cast<char*>(&header), sizeof(header));
+  const bool is_elf = std::string(header.e_ident, header.e_ident + SELFMAG) == ELFMAG;
+  return is_elf ? header.e_machine : static_cast<Elf32_Half>(EM_NONE);
+}
 
 [[noreturn]] void RunBody(const std::function<int()>& body) {
   const int result = body();
@@ -63,7 +84,7 @@ std::string Drain(int fd, steady_clock::time_point deadline) {
   for (const std::string& word : command) argv.push_back(const_cast<char*>(word.c_str()));
   argv.push_back(nullptr);
   dup2(output, STDOUT_FILENO);
-  execv(argv[0], argv.data());
+  execvp(argv[0], argv.data());
   _exit(127);
 }
 
@@ -113,15 +134,29 @@ ChildResult RunInChild(const std::function<int()>& body, milliseconds limit) {
   return Child(body).Wait(limit);
 }
 
+bool IsEmulated() {
+  return !Emulator().empty();
+}
+
+std::vector<std::string> Runnable(const std::vector<std::string>& command) {
+  if (!IsEmulated() || MachineOf(command[0]) != MachineOf("/proc/self/exe")) return command;
+  std::vector<std::string> words = Emulator();
+  words.insert(words.end(), command.begin(), command.end());
+  // For the emulator, /proc/self would be its own folder.
+  words[Emulator().size()] = std::filesystem::canonical(command[0]);
+  return words;
+}
+
 ChildResult RunProgram(const std::vector<std::string>& command, std::string* output,
                        milliseconds limit) {
+  const std::vector<std::string> words = Runnable(command);
   int ends[2];
   if (pipe2(ends, O_CLOEXEC) != 0) {
     ADD_FAILURE() << "no pipe";
     return {};
   }
   const auto deadline = steady_clock::now() + limit;
-  Child child([&]() -> int { Execute(command, ends[1]); });
+  Child child([&]() -> int { Execute(words, ends[1]); });
   close(ends[1]);
   const std::string text = Drain(ends[0], deadline);
   close(ends[0]);

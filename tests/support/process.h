@@ -40,8 +40,20 @@ class Child {
 ChildResult RunInChild(const std::function<int()>& body,
                        std::chrono::milliseconds limit = std::chrono::seconds(60));
 
-// Runs a program and waits for it; `output` receives what it writes to standard output. Its error
-// output is the test's own, because the sanitizers and the coverage counters write there too.
+// True when the test program is built for another processor and runs in an emulator.
+bool IsEmulated();
+
+// Why tests are skipped there. What they prove holds on a real kernel.
+inline constexpr char kNoHighSelect[] = "the emulator's select ends at descriptor 1,023";
+inline constexpr char kNoCountdown[] = "the emulator's select forgets the time that a signal cut";
+
+// The command that runs a program: in an emulated test with the emulator in front, when the program
+// is built for the same processor as the test.
+std::vector<std::string> Runnable(const std::vector<std::string>& command);
+
+// Runs a program, by its Runnable command, and waits for it; `output` receives what it writes to
+// standard output. Its error output is the test's own, because the sanitizers and the coverage
+// counters write there too.
 ChildResult RunProgram(const std::vector<std::string>& command, std::string* output = nullptr,
                        std::chrono::milliseconds limit = std::chrono::seconds(60));
 

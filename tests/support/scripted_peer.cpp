@@ -97,7 +97,7 @@ void ScriptedPeer::Run() {
     }
     auto peer = connect_(fd, transcripts_[i].get(), [this] { return stopped_.load(); });
     Play(i, *peer);
-    open_.push_back(std::move(peer));
+    if (peer->IsOpen()) open_.push_back(std::move(peer));
     std::lock_guard<std::mutex> lock(mutex_);
     ++ended_;
     progress_.notify_all();
@@ -110,7 +110,7 @@ int ScriptedPeer::Accept() {
   for (;;) {
     const bool last_look = stopped_;
     pollfd waiting = {listener_, POLLIN, 0};
-    if (poll(&waiting, 1, last_look ? 0 : 10) > 0) break;
+    if (poll(&waiting, 1, last_look ? 0 : 2) > 0) break;
     if (last_look) return -1;
   }
   const int fd = accept4(listener_, nullptr, nullptr, SOCK_NONBLOCK | SOCK_CLOEXEC);

@@ -43,7 +43,7 @@ void WriteCertificate(const std::string& path, X509* certificate) {
 TlsIdentity::TlsIdentity(const TlsOptions& options)
     : ca_file_(folder_.File("ca.pem")), options_(options), key_(EVP_EC_gen("P-256")) {
   EVP_PKEY* ca_key = EVP_EC_gen("P-256");
-  X509* ca = NewCertificate(ca_key, "Test authority", 1, false);
+  X509* ca = NewCertificate(ca_key, options.authority, 1, false);
   X509_set_issuer_name(ca, X509_get_subject_name(ca));
   AddExtension(ca, ca, NID_basic_constraints, "critical,CA:TRUE");
   X509_sign(ca, ca_key, EVP_sha256());

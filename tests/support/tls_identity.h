@@ -13,6 +13,7 @@ struct TlsOptions {
   bool expired = false;     // the certificate's time has passed
   bool wrong_host = false;  // it names another host than 127.0.0.1 and localhost
   int max_version = 0;      // highest protocol, such as TLS1_2_VERSION; 0: what the library offers
+  const char* authority = "Test authority";  // the name of who signs
 };
 
 // A certificate authority, and a server certificate and key that it signed.

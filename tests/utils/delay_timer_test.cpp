@@ -140,6 +140,16 @@ TEST_F(Pacing, ElapsedTimeIsTakenAs32Bits) {
   EXPECT_EQ(Yields(), 1);
 }
 
+TEST_F(Pacing, TheEndOf32BitSecondsDoesNotDisturbThePace) {
+  now_ = (int64_t{1} << 31) * 1000000 - 500000;  // half a second before
+  DelayTimer timer(1000000);
+  Pass(200000);
+  timer.Delay();
+  Pass(1000);
+  timer.Delay();
+  EXPECT_THAT(Sleeps(), ElementsAre(800000, 999000));
+}
+
 TEST(DelayTimer, GivesWhatTheSleepGives) {
   Faults faults;
   faults.FailNth(Call::kUsleep, 1, EINTR);

@@ -1,0 +1,49 @@
+// What a forked child must not inherit half done: locks of the C library and open descriptors.
+#ifndef TARNWICK_PLATFORM_FORK_HOLD_H_
+#define TARNWICK_PLATFORM_FORK_HOLD_H_
+
+#include <sys/types.h>
+
+#include <cstdio>
+
+// While one exists, fork() waits in every other thread, and so do other holds: keep the scope free
+// of anything that waits. A thread may fork in its own hold, as a signal handler does.
+class ForkHold {
+ public:
+  ForkHold();
+  ~ForkHold();
+  ForkHold(const ForkHold&) = delete;
+  ForkHold& operator=(const ForkHold&) = delete;
+};
+
+// An open file of which a forked child keeps no descriptor: its copies are closed before fork()
+// returns there. A child that stays would otherwise keep the file's lock when the parent dies.
+// A thread that forks while it has one must not use it in the child.
+class UninheritedFile {
+ public:
+  // Opens it as open(2) does; a null `path` fails with EFAULT.
+  UninheritedFile(const char* path, int flags, mode_t mode);
+
+  // Closes it; errno is kept.
+  ~UninheritedFile();
+  UninheritedFile(const UninheritedFile&) = delete;
+  UninheritedFile& operator=(const UninheritedFile&) = delete;
+
+  bool Valid() const { return m_fd >= 0; }
+  int Get() const { return m_fd; }
+
+  // Makes a stream on it and gives true, or false with errno. The stream has no buffer, because a
+  // forked child would write the contents again when it ends. REQUIRES: no stream yet.
+  bool MakeStream(const char* mode);
+  FILE* Stream() const { return m_stream; }
+
+ private:
+  friend void CloseInheritedFiles();
+
+  int m_fd;
+  FILE* m_stream = nullptr;
+  UninheritedFile* m_next = nullptr;
+  UninheritedFile** m_link = nullptr;  // what points to this object
+};
+
+#endif  // TARNWICK_PLATFORM_FORK_HOLD_H_

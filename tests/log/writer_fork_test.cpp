@@ -1,0 +1,186 @@
+// Processes that fork while another of their threads writes a line.
+#include <fcntl.h>
+#include <gtest/gtest.h>
+#include <signal.h>
+#include <sys/mman.h>
+#include <sys/stat.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <atomic>
+#include <chrono>
+#include <functional>
+#include <string>
+#include <thread>
+
+#include "tarnwick/log/twdebuglog.h"
+#include "tests/support/faults.h"
+#include "tests/support/files.h"
+#include "tests/support/flag.h"
+#include "tests/support/log_capture.h"
+#include "tests/support/process.h"
+
+namespace {
+
+using std::chrono::milliseconds;
+using std::chrono::seconds;
+
+void Write() {
+  TWPrintf(LOG_TYPE_MAIN, "http", "warn", "name", 57, "Func", "message\n");
+}
+
+// A thread that writes a line and runs `action` before the n-th call of one kind in it. It ends
+// when `end` is set, so that it is alive when the test forks.
+std::thread WriterThatStopsAt(Call call, int n, const std::function<void()>& action,
+                              const Flag& end) {
+  return std::thread([=] {
+    Faults faults;
+    faults.Before(call, [=](int count) {
+      if (count == n) action();
+    });
+    Write();
+    end.Wait();
+  });
+}
+
+class WriterFork : public ::testing::Test {
+ protected:
+  WriterFork() {
+    FreeDbgCfg();
+    unlink(kMainLog);
+  }
+  ~WriterFork() override { unlink(kMainLog); }
+};
+
+TEST_F(WriterFork, AChildDoesNotHaveTheLogOpen) {
+  const Flag in_line;
+  const Flag go_on;
+  const auto stop = [=] {
+    in_line.Set();
+    go_on.Wait();
+  };
+  std::thread writer = WriterThatStopsAt(Call::kFlock, 2, stop, go_on);
+  EXPECT_TRUE(in_line.Wait());
+  const ChildResult child = RunInChild([] {
+    int open = 0;
+    for (const auto& [fd, target] : OpenDescriptors()) open += target == kMainLog ? 1 : 0;
+    return open;
+  });
+  go_on.Set();
+  writer.join();
+  EXPECT_EQ(child.code, 0);
+  EXPECT_EQ(ParseLog(ReadFile(kMainLog)).size(), 1u);
+}
+
+// Forks a child that stays, while a line has the lock; the child's id goes into `*child`.
+[[noreturn]] void ForkInALine(std::atomic<int>* child) {
+  const Flag in_line;
+  const auto stop = [=] {
+    in_line.Set();
+    for (;;) pause();
+  };
+  std::thread writer = WriterThatStopsAt(Call::kFlock, 2, stop, Flag());
+  in_line.Wait();
+  const pid_t pid = fork();
+  if (pid != 0) *child = pid;
+  for (;;) pause();
+}
+
+TEST_F(WriterFork, AKilledParentsLockDoesNotStayWithItsChild) {
+  void* const memory =
+      mmap(nullptr, 4096, PROT_READ | PROT_WRITE, MAP_SHARED | MAP_ANONYMOUS, -1, 0);
+  ASSERT_NE(memory, MAP_FAILED);
+  auto* grandchild = new (memory) std::atomic<int>(0);
+  {
+    const Child parent([=]() -> int { ForkInALine(grandchild); });
+    for (int i = 0; i < 10000 && *grandchild == 0; ++i) usleep(1000);
+  }  // killed
+  ASSERT_NE(*grandchild, 0);
+  const ChildResult writer = RunInChild(
+      [] {
+        Write();
+        return 0;
+      },
+      seconds(10));
+  kill(*grandchild, SIGKILL);
+  munmap(memory, 4096);
+  EXPECT_FALSE(writer.timed_out);
+  EXPECT_EQ(ParseLog(ReadFile(kMainLog)).size(), 2u);
+}
+
+// A pipe in the log's place that takes no further byte until it is read.
+class FullPipe {
+ public:
+  FullPipe() {
+    EXPECT_EQ(mkfifo(kMainLog, 0600), 0);
+    fd_ = open(kMainLog, O_RDWR | O_NONBLOCK | O_CLOEXEC);
+    while (write(fd_, "x", 1) == 1) ++filled_;
+  }
+  ~FullPipe() { close(fd_); }
+  FullPipe(const FullPipe&) = delete;
+  FullPipe& operator=(const FullPipe&) = delete;
+
+  // What came behind the filling, up to the end of a line and for as long as more comes.
+  std::string Read() {
+    std::string text;
+    char piece[4096];
+    for (int waits = 0; waits < 10000 && (text.empty() || text.back() != '\n');) {
+      const ssize_t count = read(fd_, piece, sizeof(piece));
+      if (count > 0) {
+        text.append(piece, static_cast<size_t>(count));
+      } else {
+        usleep(1000);
+        ++waits;
+      }
+    }
+    return text.substr(filled_);
+  }
+
+ private:
+  int fd_;
+  size_t filled_ = 0;
+};
+
+TEST_F(WriterFork, AChildThatEndsWritesNothingOfItsParentsLine) {
+  FullPipe pipe;
+  const Flag in_line;
+  const Flag end;
+  std::thread writer = WriterThatStopsAt(
+      Call::kLocaltimeR, 1, [=] { in_line.Set(); }, end);
+  EXPECT_TRUE(in_line.Wait());
+  usleep(50000);  // the line waits for room in the pipe
+  // A child flushes its streams when it ends.
+  const ChildResult child = RunInChild([] { return 0; }, seconds(10));
+  const std::string text = pipe.Read();
+  end.Set();
+  writer.join();
+  EXPECT_FALSE(child.timed_out);
+  EXPECT_EQ(ParseLog(text).size(), 1u) << text;
+}
+
+// The C library's lock of the time zone would stay held in the child, whose own line would then
+// wait for ever, with the lock of the log.
+TEST_F(WriterFork, AForkWaitsWhileALineReadsTheTimeZone) {
+  const Flag in_line;
+  const Flag forked;
+  bool forked_meanwhile = false;
+  const Flag child_ended;
+  const auto stop = [&] {
+    in_line.Set();
+    forked_meanwhile = forked.Wait(milliseconds(200));
+  };
+  std::thread writer = WriterThatStopsAt(Call::kLocaltimeR, 1, stop, child_ended);
+  EXPECT_TRUE(in_line.Wait());
+  Child child([] {
+    Write();
+    return 0;
+  });
+  forked.Set();
+  EXPECT_EQ(child.Wait().code, 0);
+  child_ended.Set();
+  writer.join();
+  EXPECT_FALSE(forked_meanwhile);
+  EXPECT_EQ(ParseLog(ReadFile(kMainLog)).size(), 2u);
+}
+
+}  // namespace

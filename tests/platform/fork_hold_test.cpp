@@ -1,0 +1,151 @@
+// What a forked child does not inherit.
+#include "tarnwick/platform/fork_hold.h"
+
+#include <fcntl.h>
+#include <gtest/gtest.h>
+#include <sys/file.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <chrono>
+#include <memory>
+#include <string>
+#include <thread>
+
+#include "tarnwick/platform/owned.h"
+#include "tests/support/faults.h"
+#include "tests/support/files.h"
+#include "tests/support/flag.h"
+#include "tests/support/process.h"
+
+namespace {
+
+int OpenIn(const std::string& folder) {
+  int count = 0;
+  for (const auto& [fd, target] : OpenDescriptors()) count += target.rfind(folder, 0) == 0 ? 1 : 0;
+  return count;
+}
+
+TEST(ForkHold, AForkInAnotherThreadWaitsForItsEnd) {
+  const Flag held;
+  const Flag forked;
+  const Flag child_ended;
+  bool forked_meanwhile = false;
+  std::thread holder([&] {
+    {
+      const ForkHold hold;
+      held.Set();
+      forked_meanwhile = forked.Wait(std::chrono::milliseconds(200));
+    }
+    child_ended.Wait();
+  });
+  EXPECT_TRUE(held.Wait());
+  Child child([] { return 0; });
+  forked.Set();
+  EXPECT_EQ(child.Wait().code, 0);
+  child_ended.Set();
+  holder.join();
+  EXPECT_FALSE(forked_meanwhile);
+}
+
+TEST(ForkHold, AThreadMayForkInItsOwnAndTheChildMayHoldAgain) {
+  const ForkHold hold;
+  const ChildResult result = RunInChild([] {
+    const ForkHold again;
+    return RunInChild([] { return 0; }).code;
+  });
+  EXPECT_EQ(result.code, 0);
+}
+
+TEST(ForkHold, AChildsThreadsHoldInTurn) {
+  const ChildResult result = RunInChild([] {
+    int value = 0;
+    const auto add = [&value] {
+      for (int i = 0; i < 1000; ++i) {
+        const ForkHold hold;
+        ++value;
+      }
+    };
+    std::thread other(add);
+    add();
+    other.join();
+    return value == 2000 ? 0 : 1;
+  });
+  EXPECT_EQ(result.code, 0);
+}
+
+TEST(UninheritedFile, OpensCreatesAndClosesAsOpenDoes) {
+  const TempDir folder;
+  const DescriptorGuard descriptors;
+  {
+    const UninheritedFile file(folder.File("log").c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
+    ASSERT_TRUE(file.Valid());
+    EXPECT_EQ(write(file.Get(), "text", 4), 4);
+  }
+  EXPECT_EQ(ReadFile(folder.File("log")), "text");
+}
+
+TEST(UninheritedFile, WithoutAPathOrAFolderItIsNotValidAndErrnoTellsWhy) {
+  errno = 0;
+  EXPECT_FALSE(UninheritedFile(nullptr, O_RDONLY, 0).Valid());
+  EXPECT_EQ(errno, EFAULT);
+  EXPECT_FALSE(UninheritedFile("/nowhere/file", O_RDONLY, 0).Valid());
+  EXPECT_EQ(errno, ENOENT);
+}
+
+TEST(UninheritedFile, AChildHasNoneOfThoseThatAreOpen) {
+  const TempDir folder;
+  std::unique_ptr<UninheritedFile> files[3];
+  for (int i = 0; i < 3; ++i) {
+    const std::string path = folder.File(std::to_string(i));
+    files[i] = std::make_unique<UninheritedFile>(path.c_str(), O_WRONLY | O_CREAT, 0600);
+  }
+  EXPECT_EQ(RunInChild([&] { return OpenIn(folder.Path()); }).code, 0);
+  files[1].reset();
+  EXPECT_EQ(RunInChild([&] { return OpenIn(folder.Path()); }).code, 0);
+  EXPECT_EQ(OpenIn(folder.Path()), 2);
+  files[2].reset();
+  files[0].reset();
+  EXPECT_EQ(OpenIn(folder.Path()), 0);
+}
+
+TEST(UninheritedFile, ADescriptorThatWasClosedIsNotTakenFromAChild) {
+  const TempDir folder;
+  const std::string path = folder.File("file");
+  { const UninheritedFile closed(path.c_str(), O_WRONLY | O_CREAT, 0600); }
+  const OwnedFd same_number(open(path.c_str(), O_RDONLY | O_CLOEXEC));
+  EXPECT_EQ(RunInChild([&] { return OpenIn(folder.Path()); }).code, 1);
+}
+
+TEST(UninheritedFile, TheParentKeepsItsLockWhenAChildStarts) {
+  const TempDir folder;
+  const std::string path = folder.File("file");
+  const UninheritedFile file(path.c_str(), O_WRONLY | O_CREAT, 0600);
+  ASSERT_EQ(flock(file.Get(), LOCK_EX), 0);
+  EXPECT_EQ(RunInChild([] { return 0; }).code, 0);
+  const OwnedFd other(open(path.c_str(), O_RDONLY | O_CLOEXEC));
+  EXPECT_EQ(flock(other.Get(), LOCK_EX | LOCK_NB), -1);
+}
+
+TEST(UninheritedFile, ItsStreamWritesAtOnceAndIsClosedWithIt) {
+  const TempDir folder;
+  const DescriptorGuard descriptors;
+  {
+    UninheritedFile file(folder.File("log").c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
+    ASSERT_TRUE(file.MakeStream("a"));
+    fprintf(file.Stream(), "%s", "text");
+    EXPECT_EQ(ReadFile(folder.File("log")), "text");
+  }
+}
+
+TEST(UninheritedFile, AStreamThatCannotBeMadeLeavesTheDescriptorToItsOwner) {
+  const TempDir folder;
+  const DescriptorGuard descriptors;
+  Faults faults;
+  faults.FailNth(Call::kFdopen, 1, ENOMEM);
+  UninheritedFile file(folder.File("log").c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
+  EXPECT_FALSE(file.MakeStream("a"));
+  EXPECT_EQ(errno, ENOMEM);
+}
+
+}  // namespace
