@@ -1,0 +1,57 @@
+// A challenge and the login that answers it. The lines are user, password, path, method and time;
+// whatever follows is the challenge:
+//
+//   admin
+//   secret
+//   cgi/a.cgi
+//   GET
+//   1700000000
+//    Digest realm="r", nonce="n", qop="auth"
+#include <cstddef>
+#include <cstdint>
+#include <cstdlib>
+#include <string>
+#include <string_view>
+
+#include "fuzz/oracle/shared/model_login.h"
+#include "fuzz/support/script.h"
+#include "fuzz/support/target.h"
+#include "fuzz/support/wire.h"
+#include "tarnwick/http/challenge_words.h"
+#include "tarnwick/http/twhttp.h"
+
+namespace {
+
+class Client : public TWHttpClient {
+ public:
+  Client(const ModelLogin& login, const std::string& challenge) {
+    m_strUser = login.user;
+    m_strPassword = login.password;
+    m_strPath = login.path;
+    m_strAuthenticate = challenge;
+  }
+};
+
+}  // namespace
+
+extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
+  LogEverything();
+  std::string_view text(reinterpret_cast<const char*>(data), size);
+  ModelLogin login;
+  login.user = TakeLine(&text);
+  login.password = TakeLine(&text);
+  login.path = TakeLine(&text);
+  const std::string method(TakeLine(&text));
+  g_fuzz_time = std::strtol(std::string(TakeLine(&text)).c_str(), nullptr, 10) & 0x7fffffff;
+  const std::string challenge(text);
+
+  Client client(login, challenge);
+  ExpectSame("Digest line", client.GenDigestAccessAuth(method, "body"),
+             ModelDigestLine(login, challenge, method, "body", g_fuzz_time));
+  ExpectSame("Basic line", client.GenBasicAccessAuth(), ModelBasicLine(login));
+  for (const std::string& word : {std::string("digest"), std::string("basic"), login.user}) {
+    ExpectSame("word in the challenge", static_cast<int64_t>(ContainsIgnoreCase(challenge, word)),
+               static_cast<int64_t>(ModelContains(challenge, word)));
+  }
+  return 0;
+}

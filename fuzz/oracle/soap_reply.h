@@ -1,0 +1,45 @@
+// A client that posts SOAP envelopes, told once more in the plainest way.
+#ifndef TARNWICK_FUZZ_ORACLE_SOAP_REPLY_H_
+#define TARNWICK_FUZZ_ORACLE_SOAP_REPLY_H_
+
+#include <string>
+
+#include "fuzz/oracle/shared/model_head.h"
+#include "fuzz/oracle/shared/model_login.h"
+#include "fuzz/oracle/shared/model_socket.h"
+
+namespace oracle {
+
+class SoapClient {
+ public:
+  // `time` is what time(2) shows the library. REQUIRES: `socket` outlives the object.
+  SoapClient(ModelSocket* socket, std::string host, ModelLogin login, long time);
+
+  // Results: the client's result codes; `reply` changes only when there is one.
+  int Post(const std::string& envelope, std::string* reply);
+  int PostWithLogin(const std::string& envelope, std::string* reply);
+
+  const ModelHead& Head() const { return head_; }
+  int Result() const { return result_; }
+
+ private:
+  std::string RequestFor(const std::string& envelope);
+
+  ModelSocket* socket_;
+  std::string host_;
+  ModelLogin login_;
+  long time_;
+  ModelHead head_;
+  int result_ = 1;
+  std::string authorization_;
+};
+
+// The length that a header announces: its leading decimal number; 0 when no reply can be that long.
+int AnnouncedLength(const std::string& value);
+
+// What of a reply is parsed as XML.
+std::string WithoutLineEnds(const std::string& text);
+
+}  // namespace oracle
+
+#endif  // TARNWICK_FUZZ_ORACLE_SOAP_REPLY_H_

@@ -1,0 +1,23 @@
+#include "fuzz/oracle/xml_reply.h"
+
+#include <utility>
+
+namespace oracle {
+
+void Answers::Add(const std::string& bytes) {
+  there_ = true;
+  text_ += bytes;
+}
+
+void Answers::Lose() {
+  there_ = false;
+  text_.assign(text_.size(), '\0');
+}
+
+std::optional<std::string> Answers::Take() {
+  // Without memory the size stays as it is.
+  if (!std::exchange(there_, false)) return std::nullopt;
+  return std::exchange(text_, std::string());
+}
+
+}  // namespace oracle
