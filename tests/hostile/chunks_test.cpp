@@ -1,0 +1,321 @@
+// Chunked bodies that are none, and how each reader of a body ends with them.
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <json/value.h>
+#include <libxml/tree.h>
+
+#include "tarnwick/platform/owned.h"
+#include "tests/hostile/hostile_util.h"
+
+using namespace std::string_literals;
+
+namespace {
+
+constexpr char kHead[] = "HTTP/1.1 200 OK\r\nTransfer-Encoding: chunked\r\n\r\n";
+
+// What the client's own readers make of the chunks, which is always a success, and what libcurl
+// makes of them: its code and the body until then.
+struct ChunkRow {
+  const char* name;
+  std::string chunks;
+  std::string body;
+  int curl_code;
+  std::string curl_body;
+  std::string trailer = "";  // libcurl hands it on as header lines, and a file gets these as well
+};
+
+std::string Repeated(size_t count, const std::string& text) {
+  std::string all;
+  for (size_t i = 0; i < count; ++i) all += text;
+  return all;
+}
+
+const ChunkRow kChunks[] = {
+    {"TwoChunks", "4\r\nWiki\r\n5\r\npedia\r\n0\r\n\r\n", "Wikipedia", 0, "Wikipedia"},
+    {"DigitsOfBothCases", "a\r\n0123456789\r\nA\r\n0123456789\r\n0\r\n\r\n", "01234567890123456789",
+     0, "01234567890123456789"},
+    {"NothingAtAll", "", "", 18, ""},
+    {"TheLastChunkAlone", "0\r\n\r\n", "", 0, ""},
+
+    // Sizes.
+    {"ASizeOf80000000", "80000000\r\nabc", "abc", 18, "abc"},
+    {"ASizeOfFfffffff", "ffffffff\r\nabc", "abc", 18, "abc"},
+    {"ASizeOf100000001", "100000001\r\nabc", "a", 18, "abc"},
+    {"ASizeOf100000000", "100000000\r\nabc", "", 18, "abc"},
+    {"ASizeOfSixteenF", "ffffffffffffffff\r\nabc", "abc", 56, ""},
+    {"ASizeOfAHundredF", std::string(100, 'f') + "\r\nabc", "abc", 56, ""},
+    {"ANegativeSize", "-2\r\nabc", "", 56, ""},
+    {"APlusSign", "+3\r\nabc\r\n0\r\n\r\n", "", 56, ""},
+    {"AHexadecimalPrefix", "0x10\r\nabc\r\n\r\n", "", 43, ""},
+    {"ABlankInFront", " 3\r\nabc\r\n0\r\n\r\n", "", 56, ""},
+    {"FourThousandZeros", std::string(4096, '0') + "\r\n\r\n", "", 56, ""},
+    {"FourThousandZerosAndAThree", std::string(4096, '0') + "3\r\nabc\r\n0\r\n\r\n", "abc", 56, ""},
+    {"ZerosBeyondTheBuffer", std::string(9000, '0') + "3\r\nabc\r\n0\r\n\r\n", "", 56, ""},
+    {"AText", "hello\r\nabc", "", 56, ""},
+    {"ATextOfDigits", "decade\r\nabc", "abc", 18, "abc"},
+    {"AnEmptyLineForASize", "\r\nabc", "", 56, ""},
+    {"AZeroByteBehindTheSize", "3\0\r\nabc\r\n0\r\n\r\n"s, "abc", 0, "abc"},
+    {"AZeroByteBeforeTheSize", "\0"s + "3\r\nabc\r\n0\r\n\r\n", "", 56, ""},
+    {"ControlBytesForASize", "\x01\x02\x03\r\nabc", "", 56, ""},
+
+    // Extensions.
+    {"AnExtension", "3;a=b\r\nabc\r\n0;c\r\n\r\n", "abc", 0, "abc"},
+    {"AnExtensionBehindABlank", "3 a=b\r\nabc\r\n0\r\n\r\n", "abc", 0, "abc"},
+    {"AnExtensionAlone", ";a=b\r\nabc\r\n0\r\n\r\n", "", 56, ""},
+    {"AnExtensionBeyondTheBuffer", "3;" + std::string(9000, 'x') + "\r\nabc\r\n0\r\n\r\n", "xxx", 0,
+     "abc"},
+
+    // Sizes that lie, and line ends that are none.
+    {"ASizeTooSmall", "3\r\nabcde\r\n0\r\n\r\n", "abc", 56, "abc"},
+    {"ASizeTooLarge", "8\r\nabcde\r\n0\r\n\r\n", "abcde\r\n0", 56, "abcde\r\n0"},
+    {"NoLineEndBehindAChunk", "3\r\nabc3\r\ndef\r\n0\r\n\r\n", "abc", 56, "abc"},
+    {"AnotherPairBehindAChunk", "3\r\nabcXY3\r\ndef\r\n0\r\n\r\n", "abcdef", 56, "abc"},
+    {"BareLineFeeds", "3\nabc\n0\n\n", "abc", 0, "abc"},
+    {"BareCarriageReturns", "3\rabc\r0\r\r", "bc\r", 18, ""},
+
+    // Ends.
+    {"NoLastChunk", "3\r\nabc\r\n", "abc", 18, "abc"},
+    {"CutInAChunk", "5\r\nabc", "abc", 18, "abc"},
+    {"CutInASize", "5", "", 18, ""},
+    {"CutInASizesLineEnd", "5\r", "", 18, ""},
+    {"CutBehindASize", "5\r\n", "", 18, ""},
+    {"CutInAChunksLineEnd", "3\r\nabc\r", "abc", 18, "abc"},
+    {"CutInTheLastSize", "3\r\nabc\r\n0", "abc", 18, "abc"},
+    {"CutBehindTheLastSize", "3\r\nabc\r\n0\r\n", "abc", 18, "abc"},
+    {"ATrailer", "3\r\nabc\r\n0\r\nX: y\r\n\r\n", "abc", 0, "abc", "X: y\r\n"},
+    {"AnotherReplyBehindTheLastChunk", "3\r\nabc\r\n0\r\n\r\nHTTP/1.1 500 No\r\n\r\n", "abc", 0,
+     "abc"},
+
+    // Data.
+    {"ZeroBytesInAChunk", "3\r\n\0\0\0\r\n0\r\n\r\n"s, "\0\0\0"s, 0, "\0\0\0"s},
+    {"AChunkOfManyBuffers", "4e20\r\n" + std::string(20000, 'x') + "\r\n0\r\n\r\n",
+     std::string(20000, 'x'), 0, std::string(20000, 'x')},
+    {"AThousandChunksOfAByte", Repeated(1000, "1\r\nx\r\n") + "0\r\n\r\n", std::string(1000, 'x'),
+     0, std::string(1000, 'x')},
+};
+
+// A GET, and the whole body behind it.
+Outcome GetAndReadBody(ClientProbe& client) {
+  EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
+  std::string body;
+  const int result = client.ReadBody(body);
+  return OutcomeOf(client, result, body);
+}
+
+// A request that the caller has written, and the whole response to it.
+Outcome GetResponse(ClientProbe& client) {
+  const std::string request = "GET /own HTTP/1.1\r\n\r\n";
+  client.m_pSocket->Connect();
+  client.m_pSocket->WriteData(request.data(), static_cast<int>(request.size()));
+  const std::string text = client.GetResp();
+  return OutcomeOf(client, 0, text);
+}
+
+// A form, and the whole body behind it.
+Outcome PostAndReadBody(ClientProbe& client) {
+  EXPECT_EQ(client.SendRequestBySocketPost("a=1"), HTTP_RET_OK);
+  std::string body;
+  const int result = client.ReadBody(body);
+  return OutcomeOf(client, result, body);
+}
+
+// A GET, read by the caller in pieces, which leaves the chunks as they are.
+Outcome GetInPieces(ClientProbe& client) {
+  EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
+  return OutcomeOf(client, 0, ReadBody(client));
+}
+
+Outcome CurlToText(int port) {
+  ClientProbe client(port);
+  const int result = client.SendRequestByCurl(HTTP_METHOD_GET, true, 10);
+  return OutcomeOf(client, result, client.m_strCurlText);
+}
+
+// The text is what the file holds.
+Outcome CurlToFile(int port) {
+  ClientProbe client(port);
+  const OwnedFile file(tmpfile());
+  client.SetCurlRespFile(file.get());
+  const int result = client.SendRequestByCurl(HTTP_METHOD_GET, true, 10);
+  std::string content(static_cast<size_t>(ftell(file.get())), '\0');
+  rewind(file.get());
+  EXPECT_EQ(fread(content.data(), 1, content.size(), file.get()), content.size());
+  return OutcomeOf(client, result, content);
+}
+
+// The text is what was collected for the document.
+Outcome XmlGet(int port) {
+  ClientProbe client(port);
+  const int result = client.SendReqByXMLGet(10);
+  const std::string text = client.m_pRespBuf == nullptr
+                               ? std::string()
+                               : std::string(client.m_pRespBuf, client.m_respLen);
+  return OutcomeOf(client, result, text);
+}
+
+std::vector<ReplyScenario> SocketTable(Outcome (*operation)(ClientProbe&), int response) {
+  std::vector<ReplyScenario> table;
+  for (const ChunkRow& row : kChunks) {
+    table.push_back({row.name, kHead + row.chunks, operation, {0, response, 200, row.body}});
+  }
+  return table;
+}
+
+std::vector<Scenario> CurlTable(const std::string& function, Outcome (*operation)(int),
+                                std::string (*text)(const ChunkRow&)) {
+  std::vector<Scenario> table;
+  for (const ChunkRow& row : kChunks) {
+    const int result = row.curl_code == 0 ? HTTP_RET_OK : HTTP_RET_IO_ERROR;
+    std::vector<std::string> log;
+    if (row.curl_code != 0) {
+      log.push_back(function + ": Failed to make http connection, return value=" +
+                    std::to_string(row.curl_code) + "\n");
+    }
+    table.push_back({row.name,
+                     {{ExpectRequest(), Offer(kHead + row.chunks), Close()}},
+                     operation,
+                     {result, result, 0, text(row)},
+                     log});
+  }
+  return table;
+}
+
+std::string BodyOf(const ChunkRow& row) {
+  return row.curl_body;
+}
+
+// What is left of the head, the body, and the trailer.
+std::string FileOf(const ChunkRow& row) {
+  return "\r\n" + row.curl_body + row.trailer;
+}
+
+// Replies whose chunks a reader takes for the body itself.
+const char kChunkedJson[] = "10\r\n{\"success\":true}\r\n0\r\n\r\n";
+
+std::string Under(const std::string& lines, const std::string& body) {
+  return "HTTP/1.1 200 OK\r\n" + lines + "\r\n" + body;
+}
+
+const ReplyScenario kUndecoded[] = {
+    {"ChunkedWithACapital",
+     Under("Transfer-Encoding: Chunked\r\n", "3\r\nabc\r\n0\r\n\r\n"),
+     GetAndReadBody,
+     {0, 0, 200, "3\r\nabc\r\n0\r\n\r\n"}},
+    {"ChunkedBehindAnotherCoding",
+     Under("Transfer-Encoding: gzip, chunked\r\n", "3\r\nabc\r\n0\r\n\r\n"),
+     GetAndReadBody,
+     {0, 0, 200, "3\r\nabc\r\n0\r\n\r\n"}},
+    {"ChunkedAmongBlanks",
+     Under("Transfer-Encoding:   chunked  \r\n", "3\r\nabc\r\n0\r\n\r\n"),
+     GetAndReadBody,
+     {0, 0, 200, "abc"}},
+    {"ChunkedTakenBack",
+     Under("Transfer-Encoding: chunked\r\nTransfer-Encoding: identity\r\n", "3\r\nabc\r\n"),
+     GetAndReadBody,
+     {0, 0, 200, "3\r\nabc\r\n"}},
+    {"ChunkedBehindALengthLine",
+     Under("Content-Length: 2\r\nTransfer-Encoding: chunked\r\n", "3\r\nabc\r\n0\r\n\r\n"),
+     GetAndReadBody,
+     {0, 0, 200, "abc"}},
+    {"AnErrorStatusIsReadAllTheSame",
+     "HTTP/1.1 500 No\r\nTransfer-Encoding: chunked\r\n\r\n3\r\nabc\r\n0\r\n\r\n",
+     GetAndReadBody,
+     {0, 5, 500, "abc"}},
+    {"AnErrorStatusIsNoResponse",
+     "HTTP/1.1 500 No\r\nTransfer-Encoding: chunked\r\n\r\n3\r\nabc\r\n0\r\n\r\n",
+     GetResponse,
+     {0, 1, 500, "{\"error\":true}"},
+     {"GetResp: Http Resp error\n"}},
+    {"PiecesAreNotDecoded",
+     std::string(kHead) + "3\r\nabc\r\n0\r\n\r\n",
+     GetInPieces,
+     {0, 0, 200, "3\r\nabc\r\n0\r\n\r\n"}},
+    {"AFormsReplyIsDecoded",
+     std::string(kHead) + "3\r\nabc\r\n0\r\n\r\n",
+     PostAndReadBody,
+     {0, 0, 200, "abc"}},
+};
+
+Outcome JsonGet(int port) {
+  Json::Value value = "untouched";
+  const int result = SendHttpGet("127.0.0.1", port, "a.cgi", value, 5, true);
+  return {result, 0, 0, value.toStyledString()};
+}
+
+Outcome Soap(int port) {
+  ClientProbe client(port);
+  std::string reply = "untouched";
+  const int result = client.SendReqBySocketPost("<a/>", reply);
+  return OutcomeOf(client, result, reply);
+}
+
+Outcome XmlSoap(int port) {
+  ClientProbe client(port);
+  xmlDoc untouched;
+  xmlDoc* doc = &untouched;
+  const int result = client.SendReqByXMLSocketPost("<a/>", doc);
+  const bool stays = doc == &untouched;
+  if (!stays) xmlFreeDoc(doc);
+  return OutcomeOf(client, result, stays ? "untouched" : doc == nullptr ? "none" : "a document");
+}
+
+Script Reply(const std::string& reply) {
+  return {ExpectRequest(), Offer(reply), Close()};
+}
+
+const Scenario kOtherReaders[] = {
+    {"JsonTakesTheChunksForTheBody",
+     {Reply(std::string(kHead) + kChunkedJson)},
+     JsonGet,
+     {-2, 0, 0, "10\n"},
+     {"SendHttpGet: Failed to parse json [" + std::string(kChunkedJson) + "].\n"}},
+    {"SoapNeverReadsChunks",
+     {Reply(std::string(kHead) + "4\r\n<a/>\r\n0\r\n\r\n")},
+     Soap,
+     {3, 0, 200, "untouched"}},
+    {"SoapWithALengthTakesTheChunksForTheBody",
+     {Reply(
+         Under("Transfer-Encoding: chunked\r\nContent-Length: 7\r\n", "4\r\n<a/>\r\n0\r\n\r\n"))},
+     Soap,
+     {0, 0, 200, "4\r\n<a/>"}},
+    {"XmlSoapNeverReadsChunks",
+     {Reply(std::string(kHead) + "4\r\n<a/>\r\n0\r\n\r\n")},
+     XmlSoap,
+     {3, 0, 200, "untouched"}},
+    {"XmlSoapWithALengthTakesTheChunksForTheBody",
+     {Reply(
+         Under("Transfer-Encoding: chunked\r\nContent-Length: 7\r\n", "4\r\n<a/>\r\n0\r\n\r\n"))},
+     XmlSoap,
+     {0, 0, 200, "none"}},
+};
+
+}  // namespace
+
+class Chunks : public ::testing::TestWithParam<ReplyScenario> {};
+
+TEST_P(Chunks, EndAsTheTableSays) {
+  PlayReply(GetParam());
+}
+
+INSTANTIATE_TEST_SUITE_P(ReadBody, Chunks, ::testing::ValuesIn(SocketTable(GetAndReadBody, 0)),
+                         ReplyName);
+INSTANTIATE_TEST_SUITE_P(GetResp, Chunks, ::testing::ValuesIn(SocketTable(GetResponse, 1)),
+                         ReplyName);
+INSTANTIATE_TEST_SUITE_P(Codings, Chunks, ::testing::ValuesIn(kUndecoded), ReplyName);
+
+class ChunkReaders : public ::testing::TestWithParam<Scenario> {};
+
+TEST_P(ChunkReaders, EndAsTheTableSays) {
+  PlayScenario(GetParam());
+}
+
+INSTANTIATE_TEST_SUITE_P(Text, ChunkReaders,
+                         ::testing::ValuesIn(CurlTable("SendRequestByCurl", CurlToText, BodyOf)),
+                         ScenarioName);
+INSTANTIATE_TEST_SUITE_P(File, ChunkReaders,
+                         ::testing::ValuesIn(CurlTable("SendRequestByCurl", CurlToFile, FileOf)),
+                         ScenarioName);
+INSTANTIATE_TEST_SUITE_P(Xml, ChunkReaders,
+                         ::testing::ValuesIn(CurlTable("SendReqByXMLGet", XmlGet, BodyOf)),
+                         ScenarioName);
+INSTANTIATE_TEST_SUITE_P(Others, ChunkReaders, ::testing::ValuesIn(kOtherReaders), ScenarioName);

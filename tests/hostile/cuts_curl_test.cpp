@@ -1,0 +1,179 @@
+// libcurl's exchanges, cut behind every byte of their replies.
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <json/value.h>
+#include <libxml/parser.h>
+#include <libxml/tree.h>
+
+#include "tarnwick/platform/owned.h"
+#include "tests/hostile/cut_runs.h"
+
+namespace {
+
+Outcome CurlGet(ClientProbe& client) {
+  const int result = client.SendRequestByCurl(HTTP_METHOD_GET, false, 5);
+  return OutcomeOf(client, result, client.m_strCurlText);
+}
+
+Outcome CurlPost(ClientProbe& client) {
+  const int result = client.SendRequestByCurl(HTTP_METHOD_POST, false, 5);
+  return OutcomeOf(client, result, client.m_strCurlText);
+}
+
+Outcome CurlToFile(ClientProbe& client) {
+  const OwnedFile file(tmpfile());
+  client.SetCurlRespFile(file.get());
+  const int result = client.SendRequestByCurl(HTTP_METHOD_GET, false, 5);
+  std::string content(static_cast<size_t>(ftell(file.get())), '\0');
+  rewind(file.get());
+  EXPECT_EQ(fread(content.data(), 1, content.size(), file.get()), content.size());
+  return OutcomeOf(client, result, content);
+}
+
+Outcome LoginByCurl(ClientProbe& client) {
+  return OutcomeOf(client, client.SendRequestByPost("?"));
+}
+
+Outcome HttpsJson(ClientProbe& client) {
+  Json::Value value = "untouched";
+  const int result = SendHttpsGet("127.0.0.1", client.m_port, "a.cgi", value, 5);
+  return {result, 0, 0, result == 0 && value.isObject() ? value["id"].asString() : "none"};
+}
+
+// The outcome of an XML request, with what was collected for a document.
+template <typename Request>
+Outcome XmlRequest(ClientProbe& client, Request request) {
+  xmlDoc* doc = xmlParseMemory("<a/>", 4);
+  const int result = request(doc);
+  xmlFreeDoc(doc);
+  const std::string text = client.m_pRespBuf == nullptr
+                               ? std::string()
+                               : std::string(client.m_pRespBuf, client.m_respLen);
+  return OutcomeOf(client, result, text);
+}
+
+Outcome XmlGet(ClientProbe& client) {
+  return XmlRequest(client, [&](xmlDoc*) { return client.SendReqByXMLGet(5); });
+}
+
+Outcome XmlPost(ClientProbe& client) {
+  return XmlRequest(client, [&](xmlDoc* doc) { return client.SendReqByXMLPost(doc); });
+}
+
+Outcome XmlPut(ClientProbe& client) {
+  return XmlRequest(client, [&](xmlDoc* doc) { return client.SendReqByXMLPut(doc); });
+}
+
+Outcome XmlDelete(ClientProbe& client) {
+  return XmlRequest(client, [&](xmlDoc*) { return client.SendReqByXMLDelete(); });
+}
+
+// How far libcurl comes with a cut reply.
+struct CurlProgress {
+  bool succeeds = false;
+  std::string lines;  // complete header lines, without the status line
+  std::string body;   // decoded
+};
+
+// libcurl takes a close within the head, behind the status line, for the end of the reply, until it
+// has read the line that tells where the body ends. From there on the body must be whole. A reset
+// is a failure unless the reply was known to be whole.
+CurlProgress FollowCurl(const std::string& whole, const Cut& cut) {
+  const size_t status_end = whole.find("\r\n") + 2;
+  const size_t head_end = whole.find("\r\n\r\n") + 4;
+  const bool chunked = whole.find("Transfer-Encoding") != std::string::npos;
+  const size_t framing = std::min(whole.find("Content-Length"), whole.find("Transfer-Encoding"));
+  const size_t framed = framing == std::string::npos ? framing : whole.find("\r\n", framing) + 2;
+  const size_t length = cut.bytes.size();
+  CurlProgress progress;
+  progress.succeeds = length == whole.size() && framed != std::string::npos;
+  // The line feed behind the last chunk is not missed.
+  if (!cut.reset && chunked && length + 1 == whole.size()) progress.succeeds = true;
+  if (!cut.reset && length >= status_end && length < framed) progress.succeeds = true;
+  const size_t lines_end = length < head_end ? cut.bytes.rfind('\n') + 1 : head_end;
+  if (lines_end > status_end) progress.lines = whole.substr(status_end, lines_end - status_end);
+  if (length <= head_end) return progress;
+  CutReader reader({cut.bytes.substr(head_end)}, true);
+  if (chunked) ReadModelChunks(reader, &progress.body);
+  if (!chunked) progress.body = cut.bytes.substr(head_end);
+  return progress;
+}
+
+std::string FailedIn(const std::string& function) {
+  return function + ": Failed to make http connection, return value=N\n";
+}
+
+using Rule = std::function<Expected(const std::vector<Cut>&, bool)>;
+
+Rule CurlRule(const std::string& function, const std::string& whole, bool to_file = false) {
+  return [=](const std::vector<Cut>& replies, bool) {
+    const CurlProgress progress = FollowCurl(whole, replies[0]);
+    const int result = progress.succeeds ? 0 : 3;
+    Expected expected = {{result, result, 0, progress.body}, {}};
+    if (to_file) {
+      std::string lines = progress.lines;
+      const size_t coding = lines.find("Transfer-Encoding");
+      if (coding != std::string::npos) lines.erase(coding, lines.find('\n', coding) + 1 - coding);
+      expected.outcome.text = lines + progress.body;
+    }
+    if (!progress.succeeds) expected.log = {FailedIn(function)};
+    return expected;
+  };
+}
+
+// An empty text counts as a success.
+Expected HttpsJsonRule(const std::vector<Cut>& replies, bool /*buffered*/) {
+  const CurlProgress progress = FollowCurl(Ok("", kJson), replies[0]);
+  if (!progress.succeeds) return {{-1, 0, 0, "none"}, {FailedIn("SendRequestByCurl")}};
+  if (progress.body.empty()) return {{0, 0, 0, "none"}, {}};
+  if (progress.body == kJson) return {{0, 0, 0, "7"}, {}};
+  return {{-3, 0, 0, "none"},
+          {"SendHttpsGet: Failed to parse json. Result is [" + progress.body + "]\n"}};
+}
+
+// What libcurl makes of half a refusal is its own matter: the first reply comes whole.
+Expected CurlLoginRule(const std::vector<Cut>& replies, bool /*buffered*/) {
+  const CurlProgress progress = FollowCurl(kOfALength, replies[1]);
+  const int result = progress.succeeds ? 0 : 3;
+  Expected expected = {{result, result, 0, ""}, {}, 2};
+  if (!progress.succeeds) expected.log = {FailedIn("SendRequestByPost")};
+  return expected;
+}
+
+constexpr char kByCurl[] = "SendRequestByCurl";
+
+const Exchanged kCurlExchanges[] = {
+    {"CurlGet", {kOfALength}, CurlGet, CurlRule(kByCurl, kOfALength)},
+    {"CurlGetToTheEnd", {kToTheEnd}, CurlGet, CurlRule(kByCurl, kToTheEnd)},
+    {"CurlGetOfChunks", {kChunked}, CurlGet, CurlRule(kByCurl, kChunked)},
+    {"CurlToFile", {kOfALength}, CurlToFile, CurlRule(kByCurl, kOfALength, true)},
+    {"CurlToFileOfChunks", {kChunked}, CurlToFile, CurlRule(kByCurl, kChunked, true)},
+    {"CurlPost", {kOfALength}, CurlPost, CurlRule(kByCurl, kOfALength)},
+};
+
+const Exchanged kPlainCurlExchanges[] = {
+    {"CurlLogin", {kClosedDigest, kOfALength}, LoginByCurl, CurlLoginRule, "", 1},
+    {"XmlGet", {OkOfLength(kXml)}, XmlGet, CurlRule("SendReqByXMLGet", OkOfLength(kXml))},
+    {"XmlPost", {OkOfLength(kXml)}, XmlPost, CurlRule("SendReqByXMLPost", OkOfLength(kXml))},
+    {"XmlPut", {OkOfLength(kXml)}, XmlPut, CurlRule("SendReqByXMLPut", OkOfLength(kXml))},
+    {"XmlDelete", {OkOfLength(kXml)}, XmlDelete, CurlRule("SendReqByXMLDelete", OkOfLength(kXml))},
+};
+
+const Exchanged kHttpsExchanges[] = {
+    {"HttpsJson", {Ok("", kJson)}, HttpsJson, HttpsJsonRule},
+};
+
+}  // namespace
+
+class CurlCuts : public ::testing::TestWithParam<CutCase> {};
+
+TEST_P(CurlCuts, AtEveryByteGiveWhatTheRulesSay) {
+  PlayCuts(GetParam().exchange, GetParam().end, GetParam().buffered);
+}
+
+INSTANTIATE_TEST_SUITE_P(PlainAndTls, CurlCuts,
+                         ::testing::ValuesIn(CasesOf(kCurlExchanges, true, true)), CutName);
+INSTANTIATE_TEST_SUITE_P(Plain, CurlCuts,
+                         ::testing::ValuesIn(CasesOf(kPlainCurlExchanges, true, false)), CutName);
+INSTANTIATE_TEST_SUITE_P(Tls, CurlCuts, ::testing::ValuesIn(CasesOf(kHttpsExchanges, false, true)),
+                         CutName);

@@ -1,0 +1,246 @@
+// The socket's exchanges, cut behind every byte of their replies. What a client makes of the rest
+// is worked out by cut_model.h.
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <json/value.h>
+#include <libxml/tree.h>
+
+#include "tests/hostile/cut_runs.h"
+
+using namespace std::string_literals;
+
+namespace {
+
+// What the clients do.
+
+Outcome GetAndReadBody(ClientProbe& client) {
+  EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
+  std::string body;
+  const int result = client.ReadBody(body);
+  return OutcomeOf(client, result, body);
+}
+
+Outcome LoginAndReadBody(ClientProbe& client) {
+  EXPECT_EQ(client.SendRequest(HTTP_METHOD_GET, ""), HTTP_RET_OK);
+  std::string body;
+  const int result = client.ReadBody(body);
+  return OutcomeOf(client, result, body);
+}
+
+Outcome PostAndReadBody(ClientProbe& client) {
+  EXPECT_EQ(client.SendRequestBySocketPost("a=1&b=2"), HTTP_RET_OK);
+  std::string body;
+  const int result = client.ReadBody(body);
+  return OutcomeOf(client, result, body);
+}
+
+Outcome Soap(ClientProbe& client) {
+  std::string reply = "untouched";
+  const int result = client.SendReqBySocketPost("<a/>", reply);
+  return OutcomeOf(client, result, reply);
+}
+
+Outcome SoapWithLogin(ClientProbe& client) {
+  std::string reply = "untouched";
+  const int result = client.SendAuthReqBySocketPost("<a/>", reply);
+  return OutcomeOf(client, result, reply);
+}
+
+Outcome XmlSoap(ClientProbe& client) {
+  xmlDoc untouched;
+  xmlDoc* doc = &untouched;
+  const int result = client.SendReqByXMLSocketPost("<a/>", doc);
+  if (doc == &untouched) return OutcomeOf(client, result, "untouched");
+  const bool parsed = doc != nullptr;
+  xmlFreeDoc(doc);
+  return OutcomeOf(client, result, parsed ? "a document" : "none");
+}
+
+Outcome Upload(ClientProbe& client) {
+  EXPECT_EQ(client.OpenRawDataUpload(), HTTP_RET_OK);
+  EXPECT_EQ(client.WriteData("data, to the end.", 17), 17);
+  const std::string reply = client.GetResp();
+  return OutcomeOf(client, 0, reply);
+}
+
+Outcome JsonGet(ClientProbe& client) {
+  Json::Value value = "untouched";
+  const int result = SendHttpGet("127.0.0.1", client.m_port, "a.cgi", value, 5, true);
+  // A part of a document may leave a part of its values.
+  return {result, 0, 0, result == 0 ? value["id"].asString() : "none"};
+}
+
+Outcome OneCallPost(ClientProbe& client) {
+  return {SendHttpPost("127.0.0.1", client.m_port, "a.cgi", "a=1", "s=1", 5), 0, 0, ""};
+}
+
+// What must come of it.
+
+std::vector<std::string> ReadBodyLog(bool read) {
+  return read ? std::vector<std::string>{}
+              : std::vector<std::string>{"ReadBody: Read data error\n"};
+}
+
+// The head and the body of the last reply, with the log of the heads before it.
+Expected HeadAndBody(const Cut& reply, bool buffered, std::vector<std::string> log) {
+  CutReader reader(reply, buffered);
+  const ModelHead head = ReadModelHead(reader, &log);
+  std::string body;
+  const bool read = ReadModelBody(reader, head, &body);
+  for (const std::string& line : ReadBodyLog(read)) log.push_back(line);
+  return {{read ? 0 : 3, head.response, head.status, body}, log};
+}
+
+Expected GetRule(const std::vector<Cut>& replies, bool buffered) {
+  return HeadAndBody(replies[0], buffered, {});
+}
+
+// A challenge that names a scheme is answered, and its reply counts.
+bool AsksForLogin(const ModelHead& head) {
+  return head.response == 4 && (head.challenge.find("Digest") != std::string::npos ||
+                                head.challenge.find("Basic") != std::string::npos);
+}
+
+Expected LoginRule(const std::vector<Cut>& replies, bool buffered) {
+  CutReader reader(replies[0], buffered);
+  std::vector<std::string> log;
+  if (!AsksForLogin(ReadModelHead(reader, &log))) return GetRule(replies, buffered);
+  Expected expected = HeadAndBody(replies[1], buffered, log);
+  expected.connections = 2;
+  return expected;
+}
+
+// One SOAP reply; `text` stays when there is nothing to read.
+int ReadSoap(const Cut& reply, bool buffered, ModelHead* head, Expected* expected) {
+  CutReader reader(reply, buffered);
+  *head = ReadModelHead(reader, &expected->log);
+  expected->outcome.response = head->response;
+  expected->outcome.status = head->status;
+  const size_t length = head->complete ? strtoul(head->length.c_str(), nullptr, 10) : 0;
+  if (length == 0) return 3;
+  std::string text;
+  if (reader.Read(length, &text) > 0) {
+    expected->outcome.text = text;
+    return 0;
+  }
+  expected->log.push_back("SendReqBySocketPost: Read data faild.\n");
+  return 3;
+}
+
+Expected SoapRule(const std::vector<Cut>& replies, bool buffered) {
+  Expected expected = {{0, 0, 0, "untouched"}, {}};
+  ModelHead head;
+  expected.outcome.result = ReadSoap(replies[0], buffered, &head, &expected);
+  return expected;
+}
+
+Expected SoapLoginRule(const std::vector<Cut>& replies, bool buffered) {
+  Expected expected = {{0, 0, 0, "untouched"}, {}};
+  ModelHead head;
+  int result = ReadSoap(replies[0], buffered, &head, &expected);
+  if (AsksForLogin(head)) {
+    result = ReadSoap(replies[1], buffered, &head, &expected);
+    expected.connections = 2;
+  }
+  expected.outcome.result = result != 0 ? result : head.response;
+  return expected;
+}
+
+// Half a document is none.
+Expected XmlSoapRule(const std::vector<Cut>& replies, bool buffered) {
+  Expected expected = SoapRule(replies, buffered);
+  if (expected.outcome.result != 0) return expected;
+  expected.outcome.text = expected.outcome.text == kXml ? "a document" : "none";
+  return expected;
+}
+
+Expected UploadRule(const std::vector<Cut>& replies, bool buffered) {
+  const std::string error = "{\"error\":true}";
+  Expected expected;
+  CutReader reader(replies[0], buffered);
+  const ModelHead head = ReadModelHead(reader, &expected.log);
+  std::string body;
+  const bool success = head.response == 0;
+  const bool read = success && ReadModelBody(reader, head, &body);
+  if (!read) {
+    expected.log.push_back(success ? "GetResp: Read data error\n" : "GetResp: Http Resp error\n");
+  }
+  expected.outcome = {0, 1, head.status, read ? body : error};
+  return expected;
+}
+
+Expected JsonRule(const std::vector<Cut>& replies, bool /*buffered*/) {
+  Expected expected = {{-1, 0, 0, "none"}, {}};
+  CutReader reader(replies[0], true);
+  const ModelHead head = ReadModelHead(reader, &expected.log);
+  std::string body;
+  if (head.response != 0) {
+    expected.log.push_back("SendHttpGet: Failed to check response[N]: N\n");
+  } else if (!ReadModelBody(reader, head, &body)) {
+    expected.log.push_back("SendHttpGet: Failed to read data: N\n");
+  } else if (body.empty()) {
+    expected.log.push_back("SendHttpGet: Read Buffer Error\n");
+  } else if (body != kJson) {
+    expected.log.push_back("SendHttpGet: Failed to parse json [" + body + "].\n");
+    expected.outcome.result = -2;
+  } else {
+    expected.outcome = {0, 0, 0, "7"};
+  }
+  return expected;
+}
+
+// The answer's outcome does not count.
+Expected OneCallPostRule(const std::vector<Cut>& replies, bool /*buffered*/) {
+  Expected expected = {{0, 0, 0, ""}, {}};
+  CutReader reader(replies[0], true);
+  ReadModelHead(reader, &expected.log);
+  return expected;
+}
+
+const Exchanged kSocketExchanges[] = {
+    {"GetToTheEnd", {kToTheEnd}, GetAndReadBody, GetRule},
+    {"GetOfALength", {kOfALength}, GetAndReadBody, GetRule},
+    {"GetOfChunks", {kChunked}, GetAndReadBody, GetRule},
+    {"GetOfAnError", {kNotFound}, GetAndReadBody, GetRule},
+    {"DigestLogin", {kDigest, kOfALength}, LoginAndReadBody, LoginRule},
+    {"BasicLogin", {kBasic, kChunked}, LoginAndReadBody, LoginRule},
+    {"RefusedLogin", {kDigest, kDigest}, LoginAndReadBody, LoginRule},
+    {"Form", {kChunked}, PostAndReadBody, GetRule},
+    {"Soap", {OkOfLength(kXml)}, Soap, SoapRule},
+    {"SoapDigestLogin", {kDigest, OkOfLength(kXml)}, SoapWithLogin, SoapLoginRule},
+    {"SoapBasicLogin", {kBasic, OkOfLength(kXml)}, SoapWithLogin, SoapLoginRule},
+    {"XmlSoap", {OkOfLength(kXml)}, XmlSoap, XmlSoapRule},
+    {"Upload", {kChunked}, Upload, UploadRule, "data, to the end."},
+};
+
+const Exchanged kPlainExchanges[] = {
+    {"Json", {Ok("", kJson)}, JsonGet, JsonRule},
+    {"OneCallPost", {kNotFound}, OneCallPost, OneCallPostRule},
+};
+
+// Each exchange with each end. Over TLS a direct read gives what a direct plain one does, so that
+// two exchanges will do.
+std::vector<CutCase> SocketCuts() {
+  std::vector<CutCase> cases;
+  for (const Exchanged& exchange : kSocketExchanges) {
+    const bool in_all_ways = exchange.name == "GetOfChunks" || exchange.name == "SoapDigestLogin";
+    for (const auto& [name, end] : kEnds) {
+      cases.push_back({exchange.name + name, exchange, end, true});
+      if (IsTls(end) && !in_all_ways) continue;
+      cases.push_back({exchange.name + name + "Direct", exchange, end, false});
+    }
+  }
+  return cases;
+}
+
+}  // namespace
+
+class Cuts : public ::testing::TestWithParam<CutCase> {};
+
+TEST_P(Cuts, AtEveryByteGiveWhatTheRulesSay) {
+  PlayCuts(GetParam().exchange, GetParam().end, GetParam().buffered);
+}
+
+INSTANTIATE_TEST_SUITE_P(Socket, Cuts, ::testing::ValuesIn(SocketCuts()), CutName);
+INSTANTIATE_TEST_SUITE_P(OneCall, Cuts, ::testing::ValuesIn(CasesOf(kPlainExchanges, true, false)),
+                         CutName);

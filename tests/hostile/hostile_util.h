@@ -1,0 +1,188 @@
+// Tables of hostile peers. Each line of a table is a test of its own: a name, what the peer does,
+// the operation that meets it, and what comes of that.
+//
+//   class Heads : public ::testing::TestWithParam<Scenario> {};
+//   TEST_P(Heads, EndAsTheTableSays) { PlayScenario(GetParam()); }
+//   INSTANTIATE_TEST_SUITE_P(Hostile, Heads, ::testing::ValuesIn(kTable), ScenarioName);
+#ifndef TARNWICK_TESTS_HOSTILE_HOSTILE_UTIL_H_
+#define TARNWICK_TESTS_HOSTILE_HOSTILE_UTIL_H_
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <functional>
+#include <memory>
+#include <ostream>
+#include <string>
+#include <vector>
+
+#include "tests/http/http_test_util.h"
+#include "tests/support/log_capture.h"
+#include "tests/support/process.h"
+#include "tests/support/scripted_peer.h"
+#include "tests/support/tls_scripted_peer.h"
+
+// The stack that a daemon's thread has at the least.
+inline constexpr size_t kSmallStack = 64 << 10;
+
+// What an operation gave.
+struct Outcome {
+  int result = 0;    // what it returned
+  int response = 0;  // what CheckResponse returns afterwards
+  int status = 0;    // and the status that it tells
+  std::string text;  // the body, or what else the operation gives
+};
+
+inline bool operator==(const Outcome& a, const Outcome& b) {
+  return a.result == b.result && a.response == b.response && a.status == b.status &&
+         a.text == b.text;
+}
+
+inline std::ostream& operator<<(std::ostream& out, const Outcome& outcome) {
+  return out << "result " << outcome.result << ", response " << outcome.response << ", status "
+             << outcome.status << ", " << outcome.text.size() << " bytes ["
+             << ::testing::PrintToString(outcome.text.substr(0, 300)) << "]";
+}
+
+// The outcome of an operation that returned `result` on a client, with a text that came of it.
+inline Outcome OutcomeOf(TWHttpClient& client, int result, const std::string& text = "") {
+  Outcome outcome = {result, 0, 0, text};
+  outcome.response = client.CheckResponse(outcome.status);
+  return outcome;
+}
+
+struct Scenario {
+  std::string name;  // letters and digits
+  std::vector<Script> peer;
+  std::function<Outcome(int port)> operation;
+  Outcome expected;
+
+  // What the category http logs, down to level debug: "function: message" each.
+  std::vector<std::string> log = {};
+
+  bool tls = false;
+  size_t stack = kSmallStack;
+  PeerOptions options = {};
+};
+
+inline std::ostream& operator<<(std::ostream& out, const Scenario& scenario) {
+  return out << scenario.name;
+}
+
+inline std::string ScenarioName(const ::testing::TestParamInfo<Scenario>& info) {
+  return info.param.name;
+}
+
+inline std::vector<std::string> HttpLog(const LogCapture& log) {
+  std::vector<std::string> lines;
+  for (const LogLine& line : log.Lines("http"))
+    lines.push_back(line.function + ": " + line.message);
+  return lines;
+}
+
+// The text with N for each number: descriptors, ports, codes and sizes that are not sure.
+inline std::string WithoutNumbers(const std::string& text) {
+  std::string result;
+  for (const char c : text) {
+    const bool digit = isdigit(static_cast<unsigned char>(c)) != 0;
+    if (!digit) result += c;
+    if (digit && (result.empty() || result.back() != 'N')) result += 'N';
+  }
+  return result;
+}
+
+inline std::unique_ptr<ScriptedPeer> PeerOf(const Scenario& scenario) {
+  if (!scenario.tls) return std::make_unique<ScriptedPeer>(scenario.peer, scenario.options);
+  return std::make_unique<TlsScriptedPeer>(scenario.peer, TlsOptions{}, scenario.options);
+}
+
+// Runs the operation against the peer on a small stack, and compares what came of it. No descriptor
+// may be left.
+inline void PlayScenario(const Scenario& scenario) {
+  constexpr int kDebug = 5;
+  const DescriptorGuard descriptors;
+  const LogCapture log(kDebug);
+  const auto peer = PeerOf(scenario);
+  Outcome outcome;
+  RunOnSmallStack(scenario.stack, [&] { outcome = scenario.operation(peer->Port()); });
+  EXPECT_EQ(outcome, scenario.expected);
+  EXPECT_EQ(HttpLog(log), scenario.log);
+}
+
+// Sends bytes in pieces, for as long as the client takes them: one that has seen enough may go.
+inline Step Offer(const std::string& bytes, size_t piece = std::string::npos) {
+  return {"Offer()", [bytes, piece](PeerConnection& peer, std::string* error) {
+            constexpr useconds_t kBetweenPieces = 100;
+            for (size_t at = 0; at < bytes.size(); at += std::min(piece, bytes.size())) {
+              if (at > 0) usleep(kBetweenPieces);
+              if (!peer.Write(bytes.substr(at, piece))) break;
+            }
+            if (peer.DeadlinePassed()) *error = "deadline passed";
+            return !peer.DeadlinePassed();
+          }};
+}
+
+// A reply that has the same outcome however it travels.
+struct ReplyScenario {
+  std::string name;
+  std::string reply;
+  std::function<Outcome(ClientProbe&)> operation;
+  Outcome expected;
+  std::vector<std::string> log = {};
+
+  // The operation makes one read, which delivers what has arrived when it is a direct one.
+  bool buffered_only = false;
+};
+
+inline std::ostream& operator<<(std::ostream& out, const ReplyScenario& scenario) {
+  return out << scenario.name;
+}
+
+inline std::string ReplyName(const ::testing::TestParamInfo<ReplyScenario>& info) {
+  return info.param.name;
+}
+
+// How a reply travels, and how the client reads it.
+struct Delivery {
+  const char* name;
+  bool tls;
+  bool buffered;
+  size_t piece;
+};
+
+inline constexpr Delivery kDeliveries[] = {
+    {"plain, buffered, at once", false, true, std::string::npos},
+    {"plain, buffered, byte by byte", false, true, 1},
+    {"plain, direct, at once", false, false, std::string::npos},
+    {"plain, direct, byte by byte", false, false, 1},
+    {"TLS, buffered, at once", true, true, std::string::npos},
+    {"TLS, direct, record by record of a byte", true, false, 1},
+};
+
+// Of a long reply, byte by byte, several bytes travel together, so that it does not take seconds.
+inline size_t PieceOf(const Delivery& delivery, const std::string& reply) {
+  constexpr size_t kMostPieces = 500;
+  return std::max(delivery.piece, reply.size() / kMostPieces);
+}
+
+// Plays one reply in each of the ways.
+inline void PlayReply(const ReplyScenario& scenario) {
+  for (const Delivery& delivery : kDeliveries) {
+    if (scenario.buffered_only && !delivery.buffered) continue;
+    SCOPED_TRACE(delivery.name);
+    ClientSettings settings;
+    settings.https = delivery.tls;
+    settings.buffered = delivery.buffered;
+    const auto operation = [&](int port) {
+      ClientProbe client(port, settings);
+      return scenario.operation(client);
+    };
+    const Script script = {ExpectRequest(),
+                           Offer(scenario.reply, PieceOf(delivery, scenario.reply)), Close()};
+    PlayScenario(
+        {scenario.name, {script}, operation, scenario.expected, scenario.log, delivery.tls});
+  }
+}
+
+#endif  // TARNWICK_TESTS_HOSTILE_HOSTILE_UTIL_H_

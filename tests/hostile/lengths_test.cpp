@@ -1,0 +1,281 @@
+// Content-Length lines that are none, and how each reader of a body ends with them.
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <json/value.h>
+#include <libxml/tree.h>
+
+#include "tests/hostile/hostile_util.h"
+
+using namespace std::string_literals;
+
+namespace {
+
+constexpr char kReadFailed[] = "SendReqBySocketPost: Read data faild.\n";
+
+// The body of a reply, of which a SOAP request reads as much as the reply announces and anything
+// else all of it, and libcurl what it makes of the length.
+struct LengthRow {
+  const char* name;
+  std::string lines;  // of the head
+  std::string body;
+  std::string kept;  // what GetHttpContent gives
+  std::string soap;  // the reply; kFails when there is none
+  int curl_code;
+  std::string curl;
+};
+
+constexpr char kFails[] = "(fails)";
+constexpr char kNone[] = "(none)";
+
+std::string Length(const std::string& value) {
+  return "Content-Length: " + value + "\r\n";
+}
+
+std::string Lines(size_t count) {
+  std::string lines;
+  for (size_t i = 0; i < count; ++i) lines += "X: y\r\n";
+  return lines;
+}
+
+const LengthRow kLengths[] = {
+    {"TheRightOne", Length("4"), "<a/>", "4", "<a/>", 0, "<a/>"},
+    {"NoLength", "", "<a/>", kNone, kFails, 0, "<a/>"},
+
+    // What is no number.
+    {"AText", Length("four"), "<a/>", "four", kFails, 8, ""},
+    {"ABlank", "Content-Length: \r\n", "<a/>", "", kFails, 8, ""},
+    {"ASignAlone", Length("-"), "<a/>", "-", kFails, 8, ""},
+    {"AHexadecimalNumber", Length("0x4"), "<a/>", "0x4", kFails, 0, ""},
+    {"ControlBytes", Length("\x01\x02"), "<a/>", "\x01\x02", kFails, 8, ""},
+    {"AZeroByte", Length("\0"s + "4"), "<a/>", "", kFails, 8, ""},
+
+    // Numbers with something around them.
+    {"APlusSign", Length("+4"), "<a/>", "+4", "<a/>", 0, "<a/>"},
+    {"BlanksAround", Length("   4   "), "<a/>", "4", "<a/>", 0, "<a/>"},
+    {"ATabInFront", Length("\t4"), "<a/>", "\t4", "<a/>", 0, "<a/>"},
+    {"ZerosInFront", Length("0004"), "<a/>", "0004", "<a/>", 0, "<a/>"},
+    {"AThousandZerosInFront", Length(std::string(1000, '0') + "4"), "<a/>",
+     std::string(1000, '0') + "4", "<a/>", 0, "<a/>"},
+    {"LettersBehind", Length("4 bytes"), "<a/>", "4 bytes", "<a/>", 0, "<a/>"},
+    {"AFraction", Length("4.9"), "<a/>", "4.9", "<a/>", 0, "<a/>"},
+    {"AList", Length("4, 4"), "<a/>", "4, 4", "<a/>", 0, "<a/>"},
+    {"NoColon", "Content-Length 4\r\n", "<a/>", "4", "<a/>", 8, ""},
+    {"ALongerName", "Content-Lengths: 4\r\n", "<a/>", "4", "<a/>", 0, "<a/>"},
+
+    // Numbers out of range.
+    {"Zero", Length("0"), "<a/>", "0", kFails, 0, ""},
+    {"MinusZero", Length("-0"), "<a/>", "-0", kFails, 8, ""},
+    {"Negative", Length("-4"), "<a/>", "-4", kFails, 8, ""},
+    {"NegativeBeyond64Bits", Length("-9223372036854775812"), "<a/>", "-9223372036854775812", kFails,
+     8, ""},
+    {"AlmostAllOf31Bits", Length("2147483646"), "<a/>", "2147483646", "<a/>", 18, "<a/>"},
+    {"AllOf31Bits", Length("2147483647"), "<a/>", "2147483647", kFails, 18, "<a/>"},
+    {"Beyond31Bits", Length("2147483652"), "<a/>", "2147483652", kFails, 18, "<a/>"},
+    {"Beyond32Bits", Length("4294967300"), "<a/>", "4294967300", kFails, 18, "<a/>"},
+    {"AllOf63Bits", Length("9223372036854775807"), "<a/>", "9223372036854775807", kFails, 18,
+     "<a/>"},
+    {"Beyond64Bits", Length("18446744073709551620"), "<a/>", "18446744073709551620", kFails, 0,
+     "<a/>"},
+    {"AThousandDigits", Length(std::string(1000, '4')), "<a/>", std::string(1000, '4'), kFails, 0,
+     "<a/>"},
+
+    // Several lines: the first counts.
+    {"TwiceTheSame", Length("4") + Length("4"), "<a/>", "4", "<a/>", 0, "<a/>"},
+    {"ASmallerOneFirst", Length("2") + Length("4"), "<a/>", "2", "<a", 0, "<a/>"},
+    {"ALargerOneFirst", Length("4") + Length("2"), "<a/>", "4", "<a/>", 0, "<a"},
+    {"ATextFirst", Length("four") + Length("4"), "<a/>", "four", kFails, 8, ""},
+    {"AsTheLastLineThatIsRead", Lines(28) + Length("4"), "<a/>", "4", "<a/>", 0, "<a/>"},
+
+    // Lengths that lie.
+    {"LargerThanTheBody", Length("100"), "<a/>", "100", "<a/>", 18, "<a/>"},
+    {"SmallerThanTheBody", Length("2"), "<a/>", "2", "<a", 0, "<a"},
+    {"AByteMoreThanTheBody", Length("5"), "<a/>", "5", "<a/>", 18, "<a/>"},
+    {"ABodyWithAZeroByte", Length("4"), "<a\0b"s, "4", "<a", 0, "<a\0b"s},
+};
+
+Outcome GetAndReadBody(ClientProbe& client) {
+  EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
+  std::string body;
+  const int result = client.ReadBody(body);
+  return OutcomeOf(client, result, Content(client, HTTP_CONTENT_LENGTH) + ": " + body);
+}
+
+Outcome Soap(ClientProbe& client) {
+  std::string reply = kFails;
+  const int result = client.SendReqBySocketPost("<a/>", reply);
+  return OutcomeOf(client, result, reply);
+}
+
+// The text tells whether there is a document.
+Outcome XmlSoap(ClientProbe& client) {
+  xmlDoc untouched;
+  xmlDoc* doc = &untouched;
+  const int result = client.SendReqByXMLSocketPost("<a/>", doc);
+  if (doc == &untouched) return OutcomeOf(client, result, kFails);
+  const bool parsed = doc != nullptr;
+  xmlFreeDoc(doc);
+  return OutcomeOf(client, result, parsed ? "a document" : "no document");
+}
+
+Outcome CurlGet(int port) {
+  ClientProbe client(port);
+  const int result = client.SendRequestByCurl(HTTP_METHOD_GET, true, 10);
+  return OutcomeOf(client, result, client.m_strCurlText);
+}
+
+std::string Reply(const std::string& lines, const std::string& body) {
+  return "HTTP/1.1 200 OK\r\n" + lines + "\r\n" + body;
+}
+
+std::vector<ReplyScenario> BodyTable() {
+  std::vector<ReplyScenario> table;
+  for (const LengthRow& row : kLengths) {
+    table.push_back({row.name,
+                     Reply(row.lines, row.body),
+                     GetAndReadBody,
+                     {0, 0, 200, row.kept + ": " + row.body}});
+  }
+  return table;
+}
+
+std::vector<ReplyScenario> SoapTable() {
+  std::vector<ReplyScenario> table;
+  for (const LengthRow& row : kLengths) {
+    const int result = row.soap == kFails ? HTTP_RET_IO_ERROR : HTTP_RET_OK;
+    table.push_back(
+        {row.name, Reply(row.lines, row.body), Soap, {result, 0, 200, row.soap}, {}, true});
+  }
+  return table;
+}
+
+std::vector<Scenario> CurlTable() {
+  std::vector<Scenario> table;
+  for (const LengthRow& row : kLengths) {
+    const int result = row.curl_code == 0 ? HTTP_RET_OK : HTTP_RET_IO_ERROR;
+    std::vector<std::string> log;
+    if (row.curl_code != 0) {
+      log.push_back("SendRequestByCurl: Failed to make http connection, return value=" +
+                    std::to_string(row.curl_code) + "\n");
+    }
+    const Script script = {ExpectRequest(), Offer(Reply(row.lines, row.body)), Close()};
+    table.push_back({row.name, {script}, CurlGet, {result, result, 0, row.curl}, log});
+  }
+  return table;
+}
+
+// Heads that end the reading, and bodies that end before they begin.
+const ReplyScenario kOthers[] = {
+    {"NoValueForABody",
+     Reply("Content-Length:\r\n", "<a/>"),
+     GetAndReadBody,
+     {3, 1, 200, "(none): "},
+     {"ReadBody: Read data error\n"}},
+    {"NoValueForSoap", Reply("Content-Length:\r\n", "<a/>"), Soap, {3, 1, 200, kFails}},
+    {"AFoldedValueForSoap", Reply("Content-Length:\r\n 4\r\n", "<a/>"), Soap, {3, 1, 200, kFails}},
+    {"BeyondTheLastLineForSoap", Reply(Lines(30) + Length("4"), "<a/>"), Soap, {3, 0, 200, kFails}},
+    {"BeyondTheLastLineForABody",
+     Reply(Lines(30) + Length("4"), "<a/>"),
+     GetAndReadBody,
+     {0, 0, 200, "(none): Content-Length: 4\r\n\r\n<a/>"}},
+    {"NoBodyForSoap", Reply(Length("4"), ""), Soap, {3, 0, 200, kFails}, {kReadFailed}},
+    {"NoBodyOf2GibibytesForSoap",
+     Reply(Length("2147483646"), ""),
+     Soap,
+     {3, 0, 200, kFails},
+     {kReadFailed}},
+    {"ABodyOfAZeroByteForSoap", Reply(Length("1"), "\0"s), Soap, {0, 0, 200, ""}},
+    {"AnErrorsBodyForSoap",
+     "HTTP/1.1 500 No\r\nContent-Length: 4\r\n\r\n<a/>",
+     Soap,
+     {0, 5, 500, "<a/>"},
+     {},
+     true},
+    {"TheRightOneForXml", Reply(Length("4"), "<a/>"), XmlSoap, {0, 0, 200, "a document"}, {}, true},
+    {"SmallerThanTheBodyForXml",
+     Reply(Length("3"), "<a/>"),
+     XmlSoap,
+     {0, 0, 200, "no document"},
+     {},
+     true},
+    {"NegativeForXml", Reply(Length("-4"), "<a/>"), XmlSoap, {3, 0, 200, kFails}},
+};
+
+Outcome JsonGet(int port) {
+  Json::Value value = "untouched";
+  const int result = SendHttpGet("127.0.0.1", port, "a.cgi", value, 5, true);
+  return {result, 0, 0, value.toStyledString()};
+}
+
+Script Answer(const std::string& reply) {
+  return {ExpectRequest(), Offer(reply), Close()};
+}
+
+const char kJson[] = "{\"success\":true}";
+const char kJsonShown[] = "{\n\t\"success\" : true\n}\n";
+
+const Scenario kJsonTable[] = {
+    {"SmallerThanTheBodyForJson",
+     {Answer(Reply(Length("2"), kJson))},
+     JsonGet,
+     {0, 0, 0, kJsonShown}},
+    {"LargerThanTheBodyForJson",
+     {Answer(Reply(Length("2000"), kJson))},
+     JsonGet,
+     {0, 0, 0, kJsonShown}},
+    {"NegativeForJson", {Answer(Reply(Length("-1"), kJson))}, JsonGet, {0, 0, 0, kJsonShown}},
+    {"NoValueForJson",
+     {Answer(Reply("Content-Length:\r\n", kJson))},
+     JsonGet,
+     {-1, 0, 0, "\"untouched\"\n"},
+     {"SendHttpGet: Failed to check response[200]: 1\n"}},
+    {"NoBodyForJson",
+     {Answer(Reply(Length("16"), ""))},
+     JsonGet,
+     {-1, 0, 0, "\"untouched\"\n"},
+     {"SendHttpGet: Read Buffer Error\n"}},
+};
+
+// A SOAP reply of more than a mebibyte is read as it comes, and whole.
+Outcome SoapOfAnySize(int port) {
+  ClientProbe client(port);
+  return Soap(client);
+}
+
+const std::string kLarge(3 << 20, 'x');
+
+const Scenario kLargeTable[] = {
+    {"ALargeBodyForSoap",
+     {Answer(Reply(Length(std::to_string(kLarge.size())), kLarge))},
+     SoapOfAnySize,
+     {0, 0, 200, kLarge}},
+    {"HalfOfALargeBodyForSoap",
+     {Answer(Reply(Length(std::to_string(2 * kLarge.size())), kLarge))},
+     SoapOfAnySize,
+     {0, 0, 200, kLarge}},
+    {"MuchMoreThanALargeBodyForSoap",
+     {Answer(Reply(Length("2147483646"), kLarge))},
+     SoapOfAnySize,
+     {0, 0, 200, kLarge}},
+};
+
+}  // namespace
+
+class Lengths : public ::testing::TestWithParam<ReplyScenario> {};
+
+TEST_P(Lengths, EndAsTheTableSays) {
+  PlayReply(GetParam());
+}
+
+INSTANTIATE_TEST_SUITE_P(ReadBody, Lengths, ::testing::ValuesIn(BodyTable()), ReplyName);
+INSTANTIATE_TEST_SUITE_P(Soap, Lengths, ::testing::ValuesIn(SoapTable()), ReplyName);
+INSTANTIATE_TEST_SUITE_P(Others, Lengths, ::testing::ValuesIn(kOthers), ReplyName);
+
+class LengthReaders : public ::testing::TestWithParam<Scenario> {};
+
+TEST_P(LengthReaders, EndAsTheTableSays) {
+  PlayScenario(GetParam());
+}
+
+INSTANTIATE_TEST_SUITE_P(Curl, LengthReaders, ::testing::ValuesIn(CurlTable()), ScenarioName);
+INSTANTIATE_TEST_SUITE_P(Json, LengthReaders, ::testing::ValuesIn(kJsonTable), ScenarioName);
+INSTANTIATE_TEST_SUITE_P(Large, LengthReaders, ::testing::ValuesIn(kLargeTable), ScenarioName);

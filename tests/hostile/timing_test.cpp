@@ -1,0 +1,431 @@
+// Peers that are slow, stop in the middle, or do not read. The scenarios wait most of the time, so
+// they are played all at once, each on threads of its own; the tests then look at what came of
+// each.
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <json/value.h>
+#include <sys/syscall.h>
+#include <unistd.h>
+
+#include <chrono>
+#include <map>
+#include <mutex>
+#include <thread>
+
+#include "tests/hostile/hostile_util.h"
+
+using namespace std::string_literals;
+using std::chrono::milliseconds;
+
+namespace {
+
+constexpr char kHead[] = "HTTP/1.1 200 OK\r\n\r\n";
+constexpr char kChunkedHead[] = "HTTP/1.1 200 OK\r\nTransfer-Encoding: chunked\r\n\r\n";
+constexpr char kSoapHead[] = "HTTP/1.1 200 OK\r\nContent-Length: 10\r\n\r\n";
+
+// Each client waits for a second. A pause is longer than that, and a short one is not; several
+// short ones are.
+constexpr int kTimeout = 1;
+constexpr milliseconds kLong(1500);
+constexpr milliseconds kShort(100);
+
+Step Pause(milliseconds time) {
+  return {"Pause()", [time](PeerConnection&, std::string*) {
+            std::this_thread::sleep_for(time);
+            return true;
+          }};
+}
+
+// Sends byte by byte with a short pause in between, as long as the client takes them.
+Step SendSlowly(const std::string& bytes) {
+  return {"SendSlowly()", [bytes](PeerConnection& peer, std::string* error) {
+            for (const char byte : bytes) {
+              if (!peer.Write(std::string(1, byte))) break;
+              std::this_thread::sleep_for(kShort);
+            }
+            if (peer.DeadlinePassed()) *error = "deadline passed";
+            return !peer.DeadlinePassed();
+          }};
+}
+
+Script StallBehind(const std::string& bytes) {
+  return {ExpectRequest(), Send(bytes), StallUntilFinish()};
+}
+
+Script PauseBetween(const std::string& before, const std::string& behind) {
+  return {ExpectRequest(), Send(before), Pause(kLong), Offer(behind), Close()};
+}
+
+Script Slowly(const std::string& reply) {
+  return {ExpectRequest(), SendSlowly(reply), Close()};
+}
+
+ClientSettings Settings(bool buffered, bool https = false) {
+  ClientSettings settings;
+  settings.timeout = kTimeout;
+  settings.buffered = buffered;
+  settings.https = https;
+  return settings;
+}
+
+Outcome GetAndReadBody(int port, const ClientSettings& settings) {
+  ClientProbe client(port, settings);
+  const int sent = client.SendRequestByGet();
+  if (sent != HTTP_RET_OK) return OutcomeOf(client, sent, "not sent");
+  std::string body;
+  const int result = client.ReadBody(body);
+  return OutcomeOf(client, result, body);
+}
+
+Outcome Buffered(int port) {
+  return GetAndReadBody(port, Settings(true));
+}
+
+Outcome Direct(int port) {
+  return GetAndReadBody(port, Settings(false));
+}
+
+Outcome DirectOverTls(int port) {
+  return GetAndReadBody(port, Settings(false, true));
+}
+
+Outcome WithoutATimeout(int port) {
+  ClientSettings settings = Settings(true);
+  settings.timeout = -1;
+  return GetAndReadBody(port, settings);
+}
+
+Outcome SoapOf(int port, size_t size) {
+  ClientProbe client(port, Settings(true));
+  std::string reply = "untouched";
+  const int result = client.SendReqBySocketPost(std::string(size, 'x'), reply);
+  return OutcomeOf(client, result, reply);
+}
+
+Outcome Soap(int port) {
+  return SoapOf(port, 1);
+}
+
+const std::string kSlowBody(20, 'x');
+
+// More than the buffers of both ends hold.
+constexpr size_t kLarge = 16 << 20;
+
+Outcome LargeSoap(int port) {
+  return SoapOf(port, kLarge);
+}
+
+Outcome LargeForm(int port) {
+  ClientProbe client(port, Settings(true));
+  const int result = client.SendRequestBySocketPost(std::string(kLarge, 'x'));
+  return OutcomeOf(client, result);
+}
+
+// The text tells how much of the upload was taken.
+Outcome UploadOver(int port, bool https) {
+  ClientProbe client(port, Settings(true, https));
+  const int result = client.OpenRawDataUpload();
+  const std::string data(kLarge, 'x');
+  const int written = client.WriteData(data.data(), static_cast<int>(data.size()));
+  const bool all = written == static_cast<int>(kLarge);
+  return OutcomeOf(client, result, all ? "all" : written < 0 ? "failure" : "a part");
+}
+
+Outcome Upload(int port) {
+  return UploadOver(port, false);
+}
+
+Outcome UploadOverTls(int port) {
+  return UploadOver(port, true);
+}
+
+Outcome Json(int port) {
+  Json::Value value = "untouched";
+  const int result = SendHttpGet("127.0.0.1", port, "a.cgi", value, kTimeout, true);
+  return {result, 0, 0, value.toStyledString()};
+}
+
+Outcome Form(int port) {
+  return {SendHttpPost("127.0.0.1", port, "a.cgi", "a=1", "s=1", kTimeout), 0, 0, ""};
+}
+
+Outcome Curl(int port) {
+  ClientProbe client(port);
+  const int result = client.SendRequestByCurl(HTTP_METHOD_GET, true, kTimeout);
+  return OutcomeOf(client, result, client.m_strCurlText);
+}
+
+// How much of a slow body has come in time is not sure; all of it has not.
+Outcome CurlOfASlowBody(int port) {
+  Outcome outcome = Curl(port);
+  if (!outcome.text.empty() && outcome.text.size() < kSlowBody.size()) outcome.text = "a part";
+  return outcome;
+}
+
+Outcome CurlPost(int port) {
+  ClientProbe client(port);
+  return OutcomeOf(client, client.SendRequestByPost("?"));
+}
+
+Outcome XmlGet(int port) {
+  ClientProbe client(port);
+  const int result = client.SendReqByXMLGet(kTimeout);
+  return OutcomeOf(client, result, client.m_pRespBuf != nullptr ? client.m_pRespBuf : "");
+}
+
+Outcome ToABlackHole(int /*port*/) {
+  const BlackHolePort hole;
+  return GetAndReadBody(hole.Port(), Settings(true));
+}
+
+const char kHeadFailed[] = "CheckContentType: Connect failed!\n\n";
+const char kBodyFailed[] = "ReadBody: Read data error\n";
+
+std::string TimedOut(const std::string& function) {
+  return function + ": Failed to make http connection, return value=28\n";
+}
+
+// Any number of the log stands as N.
+const Scenario kTimings[] = {
+    // A stall ends the operation, wherever it comes.
+    {"AStallBeforeTheHead", {StallBehind("")}, Buffered, {3, 3, 0, ""}, {kBodyFailed}},
+    {"AStallBeforeTheHeadRead", {StallBehind("")}, Direct, {3, 3, 0, ""}, {kBodyFailed}},
+    {"AStallInTheStatusLine", {StallBehind("HTTP/1.1 20")}, Buffered, {3, 3, 0, ""}, {kBodyFailed}},
+    {"AStallInTheStatusLineRead",
+     {StallBehind("HTTP/1.1 20")},
+     Direct,
+     {3, 3, 0, ""},
+     {kBodyFailed}},
+    {"AStallInAHeaderLine",
+     {StallBehind("HTTP/1.1 200 OK\r\nX: ")},
+     Buffered,
+     {3, 3, 200, ""},
+     {kHeadFailed, kBodyFailed}},
+    {"AStallInALineEnd",
+     {StallBehind("HTTP/1.1 200 OK\r\nX: y\r")},
+     Direct,
+     {3, 3, 200, ""},
+     {kHeadFailed, kBodyFailed}},
+    {"AStallBehindTheHead", {StallBehind(kHead)}, Buffered, {3, 0, 200, ""}, {kBodyFailed}},
+    {"AStallBehindTheHeadRead", {StallBehind(kHead)}, Direct, {3, 0, 200, ""}, {kBodyFailed}},
+    {"AStallInABody", {StallBehind(kHead + "abc"s)}, Buffered, {3, 0, 200, "abc"}, {kBodyFailed}},
+    {"AStallInABodyRead", {StallBehind(kHead + "abc"s)}, Direct, {3, 0, 200, "abc"}, {kBodyFailed}},
+
+    // In place of a chunk's size it counts as the last chunk.
+    {"AStallBeforeAChunkSize", {StallBehind(kChunkedHead)}, Buffered, {0, 0, 200, ""}},
+    {"AStallInAChunkSize",
+     {StallBehind(kChunkedHead + "3\r\nabc\r\n5"s)},
+     Buffered,
+     {0, 0, 200, "abc"}},
+    {"AStallInAChunkSizeRead",
+     {StallBehind(kChunkedHead + "3\r\nabc\r\n5"s)},
+     Direct,
+     {0, 0, 200, "abc"}},
+    {"AStallInAChunk",
+     {StallBehind(kChunkedHead + "5\r\nabc"s)},
+     Buffered,
+     {3, 0, 200, "abc"},
+     {kBodyFailed}},
+    {"AStallInAChunkRead",
+     {StallBehind(kChunkedHead + "5\r\nabc"s)},
+     Direct,
+     {3, 0, 200, "abc"},
+     {kBodyFailed}},
+    {"AStallBehindAChunk", {StallBehind(kChunkedHead + "3\r\nabc"s)}, Direct, {0, 0, 200, "abc"}},
+
+    // Over TLS.
+    {"AStallBeforeTheHeadOverTls",
+     {StallBehind("")},
+     DirectOverTls,
+     {3, 3, 0, ""},
+     {kBodyFailed},
+     true},
+    {"AStallInABodyOverTls",
+     {StallBehind(kHead + "abc"s)},
+     DirectOverTls,
+     {3, 0, 200, "abc"},
+     {kBodyFailed},
+     true},
+
+    // The other readers.
+    {"AStallBeforeASoapHead", {StallBehind("")}, Soap, {3, 3, 0, "untouched"}},
+    {"AStallBeforeASoapBody",
+     {StallBehind(kSoapHead)},
+     Soap,
+     {3, 0, 200, "untouched"},
+     {"SendReqBySocketPost: Read data faild.\n"}},
+    {"AStallInASoapBody", {StallBehind(kSoapHead + "<a/>"s)}, Soap, {0, 0, 200, "<a/>"}},
+    {"AStallBeforeJson",
+     {StallBehind("")},
+     Json,
+     {-1, 0, 0, "\"untouched\"\n"},
+     {"SendHttpGet: Failed to check response[N]: N\n"}},
+    {"AStallInJson",
+     {StallBehind(kHead + "{\"success\":true}"s)},
+     Json,
+     {-1, 0, 0, "\"untouched\"\n"},
+     {"SendHttpGet: Failed to read data: N\n"}},
+    {"AStallBehindAForm", {StallBehind("")}, Form, {0, 0, 0, ""}},
+    {"AStallForCurl", {StallBehind("")}, Curl, {3, 3, 0, ""}, {TimedOut("SendRequestByCurl")}},
+    {"AStallInABodyForCurl",
+     {StallBehind(kSoapHead + "abc"s)},
+     Curl,
+     {3, 3, 0, "abc"},
+     {TimedOut("SendRequestByCurl")}},
+    {"AStallInABodyForXml",
+     {StallBehind(kSoapHead + "<a>"s)},
+     XmlGet,
+     {3, 3, 0, "<a>"},
+     {TimedOut("SendReqByXMLGet")}},
+    {"NoAnswerToAConnect",
+     {},
+     ToABlackHole,
+     {3, 1, 0, "not sent"},
+     {"SendRequestByGet: Connection failed!\n"}},
+
+    // Slow peers, each of whose pauses is within the time-out, are read to their end. libcurl's is
+    // one for the whole.
+    {"ASlowHead", {Slowly("HTTP/1.1 200 OK\r\nX: y\r\n\r\n")}, Buffered, {0, 0, 200, ""}},
+    {"ASlowHeadRead", {Slowly("HTTP/1.1 200 OK\r\nX: y\r\n\r\n")}, Direct, {0, 0, 200, ""}},
+    {"ASlowBody",
+     {{ExpectRequest(), Send(kHead), SendSlowly("ten bytes!"), Close()}},
+     Buffered,
+     {0, 0, 200, "ten bytes!"}},
+    {"ASlowChunk",
+     {{ExpectRequest(), Send(kChunkedHead), SendSlowly("3\r\nabc\r\n0"), Close()}},
+     Buffered,
+     {0, 0, 200, "abc"}},
+    {"ASlowBodyOverTls",
+     {{ExpectRequest(), Send(kHead), SendSlowly("ten bytes!"), Close()}},
+     DirectOverTls,
+     {0, 0, 200, "ten bytes!"},
+     {},
+     true},
+    {"ASlowBodyForCurl",
+     {{ExpectRequest(), Send(kHead), SendSlowly(kSlowBody), Close()}},
+     CurlOfASlowBody,
+     {3, 3, 0, "a part"},
+     {TimedOut("SendRequestByCurl")}},
+
+    // A pause beyond the time-out: small reads through the buffer are repeated, others are not.
+    {"APauseInTheHead",
+     {PauseBetween("HTTP/1.1 200 OK\r\n", "\r\nabc")},
+     Buffered,
+     {0, 0, 200, "abc"}},
+    {"APauseInTheHeadRead",
+     {PauseBetween("HTTP/1.1 200 OK\r\n", "\r\nabc")},
+     Direct,
+     {3, 3, 200, ""},
+     {kHeadFailed, kBodyFailed}},
+    {"APauseBeforeABody", {PauseBetween(kHead, "abc")}, Buffered, {3, 0, 200, ""}, {kBodyFailed}},
+    {"APauseBeforeAChunkSize",
+     {PauseBetween(kChunkedHead, "3\r\nabc\r\n0\r\n\r\n")},
+     Buffered,
+     {0, 0, 200, "abc"}},
+    {"APauseInAChunk",
+     {PauseBetween(kChunkedHead + "4\r\na"s, "bcd\r\n0\r\n\r\n")},
+     Buffered,
+     {0, 0, 200, "abcd"}},
+    {"APauseInTheSoapBody",
+     {PauseBetween(kSoapHead + "<a>"s, "1234</a>")},
+     Soap,
+     {0, 0, 200, "<a>"}},
+    {"APauseForAClientWithoutATimeout",
+     {PauseBetween("HTTP/1.1 200 ", "OK\r\n\r\nabc")},
+     WithoutATimeout,
+     {0, 0, 200, "abc"}},
+    {"APauseForAnOperationWithoutATimeout",
+     {{ExpectRequest(), Pause(kLong), Send("HTTP/1.1 200 OK\r\nContent-Length: 0\r\n\r\n"),
+       Close()}},
+     CurlPost,
+     {0, 0, 0, ""}},
+
+    // Peers that do not read. A write waits for as long as it takes.
+    {"ASoapRequestReadLate",
+     {{Pause(kLong), ExpectRequest(), Send(kSoapHead + "0123456789"s), Close()}},
+     LargeSoap,
+     {0, 0, 200, "0123456789"}},
+    {"ASoapRequestNotRead", {{Pause(kLong), Reset()}}, LargeSoap, {3, 3, 0, "untouched"}},
+    {"AFormReadLate",
+     {{Pause(kLong), ExpectRequest(), Send(kHead), Close()}},
+     LargeForm,
+     {0, 0, 200, ""}},
+    {"AFormNotRead",
+     {{Pause(kLong), Reset()}},
+     LargeForm,
+     {3, 1, 0, ""},
+     {"SendRequestBySocketPost: Write data faild, write N/N.\n"}},
+    {"AnUploadReadLate", {{Pause(kLong), DiscardUntilEnd()}}, Upload, {0, 1, 0, "all"}},
+    {"AnUploadNotRead", {{Pause(kLong), Reset()}}, Upload, {0, 1, 0, "a part"}},
+    {"AnUploadReadLateOverTls",
+     {{Pause(kLong), DiscardUntilEnd()}},
+     UploadOverTls,
+     {0, 1, 0, "all"},
+     {},
+     true},
+    {"AnUploadNotReadOverTls",
+     {{Pause(kLong), Reset()}},
+     UploadOverTls,
+     {0, 1, 0, "failure"},
+     {},
+     true},
+};
+
+struct Played {
+  Outcome outcome;
+  long thread = 0;
+  std::vector<std::string> log;
+};
+
+}  // namespace
+
+class Timing : public ::testing::TestWithParam<Scenario> {
+ protected:
+  static void SetUpTestSuite() {
+    const DescriptorGuard descriptors;
+    constexpr int kDebug = 5;
+    const LogCapture log(kDebug);
+    std::vector<std::thread> threads;
+    for (const Scenario& scenario : kTimings) threads.emplace_back(Play, std::cref(scenario));
+    for (std::thread& thread : threads) thread.join();
+    for (auto& [name, played] : played_) {
+      for (const LogLine& line : log.Lines("http")) {
+        if (line.tid == played.thread) played.log.push_back(line.function + ": " + line.message);
+      }
+    }
+  }
+
+  static void TearDownTestSuite() { played_.clear(); }
+
+  static void Play(const Scenario& scenario) {
+    Played played;
+    {
+      const auto peer = scenario.peer.empty() ? nullptr : PeerOf(scenario);
+      RunOnSmallStack(scenario.stack, [&] {
+        played.thread = syscall(SYS_gettid);
+        played.outcome = scenario.operation(peer != nullptr ? peer->Port() : 0);
+      });
+    }
+    std::lock_guard<std::mutex> lock(mutex_);
+    played_[scenario.name] = played;
+  }
+
+  static std::mutex mutex_;
+  static std::map<std::string, Played> played_;
+};
+
+std::mutex Timing::mutex_;
+std::map<std::string, Played> Timing::played_;
+
+TEST_P(Timing, EndsAsTheTableSays) {
+  const Scenario& scenario = GetParam();
+  const Played& played = played_[scenario.name];
+  std::vector<std::string> log;
+  for (const std::string& line : played.log) log.push_back(WithoutNumbers(line));
+  std::vector<std::string> expected;
+  for (const std::string& line : scenario.log) expected.push_back(WithoutNumbers(line));
+  EXPECT_EQ(played.outcome, scenario.expected);
+  EXPECT_EQ(log, expected);
+}
+
+INSTANTIATE_TEST_SUITE_P(Hostile, Timing, ::testing::ValuesIn(kTimings), ScenarioName);
