@@ -1,0 +1,26 @@
+// The operations under torture, by the folder of the library that they belong to.
+#ifndef TARNWICK_TESTS_TORTURE_OPERATIONS_H_
+#define TARNWICK_TESTS_TORTURE_OPERATIONS_H_
+
+#include <vector>
+
+#include "tests/torture/stage.h"
+
+std::vector<Operation> LogOperations();
+std::vector<Operation> UtilsOperations();
+std::vector<Operation> NetOperations();
+std::vector<Operation> HttpObjectOperations();
+std::vector<Operation> HttpSocketOperations();
+std::vector<Operation> HttpSoapOperations();
+std::vector<Operation> HttpCurlOperations();
+
+// Operations with a mistake of their own, which the torture must find, and words of its message;
+// null for one that must pass.
+struct PlantedOperation {
+  Operation operation;
+  const char* found;
+  int limit_seconds = 10;
+};
+std::vector<PlantedOperation> PlantedOperations();
+
+#endif  // TARNWICK_TESTS_TORTURE_OPERATIONS_H_

@@ -1,0 +1,151 @@
+#include "tests/torture/sweeper.h"
+
+#include <unistd.h>
+
+#include "tests/support/files.h"
+#include "tests/support/log_capture.h"
+#include "tests/torture/traces.h"
+
+namespace {
+
+// So many runs without a fault come first.
+constexpr int kWarmUpRuns = 4;
+
+// A cache that a fault has made larger is full after so many more runs; a leak grows with each.
+// OpenSSL keeps the texts of a thread's last sixteen errors.
+constexpr int kRunsToSettle = 24;
+
+// A run without a fault follows after so many with one: what a fault has broken for good shows.
+constexpr long kPointsBetweenChecks = 8;
+
+// Lines are written whole, and the file ends with one. A failed write is not made good.
+std::string LogMistake() {
+  const std::string text = t_injection.write_failed ? "" : ReadFile(kMainLog);
+  return text.empty() || text.back() == '\n' ? "" : "the log ends in the middle of a line; ";
+}
+
+}  // namespace
+
+Watchdog::Watchdog(const Operation& operation, int limit_seconds, Progress* progress)
+    : operation_(operation),
+      limit_(limit_seconds),
+      progress_(progress),
+      thread_([this] { Watch(); }) {}
+
+Watchdog::~Watchdog() {
+  stopped_ = true;
+  thread_.join();
+}
+
+void Watchdog::StartRun() {
+  started_ = Clock::now().time_since_epoch().count();
+}
+
+void Watchdog::Watch() {
+  while (!stopped_) {
+    usleep(20000);
+    const Clock::time_point started{Clock::duration(started_)};
+    if (Clock::now() - started < limit_) continue;
+    NoteMistake(operation_, "takes longer than its limit", progress_);
+    progress_->timed_out = true;
+    _exit(1);
+  }
+}
+
+std::set<std::string> Sweeper::FilesThere() {
+  return TakeTraces().files;
+}
+
+bool Sweeper::WarmUp() {
+  for (int i = 0; i < kWarmUpRuns; ++i) {
+    const RunResult result = RunOnce(kNoPoint);
+    if (result.mistakes.empty()) continue;
+    NoteMistake(operation_, result.mistakes.c_str(), progress_);
+    return false;
+  }
+  NoteCounts();
+  return true;
+}
+
+bool Sweeper::TryFirstRun(const Point& point) {
+  if (point.fault != Fault::kNone) return TryPoint(point, true);
+  const RunResult result = RunOnce(point);
+  NoteCounts();
+  if (!result.mistakes.empty()) NoteMistake(operation_, result.mistakes.c_str(), progress_);
+  return true;
+}
+
+void Sweeper::Make(const Selection& selection) {
+  if (selection.only_first) {
+    TryPoint(selection.first, true);
+    return;
+  }
+  for (const Fault fault : kFaults) {
+    if (fault < selection.first.fault) continue;
+    const bool resumes = fault == selection.first.fault;
+    SweepFault(fault, resumes ? selection.first.number : 1);
+  }
+  const std::string mistakes = AfterEffects();
+  if (!mistakes.empty()) NoteMistake(operation_, mistakes.c_str(), progress_);
+}
+
+void Sweeper::NoteCounts() {
+  progress_->allocations = t_injection.allocations;
+  progress_->calls = t_injection.calls;
+}
+
+void Sweeper::SweepFault(Fault fault, long first) {
+  int misses = 0;
+  for (long number = first; misses < kMissesToEnd; ++number) {
+    misses = TryPoint({fault, number}, false) ? 0 : misses + 1;
+  }
+}
+
+bool Sweeper::TryPoint(const Point& point, bool checks) {
+  progress_->current = point;
+  RunResult result = RunOnce(point);
+  if (result.blocks_left > 0 && !Settles(point)) {
+    result.mistakes += std::to_string(result.blocks_left) + " blocks of memory are left; ";
+  }
+  if (!result.struck) return result.reached;
+  if (++progress_->points % kPointsBetweenChecks == 0) checks = true;
+  if (checks && result.mistakes.empty()) result.mistakes = AfterEffects();
+  if (!result.mistakes.empty()) {
+    NoteMistake(operation_, (result.mistakes + "after " + struck_name_).c_str(), progress_);
+  }
+  return true;
+}
+
+bool Sweeper::Settles(const Point& point) {
+  for (int i = 0; i < kRunsToSettle; ++i) {
+    if (RunOnce(point).blocks_left <= 0) return true;
+  }
+  return false;
+}
+
+std::string Sweeper::AfterEffects() {
+  const std::string mistakes = RunOnce(kNoPoint).mistakes;
+  return mistakes.empty() ? "" : "the next run without a fault: " + mistakes;
+}
+
+Sweeper::RunResult Sweeper::RunOnce(const Point& point) {
+  watchdog_->StartRun();
+  unlink(kMainLog);
+  RunResult result;
+  Stage stage(port_);
+  Traces before = TakeTraces();
+  // What an earlier run could not remove is gone after one without a fault.
+  if (point.fault == Fault::kNone) before.files = first_files_;
+  const long blocks = t_injection.blocks;
+  StartRun(point);
+  operation_.run(stage);
+  result.blocks_left = t_injection.blocks - blocks - (stage.Mistakes().empty() ? 0 : 1);
+  const bool with_files = !t_injection.unlink_failed;
+  result.struck = t_injection.struck;
+  if (result.struck) struck_name_ = t_injection.struck_name;
+  const long made = CountsAllocations(point.fault) ? t_injection.allocations : t_injection.calls;
+  result.reached = made >= point.number;
+  result.mistakes =
+      stage.Mistakes() + DifferenceOf(before, TakeTraces(), with_files) + HeldLock() + LogMistake();
+  return result;
+}
