@@ -1,0 +1,195 @@
+#include "tests/soak/reply.h"
+
+#include <algorithm>
+#include <cstdio>
+#include <cstdlib>
+#include <string_view>
+
+#include "tests/soak/login.h"
+
+namespace {
+
+constexpr char kSecondMark[] = "/second";
+
+bool Contains(const std::string& text, std::string_view part) {
+  return text.find(part) != std::string::npos;
+}
+
+// The number behind "Content-Length:"; 0 without one.
+size_t LengthOf(const std::string& head) {
+  constexpr std::string_view kName = "Content-Length:";
+  const size_t found = head.find(kName);
+  if (found == std::string::npos) return 0;
+  return std::strtoul(head.c_str() + found + kName.size(), nullptr, 10);
+}
+
+// The parts of a reply on their way to the client.
+struct Reply {
+  std::string head;
+  std::string body;  // as it travels, with its framing
+  bool keep_open = false;
+};
+
+std::string Chunked(const Plan& plan, const std::string& body) {
+  Random random(plan.id);
+  std::string text;
+  for (size_t sent = 0; sent < body.size();) {
+    // The second chunk of a bad one has no size; the first never is the whole body.
+    const size_t most = plan.fault == Fault::kBadChunk ? body.size() / 2 : body.size() - sent;
+    const size_t count = most == 0 ? 0 : std::min(most, 1 + Below(20000, &random));
+    char size[32];
+    snprintf(size, sizeof(size), "%zx\r\n", count);
+    if (count > 0) text += size + body.substr(sent, count) + "\r\n";
+    if (plan.fault == Fault::kBadChunk) return text + "zz\r\n";
+    sent += count;
+  }
+  return text + "0\r\n\r\n";
+}
+
+size_t AnnouncedLength(const Plan& plan, size_t length) {
+  if (plan.fault == Fault::kLongLength) return length + 1 + plan.id % 5000;
+  if (plan.fault == Fault::kShortLength) return length - 1 - plan.id % length;
+  return length;
+}
+
+Reply Success(const Plan& plan, bool keep_open) {
+  Reply reply;
+  reply.keep_open = keep_open;
+  const std::string answer = AnswerOf(plan);
+  const std::string id = std::to_string(plan.id);
+  reply.head = "HTTP/1.1 200 OK\r\nContent-Type: text/x-soak; id=" + id +
+               "\r\nSet-Cookie: id=" + id + "; Path=/\r\n";
+  if (!keep_open) reply.head += "Connection: close\r\n";
+  if (plan.framing == Framing::kLength) {
+    reply.head +=
+        "Content-Length: " + std::to_string(AnnouncedLength(plan, answer.size())) + "\r\n";
+  }
+  if (plan.framing == Framing::kChunked) reply.head += "Transfer-Encoding: chunked\r\n";
+  reply.head += "\r\n";
+  reply.body = plan.framing == Framing::kChunked ? Chunked(plan, answer) : answer;
+  return reply;
+}
+
+Reply Refusal(const std::string& status, const std::string& more, unsigned id) {
+  // A refusal without a body is another path through the SOAP requests than one with a body.
+  const std::string body = id % 2 == 0 ? "refused" : "";
+  return {"HTTP/1.1 " + status + "\r\n" + more +
+              "Connection: close\r\nContent-Length: " + std::to_string(body.size()) + "\r\n\r\n",
+          body, false};
+}
+
+// What the request holds that its plan does not: empty for a right one.
+std::string WrongPart(const Request& request) {
+  const Plan& plan = request.plan;
+  if (request.body != RequestBodyOf(plan)) return "body";
+  const bool query = plan.operation == Operation::kGet || plan.operation == Operation::kJsonGet;
+  if (query && !Contains(request.head, std::string(kEncodedQuery) + " HTTP/")) return "query";
+  const bool cookie =
+      plan.operation == Operation::kFormPost || plan.operation == Operation::kCurlPost;
+  if (cookie && !Contains(request.head, "Cookie: id=" + std::to_string(plan.id) + "\r\n")) {
+    return "cookie";
+  }
+  return "";
+}
+
+Reply ReplyTo(const Request& request) {
+  const Plan& plan = request.plan;
+  if (plan.operation == Operation::kLines) return {"", AnswerOf(plan) + "\r\n", false};
+  if (plan.fault == Fault::kServerError) return Refusal("500 Soak", "", plan.id);
+  // Asked for in turns where the plan names none.
+  const Login login = plan.login != Login::kNone           ? plan.login
+                      : plan.fault != Fault::kUnauthorized ? Login::kNone
+                      : plan.id % 4 < 2                    ? Login::kBasic
+                                                           : Login::kDigest;
+  if (plan.fault == Fault::kUnauthorized || !LoginIsRight(login, request.head)) {
+    return Refusal("401 Unauthorized", ChallengeOf(login), plan.id);
+  }
+  const std::string wrong = WrongPart(request);
+  if (!wrong.empty()) return Refusal("409 Wrong " + wrong, "", plan.id);
+  const bool first =
+      plan.operation == Operation::kSecondRequest && !Contains(request.head, kSecondMark);
+  if (!first) return Success(plan, false);
+  Plan healthy = plan;
+  healthy.fault = Fault::kNone;
+  healthy.framing = Framing::kLength;
+  return Success(healthy, true);
+}
+
+void WriteSlowly(Channel* channel, const std::string& bytes, unsigned seed) {
+  Random random(seed);
+  for (size_t sent = 0; sent < bytes.size();) {
+    const size_t count = 1 + Below(20, &random);
+    if (!channel->Write(bytes.substr(sent, count))) return;
+    sent += count;
+  }
+}
+
+// The part of `bytes` that a cut lets through: never more than half of them.
+std::string Half(const std::string& bytes, unsigned seed) {
+  return bytes.substr(0, seed % (bytes.size() / 2 + 1));
+}
+
+}  // namespace
+
+bool ReadRequest(Channel* channel, Request* request) {
+  if (!channel->ReadUntil("\r\n\r\n", &request->head)) return false;
+  request->body.clear();
+  const bool upload = Contains(request->head, "multipart/form-data");
+  const size_t length = LengthOf(request->head);
+  if (upload) {
+    if (!FindPlan(request->head, &request->plan)) return false;
+    // In the middle of what the client writes.
+    if (request->plan.fault == Fault::kReset) return true;
+    return channel->ReadUntil(std::string(kBoundary) + "--\r\n", &request->body);
+  }
+  if (length > 0 && !channel->ReadBytes(length, &request->body)) return false;
+  return FindPlan(request->head, &request->plan) || FindPlan(request->body, &request->plan);
+}
+
+bool SendReply(Channel* channel, const Request& request) {
+  const Plan& plan = request.plan;
+  const Reply reply = ReplyTo(request);
+  if (reply.keep_open) return channel->Write(reply.head + reply.body);
+  switch (plan.fault) {
+    case Fault::kReset:
+      channel->Reset();
+      return false;
+    case Fault::kStall:
+      channel->Stall();
+      return false;
+    case Fault::kGarbage:
+      channel->Write(Noise(plan.id));
+      break;
+    case Fault::kCutHead:
+      channel->Write(reply.head.substr(0, plan.id % (reply.head.size() - 2)));
+      channel->Cut();
+      return false;
+    case Fault::kCutBody:
+      channel->Write(reply.head + Half(reply.body, plan.id));
+      channel->Cut();
+      return false;
+    case Fault::kResetBody:
+      channel->Write(reply.head + Half(reply.body, plan.id));
+      channel->Reset();
+      return false;
+    case Fault::kStallBody:
+      channel->Write(reply.head + Half(reply.body, plan.id));
+      channel->Stall();
+      return false;
+    case Fault::kSlow:
+      WriteSlowly(channel, reply.head + reply.body, plan.id);
+      break;
+    default:
+      channel->Write(reply.head + reply.body);
+  }
+  channel->Close();
+  return false;
+}
+
+std::string Noise(unsigned seed) {
+  Random random(seed);
+  std::string bytes(1 + Below(5000, &random), '\0');
+  for (char& c : bytes) c = static_cast<char>(Below(256, &random));
+  bytes[0] = '\x01';  // neither a status line nor a TLS record
+  return bytes;
+}

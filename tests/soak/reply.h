@@ -1,0 +1,25 @@
+// What the soak's server answers to a request, and how it spoils the answer.
+#ifndef TARNWICK_TESTS_SOAK_REPLY_H_
+#define TARNWICK_TESTS_SOAK_REPLY_H_
+
+#include <string>
+
+#include "tests/soak/channel.h"
+#include "tests/soak/plan.h"
+
+struct Request {
+  std::string head;  // with the empty line
+  std::string body;
+  Plan plan;
+};
+
+// Reads one request; false when the client ended, or sent one that the soak does not know.
+bool ReadRequest(Channel* channel, Request* request);
+
+// Answers it, with the fault of its plan. Results: true when the connection stays open for another.
+bool SendReply(Channel* channel, const Request& request);
+
+// Bytes that are no reply.
+std::string Noise(unsigned seed);
+
+#endif  // TARNWICK_TESTS_SOAK_REPLY_H_
