@@ -4,6 +4,13 @@ add_library(tarnwick_options INTERFACE)
 add_library(tarnwick_library_options INTERFACE)
 target_compile_options(tarnwick_options INTERFACE
   -Wall -Wextra -Wshadow -Wconversion -Wformat=2 -fstack-protector-strong)
+# Tables of functions that are read-only once a program runs, and a stack that holds no code;
+# scripts/check-hardening looks whether it came to that. Programs that are to lie at random
+# addresses ask for POSITION_INDEPENDENT_CODE, for which CMake wants to know whether the linker can.
+target_link_options(tarnwick_options INTERFACE
+  LINKER:-z,relro LINKER:-z,now LINKER:-z,noexecstack)
+include(CheckPIESupported)
+check_pie_supported(LANGUAGES CXX)
 # 64-bit file offsets on 32-bit targets: a log file grows past 2 GiB.
 target_compile_definitions(tarnwick_options INTERFACE _GNU_SOURCE _FILE_OFFSET_BITS=64)
 if(CMAKE_BUILD_TYPE STREQUAL "Debug")
