@@ -2,6 +2,7 @@
 #include "tarnwick/log/twdebuglog.h"
 
 #include <fcntl.h>
+#include <sys/resource.h>
 #include <sys/syscall.h>
 #include <sys/time.h>
 #include <syslog.h>
@@ -12,6 +13,7 @@
 #include <cstdarg>
 #include <cstdio>
 #include <ctime>
+#include <optional>
 #include <string_view>
 
 #include "tarnwick/platform/file_lock.h"
@@ -25,6 +27,10 @@ constexpr char kSourceName[] = "twdebuglog";
 
 // Longer texts are cut there.
 constexpr size_t kPartSize = 128;
+
+// A line of this length goes out by one write. The buffer is the caller's stack, which saves the
+// stream an allocation.
+constexpr size_t kStreamSize = 4096;
 
 const char* PathOf(LOG_TYPE type) {
   switch (type) {
@@ -83,15 +89,22 @@ struct CallSite {
   const char* func;
 };
 
-bool WritePrefix(FILE* stream, const char* categ, const char* level, const CallSite& site) {
+void WritePrefix(FILE* stream, const char* categ, const char* level, const CallSite& site) {
   char process[kPartSize];
   char tags[kPartSize];
   char time[kPartSize];
   FormatProcess(process);
   FormatTags(categ, level, tags);
   FormatTime(time);
-  return fprintf(stream, "%s %s%s %s:%d:%s(): ", time, process, tags,
-                 site.file + BaseNameStart(site.file), site.line, site.func) >= 0;
+  fprintf(stream, "%s %s%s %s:%d:%s(): ", time, process, tags, site.file + BaseNameStart(site.file),
+          site.line, site.func);
+}
+
+// A write beyond the process's file size limit ends the process, unless the signal is held off. Few
+// processes have such a limit, and to ask is cheaper than to hold it off for nothing.
+bool HasFileSizeLimit() {
+  struct rlimit limit;
+  return getrlimit(RLIMIT_FSIZE, &limit) != 0 || limit.rlim_cur != RLIM_INFINITY;
 }
 
 }  // namespace
@@ -104,27 +117,27 @@ void TWPrintf(LOG_TYPE type, const char* categ, const char* level, const char* f
               const char* func, const char* format, ...) {
   // Callers read errno after they have logged.
   const ErrnoKeeper keeper;
+  char buffer[kStreamSize];
   UninheritedFile log(PathOf(type), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, 0666);
   if (!log.Valid()) {
     syslog(LOG_ERR, "%s:%d:%s(): open twlog file failed with errno [%d].", kSourceName, __LINE__,
            __func__, errno);
     return;
   }
-  if (!log.MakeStream("a")) {
+  if (!log.MakeStream("a", buffer, sizeof(buffer))) {
     syslog(LOG_ERR, "%s:%d:%s(): fdopen twlog file failed with errno [%d].", kSourceName, __LINE__,
            __func__, errno);
     return;
   }
   const FileLock lock(log.Get());
   if (!lock.Held()) return;
-  SignalGuard sizeLimit(SIGXFSZ);  // at the process's file size limit a write ends it otherwise
+  std::optional<SignalGuard> sizeLimit;
+  if (HasFileSizeLimit()) sizeLimit.emplace(SIGXFSZ);
+  WritePrefix(log.Stream(), categ, level,
+              {file != nullptr ? file : "", line, func != nullptr ? func : ""});
   va_list arguments;
   va_start(arguments, format);
-  // A message whose prefix did not fit would stand behind another line.
-  const bool written =
-      WritePrefix(log.Stream(), categ, level,
-                  {file != nullptr ? file : "", line, func != nullptr ? func : ""}) &&
-      (format == nullptr || vfprintf(log.Stream(), format, arguments) >= 0);
+  if (format != nullptr) vfprintf(log.Stream(), format, arguments);
   va_end(arguments);
-  if (!written) sizeLimit.TakeBack();
+  if (!log.Flush() && sizeLimit) sizeLimit->TakeBack();
 }

@@ -2,6 +2,7 @@
 
 #include <fcntl.h>
 #include <pthread.h>
+#include <stdio_ext.h>
 #include <unistd.h>
 
 #include <cerrno>
@@ -35,6 +36,7 @@ void Unlock() {
 void CloseInheritedFiles() {
   const ErrnoKeeper keeper;
   for (const UninheritedFile* file = g_files; file != nullptr; file = file->m_next) {
+    if (file->m_stream != nullptr) __fpurge(file->m_stream);
     close(file->m_fd);
   }
   g_files = nullptr;
@@ -88,10 +90,15 @@ UninheritedFile::~UninheritedFile() {
   }
 }
 
-bool UninheritedFile::MakeStream(const char* mode) {
+bool UninheritedFile::MakeStream(const char* mode, char* buffer, size_t size) {
   FILE* const stream = fdopen(m_fd, mode);
-  if (stream == nullptr) return false;
-  setvbuf(stream, nullptr, _IONBF, 0);
+  if (stream != nullptr) setvbuf(stream, buffer, _IOFBF, size);
   m_stream = stream;
-  return true;
+  return stream != nullptr;
+}
+
+bool UninheritedFile::Flush() {
+  if (fflush(m_stream) == 0) return true;
+  __fpurge(m_stream);
+  return false;
 }

@@ -16,8 +16,9 @@ class ForkHold {
   ForkHold& operator=(const ForkHold&) = delete;
 };
 
-// An open file of which a forked child keeps no descriptor: its copies are closed before fork()
-// returns there. A child that stays would otherwise keep the file's lock when the parent dies.
+// An open file of which a forked child keeps nothing: what its stream holds is dropped and its
+// descriptor closed before fork() returns there. A child that stays would otherwise keep the file's
+// lock when the parent dies, and one that ends would write the stream's contents again.
 // A thread that forks while it has one must not use it in the child.
 class UninheritedFile {
  public:
@@ -32,10 +33,14 @@ class UninheritedFile {
   bool Valid() const { return m_fd >= 0; }
   int Get() const { return m_fd; }
 
-  // Makes a stream on it and gives true, or false with errno. The stream has no buffer, because a
-  // forked child would write the contents again when it ends. REQUIRES: no stream yet.
-  bool MakeStream(const char* mode);
+  // Makes a stream on it, with a buffer of `size` bytes that outlives this object, and gives true;
+  // or false with errno. REQUIRES: no stream yet.
+  bool MakeStream(const char* mode, char* buffer, size_t size);
   FILE* Stream() const { return m_stream; }
+
+  // Writes what the stream holds. On failure it is dropped, and false is the result: closing would
+  // write it without the file's lock.
+  bool Flush();
 
  private:
   friend void CloseInheritedFiles();

@@ -8,6 +8,8 @@
 
 #include <cerrno>
 #include <chrono>
+#include <cstdio>
+#include <cstdlib>
 #include <memory>
 #include <string>
 #include <thread>
@@ -127,15 +129,43 @@ TEST(UninheritedFile, TheParentKeepsItsLockWhenAChildStarts) {
   EXPECT_EQ(flock(other.Get(), LOCK_EX | LOCK_NB), -1);
 }
 
-TEST(UninheritedFile, ItsStreamWritesAtOnceAndIsClosedWithIt) {
+TEST(UninheritedFile, ItsStreamWritesWhenItIsFlushedAndIsClosedWithIt) {
   const TempDir folder;
   const DescriptorGuard descriptors;
-  {
-    UninheritedFile file(folder.File("log").c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
-    ASSERT_TRUE(file.MakeStream("a"));
-    fprintf(file.Stream(), "%s", "text");
-    EXPECT_EQ(ReadFile(folder.File("log")), "text");
-  }
+  char buffer[1024];
+  UninheritedFile file(folder.File("log").c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
+  ASSERT_TRUE(file.MakeStream("a", buffer, sizeof(buffer)));
+  fprintf(file.Stream(), "%s", "text");
+  EXPECT_EQ(ReadFile(folder.File("log")), "");
+  EXPECT_TRUE(file.Flush());
+  EXPECT_EQ(ReadFile(folder.File("log")), "text");
+}
+
+TEST(UninheritedFile, WhatCannotBeWrittenIsDropped) {
+  char buffer[1024];
+  UninheritedFile file("/dev/full", O_WRONLY | O_CLOEXEC, 0);
+  ASSERT_TRUE(file.MakeStream("a", buffer, sizeof(buffer)));
+  fprintf(file.Stream(), "%s", "text");
+  EXPECT_FALSE(file.Flush());
+  EXPECT_TRUE(file.Flush());
+}
+
+TEST(UninheritedFile, AChildThatEndsWritesNothingOfItsStream) {
+  const TempDir folder;
+  char buffer[1024];
+  UninheritedFile file(folder.File("log").c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
+  ASSERT_TRUE(file.MakeStream("a", buffer, sizeof(buffer)));
+  fprintf(file.Stream(), "%s", "text");
+  // The number of the closed descriptor is the next one that the child opens.
+  const std::string other = folder.File("other");
+  const auto open_and_exit = [&]() -> int {
+    open(other.c_str(), O_WRONLY | O_CREAT, 0600);
+    std::exit(0);
+  };
+  EXPECT_EQ(RunInChild(open_and_exit).code, 0);
+  EXPECT_EQ(ReadFile(other), "");
+  EXPECT_TRUE(file.Flush());
+  EXPECT_EQ(ReadFile(folder.File("log")), "text");
 }
 
 TEST(UninheritedFile, AStreamThatCannotBeMadeLeavesTheDescriptorToItsOwner) {
@@ -143,8 +173,9 @@ TEST(UninheritedFile, AStreamThatCannotBeMadeLeavesTheDescriptorToItsOwner) {
   const DescriptorGuard descriptors;
   Faults faults;
   faults.FailNth(Call::kFdopen, 1, ENOMEM);
+  char buffer[1024];
   UninheritedFile file(folder.File("log").c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
-  EXPECT_FALSE(file.MakeStream("a"));
+  EXPECT_FALSE(file.MakeStream("a", buffer, sizeof(buffer)));
   EXPECT_EQ(errno, ENOMEM);
 }
 
