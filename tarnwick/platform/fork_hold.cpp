@@ -98,7 +98,7 @@ bool UninheritedFile::MakeStream(const char* mode, char* buffer, size_t size) {
 }
 
 bool UninheritedFile::Flush() {
-  if (fflush(m_stream) == 0) return true;
+  if (fflush(m_stream) == 0 && ferror(m_stream) == 0) return true;
   __fpurge(m_stream);
   return false;
 }

@@ -38,8 +38,8 @@ class UninheritedFile {
   bool MakeStream(const char* mode, char* buffer, size_t size);
   FILE* Stream() const { return m_stream; }
 
-  // Writes what the stream holds. On failure it is dropped, and false is the result: closing would
-  // write it without the file's lock.
+  // Writes what the stream holds. When this or an earlier write has failed, the rest is dropped, and
+  // false is the result: closing would write it without the file's lock.
   bool Flush();
 
  private:

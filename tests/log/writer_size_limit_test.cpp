@@ -67,6 +67,15 @@ TEST_F(WriterSizeLimit, LeavesErrnoAndTheSignalAsTheyWere) {
   });
 }
 
+TEST_F(WriterSizeLimit, CutsALineThatGoesOutInSeveralWrites) {
+  const std::string longer(10000, 'm');
+  ExpectInChild([&] {
+    TWPrintf(LOG_TYPE_MAIN, "http", "warn", "name", 57, "Func", "%s\n", longer.c_str());
+    return !IsPendingOrBlocked();
+  });
+  EXPECT_EQ(ReadFile(kMainLog).size(), kLimit);
+}
+
 TEST_F(WriterSizeLimit, LinesGoOnInANewFile) {
   ExpectInChild([] {
     Write();
