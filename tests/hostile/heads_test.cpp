@@ -15,6 +15,7 @@ constexpr char kReadFailed[] = "CheckContentType: Connect failed!\n\n";
 
 std::string Repeated(size_t count, const std::string& text) {
   std::string all;
+  all.reserve(count * text.size());
   for (size_t i = 0; i < count; ++i) all += text;
   return all;
 }
@@ -283,8 +284,9 @@ Outcome XmlGet(int port) {
   return OutcomeOf(client, result, client.m_pRespBuf != nullptr ? client.m_pRespBuf : "");
 }
 
-// The peer holds a copy or two of its mebibyte.
-constexpr size_t kMostGrowthInKilobytes = 8 << 10;
+// Of the 60 to 100 MiB that come. The peer holds its block of a mebibyte, and the address sanitizer
+// keeps freed memory for a while.
+constexpr size_t kMostGrowthInKilobytes = 16 << 10;
 
 constexpr size_t kMega = 1 << 20;
 constexpr size_t kHundred = 100 * kMega;
@@ -418,9 +420,16 @@ class EndlessHeads : public ::testing::TestWithParam<Scenario> {};
 TEST_P(EndlessHeads, EndAsTheTableSaysInConstantMemory) {
   const PeakMemory memory;
   PlayScenario(GetParam());
+  RecordProperty("growth_in_kilobytes", std::to_string(memory.GrowthInKilobytes()));
   EXPECT_LT(memory.GrowthInKilobytes(), kMostGrowthInKilobytes);
 }
 
 INSTANTIATE_TEST_SUITE_P(Hostile, EndlessHeads, ::testing::ValuesIn(kEndlessTable), ScenarioName);
 INSTANTIATE_TEST_SUITE_P(HostileCurl, EndlessHeads, ::testing::ValuesIn(kEndlessCurlTable),
                          ScenarioName);
+
+TEST(PeakMemory, SeesMemoryThatHasBeenGivenBack) {
+  const PeakMemory memory;
+  std::string(4 * kMostGrowthInKilobytes << 10, 'x').clear();
+  EXPECT_GT(memory.GrowthInKilobytes(), 3 * kMostGrowthInKilobytes);
+}
