@@ -274,3 +274,14 @@ TEST(SendRequest, ForAGetTheArgumentDoesNotCount) {
   EXPECT_EQ(client.SendRequest(HTTP_METHOD_GET, ""), HTTP_RET_OK);
   EXPECT_THAT(peer.Received(0), StartsWith("GET /x?a=1 HTTP/1.0\r\n"));
 }
+
+TEST(SendRequest, WithoutMemoryForTheBasicLoginItIsAnIoErrorAndNothingIsThrown) {
+  const ClosedPort port;
+  ClientProbe client(port.Port(), WithLogin(true));
+  Faults faults;
+  faults.FailFrom(Call::kMalloc, 1);
+  int result = -1;
+  EXPECT_NO_THROW(result = client.SendRequest(HTTP_METHOD_GET, "?"));
+  EXPECT_EQ(result, HTTP_RET_IO_ERROR);
+  EXPECT_EQ(faults.Count(Call::kConnect), 0);
+}

@@ -1,7 +1,7 @@
 // Runs each operation of the library once for each of its allocations and system calls, with that
 // call failing, and prints what went wrong and a table.
 //
-//   tarnwick_torture [--jobs N] [OPERATION...]          all operations, or these
+//   tarnwick_torture [--jobs N] [OPERATION...]          all operations, or these, N at once
 //   tarnwick_torture OPERATION --fault FAULT --point N [--cold]  one run again
 //   tarnwick_torture --quick [OPERATION...]             none as the first of a process, and unless
 //                                                       named none with a TLS handshake
@@ -16,11 +16,13 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <chrono>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
 #include <string>
+#include <thread>
 #include <vector>
 
 #include "tests/torture/operations.h"
@@ -41,7 +43,7 @@ constexpr int kMostCrashes = 50;
 struct Arguments {
   std::vector<std::string> names;
   Selection selection;
-  int jobs = 1;
+  int jobs = static_cast<int>(std::max(1U, std::thread::hardware_concurrency()));
   bool quick = false;
   bool list = false;
   bool self_check = false;
