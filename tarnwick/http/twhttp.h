@@ -74,6 +74,8 @@ enum {
 //
 // The socket operations connect anew for each request. Authorization, cookie and other texts go
 // onto the wire as they are: it is for the caller to keep line ends out of them.
+// When memory runs out, a request operation gives its failure; constructors and functions that take
+// or return a text by value throw std::bad_alloc.
 // Threads: one thread uses an object at a time; separate objects may run in separate threads.
 class TARNWICK_API TWHttpClient {
  public:
