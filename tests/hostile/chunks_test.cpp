@@ -24,12 +24,6 @@ struct ChunkRow {
   std::string trailer = "";  // libcurl hands it on as header lines, and a file gets these as well
 };
 
-std::string Repeated(size_t count, const std::string& text) {
-  std::string all;
-  for (size_t i = 0; i < count; ++i) all += text;
-  return all;
-}
-
 const ChunkRow kChunks[] = {
     {"TwoChunks", "4\r\nWiki\r\n5\r\npedia\r\n0\r\n\r\n", "Wikipedia", 0, "Wikipedia"},
     {"DigitsOfBothCases", "a\r\n0123456789\r\nA\r\n0123456789\r\n0\r\n\r\n", "01234567890123456789",

@@ -33,12 +33,6 @@ std::string Cookie(const std::string& value) {
   return "Set-Cookie: " + value + "\r\n";
 }
 
-std::string Times(int count, const std::string& text) {
-  std::string all;
-  for (int i = 0; i < count; ++i) all += text;
-  return all;
-}
-
 // All bytes but those that end a line or a text.
 std::string Controls() {
   std::string controls;
@@ -94,11 +88,11 @@ std::vector<CookieCase> NumberTable() {
   return {
       {"TheLastOfTwo", Cookie("a=1;") + Cookie("b=2;"), "b=2;"},
       {"TheLastOfTwoIsBroken", Cookie("a=1;") + Cookie("b=2"), ""},
-      {"TheLastOf29", Times(28, Cookie("a=1;")) + Cookie("b=2;"), "b=2;"},
-      {"The30thOf100", Times(29, Cookie("a=1;")) + Cookie("b=2;") + Times(70, Cookie("c=3;")),
+      {"TheLastOf29", Repeated(28, Cookie("a=1;")) + Cookie("b=2;"), "b=2;"},
+      {"The30thOf100", Repeated(29, Cookie("a=1;")) + Cookie("b=2;") + Repeated(70, Cookie("c=3;")),
        "b=2;"},
-      {"The31stIsNotRead", Times(30, "X: y\r\n") + Cookie("a=1;"), ""},
-      {"TenThousand", Times(10000, Cookie("a=1;")), "a=1;"},
+      {"The31stIsNotRead", Repeated(30, "X: y\r\n") + Cookie("a=1;"), ""},
+      {"TenThousand", Repeated(10000, Cookie("a=1;")), "a=1;"},
       {"LongestThatALineHolds", "Set-Cookie:" + LongestCookie() + "\r\n", LongestCookie()},
       {"OneByteLonger", "Set-Cookie:c" + LongestCookie() + "\r\n", ""},
       {"64KBWithoutASemicolon", Cookie(std::string(kLongest, 'c')), ""},

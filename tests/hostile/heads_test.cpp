@@ -13,14 +13,7 @@ namespace {
 constexpr char kOk[] = "HTTP/1.1 200 OK\r\n";
 constexpr char kReadFailed[] = "CheckContentType: Connect failed!\n\n";
 
-std::string Repeated(size_t count, const std::string& text) {
-  std::string all;
-  all.reserve(count * text.size());
-  for (size_t i = 0; i < count; ++i) all += text;
-  return all;
-}
-
-std::string Lines(size_t count) {
+std::string Lines(int count) {
   return Repeated(count, "X: y\r\n");
 }
 
@@ -295,7 +288,7 @@ constexpr size_t kHundred = 100 * kMega;
 // needed.
 Step SendOver(const std::string& bytes, size_t total) {
   return {"SendOver()", [bytes, total](PeerConnection& peer, std::string* error) {
-            const std::string block = Repeated(kMega / bytes.size(), bytes);
+            const std::string block = Repeated(static_cast<int>(kMega / bytes.size()), bytes);
             return SendEndlessly(block, total / block.size() * block.size()).play(peer, error);
           }};
 }

@@ -26,6 +26,13 @@
 // The stack that a daemon's thread has at the least.
 inline constexpr size_t kSmallStack = 64 << 10;
 
+inline std::string Repeated(int count, const std::string& text) {
+  std::string all;
+  all.reserve(static_cast<size_t>(count) * text.size());
+  for (int i = 0; i < count; ++i) all += text;
+  return all;
+}
+
 // What an operation gave.
 struct Outcome {
   int result = 0;    // what it returned

@@ -46,13 +46,6 @@ std::ostream& operator<<(std::ostream& out, const JsonCase& test) {
   return out << test.name;
 }
 
-std::string Times(int count, const std::string& text) {
-  std::string all;
-  all.reserve(static_cast<size_t>(count) * text.size());
-  for (int i = 0; i < count; ++i) all += text;
-  return all;
-}
-
 // A reply that succeeds, with `value` beside it.
 std::string Beside(const std::string& value) {
   return "{\"success\":true,\"x\":" + value + "}";
@@ -64,30 +57,30 @@ std::string Success(const std::string& value) {
 
 std::vector<JsonCase> DepthTable() {
   return {
-      {"16Levels", Beside(Times(15, "[") + Times(15, "]")), kTrue},
-      {"60Levels", Beside(Times(59, "[") + Times(59, "]")), kTrue},
-      {"200Levels", Beside(Times(199, "[") + Times(199, "]")), kTrueOnALargeStack},
-      {"1100Levels", Beside(Times(1099, "[") + Times(1099, "]")), kNoJson},
-      {"100000Arrays", Times(100000, "[") + Times(100000, "]"), kNoJson},
-      {"100000Objects", Times(100000, "{\"a\":") + "1" + Times(100000, "}"), kNoJson},
-      {"100000OpenArrays", Times(100000, "["), kNoJson},
-      {"100000OpenObjects", Times(100000, "{\"a\":"), kNoJson},
-      {"100000ArraysInObjects", Times(50000, "{\"a\":["), kNoJson},
-      {"100000ClosedArrays", Times(100000, "]"), kNoJson},
-      {"100000ClosedBeforeTheOpen", Times(100000, "]") + Times(100000, "["), kNoJson},
-      {"100000InAString", Beside("\"" + Times(100000, "[") + "\""), kTrue},
-      {"100000BehindAnEscapedQuote", Beside("\"\\\"" + Times(100000, "[") + "\""), kTrue},
-      {"100000BehindTwoBackslashes", "[\"\\\\\"," + Times(100000, "["), kNoJson},
-      {"100000InAComment", "/*" + Times(100000, "[") + "*/" + Success("true"), kTrue},
-      {"100000InALineComment", "//" + Times(100000, "[") + "\n" + Success("true"), kTrue},
-      {"100000BehindALineComment", "//\r" + Times(100000, "["), kNoJson},
-      {"100000BehindASlash", "/" + Times(100000, "["), kNoJson},
-      {"100000BehindAnOpenString", "\"" + Times(100000, "["), kNoJson},
-      {"100000BehindAZeroByte", std::string(1, '\0') + Times(100000, "["), kNoJson},
-      {"100000BehindTheRoot", Success("true") + Times(100000, "["), kNoJson},
-      {"100000Commas", "[" + Times(100000, ",") + "]", kNoJson},
-      {"100000Colons", "{" + Times(100000, ":") + "}", kNoJson},
-      {"100000Comments", Times(100000, "/**/") + Success("true"), kTrue},
+      {"16Levels", Beside(Repeated(15, "[") + Repeated(15, "]")), kTrue},
+      {"60Levels", Beside(Repeated(59, "[") + Repeated(59, "]")), kTrue},
+      {"200Levels", Beside(Repeated(199, "[") + Repeated(199, "]")), kTrueOnALargeStack},
+      {"1100Levels", Beside(Repeated(1099, "[") + Repeated(1099, "]")), kNoJson},
+      {"100000Arrays", Repeated(100000, "[") + Repeated(100000, "]"), kNoJson},
+      {"100000Objects", Repeated(100000, "{\"a\":") + "1" + Repeated(100000, "}"), kNoJson},
+      {"100000OpenArrays", Repeated(100000, "["), kNoJson},
+      {"100000OpenObjects", Repeated(100000, "{\"a\":"), kNoJson},
+      {"100000ArraysInObjects", Repeated(50000, "{\"a\":["), kNoJson},
+      {"100000ClosedArrays", Repeated(100000, "]"), kNoJson},
+      {"100000ClosedBeforeTheOpen", Repeated(100000, "]") + Repeated(100000, "["), kNoJson},
+      {"100000InAString", Beside("\"" + Repeated(100000, "[") + "\""), kTrue},
+      {"100000BehindAnEscapedQuote", Beside("\"\\\"" + Repeated(100000, "[") + "\""), kTrue},
+      {"100000BehindTwoBackslashes", "[\"\\\\\"," + Repeated(100000, "["), kNoJson},
+      {"100000InAComment", "/*" + Repeated(100000, "[") + "*/" + Success("true"), kTrue},
+      {"100000InALineComment", "//" + Repeated(100000, "[") + "\n" + Success("true"), kTrue},
+      {"100000BehindALineComment", "//\r" + Repeated(100000, "["), kNoJson},
+      {"100000BehindASlash", "/" + Repeated(100000, "["), kNoJson},
+      {"100000BehindAnOpenString", "\"" + Repeated(100000, "["), kNoJson},
+      {"100000BehindAZeroByte", std::string(1, '\0') + Repeated(100000, "["), kNoJson},
+      {"100000BehindTheRoot", Success("true") + Repeated(100000, "["), kNoJson},
+      {"100000Commas", "[" + Repeated(100000, ",") + "]", kNoJson},
+      {"100000Colons", "{" + Repeated(100000, ":") + "}", kNoJson},
+      {"100000Comments", Repeated(100000, "/**/") + Success("true"), kTrue},
   };
 }
 
@@ -98,7 +91,7 @@ std::vector<JsonCase> ShapeTable() {
       {"Sound", sound, kTrue},
       {"OneBlank", " ", kNoJson},
       {"OnlyBlanks", std::string(65536, ' '), kNoJson},
-      {"OnlyLineEnds", Times(1000, "\r\n"), kNoJson},
+      {"OnlyLineEnds", Repeated(1000, "\r\n"), kNoJson},
       {"BlanksAround", " \t\r\n" + sound + " \t\r\n", kTrue},
       {"OtherBlanksAround", "\v\f" + sound, kNoJson},
       {"OnlyACommentAndNoEnd", "/*", kNoJson},
@@ -151,7 +144,7 @@ std::vector<JsonCase> StringTable() {
   return {
       {"Of10MB", Beside("\"" + std::string(10 * kMegabyte, 's') + "\""), kTrue},
       {"Of10MBOpen", Beside("\"" + std::string(10 * kMegabyte, 's')), kNoJson},
-      {"Of1MBOfEscapes", Beside("\"" + Times(1 << 19, "\\n") + "\""), kTrue},
+      {"Of1MBOfEscapes", Beside("\"" + Repeated(1 << 19, "\\n") + "\""), kTrue},
       {"AMemberNameOf1MB", "{\"" + std::string(kMegabyte, 'n') + "\":1,\"success\":true}", kTrue},
       {"WrongUtf8", Beside("\"\xff\xfe\xc0\xaf\""), kTrue},
       {"CutUtf8", Beside("\"\xe2\x82\""), kTrue},
@@ -218,10 +211,10 @@ std::vector<JsonCase> SuccessTable() {
       {"TheLargestNumber", Success("18446744073709551615"), kTrue},
       {"Twice", "{\"success\":false,\"success\":true}", kTrue},
       {"TwiceTheOtherWay", "{\"success\":true,\"success\":false}", kNotTrue},
-      {"AHundredThousandTimes", "{" + Times(100000, "\"success\":true,") + "\"success\":false}",
+      {"AHundredThousandTimes", "{" + Repeated(100000, "\"success\":true,") + "\"success\":false}",
        kNotTrue},
       {"Inside", "{\"data\":{\"success\":true}}", kNotTrue},
-      {"BehindAHundredThousandMembers", "{" + Times(100000, "\"m\":[],") + "\"success\":true}",
+      {"BehindAHundredThousandMembers", "{" + Repeated(100000, "\"m\":[],") + "\"success\":true}",
        kTrue},
       {"InAnArray", "[{\"success\":true}]", kNotTrue},
       {"ARootThatIsTrue", "true", kNotTrue},
@@ -299,8 +292,8 @@ TEST(JsonLevels, OfAThousandAreTakenOnAUsualStack) {
   int more = 1;
   RunOnSmallStack(8 * kMegabyte, [&] {
     Json::Value value;
-    thousand = JsonParse(Beside(Times(998, "[") + Times(998, "]")), value);
-    more = JsonParse(Beside(Times(1100, "[") + Times(1100, "]")), value);
+    thousand = JsonParse(Beside(Repeated(998, "[") + Repeated(998, "]")), value);
+    more = JsonParse(Beside(Repeated(1100, "[") + Repeated(1100, "]")), value);
   });
   EXPECT_EQ(thousand, kTrue);
   EXPECT_EQ(more, kNoJson);

@@ -29,12 +29,6 @@ SharedTls TlsOf(int version) {
   return std::make_shared<ServerTls>(version);
 }
 
-std::string Repeated(int count, const std::string& text) {
-  std::string all;
-  for (int i = 0; i < count; ++i) all += text;
-  return all;
-}
-
 Script Joined(Script script, const Script& more) {
   script.insert(script.end(), more.begin(), more.end());
   return script;

@@ -145,15 +145,8 @@ std::ostream& operator<<(std::ostream& out, const XmlCase& test) {
   return out << test.name;
 }
 
-std::string Times(int count, const std::string& text) {
-  std::string all;
-  all.reserve(static_cast<size_t>(count) * text.size());
-  for (int i = 0; i < count; ++i) all += text;
-  return all;
-}
-
 std::string Nested(int levels, const std::string& inside = "") {
-  return Times(levels, "<a>") + inside + Times(levels, "</a>");
+  return Repeated(levels, "<a>") + inside + Repeated(levels, "</a>");
 }
 
 std::string WithDtd(const std::string& subset, const std::string& root) {
@@ -165,7 +158,7 @@ std::string Laughs(int levels) {
   std::string subset = "<!ENTITY l0 'lol'>";
   for (int i = 1; i <= levels; ++i) {
     subset += "<!ENTITY l" + std::to_string(i) + " '" +
-              Times(10, "&l" + std::to_string(i - 1) + ";") + "'>";
+              Repeated(10, "&l" + std::to_string(i - 1) + ";") + "'>";
   }
   return subset;
 }
@@ -174,7 +167,7 @@ std::string ParameterLaughs(int levels, const std::string& laugh) {
   std::string subset = "<!ENTITY % p0 '" + laugh + "'>";
   for (int i = 1; i <= levels; ++i) {
     subset += "<!ENTITY % p" + std::to_string(i) + " '" +
-              Times(10, "&#37;p" + std::to_string(i - 1) + ";") + "'>";
+              Repeated(10, "&#37;p" + std::to_string(i - 1) + ";") + "'>";
   }
   return subset + "%p" + std::to_string(levels) + ";";
 }
@@ -209,15 +202,16 @@ std::vector<XmlCase> EntityTable() {
       {"BillionLaughsInAParameter",
        WithDtd(Laughs(9) + "<!ENTITY % e \"<!ATTLIST a x CDATA '&#38;l9;'>  \">%e; %e;", "<a/>"),
        Parsed::kByNone},
-      {"TenThousandEmptyParameters", WithDtd("<!ENTITY % e ''>" + Times(10000, "%e;"), "<a/>"),
+      {"TenThousandEmptyParameters", WithDtd("<!ENTITY % e ''>" + Repeated(10000, "%e;"), "<a/>"),
        Parsed::kByBoth},
       {"QuadraticBlowUp",
-       WithDtd("<!ENTITY q '" + kBig + "'>", "<a>" + Times(1000, "&q;") + "</a>"), Parsed::kByBoth},
+       WithDtd("<!ENTITY q '" + kBig + "'>", "<a>" + Repeated(1000, "&q;") + "</a>"),
+       Parsed::kByBoth},
       {"QuadraticBlowUpInAnAttribute",
-       WithDtd("<!ENTITY q '" + kBig + "'>", "<a x='" + Times(1000, "&q;") + "'/>"),
+       WithDtd("<!ENTITY q '" + kBig + "'>", "<a x='" + Repeated(1000, "&q;") + "'/>"),
        Parsed::kByBoth},
       {"QuadraticBlowUpInAttributes",
-       WithDtd("<!ENTITY q '" + kBig + "'>", "<a>" + Times(1000, "<b x='&q;'/>") + "</a>"),
+       WithDtd("<!ENTITY q '" + kBig + "'>", "<a>" + Repeated(1000, "<b x='&q;'/>") + "</a>"),
        Parsed::kByBoth},
       {"AChainOf10Entities", WithDtd(Chain(10), "<a>&c10;</a>"), Parsed::kByBoth},
       {"AChainOf30Entities", WithDtd(Chain(30), "<a>&c30;</a>"), Parsed::kByNone},
@@ -233,8 +227,8 @@ std::vector<XmlCase> EntityTable() {
       {"CharacterZero", "<a>&#0;</a>", Parsed::kByNone},
       {"CharacterBeyondAll", "<a>&#x110000;</a>", Parsed::kByNone},
       {"CharacterOfADigitStorm", "<a>&#" + std::string(100000, '9') + ";</a>", Parsed::kByNone},
-      {"ATenThousandCharacterReferences", "<a>" + Times(10000, "&#65;") + "</a>", Parsed::kByBoth,
-       std::string(10000, 'A')},
+      {"ATenThousandCharacterReferences", "<a>" + Repeated(10000, "&#65;") + "</a>",
+       Parsed::kByBoth, std::string(10000, 'A')},
       {"PredefinedEntities", "<a>&lt;&amp;&gt;&quot;&apos;</a>", Parsed::kByBoth, "<&>\"'"},
   };
 }
@@ -296,13 +290,13 @@ std::vector<XmlCase> SizeTable() {
       {"250Levels", Nested(250, "x"), Parsed::kByBoth, "x"},
       {"300Levels", Nested(300), Parsed::kByNone},
       {"100000Levels", Nested(100000), Parsed::kByNone},
-      {"100000OpenElements", Times(100000, "<a>"), Parsed::kByNone},
-      {"100000ClosedElements", Times(100000, "</a>"), Parsed::kByNone},
-      {"100000OpenParentheses", WithDtd("<!ELEMENT a " + Times(100000, "("), "<a/>"),
+      {"100000OpenElements", Repeated(100000, "<a>"), Parsed::kByNone},
+      {"100000ClosedElements", Repeated(100000, "</a>"), Parsed::kByNone},
+      {"100000OpenParentheses", WithDtd("<!ELEMENT a " + Repeated(100000, "("), "<a/>"),
        Parsed::kByNone},
-      {"100000Brothers", "<r>" + Times(100000, "<a/>") + "</r>", Parsed::kByBoth, "",
+      {"100000Brothers", "<r>" + Repeated(100000, "<a/>") + "</r>", Parsed::kByBoth, "",
        32 * kMegabyte},
-      {"100000CommentsBeforeTheRoot", Times(100000, "<!---->") + "<a/>", Parsed::kByBoth, "",
+      {"100000CommentsBeforeTheRoot", Repeated(100000, "<!---->") + "<a/>", Parsed::kByBoth, "",
        32 * kMegabyte},
       {"AnAttributeOf64KB", "<a x='" + std::string(65536, 'v') + "'/>", Parsed::kByBoth},
       {"AnAttributeOf9MB", "<a x='" + long_text + "'/>", Parsed::kByBoth},
@@ -318,11 +312,11 @@ std::vector<XmlCase> SizeTable() {
        Parsed::kByNone},
       {"AnInstructionOf11MB", "<?i " + std::string(11 * kMegabyte, 'i') + "?><a/>",
        Parsed::kByNone},
-      {"A1MBOfLineEnds", "<a>" + Times(1 << 19, "\r\n") + "</a>", Parsed::kByBoth, ""},
+      {"A1MBOfLineEnds", "<a>" + Repeated(1 << 19, "\r\n") + "</a>", Parsed::kByBoth, ""},
       // Each element gets a copy of the name: what the server announces, the daemon pays for.
       {"500DefaultNamespacesOf40KB",
        WithDtd("<!ATTLIST a xmlns CDATA 'u:" + std::string(40000, 'n') + "'>",
-               "<r>" + Times(500, "<a/>") + "</r>"),
+               "<r>" + Repeated(500, "<a/>") + "</r>"),
        Parsed::kByBoth, "", 500 * 41000},
   };
 }
