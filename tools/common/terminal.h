@@ -1,0 +1,27 @@
+// What a tool may do with its output: colour, progress and control bytes.
+#ifndef TARNWICK_TOOLS_COMMON_TERMINAL_H_
+#define TARNWICK_TOOLS_COMMON_TERMINAL_H_
+
+#include <string>
+#include <string_view>
+
+enum class Colour { kNone, kRed, kGreen, kYellow, kBlue, kMagenta, kCyan, kGrey, kBold };
+
+// True when `fd` is a terminal.
+bool IsTerminal(int fd);
+
+// True when `fd` is a terminal that takes colours: NO_COLOR (https://no-color.org) is unset or
+// empty and TERM is neither missing nor "dumb".
+bool MayColour(int fd);
+
+// `text` in that colour, or as it is when `enabled` is false.
+std::string Paint(Colour colour, std::string_view text, bool enabled);
+
+// Columns of the terminal behind `fd`; 80 when it is none or does not tell.
+int TerminalWidth(int fd);
+
+// `text` with every control byte, and every byte that is not part of valid UTF-8, written as \n,
+// \r, \t or \xNN, and a backslash doubled: what a peer sent cannot move the cursor.
+std::string EscapeControls(std::string_view text);
+
+#endif  // TARNWICK_TOOLS_COMMON_TERMINAL_H_
