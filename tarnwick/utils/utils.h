@@ -77,7 +77,8 @@ TARNWICK_API std::string Md5ToHex(const unsigned char* digest);
 // `value` in decimal.
 TARNWICK_API std::string IntToString(int64_t value);
 
-// The UTC time `microseconds` after the epoch as, for example, 20240305T140309.417Z.
+// The UTC time `microseconds` after the epoch as, for example, 20240305T140309.417Z. Where time_t has
+// 32 bits, the calendar starts again in 1901 behind 20380119T031407.999Z.
 TARNWICK_API std::string FormatUtcTimeStamp(int64_t microseconds);
 
 // Writes the `len` bytes at `buf` to the descriptor, which may be non-blocking.

@@ -13,21 +13,22 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <libxml/parser.h>
-#include <pthread.h>
-#include <sys/mman.h>
 
+#include <cstdlib>
 #include <cstring>
 #include <functional>
+#include <memory>
 #include <string>
 #include <vector>
 
 #include "tarnwick/http/json_reply.h"
+#include "tarnwick/log/twdebuglog.h"
+#include "tarnwick/net/sslsocket.h"
+#include "tarnwick/utils/utils.h"
 #include "tests/hostile/hostile_util.h"
+#include "tests/support/stack_use.h"
 
 namespace {
-
-constexpr size_t kPainted = 8 << 20;
-constexpr int kPaint = 0xa5;
 
 // Sanitizers multiply what a function needs.
 #if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
@@ -35,34 +36,6 @@ constexpr size_t kScale = 16;
 #else
 constexpr size_t kScale = 1;
 #endif
-
-void* CallIt(void* body) {
-  (*static_cast<const std::function<void()>*>(body))();
-  return nullptr;
-}
-
-// Runs `body` on a stack of a known pattern. Results: the bytes that were overwritten, from the
-// stack's top to the deepest one.
-size_t StackUsedBy(const std::function<void()>& body) {
-  void* const memory =
-      mmap(nullptr, kPainted, PROT_READ | PROT_WRITE, MAP_PRIVATE | MAP_ANONYMOUS, -1, 0);
-  EXPECT_NE(memory, MAP_FAILED);
-  memset(memory, kPaint, kPainted);
-  pthread_attr_t attributes;
-  pthread_attr_init(&attributes);
-  pthread_attr_setstack(&attributes, memory, kPainted);
-  pthread_t thread;
-  EXPECT_EQ(pthread_create(&thread, &attributes, CallIt,
-                           const_cast<void*>(static_cast<const void*>(&body))),
-            0);
-  pthread_join(thread, nullptr);
-  pthread_attr_destroy(&attributes);
-  const unsigned char* const bytes = static_cast<const unsigned char*>(memory);
-  size_t untouched = 0;
-  while (untouched < kPainted && bytes[untouched] == kPaint) ++untouched;
-  munmap(memory, kPainted);
-  return kPainted - untouched;
-}
 
 struct StackCase {
   std::string name;
@@ -113,8 +86,27 @@ std::string NestedEntities(int levels) {
   return text + "]><a>&e" + std::to_string(levels) + ";</a>";
 }
 
+template <typename Socket>
+void ReadALine(int port) {
+  const auto socket = std::make_unique<Socket>("127.0.0.1", port, 5, true);
+  char line[64];
+  socket->Connect();
+  socket->ReadToLineEnd(line, sizeof(line));
+}
+
 const StackCase kStacks[] = {
     {"Nothing", 8, {}, [](int) {}},
+    {"TWPrintf",
+     16,
+     {},
+     [](int) { TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_WARN, "camera %d: %f\n", 3, 0.5); }},
+    {"LoadDbgLogSettings", 16, {}, [](int) { TWDbgLogCfg().LoadDbgLogSettings(); }},
+    {"SaveDbgLogSettings", 16, {}, [](int) { TWDbgLogCfg().SaveDbgLogSettings(); }},
+    {"UrlEncode", 8, {}, [](int) { UrlEncode("a b", "/"); }},
+    {"Base64Encode", 8, {}, [](int) { free(Base64Encode("abc")); }},
+    {"FormatUtcTimeStamp", 12, {}, [](int) { FormatUtcTimeStamp(0); }},
+    {"ConnectAndReadALine", 16, {SendThenClose("hello\n")}, ReadALine<TWSocket>},
+    {"ConnectAndReadALineOverTls", 32, {SendThenClose("hello\n")}, ReadALine<SSLSocket>, true},
     {"SendRequestByGet",
      32,
      {Exchange(kOk)},
@@ -150,6 +142,10 @@ const StackCase kStacks[] = {
        ClientProbe(port).SendReqByXMLSocketPost("<a/>", doc);
        xmlFreeDoc(doc);
      }},
+    {"OpenRawDataUpload",
+     32,
+     {{DiscardUntilEnd()}},
+     [](int port) { ClientProbe(port).OpenRawDataUpload(); }},
     {"SendHttpGet",
      32,
      {Exchange(kOk)},
@@ -157,6 +153,10 @@ const StackCase kStacks[] = {
        Json::Value value;
        SendHttpGet("127.0.0.1", port, "a.cgi", value, 5, true);
      }},
+    {"SendHttpPost",
+     32,
+     {Exchange(kOk)},
+     [](int port) { SendHttpPost("127.0.0.1", port, "a.cgi", "a=1", "b=2", 5); }},
     {"SendRequestByGetToAHostName",
      32,
      {Exchange(kOk)},

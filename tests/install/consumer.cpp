@@ -1,5 +1,12 @@
 // A program of somebody else: it includes every public header, uses something of each layer through
 // the installed library, and brings settings-file functions of its own.
+//
+//   consumer           what works without a record of levels
+//   consumer create    creates the record, as the product's managing process does
+//   consumer attached  what a daemon finds that starts afterwards
+#include <sys/ipc.h>
+#include <sys/shm.h>
+
 #include <cstdio>
 #include <cstring>
 #include <memory>
@@ -63,12 +70,34 @@ void CheckHttp() {
   curl_easy_cleanup(handle);
 }
 
+void CreateRecord() {
+  const int segment = shmget(TWShmDbgLogIPCKey(), sizeof(TWDbgLogCfg), IPC_CREAT | IPC_EXCL | 0600);
+  Expect(segment != -1, "there was no record");
+  InitDbgCfg();
+  Expect(g_pDbgLogCfg != nullptr, "the new record is attached");
+  if (g_pDbgLogCfg == nullptr) return;
+  g_pDbgLogCfg->SetLevel(LOG_CATEG_CAMERA, LOG_LEVEL_DEBUG3);
+}
+
+// Nothing of the program calls for it: the library does it when it is loaded, or linked in.
+void CheckAttached() {
+  Expect(g_pDbgLogCfg != nullptr, "the record is attached at the start");
+  Expect(TWLogEnabled(LOG_CATEG_CAMERA, LOG_LEVEL_DEBUG3), "its levels count");
+}
+
 }  // namespace
 
-int main() {
-  CheckLog();
-  CheckOwnSettingsFunction();
-  CheckUtilsAndNet();
-  CheckHttp();
+int main(int argc, char** argv) {
+  const char* const what = argc > 1 ? argv[1] : "";
+  if (std::strcmp(what, "create") == 0) {
+    CreateRecord();
+  } else if (std::strcmp(what, "attached") == 0) {
+    CheckAttached();
+  } else {
+    CheckLog();
+    CheckOwnSettingsFunction();
+    CheckUtilsAndNet();
+    CheckHttp();
+  }
   return failures == 0 ? 0 : 1;
 }

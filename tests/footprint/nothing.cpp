@@ -1,0 +1,4 @@
+// A program whose whole cost is what is loaded with it.
+int main() {
+  return 0;
+}
