@@ -19,6 +19,7 @@
 #include "tarnwick/platform/export.h"
 #include "tarnwick/platform/qlibcfile.h"
 #include "tarnwick/utils/utils.h"
+#include "tarnwick/version.h"
 
 extern "C" int QLIBCFileGetKeyValue(const char*, const char* key, char* value, int size, int) {
   return std::snprintf(value, static_cast<size_t>(size), "%s",
@@ -54,6 +55,7 @@ void CheckOwnSettingsFunction() {
 }
 
 void CheckUtilsAndNet() {
+  Expect(TWVersionNumber() == TARNWICK_VERSION_NUMBER, "headers and library are of one version");
   Expect(UrlEncode("a b", "") == "a%20b", "text is encoded");
   auto plain = std::make_unique<TWSocket>("127.0.0.1", 1, 1, true);
   Expect(plain->Connect() != 0, "nobody listens on port 1");
