@@ -1,0 +1,47 @@
+#include "tools/common/parser.h"
+
+#include <cstdio>
+#include <string>
+#include <vector>
+
+#include "tools/common/names.h"
+
+namespace {
+
+// The sub-command that the arguments named, because its --help is the one to read.
+std::string NameWithCommand(const CLI::App& app) {
+  const auto parsed = app.get_subcommands();
+  return app.get_name() + (parsed.empty() ? "" : " " + parsed.front()->get_name());
+}
+
+// A word in the place of the sub-command that is none; without this, the parser would only miss one.
+// Results: empty when the mistake is another one.
+std::string UnknownCommand(const CLI::App& app, int argc, char** argv) {
+  std::vector<std::string> names;
+  for (const CLI::App* command : app.get_subcommands([](const CLI::App*) { return true; })) {
+    if (!command->get_name().empty()) names.push_back(command->get_name());
+  }
+  if (names.empty() || argc < 2 || argv[1][0] == '-' || !app.get_subcommands().empty()) return "";
+  std::string text = "unknown sub-command \"" + std::string(argv[1]) + "\"";
+  std::string nearest;
+  for (const std::string& name : NearestNames(argv[1], names)) {
+    nearest += (nearest.empty() ? "" : ", ") + name;
+  }
+  return nearest.empty() ? text : text + " (did you mean " + nearest + "?)";
+}
+
+}  // namespace
+
+std::optional<int> ParseArguments(CLI::App* app, int argc, char** argv) try {
+  app->parse(argc, argv);
+  return std::nullopt;
+} catch (const CLI::RuntimeError& error) {
+  return error.get_exit_code();
+} catch (const CLI::ParseError& error) {
+  if (error.get_exit_code() == static_cast<int>(CLI::ExitCodes::Success)) return app->exit(error);
+  const std::string unknown = UnknownCommand(*app, argc, argv);
+  fprintf(stderr, "%s: %s\n%s: try \"%s --help\"\n", app->get_name().c_str(),
+          unknown.empty() ? error.what() : unknown.c_str(), app->get_name().c_str(),
+          NameWithCommand(*app).c_str());
+  return 2;
+}

@@ -1,0 +1,113 @@
+#include "tools/common/terminal.h"
+
+#include <sys/ioctl.h>
+#include <unistd.h>
+
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+
+#include "tools/common/utf8.h"
+
+namespace {
+
+const char* CodeOf(Colour colour) {
+  switch (colour) {
+    case Colour::kNone:
+      return "";
+    case Colour::kRed:
+      return "\x1b[31m";
+    case Colour::kGreen:
+      return "\x1b[32m";
+    case Colour::kYellow:
+      return "\x1b[33m";
+    case Colour::kBlue:
+      return "\x1b[34m";
+    case Colour::kMagenta:
+      return "\x1b[35m";
+    case Colour::kCyan:
+      return "\x1b[36m";
+    case Colour::kGrey:
+      return "\x1b[90m";
+    case Colour::kBold:
+      return "\x1b[1m";
+  }
+  return "";
+}
+
+// Terminals take U+0080 to U+009F for control sequences as well.
+bool IsC1Control(std::string_view character) {
+  return character.size() == 2 && character[0] == '\xC2' &&
+         static_cast<unsigned char>(character[1]) < 0xA0;
+}
+
+void AppendEscaped(char byte, std::string* result) {
+  switch (byte) {
+    case '\n':
+      result->append("\\n");
+      return;
+    case '\r':
+      result->append("\\r");
+      return;
+    case '\t':
+      result->append("\\t");
+      return;
+    case '\\':
+      result->append("\\\\");
+      return;
+    default:
+      break;
+  }
+  char text[8];
+  snprintf(text, sizeof(text), "\\x%02X", static_cast<unsigned>(static_cast<unsigned char>(byte)));
+  result->append(text);
+}
+
+bool IsPlain(std::string_view character) {
+  const char first = character[0];
+  if (character.size() > 1) return !IsC1Control(character);
+  return first >= ' ' && first != '\x7F' && first != '\\';
+}
+
+}  // namespace
+
+bool IsTerminal(int fd) {
+  return isatty(fd) == 1;
+}
+
+bool MayColour(int fd) {
+  const char* const noColour = std::getenv("NO_COLOR");
+  if (noColour != nullptr && *noColour != '\0') return false;
+  const char* const type = std::getenv("TERM");
+  return type != nullptr && *type != '\0' && std::strcmp(type, "dumb") != 0 && IsTerminal(fd);
+}
+
+std::string Paint(Colour colour, std::string_view text, bool enabled) {
+  if (!enabled || colour == Colour::kNone) return std::string(text);
+  std::string result(CodeOf(colour));
+  result.append(text);
+  result.append("\x1b[0m");
+  return result;
+}
+
+int TerminalWidth(int fd) {
+  struct winsize size = {};
+  if (ioctl(fd, TIOCGWINSZ, &size) == 0 && size.ws_col > 0) return size.ws_col;
+  return 80;
+}
+
+std::string EscapeControls(std::string_view text) {
+  std::string result;
+  result.reserve(text.size());
+  while (!text.empty()) {
+    const size_t length = Utf8CharacterLength(text);
+    const std::string_view character = text.substr(0, length == 0 ? 1 : length);
+    if (length > 0 && IsPlain(character)) {
+      result.append(character);
+    } else {
+      for (const char byte : character) AppendEscaped(byte, &result);
+    }
+    text.remove_prefix(character.size());
+  }
+  return result;
+}
