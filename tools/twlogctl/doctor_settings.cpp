@@ -1,0 +1,115 @@
+// The doctor's look at the settings file and at the rotation of the logs.
+#include <fnmatch.h>
+
+#include <algorithm>
+#include <sstream>
+#include <vector>
+
+#include "tools/twlogctl/doctor.h"
+#include "tools/twlogctl/log_paths.h"
+#include "tools/twlogctl/owned_folder.h"
+#include "tools/twlogctl/processes.h"
+#include "tools/twlogctl/settings_file.h"
+
+namespace {
+
+constexpr char kRotationFolder[] = "/etc/logrotate.d";
+
+bool IsRegular(const std::string& path) {
+  struct stat state = {};
+  return stat(path.c_str(), &state) == 0 && S_ISREG(state.st_mode);
+}
+
+// Those that logrotate leaves out are what editors and package managers leave behind.
+bool IsLeftOver(const std::string& name) {
+  for (const std::string ending : {"~", ".bak", ".dpkg-old", ".dpkg-new", ".dpkg-dist", ".disabled",
+                                   ".rpmsave", ".rpmorig", ".rpmnew", ".swp"}) {
+    if (name.size() > ending.size() &&
+        name.compare(name.size() - ending.size(), ending.size(), ending) == 0) {
+      return true;
+    }
+  }
+  return name.front() == '.';
+}
+
+std::vector<std::string> RotationFiles() {
+  std::vector<std::string> files = {"/etc/logrotate.conf"};
+  const OwnedFolder folder(opendir(kRotationFolder));
+  if (!folder) return files;
+  while (const struct dirent* const entry = readdir(folder.get())) {
+    const std::string name = entry->d_name;
+    if (!IsLeftOver(name)) files.push_back(std::string(kRotationFolder) + "/" + name);
+  }
+  std::sort(files.begin() + 1, files.end());
+  return files;
+}
+
+// A file names logs by patterns, with or without quotes, in front of a brace.
+bool Names(const std::string& text, const char* path) {
+  std::istringstream lines(text);
+  for (std::string line; std::getline(lines, line);) {
+    line.resize(std::min(line.find('#'), line.size()));
+    for (char& letter : line) {
+      if (letter == '"' || letter == '\'' || letter == '{') letter = ' ';
+    }
+    std::istringstream words(line);
+    for (std::string word; words >> word;) {
+      if (word.front() == '/' && fnmatch(word.c_str(), path, FNM_PATHNAME) == 0) return true;
+    }
+  }
+  return false;
+}
+
+// Results: empty when nothing rotates the log.
+std::string RotatedBy(const char* path) {
+  for (const std::string& file : RotationFiles()) {
+    if (Names(ReadWholeFile(file), path)) return file;
+  }
+  return "";
+}
+
+}  // namespace
+
+void CheckSettings(Findings* findings) {
+  SavedLevels saved;
+  SettingsFault fault;
+  const std::string path = kSettingsPath;
+  switch (ReadSettings(&saved, &fault)) {
+    case SettingsState::kRight:
+      findings->push_back({"settings", Verdict::kRight, path, ""});
+      return;
+    case SettingsState::kMissing:
+    case SettingsState::kNoLine:
+      findings->push_back(
+          {"settings", Verdict::kNote, "no levels are saved: " + fault.Describe(), ""});
+      return;
+    case SettingsState::kUnreadable:
+      findings->push_back(
+          {"settings", Verdict::kWrong, fault.Describe(),
+           IsRegular(path) ? "chmod u+r " + path : "mv " + path + " " + path + ".old"});
+      return;
+    case SettingsState::kBroken:
+      findings->push_back({"settings", Verdict::kWrong, fault.Describe(),
+                           "twlogctl save, or correct the line by hand"});
+      return;
+  }
+}
+
+void CheckRotation(Findings* findings) {
+  std::string missing;
+  for (const char* path : {kMainLogPath, kNotificationLogPath}) {
+    const std::string file = RotatedBy(path);
+    if (file.empty()) {
+      missing += (missing.empty() ? "" : " and ") + std::string(path);
+    } else {
+      findings->push_back({"rotation", Verdict::kRight, std::string(path) + ", by " + file, ""});
+    }
+  }
+  if (missing.empty()) return;
+  const std::string folder = kLogFolder;
+  findings->push_back({"rotation", Verdict::kWrong,
+                       "nothing rotates " + missing + ", which grows until the disk is full",
+                       "printf '" + folder +
+                           "/*.log {\\n  weekly\\n  rotate 8\\n  compress\\n  missingok\\n}\\n' >" +
+                           kRotationFolder + "/tarnwick"});
+}

@@ -1,0 +1,55 @@
+// A log file that grows while it is read.
+#ifndef TARNWICK_TOOLS_TWLOGCTL_LOG_FILE_H_
+#define TARNWICK_TOOLS_TWLOGCTL_LOG_FILE_H_
+
+#include <sys/stat.h>
+
+#include <string>
+#include <utility>
+
+#include "tarnwick/platform/owned.h"
+
+// Reads what writers append, without their lock: whoever looks at a log must not hold up the
+// daemons. A truncation shows by the file's length, or by other bytes at the places that were read
+// last: writers may have appended more than was there before anybody looked.
+class LogFile {
+ public:
+  enum class Result {
+    kNothing,   // nothing new
+    kData,      // `data` was filled
+    kRestarted  // the file was truncated; the next call reads it from its beginning
+  };
+
+  // REQUIRES: a regular file's descriptor, open for reading.
+  explicit LogFile(OwnedFd fd) : m_fd(std::move(fd)) {}
+
+  // Puts the next bytes, 64 KiB at most, into `data`.
+  Result Read(std::string* data);
+
+  // How many bytes Read has not given out yet.
+  off_t Unread() const;
+
+  // True when `status` is that of this file.
+  bool Is(const struct stat& status) const;
+
+  int Descriptor() const { return m_fd.Get(); }
+
+ private:
+  // Bytes that were read, to be found again at their place.
+  struct Mark {
+    off_t offset = 0;
+    std::string bytes;
+  };
+
+  bool Stands(const Mark& mark) const;
+  bool Truncated() const;
+  void Remember(const std::string& data);
+  Result Restart();
+
+  OwnedFd m_fd;
+  off_t m_offset = 0;
+  Mark m_head;  // the first bytes of the file
+  Mark m_tail;  // the last ones in front of m_offset
+};
+
+#endif  // TARNWICK_TOOLS_TWLOGCTL_LOG_FILE_H_

@@ -1,0 +1,27 @@
+// Messages on standard output.
+#ifndef TARNWICK_TOOLS_TWLOGCTL_LOG_PRINTER_H_
+#define TARNWICK_TOOLS_TWLOGCTL_LOG_PRINTER_H_
+
+#include "tools/twlogctl/log_select.h"
+
+class LogPrinter {
+ public:
+  // Without `json` a pipe or a file gets the bytes of the log. On a terminal control bytes are
+  // escaped, and lines have the colour of their level.
+  explicit LogPrinter(bool json);
+
+  void Print(const LogMessage& message);
+
+  // Results: false when standard output does not take what was printed, which the program reports
+  // at its end.
+  bool Flush();
+
+ private:
+  void PrintText(const LogMessage& message);
+
+  bool m_json;
+  bool m_terminal;
+  bool m_colour;
+};
+
+#endif  // TARNWICK_TOOLS_TWLOGCTL_LOG_PRINTER_H_

@@ -1,0 +1,40 @@
+// From the text of messages to the ones that are wanted.
+#ifndef TARNWICK_TOOLS_TWLOGCTL_LOG_SELECT_H_
+#define TARNWICK_TOOLS_TWLOGCTL_LOG_SELECT_H_
+
+#include <functional>
+#include <optional>
+#include <string_view>
+#include <utility>
+
+#include "tools/twlogctl/log_filter.h"
+#include "tools/twlogctl/log_line.h"
+#include "tools/twlogctl/log_time.h"
+
+struct LogMessage {
+  std::string_view text;  // as it stands in the log
+  const LogLine* line;    // null for lines without a message's beginning
+  std::optional<Moment> moment;
+  bool continues;  // lines that belong to the message given out before
+};
+
+using WantedSink = std::function<void(const LogMessage& message)>;
+
+class LogSelector {
+ public:
+  LogSelector(LogFilter filter, Moment newest) : m_filter(std::move(filter)), m_clock(newest) {}
+
+  // Takes a message as a MessageSink does and hands it on if it is wanted. Lines that continue a
+  // message share its fate.
+  void Take(std::string_view text, bool continues, const WantedSink& sink);
+
+  void Advance(Moment newest) { m_clock.Advance(newest); }
+  LogFilter& Filter() { return m_filter; }
+
+ private:
+  LogFilter m_filter;
+  LogClock m_clock;
+  bool m_wantedLast = false;
+};
+
+#endif  // TARNWICK_TOOLS_TWLOGCTL_LOG_SELECT_H_

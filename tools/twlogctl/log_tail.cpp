@@ -1,0 +1,145 @@
+#include "tools/twlogctl/log_tail.h"
+
+#include <fcntl.h>
+#include <sys/stat.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <iterator>
+#include <utility>
+
+namespace {
+
+using std::chrono::milliseconds;
+using std::chrono::minutes;
+using std::chrono::seconds;
+
+// The lines of a message come at once, or nearly so when it is longer than the writer's buffer.
+constexpr milliseconds kMessageEnd(100);
+
+// Looks without an event, for what gives none.
+constexpr seconds kLook(1);
+
+constexpr minutes kQuiet(1);
+
+// Files that were renamed or removed and are read on. Rotations come hours apart.
+constexpr size_t kMostSources = 16;
+
+std::string FolderOf(const std::string& path) {
+  const size_t slash = path.rfind('/');
+  if (slash == std::string::npos) return ".";
+  return slash == 0 ? "/" : path.substr(0, slash);
+}
+
+}  // namespace
+
+LogTail::LogTail(std::string path) : m_path(std::move(path)) {
+  WatchFolder();
+}
+
+void LogTail::WatchFolder() {
+  m_watch.AddFolder(FolderOf(m_path));
+  m_folderWatched = Clock::now();
+}
+
+LogTail::SourceIterator LogTail::Known(const struct stat& status) {
+  return std::find_if(m_sources.begin(), m_sources.end(),
+                      [&](const Source& source) { return source.file.Is(status); });
+}
+
+// Makes the file at the path the last source. One that comes back under its old name is read on
+// where it was left. Results: 0 or an errno.
+int LogTail::OpenFile() {
+  // Not blocking, for the sake of a pipe of that name.
+  OwnedFd fd(open(m_path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
+  struct stat status = {};
+  if (!fd.Valid() || fstat(fd.Get(), &status) != 0) return errno;
+  if (!S_ISREG(status.st_mode)) return S_ISDIR(status.st_mode) ? EISDIR : EINVAL;
+  const SourceIterator known = Known(status);
+  if (known != m_sources.end()) {
+    m_sources.splice(m_sources.end(), m_sources, known);
+    return 0;
+  }
+  const int watch = m_watch.AddFile(fd.Get());
+  m_sources.push_back({LogFile(std::move(fd)), MessageSplitter(), watch, Clock::now()});
+  ++m_fileCount;
+  return 0;
+}
+
+void LogTail::FindFile() {
+  struct stat status = {};
+  if (stat(m_path.c_str(), &status) != 0) {
+    m_error = errno;
+  } else if (m_sources.empty() || !m_sources.back().file.Is(status)) {
+    m_error = OpenFile();
+  } else {
+    m_error = 0;
+  }
+}
+
+// Results: whether something new came.
+bool LogTail::ReadSource(Source* source, const MessageSink& sink) {
+  std::string data;
+  bool changed = false;
+  // No more than there is now: a file that grows as fast as it is read must not keep the others
+  // waiting.
+  for (off_t unread = source->file.Unread(); unread >= 0;) {
+    const LogFile::Result result = source->file.Read(&data);
+    if (result == LogFile::Result::kNothing) break;
+    changed = true;
+    if (result == LogFile::Result::kRestarted) {
+      source->splitter.End(sink);  // the rest of an incomplete line is gone
+      unread = source->file.Unread();
+    } else {
+      source->splitter.Feed(data, sink);
+      unread -= static_cast<off_t>(data.size());
+    }
+  }
+  return changed;
+}
+
+void LogTail::ReadAll(const MessageSink& sink) {
+  for (Source& source : m_sources) {
+    const Clock::time_point now = Clock::now();
+    if (ReadSource(&source, sink)) {
+      source.changed = now;
+    } else if (now - source.changed >= kMessageEnd) {
+      source.splitter.Flush(sink);
+    }
+  }
+}
+
+void LogTail::DropQuiet(const MessageSink& sink) {
+  const Clock::time_point now = Clock::now();
+  for (auto source = m_sources.begin(); source != m_sources.end();) {
+    const bool atPath = m_error == 0 && std::next(source) == m_sources.end();
+    const bool tooMany = m_sources.size() > kMostSources;
+    if (atPath || (now - source->changed < kQuiet && !tooMany)) {
+      ++source;
+      continue;
+    }
+    source->splitter.End(sink);
+    m_watch.Remove(source->watch);
+    source = m_sources.erase(source);
+  }
+}
+
+void LogTail::Poll(const MessageSink& sink) {
+  m_watch.Drain();
+  if (Clock::now() - m_folderWatched >= kLook) WatchFolder();
+  // What was written before the rotation comes before what was written after it.
+  ReadAll(sink);
+  FindFile();
+  ReadAll(sink);
+  DropQuiet(sink);
+}
+
+void LogTail::Flush(const MessageSink& sink) {
+  for (Source& source : m_sources) source.splitter.Flush(sink);
+}
+
+milliseconds LogTail::Patience() const {
+  const bool waits = std::any_of(m_sources.begin(), m_sources.end(),
+                                 [](const Source& source) { return source.splitter.Waits(); });
+  return waits ? kMessageEnd : milliseconds(kLook);
+}

@@ -1,0 +1,63 @@
+// Follows a log by its path through renames, removals and truncations.
+#ifndef TARNWICK_TOOLS_TWLOGCTL_LOG_TAIL_H_
+#define TARNWICK_TOOLS_TWLOGCTL_LOG_TAIL_H_
+
+#include <chrono>
+#include <list>
+#include <string>
+
+#include "tools/twlogctl/log_file.h"
+#include "tools/twlogctl/log_messages.h"
+#include "tools/twlogctl/log_watch.h"
+
+// A writer opens the file and then waits for its lock, so lines reach a file after it was renamed or
+// removed: each file that was at the path is read on until it has been quiet for a minute.
+class LogTail {
+ public:
+  using Clock = std::chrono::steady_clock;
+
+  explicit LogTail(std::string path);
+
+  // Gives out the messages that are new, those of older files first. The last message of a file
+  // waits a little for further lines, and an incomplete line for its end.
+  void Poll(const MessageSink& sink);
+
+  // Gives out what waits for further lines.
+  void Flush(const MessageSink& sink);
+
+  // How long to wait at most, unless Descriptor() becomes readable, before the next Poll.
+  std::chrono::milliseconds Patience() const;
+  int Descriptor() const { return m_watch.Descriptor(); }
+
+  // 0 while the path leads to a log that can be read, else the errno of opening it.
+  int Error() const { return m_error; }
+
+  // How many files have been read from so far.
+  int FileCount() const { return m_fileCount; }
+
+ private:
+  struct Source {
+    LogFile file;
+    MessageSplitter splitter;
+    int watch;
+    Clock::time_point changed;
+  };
+
+  using SourceIterator = std::list<Source>::iterator;
+  SourceIterator Known(const struct stat& status);
+  void FindFile();
+  int OpenFile();
+  void WatchFolder();
+  bool ReadSource(Source* source, const MessageSink& sink);
+  void ReadAll(const MessageSink& sink);
+  void DropQuiet(const MessageSink& sink);
+
+  std::string m_path;
+  LogWatch m_watch;
+  std::list<Source> m_sources;  // the last one is that at the path, if m_error is 0
+  Clock::time_point m_folderWatched;
+  int m_error = 0;
+  int m_fileCount = 0;
+};
+
+#endif  // TARNWICK_TOOLS_TWLOGCTL_LOG_TAIL_H_

@@ -1,0 +1,33 @@
+// Wakes a reader of logs when there may be something new.
+#ifndef TARNWICK_TOOLS_TWLOGCTL_LOG_WATCH_H_
+#define TARNWICK_TOOLS_TWLOGCTL_LOG_WATCH_H_
+
+#include <string>
+
+#include "tarnwick/platform/owned.h"
+
+// Events are hints: whoever was woken looks at the files themselves, and looks at them now and then
+// without an event too, because network file systems give none and queues overflow.
+class LogWatch {
+ public:
+  LogWatch();
+
+  // The folder's entries that come, go and change their names. Repeated calls follow a folder that
+  // was removed and made again.
+  void AddFolder(const std::string& path);
+
+  // The changes of an open file, whatever its name. Results: for Remove; -1 when there is none.
+  int AddFile(int fd);
+  void Remove(int watch);
+
+  // Readable when there are events; -1 when the system has no more watches to give.
+  int Descriptor() const { return m_fd.Get(); }
+
+  // Takes the events off.
+  void Drain();
+
+ private:
+  OwnedFd m_fd;
+};
+
+#endif  // TARNWICK_TOOLS_TWLOGCTL_LOG_WATCH_H_

@@ -1,0 +1,111 @@
+#include "tools/twlogctl/processes.h"
+
+#include <unistd.h>
+
+#include <algorithm>
+#include <cstdio>
+#include <cstdlib>
+#include <ctime>
+#include <fstream>
+#include <iterator>
+#include <sstream>
+
+#include "tarnwick/log/twdebuglog.h"
+#include "tools/twlogctl/owned_folder.h"
+
+namespace {
+
+// The file name under which a System V segment stands in /proc/PID/maps.
+std::string SegmentName() {
+  char name[32];
+  snprintf(name, sizeof(name), "/SYSV%08x", static_cast<unsigned>(TWShmDbgLogIPCKey()));
+  return name;
+}
+
+double SecondsSinceBoot() {
+  struct timespec now = {};
+  clock_gettime(CLOCK_BOOTTIME, &now);
+  return static_cast<double>(now.tv_sec) + static_cast<double>(now.tv_nsec) / 1e9;
+}
+
+// A line is "from-to flags offset device inode path", and the inode of a segment is its id.
+bool IsSegment(const std::string& line, const std::string& name, int segment) {
+  if (line.find(name) == std::string::npos) return false;
+  std::istringstream words(line);
+  std::string range, flags, offset, device;
+  long long inode = -1;
+  return static_cast<bool>(words >> range >> flags >> offset >> device >> inode) &&
+         inode == segment;
+}
+
+// The IPC namespace of a process, which has segments of its own; a container's is another one. Empty
+// when the process hides it, as it does its memory.
+std::string IpcNamespace(const std::string& process) {
+  char name[64];
+  const ssize_t length = readlink(("/proc/" + process + "/ns/ipc").c_str(), name, sizeof(name));
+  return length > 0 ? std::string(name, static_cast<size_t>(length)) : "";
+}
+
+LibraryUser LookAtMemory(pid_t pid, int segment) {
+  LibraryUser user;
+  const std::string segmentName = SegmentName();
+  std::istringstream maps(ReadWholeFile("/proc/" + std::to_string(pid) + "/maps"));
+  for (std::string line; std::getline(maps, line);) {
+    if (line.find("/libtarnwick.so") != std::string::npos) user.hasLibrary = true;
+    if (IsSegment(line, segmentName, segment)) user.hasRecord = true;
+  }
+  return user;
+}
+
+}  // namespace
+
+std::string ReadWholeFile(const std::string& path) {
+  std::ifstream file(path, std::ios::binary);
+  return std::string(std::istreambuf_iterator<char>(file), {});
+}
+
+std::optional<ProcessInfo> ReadProcess(pid_t pid) {
+  const std::string stat = ReadWholeFile("/proc/" + std::to_string(pid) + "/stat");
+  const size_t open = stat.find('(');
+  const size_t close = stat.rfind(')');  // a name may hold brackets itself
+  if (open == std::string::npos || close == std::string::npos) return std::nullopt;
+  ProcessInfo process;
+  process.pid = pid;
+  process.name = stat.substr(open + 1, close - open - 1);
+  std::istringstream fields(stat.substr(close + 1));
+  fields >> process.state;
+  std::string skipped;
+  for (int field = 4; field < 22; ++field) fields >> skipped;
+  double startTicks = 0;  // field 22, since the machine was started
+  fields >> startTicks;
+  process.ageSeconds =
+      std::max(0.0, SecondsSinceBoot() - startTicks / static_cast<double>(sysconf(_SC_CLK_TCK)));
+  return process;
+}
+
+std::vector<pid_t> AllProcesses() {
+  std::vector<pid_t> pids;
+  const OwnedFolder folder(opendir("/proc"));
+  if (!folder) return pids;
+  while (const struct dirent* const entry = readdir(folder.get())) {
+    const int pid = std::atoi(entry->d_name);
+    if (pid > 0) pids.push_back(pid);
+  }
+  std::sort(pids.begin(), pids.end());
+  return pids;
+}
+
+std::vector<LibraryUser> LibraryUsers(int segment) {
+  std::vector<LibraryUser> users;
+  const std::string ownNamespace = IpcNamespace("self");
+  for (const pid_t pid : AllProcesses()) {
+    if (pid == getpid() || IpcNamespace(std::to_string(pid)) != ownNamespace) continue;
+    LibraryUser user = LookAtMemory(pid, segment);
+    if (!user.hasLibrary && !user.hasRecord) continue;
+    const std::optional<ProcessInfo> process = ReadProcess(pid);
+    if (!process) continue;
+    user.process = *process;
+    users.push_back(user);
+  }
+  return users;
+}

@@ -1,0 +1,39 @@
+// What /proc tells about the processes that use the record and the logs.
+#ifndef TARNWICK_TOOLS_TWLOGCTL_PROCESSES_H_
+#define TARNWICK_TOOLS_TWLOGCTL_PROCESSES_H_
+
+#include <sys/types.h>
+
+#include <optional>
+#include <string>
+#include <vector>
+
+struct ProcessInfo {
+  pid_t pid = 0;
+  std::string name;
+  char state = '?';       // the letter of /proc/PID/stat; T is a stopped process
+  double ageSeconds = 0;  // since it was started
+};
+
+// Results: nothing when there is no such process (any more).
+std::optional<ProcessInfo> ReadProcess(pid_t pid);
+
+// The processes of the machine whose number is in this /proc.
+std::vector<pid_t> AllProcesses();
+
+// How a process stands to the record.
+struct LibraryUser {
+  ProcessInfo process;
+  bool hasLibrary = false;  // it has the shared library in its memory
+  bool hasRecord = false;   // it has attached the record with the given segment
+};
+
+// The processes but this one that have the shared library or the record in their memory, of those
+// that could share the record: the ones of this IPC namespace. Those of other users are seen by root
+// alone. `segment` is the record's id, or -1 for none.
+std::vector<LibraryUser> LibraryUsers(int segment);
+
+// The whole text of a file, empty when it cannot be read. For /proc, whose files have no size.
+std::string ReadWholeFile(const std::string& path);
+
+#endif  // TARNWICK_TOOLS_TWLOGCTL_PROCESSES_H_

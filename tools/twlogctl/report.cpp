@@ -1,0 +1,53 @@
+#include "tools/twlogctl/report.h"
+
+#include <grp.h>
+#include <pwd.h>
+
+#include <cstdio>
+#include <vector>
+
+#include "tarnwick/log/twdebuglog.h"
+#include "tools/common/names.h"
+
+namespace {
+
+std::string DidYouMean(const std::vector<std::string>& nearest) {
+  std::string names;
+  for (const std::string& name : nearest) names += (names.empty() ? "" : ", ") + name;
+  return names.empty() ? "" : " (did you mean " + names + "?)";
+}
+
+}  // namespace
+
+void Complain(const std::string& text) {
+  fprintf(stderr, "twlogctl: %s\n", text.c_str());
+}
+
+std::string LevelText(int level) {
+  if (level < LOG_LEVEL_ALARM || level > LOG_LEVEL_DEBUG3) return std::to_string(level);
+  return Enum2String(static_cast<LOG_LEVEL>(level));
+}
+
+std::string UserName(uid_t user) {
+  const struct passwd* const entry = getpwuid(user);
+  return entry != nullptr ? entry->pw_name : std::to_string(user);
+}
+
+std::string GroupName(gid_t group) {
+  const struct group* const entry = getgrgid(group);
+  return entry != nullptr ? entry->gr_name : std::to_string(group);
+}
+
+std::string ModeText(mode_t mode) {
+  char text[16];
+  snprintf(text, sizeof(text), "%04o", static_cast<unsigned>(mode & 07777));
+  return text;
+}
+
+std::string DidYouMeanCategory(const std::string& text) {
+  return DidYouMean(NearestNames(text, CategoryNames()));
+}
+
+std::string DidYouMeanLevel(const std::string& text) {
+  return DidYouMean(NearestNames(text, LevelNames()));
+}

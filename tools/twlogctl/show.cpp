@@ -1,0 +1,69 @@
+// twlogctl show: the messages of a log.
+#include <CLI/CLI.hpp>
+#include <cstring>
+#include <memory>
+#include <optional>
+
+#include "tools/twlogctl/commands.h"
+#include "tools/twlogctl/log_options.h"
+#include "tools/twlogctl/log_printer.h"
+#include "tools/twlogctl/log_reading.h"
+#include "tools/twlogctl/log_window.h"
+#include "tools/twlogctl/report.h"
+
+namespace {
+
+struct ShowOptions : LogOptions {
+  std::optional<size_t> count;
+};
+
+// Counts what was shown, because nothing found is a result of its own.
+class Shower {
+ public:
+  explicit Shower(bool json) : m_printer(json) {}
+
+  void Show(const LogMessage& message) {
+    m_printer.Print(message);
+    m_found = true;
+  }
+  bool Found() const { return m_found; }
+  bool Flush() { return m_printer.Flush(); }
+
+ private:
+  LogPrinter m_printer;
+  bool m_found = false;
+};
+
+int Show(const ShowOptions& options) {
+  const std::string path = LogPath(options);
+  const LogFilter filter = MakeFilter(options, Now(), Direction::kBack);
+  Shower shower(options.json);
+  LogWindow window(options.count.value_or(0));
+  const int error = ReadLog(path, filter, [&](const LogMessage& message) {
+    options.count ? window.Add(message) : shower.Show(message);
+  });
+  window.Drain([&](const LogMessage& message) { shower.Show(message); });
+  if (!shower.Flush()) return kExitWrong;
+  if (error != 0) {
+    Complain(path + ": " + std::strerror(error));
+    return kExitWrong;
+  }
+  if (shower.Found()) return kExitDone;
+  Complain(path + ": no message matches");
+  return kExitWrong;
+}
+
+}  // namespace
+
+void AddShow(CLI::App* app, int* exitCode) {
+  auto options = std::make_shared<ShowOptions>();
+  CLI::App* show = app->add_subcommand("show", "Show the messages of a log.");
+  AddSourceOptions(show, options.get());
+  AddFilterOptions(show, options.get());
+  AddTimeOptions(show, options.get());
+  AddJsonOption(show, options.get());
+  show->add_option("-n,--lines", options->count, "Show the last messages only, so many of them.")
+      ->check(IsWholeNumber)
+      ->type_name("COUNT");
+  show->callback([=] { *exitCode = Show(*options); });
+}

@@ -1,0 +1,102 @@
+#include "tools/twlogctl/top_terminal.h"
+
+#include <ncurses.h>
+#include <sys/ioctl.h>
+#include <sys/signalfd.h>
+#include <unistd.h>
+
+#include <cstdio>
+#include <utility>
+
+#include "tools/common/terminal.h"
+#include "tools/twlogctl/top_screen.h"
+
+namespace {
+
+constexpr int kSignals[] = {SIGINT, SIGTERM, SIGHUP, SIGQUIT, SIGWINCH};
+
+// Handlers of ncurses wait for none of them: they stay blocked until the terminal is put back.
+int OpenSignals() {
+  sigset_t set;
+  sigemptyset(&set);
+  for (const int signal : kSignals) sigaddset(&set, signal);
+  sigprocmask(SIG_BLOCK, &set, nullptr);
+  return signalfd(-1, &set, SFD_NONBLOCK | SFD_CLOEXEC);
+}
+
+TopKey KeyOf(int code) {
+  constexpr std::pair<int, TopKey> kKeys[] = {
+      {KEY_UP, TopKey::kUp},          {KEY_DOWN, TopKey::kDown},  {KEY_PPAGE, TopKey::kPageUp},
+      {KEY_NPAGE, TopKey::kPageDown}, {KEY_HOME, TopKey::kHome},  {KEY_END, TopKey::kEnd},
+      {KEY_LEFT, TopKey::kLess},      {KEY_RIGHT, TopKey::kMore}, {'n', TopKey::kNotice},
+      {'s', TopKey::kSort},           {'o', TopKey::kOnly},       {' ', TopKey::kHold},
+      {'?', TopKey::kHelp},           {'q', TopKey::kLeave},
+  };
+  for (const auto& [known, key] : kKeys) {
+    if (code == known) return key;
+  }
+  return TopKey::kNone;
+}
+
+// Some terminals send the short forms although they were asked for the long ones.
+void DefineShortKeys() {
+  define_key("\x1b[A", KEY_UP);
+  define_key("\x1b[B", KEY_DOWN);
+  define_key("\x1b[C", KEY_RIGHT);
+  define_key("\x1b[D", KEY_LEFT);
+}
+
+}  // namespace
+
+TopSignals::TopSignals() : m_fd(OpenSignals()) {}
+
+int TopSignals::Take() {
+  struct signalfd_siginfo info;
+  return read(m_fd.Get(), &info, sizeof(info)) == sizeof(info) ? static_cast<int>(info.ssi_signo)
+                                                               : 0;
+}
+
+void TopSignals::EndBy(int signal) {
+  sigset_t set;
+  sigemptyset(&set);
+  sigaddset(&set, signal);
+  std::signal(signal, SIG_DFL);
+  raise(signal);
+  sigprocmask(SIG_UNBLOCK, &set, nullptr);
+}
+
+bool TopTerminal::Open() {
+  // Not initscr, which ends the program when it fails.
+  SCREEN* const screen = newterm(nullptr, stdout, stdin);
+  if (screen == nullptr) return false;
+  m_screen = screen;
+  cbreak();
+  noecho();
+  nonl();
+  keypad(stdscr, TRUE);
+  nodelay(stdscr, TRUE);
+  set_escdelay(25);
+  curs_set(0);
+  DefineShortKeys();
+  if (MayColour(STDOUT_FILENO)) StartScreenColours();
+  return true;
+}
+
+TopTerminal::~TopTerminal() {
+  if (m_screen == nullptr) return;
+  endwin();
+  delscreen(static_cast<SCREEN*>(m_screen));
+}
+
+void TopTerminal::Resize() {
+  struct winsize size = {};
+  if (ioctl(STDOUT_FILENO, TIOCGWINSZ, &size) != 0 || size.ws_row == 0 || size.ws_col == 0) return;
+  resizeterm(size.ws_row, size.ws_col);
+}
+
+bool TopTerminal::TakeKey(TopKey* key) {
+  const int code = getch();
+  if (code == ERR) return false;
+  *key = KeyOf(code);
+  return true;
+}
