@@ -1,0 +1,42 @@
+// An endpoint: an address, what answers there and what is wrong with it.
+#ifndef TARNWICK_TOOLS_TWCAMSIM_ENDPOINT_H_
+#define TARNWICK_TOOLS_TWCAMSIM_ENDPOINT_H_
+
+#include <atomic>
+#include <cstdint>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "tools/twcamsim/faults.h"
+#include "tools/twcamsim/login.h"
+#include "tools/twcamsim/profile.h"
+
+struct Endpoint {
+  Endpoint(const ProfileType* profile_type, Account account)
+      : type(profile_type), login(std::move(account)) {}
+
+  const ProfileType* type;
+  std::string name;
+  int index = 0;
+  std::string host;
+  uint16_t port = 0;  // 0 until it listens, unless one was asked for
+  bool tls = false;
+  std::string login_style;
+  Login login;
+  std::unique_ptr<Profile> profile;
+  std::vector<Fault> faults;
+  std::atomic<int> connections{0};
+};
+
+// Makes an endpoint from "PROFILE[,OPTION[=VALUE]]...".
+// Results: nullptr with a sentence in `error`.
+std::unique_ptr<Endpoint> ParseEndpoint(const std::string& text, std::string* error);
+
+// The options that every profile takes.
+const std::vector<ProfileOption>& CommonOptions();
+
+// What is started when no endpoint is asked for.
+const std::vector<std::string>& StandardEndpoints();
+
+#endif  // TARNWICK_TOOLS_TWCAMSIM_ENDPOINT_H_

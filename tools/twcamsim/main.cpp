@@ -1,0 +1,109 @@
+// twcamsim: simulated cameras, and all that can be wrong with one.
+#include <json/value.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstdio>
+#include <cstring>
+#include <filesystem>
+#include <random>
+
+#include "tools/common/json_output.h"
+#include "tools/twcamsim/arguments.h"
+#include "tools/twcamsim/lists.h"
+#include "tools/twcamsim/server.h"
+
+namespace {
+
+constexpr int kFailed = 1;
+constexpr int kUsage = 2;
+
+int Complain(int status, const std::string& text) {
+  fprintf(stderr, "twcamsim: %s\n", text.c_str());
+  return status;
+}
+
+// The folder for the authority's certificate: one that stays, or one that goes away with this object.
+class Folder {
+ public:
+  Folder() = default;
+  ~Folder() {
+    std::error_code ignored;
+    if (temporary_) std::filesystem::remove_all(path_, ignored);
+  }
+  Folder(const Folder&) = delete;
+  Folder& operator=(const Folder&) = delete;
+
+  bool Make(const std::string& wish, std::string* error) {
+    path_ = wish;
+    std::error_code code;
+    if (wish.empty()) {
+      std::string name = std::filesystem::temp_directory_path(code).string() + "/twcamsim.XXXXXX";
+      temporary_ = mkdtemp(name.data()) != nullptr;
+      path_ = name;
+      if (!temporary_) code = std::error_code(errno, std::generic_category());
+    } else {
+      std::filesystem::create_directories(wish, code);
+    }
+    if (code) *error = path_ + ": " + code.message();
+    return !code;
+  }
+
+  const std::string& Path() const { return path_; }
+
+ private:
+  std::string path_;
+  bool temporary_ = false;
+};
+
+bool NeedsTls(const std::vector<std::unique_ptr<Endpoint>>& endpoints) {
+  for (const auto& endpoint : endpoints) {
+    if (endpoint->tls) return true;
+  }
+  return false;
+}
+
+bool PrepareWorld(const Arguments& arguments, World* world, std::string* error) {
+  world->seed = arguments.seed ? *arguments.seed : std::random_device()();
+  world->idle = arguments.idle;
+  world->hold = arguments.hold;
+  return world->journal.Open(arguments.journal, error) &&
+         world->access.Open(arguments.access, error);
+}
+
+int Serve(const Arguments& arguments, std::vector<std::unique_ptr<Endpoint>> endpoints) {
+  World world;
+  Folder folder;
+  std::string error;
+  if (!PrepareWorld(arguments, &world, &error)) return Complain(kFailed, error);
+  Json::Value report(Json::objectValue);
+  report["seed"] = static_cast<Json::UInt64>(world.seed);
+  report["pid"] = getpid();
+  if (NeedsTls(endpoints)) {
+    if (!folder.Make(arguments.dir, &error) || !world.certificates.Make(arguments.listen, &error) ||
+        !world.certificates.WriteAuthority(folder.Path() + "/ca.pem", &error)) {
+      return Complain(kFailed, error);
+    }
+    report["ca"] = folder.Path() + "/ca.pem";
+  }
+  Server server(&world, std::move(endpoints));
+  if (!server.Listen(&error)) return Complain(kFailed, error);
+  report["endpoints"] = server.Describe();
+  if (!PrintJsonLine(report)) return Complain(kFailed, "standard output is gone");
+  server.Run(arguments.run_for);
+  return 0;
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+  Arguments arguments;
+  if (const std::optional<int> status = ParseArguments(argc, argv, &arguments)) return *status;
+  if (arguments.list_faults) return ListFaults(arguments.json) ? 0 : kFailed;
+  if (arguments.list_profiles) return ListProfiles(arguments.json) ? 0 : kFailed;
+  if (arguments.list_logins) return ListLogins(arguments.json) ? 0 : kFailed;
+  std::vector<std::unique_ptr<Endpoint>> endpoints;
+  std::string error;
+  if (!MakeEndpoints(arguments, &endpoints, &error)) return Complain(kUsage, error);
+  return Serve(arguments, std::move(endpoints));
+}

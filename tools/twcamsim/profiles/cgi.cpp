@@ -1,0 +1,42 @@
+// A camera's CGI programs, which answer with lines of text; in the open, behind Basic, behind Digest.
+#include "tools/twcamsim/profile.h"
+#include "tools/twcamsim/tell.h"
+
+namespace {
+
+class CgiService : public Profile {
+ public:
+  Response Answer(const Exchange& exchange) override {
+    const std::string& path = exchange.request.path;
+    if (path == "/info.cgi") {
+      return MakeResponse(200, "text/plain", "camera=north gate\nmodel=TW-1\npresets=4\n");
+    }
+    if (path == "/set.cgi") return MakeResponse(200, "text/plain", "ok\n");
+    if (path == "/text.cgi") return TellAsText(exchange);
+    if (path == "/cookie.cgi") {
+      Response response = TellAsText(exchange);
+      response.Set("Set-Cookie", "session=42; Path=/; HttpOnly");
+      return response;
+    }
+    return MakeResponse(404, "text/plain", "no such program\n");
+  }
+};
+
+std::unique_ptr<Profile> MakeCgi(const ProfileOptions& /*options*/, std::string* /*error*/) {
+  return std::make_unique<CgiService>();
+}
+
+}  // namespace
+
+std::vector<ProfileType> CgiProfiles() {
+  return {
+      {"cgi",
+       "none",
+       "a camera's programs: /info.cgi, /set.cgi, /text.cgi tells what came, /cookie.cgi also sets "
+       "a cookie",
+       {},
+       MakeCgi},
+      {"cgi-basic", "basic", "the same behind a login by Basic", {}, MakeCgi},
+      {"cgi-digest", "digest", "the same behind a login by Digest", {}, MakeCgi},
+  };
+}

@@ -1,0 +1,89 @@
+// A whole camera: information, commands, services and an upload, in the open, below /basic behind
+// Basic and below /digest behind Digest.
+#include <fmt/format.h>
+
+#include <fstream>
+#include <mutex>
+
+#include "tools/twcamsim/profile.h"
+#include "tools/twcamsim/tell.h"
+#include "tools/twcamsim/upload_counter.h"
+
+namespace {
+
+constexpr char kInfo[] = "{\"camera\":\"north gate\",\"success\":true}\n";
+
+bool StartsWith(const std::string& text, const std::string& start) {
+  return text.compare(0, start.size(), start) == 0;
+}
+
+// The path below the folder that stands for a login.
+std::string Below(const std::string& path) {
+  for (const char* folder : {"/basic", "/digest"}) {
+    if (StartsWith(path, std::string(folder) + "/")) return path.substr(std::string(folder).size());
+  }
+  return path;
+}
+
+class Site : public Profile {
+ public:
+  explicit Site(std::string posted) : posted_(std::move(posted)) {}
+
+  bool TakesStream(const Request& request) const override {
+    return request.method == "POST" && Below(request.path) == "/count.cgi";
+  }
+
+  std::string LoginFor(const Request& request) const override {
+    if (StartsWith(request.path, "/basic/")) return "basic";
+    if (StartsWith(request.path, "/digest/")) return "digest";
+    return "";
+  }
+
+  Response Answer(const Exchange& exchange) override {
+    const std::string path = Below(exchange.request.path);
+    if (path == "/info.json") return MakeResponse(200, "application/json", kInfo);
+    if (path == "/json.cgi" || path == "/") return TellAsJson(exchange);
+    if (path == "/text.cgi") return TellAsText(exchange);
+    if (path == "/xml.cgi") return TellAsXml(exchange);
+    if (path == "/count.cgi") return Count(exchange);
+    if (path == "/command.sh") return Command(exchange.request);
+    return MakeResponse(404, "text/plain", "not found\n");
+  }
+
+ private:
+  static Response Count(const Exchange& exchange) {
+    if (!exchange.source) return MakeResponse(405, "text/plain", "POST a clip\n");
+    const UploadCount count = CountUpload(exchange.request, 0, *exchange.source);
+    return MakeResponse(200, "text/plain", fmt::format("{} {}\n", count.bytes, count.end));
+  }
+
+  Response Command(const Request& request) {
+    const std::lock_guard<std::mutex> lock(mutex_);
+    if (!posted_.empty()) std::ofstream(posted_, std::ios::binary) << request.body;
+    return MakeResponse(200, "text/plain", "ok\n");
+  }
+
+  const std::string posted_;
+  std::mutex mutex_;
+};
+
+std::unique_ptr<Profile> MakeSite(const ProfileOptions& options, std::string* error) {
+  const auto found = options.find("posted");
+  const std::string posted = found == options.end() ? "" : found->second;
+  if (!posted.empty() && !std::ofstream(posted, std::ios::binary)) {
+    *error = posted + " cannot be written";
+    return nullptr;
+  }
+  return std::make_unique<Site>(posted);
+}
+
+}  // namespace
+
+ProfileType SiteProfile() {
+  return {"site",
+          "none",
+          "a whole camera: /info.json, /json.cgi, /text.cgi, /xml.cgi, /count.cgi and /command.sh; "
+          "the same below /basic and /digest with a login",
+          {{"posted", "FILE", "keeps the form last posted to command.sh there"}},
+          MakeSite};
+}

@@ -1,0 +1,56 @@
+// Reads requests from a connection.
+#ifndef TARNWICK_TOOLS_TWCAMSIM_REQUEST_READER_H_
+#define TARNWICK_TOOLS_TWCAMSIM_REQUEST_READER_H_
+
+#include <chrono>
+#include <memory>
+#include <string>
+
+#include "tools/twcamsim/behaviour.h"
+#include "tools/twcamsim/link.h"
+#include "tools/twcamsim/request.h"
+
+enum class Reading {
+  kDone,
+  kNothing,  // the peer ended the connection between two requests
+  kBroken,   // it did so inside of one, or the connection failed; Result tells
+  kBad,      // what came is no HTTP; the request's `sloppy` tells
+  kLimit,    // the behaviour's limit is reached
+};
+
+// Threads: one at a time.
+class RequestReader {
+ public:
+  using Milliseconds = std::chrono::milliseconds;
+
+  RequestReader(Link* link, const Behaviour& behaviour, Milliseconds limit);
+  ~RequestReader();
+
+  // Reads up to the blank line.
+  Reading ReadHead(Request* request);
+
+  // Reads the body that the head announces, chunks decoded.
+  Reading ReadBody(Request* request);
+
+  // Hands out what comes behind the head, as it comes, without regard to the announced length.
+  Io ReadStream(std::string* bytes);
+
+  // How the last read of the connection went.
+  Io Result() const { return result_; }
+
+ private:
+  struct Parser;
+
+  Io ReadMore();
+  Reading Parse(Request* request);
+
+  Link* link_;
+  const Behaviour& behaviour_;
+  const Milliseconds limit_;
+  Io result_ = Io::kDone;
+  std::string pending_;  // came, and belongs to nothing yet
+  int64_t taken_ = 0;    // of the behaviour's limit
+  std::unique_ptr<Parser> parser_;
+};
+
+#endif  // TARNWICK_TOOLS_TWCAMSIM_REQUEST_READER_H_

@@ -1,0 +1,152 @@
+#include "tools/twcamsim/session.h"
+
+#include "tools/common/json_output.h"
+
+namespace {
+
+const char* EndName(Io result) {
+  switch (result) {
+    case Io::kEnd:
+      return "peer-closed";
+    case Io::kReset:
+      return "peer-reset";
+    case Io::kTimeout:
+      return "timeout";
+    case Io::kStopped:
+      return "stopped";
+    default:
+      return "error";
+  }
+}
+
+Json::Value LoginRecord(const Verdict& verdict) {
+  Json::Value login(Json::objectValue);
+  login["passed"] = verdict.passed;
+  login["scheme"] = verdict.scheme;
+  if (!verdict.user.empty()) login["user"] = verdict.user;
+  if (verdict.passed) return login;
+  login["field"] = verdict.field;
+  login["text"] = verdict.text;
+  return login;
+}
+
+// The code of an answer as it went out, which a fault may have made anything.
+std::string StatusOf(const Wire& wire) {
+  const std::string bytes = WireBytes(wire).substr(0, 64);
+  const size_t blank = bytes.find(' ');
+  if (blank == std::string::npos) return "";
+  return bytes.substr(blank + 1, bytes.find_first_of(" \r\n", blank + 1) - blank - 1);
+}
+
+}  // namespace
+
+Behaviour BehaviourOf(const std::vector<Fault>& faults, Random* random) {
+  Behaviour behaviour;
+  for (const Fault& fault : faults) {
+    if (!fault.type->hooks.behaviour) continue;
+    fault.type->hooks.behaviour(&behaviour, {fault.arguments, nullptr, random});
+  }
+  return behaviour;
+}
+
+Session::Session(World* world, Endpoint* endpoint, int fd, int number)
+    : world_(world),
+      endpoint_(endpoint),
+      link_(fd),
+      random_(world->seed, static_cast<uint64_t>(endpoint->index), static_cast<uint64_t>(number)),
+      behaviour_(BehaviourOf(endpoint->faults, &random_)),
+      reader_(&link_, behaviour_, world->idle),
+      start_(std::chrono::steady_clock::now()),
+      record_(Json::objectValue) {
+  record_["time"] = TimeText();
+  record_["endpoint"] = endpoint->name;
+  record_["connection"] = number;
+  record_["peer"] = link_.Peer();
+  record_["requests"] = Json::Value(Json::arrayValue);
+  for (const Fault& fault : endpoint->faults) {
+    if (fault.type->hooks.behaviour && (endpoint->tls || !fault.type->needs_tls)) NoteFault(fault);
+  }
+}
+
+void Session::Run() {
+  if (Open()) {
+    while (ServeOne()) {
+    }
+  }
+  WriteRecord();
+  finished_ = true;
+}
+
+bool Session::ServeOne() {
+  Request request;
+  if (!TakeRequest(&request)) return false;
+  const LoginStyle style = StyleFor(request);
+  const Verdict verdict = endpoint_->login.Check(style, request);
+  NoteRequest(request, verdict);
+  if (!BeforeAnswer()) return false;
+  Response response = MakeAnswer(request, style, verdict);
+  const bool streams = endpoint_->profile->TakesStream(request);
+  if (!request.KeepsAlive() || streams || response.more) response.close = true;
+  const Wire wire = Render(response, request);
+  NoteAnswer(request, wire);
+  if (!Play(wire) || (response.more && !PlayMore(response))) return false;
+  return response.close && !response.raw ? CloseNow() : true;
+}
+
+bool Session::End(const char* how) {
+  if (end_.empty()) end_ = how;
+  return false;
+}
+
+bool Session::End(Io result) {
+  End(EndName(result));
+  link_.Close(behaviour_.close_notice);
+  return false;
+}
+
+bool Session::CloseNow() {
+  link_.Close(behaviour_.close_notice);
+  return End("closed");
+}
+
+bool Session::ResetNow() {
+  link_.Reset();
+  return End("reset");
+}
+
+bool Session::Hold() {
+  return End(link_.HoldUntilPeerLeaves(world_->hold));
+}
+
+void Session::NoteRequest(const Request& request, const Verdict& verdict) {
+  Json::Value entry(Json::objectValue);
+  entry["method"] = request.method;
+  entry["target"] = request.target;
+  entry["head"] = Excerpt(request.head);
+  entry["body"] = Excerpt(request.body);
+  entry["body_bytes"] = static_cast<Json::UInt64>(request.body.size());
+  if (!request.sloppy.empty()) entry["sloppy"] = request.sloppy;
+  entry["login"] = LoginRecord(verdict);
+  record_["requests"].append(entry);
+}
+
+void Session::NoteAnswer(const Request& request, const Wire& wire) {
+  const std::string status = StatusOf(wire);
+  Json::Value& requests = record_["requests"];
+  if (!requests.empty()) requests[requests.size() - 1]["status"] = status;
+  world_->access.Write(request.method + " " + request.path + " " + status);
+}
+
+void Session::WriteRecord() {
+  record_["tls"] = link_.TlsVersion();
+  Json::Value& faults = record_["faults"] = Json::Value(Json::arrayValue);
+  for (const std::string& fault : faults_) faults.append(fault);
+  record_["bytes_in"] = static_cast<Json::UInt64>(link_.BytesIn());
+  record_["bytes_out"] = static_cast<Json::UInt64>(link_.BytesOut());
+  const auto span = std::chrono::steady_clock::now() - start_;
+  record_["duration_ms"] =
+      static_cast<Json::Int64>(std::chrono::duration_cast<std::chrono::milliseconds>(span).count());
+  record_["end"] = end_;
+  if (!link_.ErrorText().empty()) record_["error"] = link_.ErrorText();
+  world_->journal.Write(CompactJson(record_));
+}

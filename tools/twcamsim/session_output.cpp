@@ -1,0 +1,67 @@
+// The answer's way out.
+#include <algorithm>
+
+#include "tools/twcamsim/session.h"
+
+// What is to be sent together goes out by one write.
+bool Session::Play(const Wire& wire) {
+  std::string bytes;
+  for (const WireStep& step : wire) {
+    if (step.action == Action::kSend) {
+      bytes += step.bytes;
+      continue;
+    }
+    if (!Send(bytes) || !PlayStep(step)) return false;
+    bytes.clear();
+  }
+  return Send(bytes);
+}
+
+bool Session::PlayStep(const WireStep& step) {
+  switch (step.action) {
+    case Action::kSend:
+      return Send(step.bytes);
+    case Action::kPause: {
+      const Io result = link_.Pause(step.pause);
+      return result == Io::kDone || End(result);
+    }
+    case Action::kStall:
+      return Hold();
+    case Action::kClose:
+      return CloseNow();
+    case Action::kReset:
+      return ResetNow();
+  }
+  return false;
+}
+
+bool Session::PlayMore(const Response& response) {
+  for (std::string piece; response.more(&piece); piece.clear()) {
+    if (!Send(piece)) return false;
+    const Io result = link_.Pause(response.interval);
+    if (result != Io::kDone) return End(result);
+  }
+  return true;
+}
+
+bool Session::Send(const std::string& bytes) {
+  if (behaviour_.output_limit < 0) return SendPaced(bytes);
+  const size_t left = static_cast<size_t>(behaviour_.output_limit - sent_);
+  sent_ += static_cast<int64_t>(std::min(left, bytes.size()));
+  if (!SendPaced(bytes.substr(0, left))) return false;
+  if (bytes.size() < left) return true;
+  return behaviour_.reset_at_limit ? ResetNow() : CloseNow();
+}
+
+bool Session::SendPaced(const std::string& bytes) {
+  const size_t piece = behaviour_.write_piece > 0 ? behaviour_.write_piece : bytes.size();
+  for (size_t at = 0; at < bytes.size(); at += piece) {
+    if (at > 0) {
+      const Io paused = link_.Pause(behaviour_.write_interval);
+      if (paused != Io::kDone) return End(paused);
+    }
+    const Io result = link_.Write(std::string_view(bytes).substr(at, piece), world_->idle);
+    if (result != Io::kDone) return End(result);
+  }
+  return true;
+}
