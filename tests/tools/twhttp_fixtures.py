@@ -1,0 +1,25 @@
+"""Fixtures of the twhttp tests."""
+
+import pytest
+
+from twhttp_server import Peer, make_identity
+
+
+@pytest.fixture
+def peer():
+    """peer(answers...): a server that ends with the test."""
+    peers = []
+
+    def start(*answers, tls=None):
+        peers.append(Peer(*answers, tls=tls))
+        return peers[-1]
+
+    yield start
+    for each in peers:
+        each.close()
+
+
+@pytest.fixture(scope="session")
+def identity(tmp_path_factory):
+    """A TLS context of a server, and the file of its certificate."""
+    return make_identity(tmp_path_factory.mktemp("identity"))

@@ -1,0 +1,59 @@
+#include "tools/twhttp/session.h"
+
+#include <cerrno>
+#include <cstdio>
+#include <cstring>
+
+#include "tarnwick/platform/owned.h"
+#include "tools/twhttp/hooks.h"
+
+namespace {
+
+bool ReadAll(FILE* file, std::string* text) {
+  char piece[65536];
+  for (size_t size; (size = std::fread(piece, 1, sizeof(piece), file)) > 0;) {
+    text->append(piece, size);
+  }
+  return std::ferror(file) == 0;
+}
+
+bool ReadBodyFile(const std::string& path, std::string* body) {
+  if (path == "-") return ReadAll(stdin, body);
+  const OwnedFile file(std::fopen(path.c_str(), "re"));
+  return file && ReadAll(file.get(), body);
+}
+
+bool SuitsOperation(const Options& options, const std::string& body) {
+  const OperationId id = options.operation->id;
+  if ((id != OperationId::kXmlPost && id != OperationId::kXmlPut) || IsXml(body)) return true;
+  std::fprintf(stderr, "twhttp: the body to send is no well-formed XML\n");
+  return false;
+}
+
+}  // namespace
+
+bool LoadBody(const Options& options, std::string* body) {
+  *body = options.body;
+  if (options.body_file.empty() || options.operation->id == OperationId::kUpload) {
+    // Only whether it is there: an upload is sent while it is read.
+    const bool check = !options.body_file.empty() && options.body_file != "-";
+    const OwnedFile file(check ? std::fopen(options.body_file.c_str(), "re") : nullptr);
+    if (!check || file) return SuitsOperation(options, *body);
+  } else if (ReadBodyFile(options.body_file, body)) {
+    return SuitsOperation(options, *body);
+  }
+  std::fprintf(stderr, "twhttp: %s: %s\n", options.body_file.c_str(), std::strerror(errno));
+  return false;
+}
+
+void RunSession(Session* session, const std::string& body, const BodyWriter& write,
+                const std::function<void()>& moved, FakePeer* peer) {
+  Hooks hooks;
+  hooks.trace = &session->trace;
+  hooks.peer = peer;
+  hooks.port = session->options.target.port;
+  hooks.moved = moved;
+  SetGiveUp(GiveUpLimit(session->options));
+  Observe(&hooks, [&] { session->outcome = RunOperation(session->options, body, write); });
+  session->failure = Explain({session->options, session->outcome, session->trace, StopReason()});
+}
