@@ -12,7 +12,7 @@
 // Results: the handle, which the caller releases with curl_easy_cleanup; null when libcurl gave
 //   none. A failed initialisation is logged (category http, level error), and the next call tries
 //   again.
-// Threads: any.
+// Threads: any; waits while another one initialises.
 TARNWICK_API CURL* TWCurlInit();
 
 #endif  // TARNWICK_HTTP_TWCURL_H_

@@ -105,6 +105,7 @@ enum LOG_CATEG : int {
   LOG_CATEG_SHARE_LIB = 73,
 };
 
+// How many there are, and levels in the record.
 constexpr int LOG_CATEG_COUNT = 74;
 
 // How severe a line is; the lower, the more severe.
@@ -146,7 +147,8 @@ TARNWICK_API TWEnum2StrMap<LOG_LEVEL>::~TWEnum2StrMap();
 // The name of a category or a level.
 //
 // Results: a zero-terminated text that lives as long as the library is loaded; "unknown" for a
-//   value outside the enumeration; never null.
+//   value outside the enumeration; never null. The first call throws std::bad_alloc when memory
+//   runs out.
 // Threads: any; the first call builds the names, concurrent first calls wait for it.
 template <typename T>
 const char* Enum2String(T value);
@@ -246,11 +248,13 @@ TARNWICK_API void TWPrintf(LOG_TYPE type, const char* categ, const char* level, 
     __attribute__((format(printf, 7, 8)));
 
 // The part of `path` after the last "/" or "\\"; the whole path when it holds neither, and an empty
-// text when it ends in one.
+// text when it ends in one. Throws std::bad_alloc when memory runs out.
+// Threads: any.
 TARNWICK_API std::string GetFileBaseName(std::string path);
 
 // True when a line of this category and level is to be written: the level is at most the category's
 // level in the shared record, or at most notice when no record is attached.
+// Threads: any.
 inline bool TWLogEnabled(LOG_CATEG categ, LOG_LEVEL level) {
   const TWDbgLogCfg* cfg = g_pDbgLogCfg;
   return level <= (cfg != nullptr ? cfg->Level(categ) : static_cast<int>(LOG_LEVEL_NOTICE));

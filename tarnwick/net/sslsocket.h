@@ -40,7 +40,8 @@ class TARNWICK_API SSLSocket : public TWSocket {
   // Reads at most `len` decrypted bytes.
   // Results: the bytes read; 0 when the peer closed, with or without a close notice; -1 on an error
   //   (logged). errno is 0 or the failing system call's.
-  // Blocks for `timeout` seconds whenever more of a record is missing.
+  // Blocks for `timeout` seconds whenever more of a record is missing; behind DoSelect, which has
+  // waited as long, a silent peer costs a read twice the time-out.
   int _Read(void* buf, unsigned int len) override;
 
   // Writes `len` bytes in pieces of at most 32,000. Results: `len`, or -1 on an error (logged).

@@ -95,7 +95,7 @@ TARNWICK_API int WriteFd(int fd, const void* buf, int len);
 // Arguments: `stackSize` in bytes, 0 for the system's default, which also serves when the size is
 //   refused; `detached` other than 0 for a thread that nobody joins.
 // Results: 1; 0 when the thread could not be started or `start` or `thread` is null, which is
-//   logged (category utils, level error).
+//   logged (category utils, level error); `*thread` is then of no use.
 TARNWICK_API int CreateThread(void* (*start)(void*), void* arg, unsigned stackSize, int detached,
                               pthread_t* thread);
 

@@ -1,0 +1,110 @@
+// The operations through libcurl.
+#include <json/value.h>
+#include <libxml/parser.h>
+
+#include "tests/longest_call/cases.h"
+#include "tests/longest_call/client.h"
+
+namespace {
+
+// Of one transfer, in seconds: t in the table.
+constexpr int kLimit = 1;
+
+int ByCurl(int port) {
+  return NewClient(port)->SendRequestByCurl(HTTP_METHOD_GET, true, kLimit);
+}
+
+int ByCurlWithoutALimit(int port) {
+  return NewClient(port)->SendRequestByCurl(HTTP_METHOD_GET, true, 0);
+}
+
+int ByCurlToAName(int port) {
+  return NewClient(port, true, false, "camera.example.")
+      ->SendRequestByCurl(HTTP_METHOD_GET, true, kLimit);
+}
+
+int JsonOverTls(int port) {
+  Json::Value value;
+  return SendHttpsGet("127.0.0.1", port, "a.cgi", value, kLimit);
+}
+
+int XmlGet(int port) {
+  return NewClient(port)->SendReqByXMLGet(kLimit);
+}
+
+int Post(int port) {
+  return NewClient(port)->SendRequestByPost("?");
+}
+
+int WithADocument(int port, int (TWHttpClient::*send)(xmlDoc*&)) {
+  xmlDoc* doc = xmlNewDoc(reinterpret_cast<const xmlChar*>("1.0"));
+  xmlDocSetRootElement(doc, xmlNewNode(nullptr, reinterpret_cast<const xmlChar*>("a")));
+  const int result = (NewClient(port).get()->*send)(doc);
+  xmlFreeDoc(doc);
+  return result;
+}
+
+int XmlPost(int port) {
+  return WithADocument(port, &TWHttpClient::SendReqByXMLPost);
+}
+
+int XmlPut(int port) {
+  return WithADocument(port, &TWHttpClient::SendReqByXMLPut);
+}
+
+int XmlDelete(int port) {
+  return NewClient(port)->SendReqByXMLDelete();
+}
+
+std::vector<Case> LimitedCases() {
+  const std::string head = "HTTP/1.1 200 OK\r\nContent-Length: 10\r\n\r\n";
+  return {
+      {"SendRequestByCurl(t), nobody answers the connect",
+       "t",
+       1,
+       {},
+       ByCurl,
+       HTTP_RET_IO_ERROR,
+       Peer::kBlackHole},
+      {"SendRequestByCurl(t), silence", "t", 1, {Silent()}, ByCurl, HTTP_RET_IO_ERROR},
+      {"SendRequestByCurl(t), silence in the body",
+       "t",
+       1,
+       {SilentBehind(head)},
+       ByCurl,
+       HTTP_RET_IO_ERROR},
+      {"SendHttpsGet(t), silence in the handshake",
+       "t",
+       1,
+       {{StallUntilFinish()}},
+       JsonOverTls,
+       -1},
+      {"SendReqByXMLGet(t), silence", "t", 1, {Silent()}, XmlGet, HTTP_RET_IO_ERROR},
+      {"SendRequestByCurl(t) to a name, the name server is silent",
+       "the resolver's when that is longer than t: 2 s here",
+       2,
+       {},
+       ByCurlToAName,
+       HTTP_RET_IO_ERROR},
+  };
+}
+
+}  // namespace
+
+std::vector<Case> CurlCases() {
+  std::vector<Case> all = LimitedCases();
+  const std::vector<Case> unlimited = {
+      {"SendRequestByCurl(0), silence",
+       "none",
+       0,
+       {GivesWay()},
+       ByCurlWithoutALimit,
+       HTTP_RET_IO_ERROR},
+      {"SendRequestByPost, silence", "none", 0, {GivesWay()}, Post, HTTP_RET_IO_ERROR},
+      {"SendReqByXMLPost, silence", "none", 0, {GivesWay()}, XmlPost, HTTP_RET_IO_ERROR},
+      {"SendReqByXMLPut, silence", "none", 0, {GivesWay()}, XmlPut, HTTP_RET_IO_ERROR},
+      {"SendReqByXMLDelete, silence", "none", 0, {GivesWay()}, XmlDelete, HTTP_RET_IO_ERROR},
+  };
+  all.insert(all.end(), unlimited.begin(), unlimited.end());
+  return all;
+}
