@@ -6,6 +6,7 @@
 #include <openssl/md5.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cstdlib>
 #include <ctime>
 #include <initializer_list>
@@ -48,25 +49,31 @@ std::string A2Digest(const DIGEST_ACCESS_AUTH& login, const std::string& method)
   return Finish(&a2);
 }
 
+// `text` without `ch` at its ends.
+std::string_view Trim(std::string_view text, char ch) {
+  const size_t first = std::min(text.find_first_not_of(ch), text.size());
+  return text.substr(first, text.find_last_not_of(ch) + 1 - first);
+}
+
 // Deliberately simple, and the devices rely on it: the name is found wherever it first occurs, also
 // inside another word, and a quoted value is cut at its first comma, so that a list of qops gives
 // its first.
-std::string FindParameter(const std::string& challenge, const std::string& name) {
+std::string_view FindParameter(std::string_view challenge, std::string_view name) {
   const size_t found = challenge.find(name);
-  if (found == std::string::npos) return std::string();
+  if (found == std::string_view::npos) return {};
   const size_t equals = challenge.find('=', found);
-  if (equals == std::string::npos) return std::string();
-  const size_t comma = challenge.find(',', equals);
-  const size_t length = comma == std::string::npos ? comma : comma - equals - 1;
-  return TrimString(TrimString(challenge.substr(equals + 1, length), " "), "\"");
+  if (equals == std::string_view::npos) return {};
+  const std::string_view value = challenge.substr(equals + 1);
+  return Trim(Trim(value.substr(0, value.find(',')), ' '), '"');
 }
 
 }  // namespace
 
 ChallengeMap ParseChallenge(const std::string& challenge) {
-  ChallengeMap parameters = {{"realm", ""}, {"domain", ""},    {"opaque", ""}, {"nonce", ""},
-                             {"stale", ""}, {"algorithm", ""}, {"qop", ""}};
-  for (auto& [name, value] : parameters) value = FindParameter(challenge, name);
+  ChallengeMap parameters;
+  for (const char* name : {"realm", "domain", "opaque", "nonce", "stale", "algorithm", "qop"}) {
+    parameters.emplace(name, FindParameter(challenge, name));
+  }
   return parameters;
 }
 

@@ -5,8 +5,7 @@
 #include <algorithm>
 #include <climits>
 #include <cstdlib>
-
-#include "tarnwick/utils/utils.h"
+#include <string>
 
 namespace {
 
@@ -27,23 +26,28 @@ int LeadingNumber(std::string_view text) {
   return static_cast<int>(std::clamp<long>(value, INT_MIN, INT_MAX));
 }
 
-bool BeginsWith(std::string_view name, std::string_view known) {
-  return name.size() >= known.size() && strncasecmp(name.data(), known.data(), known.size()) == 0;
+bool BeginsWith(std::string_view text, std::string_view known) {
+  return text.size() >= known.size() && strncasecmp(text.data(), known.data(), known.size()) == 0;
 }
 
-Header HeaderOf(std::string_view name) {
-  constexpr struct {
-    std::string_view name;
-    Header header;
-  } kKnown[] = {
+struct KnownName {
+  std::string_view name;
+  Header header;
+};
+
+// `text` begins with the name. Most names end the search at their first letter.
+KnownName FindKnown(std::string_view text) {
+  constexpr KnownName kKnown[] = {
       {"content-type", Header::kContentType},      {"content-length", Header::kContentLength},
       {"Content-Range", Header::kContentRange},    {"Set-Cookie", Header::kSetCookie},
       {"WWW-Authenticate", Header::kAuthenticate}, {"Transfer-Encoding", Header::kTransferEncoding},
   };
-  for (const auto& known : kKnown) {
-    if (BeginsWith(name, known.name)) return known.header;
+  const int first = text[0] | 0x20;
+  if (first != 'c' && first != 's' && first != 'w' && first != 't') return {{}, Header::kOther};
+  for (const KnownName& known : kKnown) {
+    if (BeginsWith(text, known.name)) return known;
   }
-  return Header::kOther;
+  return {{}, Header::kOther};
 }
 
 }  // namespace
@@ -61,15 +65,26 @@ StatusLine ParseStatusLine(std::string_view line, int* status) {
 
 HeaderLine ParseHeaderLine(std::string_view line) {
   HeaderLine result;
-  const std::string_view name = TakeToken(&line, kNameEnds);
-  result.hasName = !name.empty();
-  result.header = HeaderOf(name);
-  result.value = line;
+  const size_t begin = line.find_first_not_of(kNameEnds);
+  if (begin == std::string_view::npos) return result;
+  result.hasName = true;
+  // No known name holds a character that ends names, so it need not be cut out of the line first.
+  line.remove_prefix(begin);
+  const KnownName known = FindKnown(line);
+  result.header = known.header;
+  if (known.header == Header::kOther) return result;
+  const size_t end = std::min(line.find_first_of(kNameEnds, known.name.size()), line.size());
+  result.value = line.substr(std::min(end + 1, line.size()));
   return result;
 }
 
-std::string CookieOf(std::string_view value) {
+std::string_view TrimSpaces(std::string_view text) {
+  const size_t first = std::min(text.find_first_not_of(' '), text.size());
+  return text.substr(first, text.find_last_not_of(' ') + 1 - first);
+}
+
+std::string_view CookieOf(std::string_view value) {
   const size_t semicolon = value.find(';');
-  if (semicolon == std::string_view::npos) return std::string();
-  return TrimString(std::string(value.substr(0, semicolon + 1)), " ");
+  if (semicolon == std::string_view::npos) return {};
+  return TrimSpaces(value.substr(0, semicolon + 1));
 }

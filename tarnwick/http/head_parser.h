@@ -2,7 +2,6 @@
 #ifndef TARNWICK_HTTP_HEAD_PARSER_H_
 #define TARNWICK_HTTP_HEAD_PARSER_H_
 
-#include <string>
 #include <string_view>
 
 enum class StatusLine {
@@ -29,14 +28,18 @@ enum class Header {
 struct HeaderLine {
   bool hasName = false;
   Header header = Header::kOther;
-  std::string_view value;  // whatever follows the one character behind the name; may be empty
+  // Of a known header, whatever follows the one character behind the name; may be empty.
+  std::string_view value;
 };
 
 // Splits a header line. A name that begins with a known one counts as that: devices append to them.
 HeaderLine ParseHeaderLine(std::string_view line);
 
+// `text` without the spaces at its ends; tabs stay.
+std::string_view TrimSpaces(std::string_view text);
+
 // The cookie of a Set-Cookie value: up to its first ";", which stays, without spaces at the ends.
 // Without a ";" there is no cookie.
-std::string CookieOf(std::string_view value);
+std::string_view CookieOf(std::string_view value);
 
 #endif  // TARNWICK_HTTP_HEAD_PARSER_H_

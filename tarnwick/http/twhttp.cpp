@@ -2,14 +2,16 @@
 #include "tarnwick/http/twhttp.h"
 
 #include <cstdlib>
+#include <utility>
 
+#include "tarnwick/net/socket_access.h"
 #include "tarnwick/net/sslsocket.h"
 
 namespace {
 
-std::string WithoutLeadingSlashes(const std::string& path) {
-  const size_t first = path.find_first_not_of('/');
-  return first == std::string::npos ? std::string() : path.substr(first);
+std::string WithoutLeadingSlashes(std::string path) {
+  path.erase(0, path.find_first_not_of('/'));
+  return path;
 }
 
 }  // namespace
@@ -33,8 +35,8 @@ TWHttpClient::TWHttpClient(std::string host, int port, std::string path, std::st
                            bool encodeQuery, bool basicAuth, HTTP_VERSION version,
                            std::string encodeKeep)
     : TWHttpClient() {
-  Init(path, host, port, user, password, timeout, bufferedRead, encodeQuery, basicAuth, version,
-       encodeKeep, https);
+  Init(std::move(path), std::move(host), port, std::move(user), std::move(password), timeout,
+       bufferedRead, encodeQuery, basicAuth, version, std::move(encodeKeep), https);
 }
 
 TWHttpClient::~TWHttpClient() {
@@ -48,10 +50,10 @@ TWHttpClient::~TWHttpClient() {
 void TWHttpClient::Init(std::string path, std::string host, int port, std::string user,
                         std::string password, int timeout, bool bufferedRead, bool encodeQuery,
                         bool basicAuth, HTTP_VERSION version, std::string encodeKeep, bool https) {
-  m_strHost = host;
+  m_strHost = std::move(host);
   m_port = port;
-  m_strUser = user;
-  m_strPassword = password;
+  m_strUser = std::move(user);
+  m_strPassword = std::move(password);
   m_result = HTTP_RET_NOT_READY;
   m_connState = 0;
   m_statusCode = 0;
@@ -60,18 +62,18 @@ void TWHttpClient::Init(std::string path, std::string host, int port, std::strin
   m_bEncodeQuery = encodeQuery;
   m_bBasicAuth = basicAuth;
   m_httpVersion = version;
-  m_strEncodeKeep = encodeKeep;
+  m_strEncodeKeep = std::move(encodeKeep);
   m_pRespBuf = nullptr;
   m_respLen = 0;
   m_pCurlRespFile = nullptr;
-  SetPath(path);
+  SetPath(std::move(path));
   InitSocket(timeout, bufferedRead);
 }
 
 void TWHttpClient::InitSocket(int timeout, bool bufferedRead) {
   // A socket that is there already is not released: a subclass may have handed it out. Init is for
   // one call an object.
-  m_pSocket = m_bHttps ? new SSLSocket() : new TWSocket();
+  m_pSocket = m_bHttps ? new SSLSocket() : SocketAccess::MakePlain();
   m_pSocket->SetSocketInfo(m_strHost, m_port, timeout, bufferedRead);
 }
 
@@ -80,7 +82,7 @@ bool TWHttpClient::ConnectAnew() {
 }
 
 void TWHttpClient::SetPath(std::string path) {
-  m_strPath = WithoutLeadingSlashes(path);
+  m_strPath = WithoutLeadingSlashes(std::move(path));
 }
 
 void TWHttpClient::SetSocketRemoteAddr(unsigned int addr) {

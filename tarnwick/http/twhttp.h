@@ -37,23 +37,23 @@ typedef struct _xmlDoc xmlDoc;  // libxml2's document
 
 // The response headers that a client keeps.
 enum HTTP_MAP_KEY : int {
-  HTTP_CONTENT_TYPE = 0,
-  HTTP_CONTENT_LENGTH = 1,
-  HTTP_CONTENT_RANGE = 2,
+  HTTP_CONTENT_TYPE = 0,    // Content-Type
+  HTTP_CONTENT_LENGTH = 1,  // Content-Length
+  HTTP_CONTENT_RANGE = 2,   // Content-Range
 };
 
 // The protocol version to send. The values are libcurl's.
 enum HTTP_VERSION : int {
   // HTTP/1.0 on the socket GET, HTTP/1.1 on the form POST, libcurl's default on the libcurl paths
   HTTP_VERSION_NONE = 0,
-  HTTP_VERSION_1_0 = 1,
-  HTTP_VERSION_1_1 = 2,
+  HTTP_VERSION_1_0 = 1,  // HTTP/1.0
+  HTTP_VERSION_1_1 = 2,  // HTTP/1.1
 };
 
 // The request method. Every value but 0 counts as POST.
 enum TW_HTTP_METHOD : int {
-  HTTP_METHOD_GET = 0,
-  HTTP_METHOD_POST = 1,
+  HTTP_METHOD_GET = 0,   // GET
+  HTTP_METHOD_POST = 1,  // POST
 };
 
 // Results of the client's operations, and of the last response (TWHttpClient::CheckResponse).
@@ -76,6 +76,9 @@ enum {
 // onto the wire as they are: it is for the caller to keep line ends out of them.
 // When memory runs out, a request operation gives its failure; constructors and functions that take
 // or return a text by value throw std::bad_alloc.
+// Blocks: each operation over the socket for the name look-up, which has no limit, then for the
+// client's time-out at each wait for the peer, of which a slow one may need many; a write, and the
+// TLS handshake, have no limit. docs/longest-call.md tells the sums.
 // Threads: one thread uses an object at a time; separate objects may run in separate threads.
 class TARNWICK_API TWHttpClient {
  public:
@@ -106,13 +109,15 @@ class TARNWICK_API TWHttpClient {
             int timeout, bool bufferedRead, bool encodeQuery, bool basicAuth, HTTP_VERSION version,
             std::string encodeKeep, bool https);
 
-  // Creates the socket: TLS when the client uses https. Init calls it.
+  // Creates the socket: TLS when the client uses https. Init calls it. A socket that is there already
+  // is not released.
   void InitSocket(int timeout, bool bufferedRead);
 
   // Sets the path of the next request; leading "/" are stripped.
   void SetPath(std::string path);
 
-  // Sets the local source address of the next connection, in network byte order; 0 for none.
+  // Sets the local source address of the next connection, in network byte order; 0 for none. Without a
+  // socket nothing happens.
   void SetSocketRemoteAddr(unsigned int addr);
 
   // Writes headers and body of SendRequestByCurl's responses to `file`, from its current position;
@@ -173,7 +178,8 @@ class TARNWICK_API TWHttpClient {
   // root. The body is collected in memory, for the one-call functions, or written to the response
   // file.
   // Arguments: `verifyPeer` false accepts any certificate and host name; `timeout` limits the whole
-  //   transfer, in seconds.
+  //   transfer, in seconds, 0 does not, and a negative one fails. A name server that is silent may
+  //   hold the call longer.
   // Results: HTTP_RET_OK after a status from 200 to 299; HTTP_RET_CERT_ERROR when the server's
   //   certificate could not be verified; HTTP_RET_IO_ERROR after anything else.
   int SendRequestByCurl(TW_HTTP_METHOD method, bool verifyPeer, int timeout);
@@ -250,7 +256,8 @@ class TARNWICK_API TWHttpClient {
   // others by Basic. The answer's body is added to what earlier requests have collected, for
   // GetResponseXML.
   //
-  // Arguments: `timeout` limits the whole transfer, in seconds; the others have no limit.
+  // Arguments: `timeout` limits the whole transfer, in seconds, as in SendRequestByCurl; the others
+  //   have no limit.
   // Results: HTTP_RET_OK after a status from 200 to 299; HTTP_RET_IO_ERROR after anything else.
   // SendReqByXMLPost sends at most 8,191 bytes of the document, indented.
   int SendReqByXMLGet(int timeout);
@@ -323,6 +330,7 @@ class TARNWICK_API TWHttpClient {
   TARNWICK_LOCAL int ReadBodyFor(const char* operation, std::string* body);
   TARNWICK_LOCAL bool ReadChunks(std::string* body);
   TARNWICK_LOCAL bool ReadChunk(uint32_t size, std::string* body);
+  TARNWICK_LOCAL int AppendPiece(int len, std::string* body);
   TARNWICK_LOCAL void DropChunkEnd();
   TARNWICK_LOCAL bool ReadToEnd(std::string* body);
 
@@ -362,7 +370,7 @@ TARNWICK_API int SendHttpPost(const std::string& host, int port, const std::stri
 
 // As SendHttpGet, over TLS through libcurl, with the certificate and host name verified.
 //
-// Arguments: `timeout` limits the whole transfer, in seconds.
+// Arguments: `timeout` limits the whole transfer, in seconds, as in SendRequestByCurl.
 // Results: 0; -1 when the transfer failed or the status is not from 200 to 299; -2 when the
 //   certificate could not be verified; -3 when the body is no JSON, or "success" is missing or not
 //   true. An empty body counts as success and leaves `result` as it was.

@@ -4,15 +4,31 @@
 #include <algorithm>
 #include <cstdint>
 #include <exception>
+#include <string_view>
 
 #include "tarnwick/http/chunk_size.h"
 #include "tarnwick/http/twhttp.h"
 #include "tarnwick/log/twdebuglog.h"
+#include "tarnwick/net/socket_access.h"
 
 namespace {
 
 constexpr int kPieceSize = 8192;
 constexpr char kErrorText[] = "{\"error\":true}";
+
+// Between these sizes a body grows to four times its length, where a string would double: it moves
+// half as often, and a move costs a page fault a page. Pages that are only reserved cost nothing,
+// so memory still grows with what arrives; of larger ones an appliance has no room to spare.
+constexpr size_t kGrowsFaster = size_t{64} << 10;
+constexpr size_t kGrowsFasterUpTo = size_t{16} << 20;
+
+void Append(std::string_view bytes, std::string* body) {
+  const size_t size = body->size() + bytes.size();
+  if (size > body->capacity() && size >= kGrowsFaster && size <= kGrowsFasterUpTo) {
+    body->reserve(4 * size);
+  }
+  body->append(bytes);
+}
 
 }  // namespace
 
@@ -23,7 +39,8 @@ std::string TWHttpClient::GetResp() try {
     return kErrorText;
   }
   std::string body;
-  return ReadBodyFor(__func__, &body) == HTTP_RET_OK ? body : kErrorText;
+  if (ReadBodyFor(__func__, &body) != HTTP_RET_OK) body = kErrorText;
+  return body;
 } catch (const std::exception&) {  // memory ran out
   return kErrorText;
 }
@@ -60,19 +77,31 @@ bool TWHttpClient::ReadChunks(std::string* body) {
 }
 
 bool TWHttpClient::ReadChunk(uint32_t size, std::string* body) {
-  char piece[kPieceSize];
   while (size > 0) {
-    const int count = ReadData(piece, static_cast<int>(std::min<uint32_t>(size, kPieceSize)));
+    const int count = AppendPiece(static_cast<int>(std::min<uint32_t>(size, kPieceSize)), body);
     if (count < 0) return false;
-    body->append(piece, static_cast<size_t>(count));
     size -= static_cast<uint32_t>(count);
     if (m_pSocket->IsEOF()) return true;
   }
   return true;
 }
 
+// As ReadData, with what came added to the body. REQUIRES: len <= kPieceSize, and the head is read.
+int TWHttpClient::AppendPiece(int len, std::string* body) {
+  const std::string_view buffered = SocketAccess::TakeBuffered(m_pSocket, len);
+  if (!buffered.empty()) {
+    Append(buffered, body);
+    return len;
+  }
+  char piece[kPieceSize];
+  const int count = ReadData(piece, len);
+  if (count > 0) Append({piece, static_cast<size_t>(count)}, body);
+  return count;
+}
+
 // The two bytes behind a chunk, whatever they are.
 void TWHttpClient::DropChunkEnd() {
+  if (!SocketAccess::TakeBuffered(m_pSocket, 2).empty()) return;
   char ending[2];
   const int count = ReadData(ending, 2);
   if (count == 1) ReadData(ending, 1);  // direct reading delivers what has arrived
@@ -80,10 +109,8 @@ void TWHttpClient::DropChunkEnd() {
 
 // The announced length does not count: the body ends where the server closes.
 bool TWHttpClient::ReadToEnd(std::string* body) {
-  char piece[kPieceSize];
   for (;;) {
-    const int count = ReadData(piece, kPieceSize);
+    const int count = AppendPiece(kPieceSize, body);
     if (count <= 0) return count == 0;
-    body->append(piece, static_cast<size_t>(count));
   }
 }

@@ -1,7 +1,6 @@
 // GET over the client's socket, and the choice of the way by method.
 #define TW_LOG_SOURCE "twhttp"
 
-#include <cstdio>
 #include <cstring>
 #include <exception>
 
@@ -12,8 +11,11 @@
 
 namespace {
 
-// Longer requests are cut to one character less; devices have small request buffers themselves.
-constexpr size_t kMaxRequest = 2048;
+// Longer requests are cut there; devices have small request buffers themselves.
+constexpr size_t kMaxRequest = 2047;
+
+// At least what a GET has besides the client's texts.
+constexpr size_t kRestOfRequest = 80;
 
 }  // namespace
 
@@ -22,9 +24,9 @@ int TWHttpClient::SendRequestByGet() try {
     TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_DEBUG, "Connection failed!\n");
     return HTTP_RET_IO_ERROR;
   }
-  char request[kMaxRequest];
-  snprintf(request, sizeof(request), "%s", BuildGetRequest().c_str());
-  if (m_pSocket->WriteData(request, static_cast<int>(strlen(request))) <= 0) {
+  const std::string request = BuildGetRequest();
+  const size_t length = strnlen(request.c_str(), kMaxRequest);  // a zero byte ends it as well
+  if (m_pSocket->WriteData(request.c_str(), static_cast<int>(length)) <= 0) {
     TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_DEBUG, "Write data faild.\n");
     return HTTP_RET_IO_ERROR;
   }
@@ -41,13 +43,16 @@ std::string TWHttpClient::BuildGetRequest() {
       m_bEncodeQuery ? EncodeQueryValues(m_strPath, m_strEncodeKeep) : m_strPath;
   // Without a preference the GET speaks HTTP/1.0: old cameras answer nothing else.
   const bool http11 = m_httpVersion == HTTP_VERSION_1_1;
-  std::string request = "GET /" + path + (http11 ? " HTTP/1.1\r\n" : " HTTP/1.0\r\n");
-  request += "User-Agent: Quenrith Tarnwick\r\n";
-  if (!m_strCookie.empty()) request += "Cookie: " + m_strCookie + "\r\n";
-  if (!m_strAuthorization.empty()) request += m_strAuthorization + "\r\n";
+  std::string request;
+  request.reserve(path.size() + m_strCookie.size() + m_strAuthorization.size() + m_strHost.size() +
+                  kRestOfRequest);
+  request.append("GET /").append(path).append(http11 ? " HTTP/1.1\r\n" : " HTTP/1.0\r\n");
+  request.append("User-Agent: Quenrith Tarnwick\r\n");
+  if (!m_strCookie.empty()) request.append("Cookie: ").append(m_strCookie).append("\r\n");
+  if (!m_strAuthorization.empty()) request.append(m_strAuthorization).append("\r\n");
   m_strAuthorization.clear();
-  if (http11) request += "Host: " + m_strHost + "\r\n";
-  request += "\r\n";
+  if (http11) request.append("Host: ").append(m_strHost).append("\r\n");
+  request.append("\r\n");
   return request;
 }
 

@@ -6,7 +6,6 @@
 #include "tarnwick/http/head_parser.h"
 #include "tarnwick/http/twhttp.h"
 #include "tarnwick/log/twdebuglog.h"
-#include "tarnwick/utils/utils.h"
 
 namespace {
 
@@ -66,25 +65,24 @@ bool TWHttpClient::KeepHeader(const char* line) {
   const HeaderLine parsed = ParseHeaderLine(line);
   if (!parsed.hasName) return false;
   if (parsed.header != Header::kOther && parsed.value.empty()) return false;
-  const std::string value(parsed.value);
   switch (parsed.header) {
     case Header::kContentType:
-      m_mapContent.emplace(HTTP_CONTENT_TYPE, TrimString(value, " "));
+      m_mapContent.try_emplace(HTTP_CONTENT_TYPE, TrimSpaces(parsed.value));
       break;
     case Header::kContentLength:
-      m_mapContent.emplace(HTTP_CONTENT_LENGTH, TrimString(value, " "));
+      m_mapContent.try_emplace(HTTP_CONTENT_LENGTH, TrimSpaces(parsed.value));
       break;
     case Header::kContentRange:
-      m_mapContent.emplace(HTTP_CONTENT_RANGE, TrimString(value, " "));
+      m_mapContent.try_emplace(HTTP_CONTENT_RANGE, TrimSpaces(parsed.value));
       break;
     case Header::kSetCookie:
-      m_strCookie = CookieOf(value);
+      m_strCookie = CookieOf(parsed.value);
       break;
     case Header::kAuthenticate:
-      m_strAuthenticate = value;
+      m_strAuthenticate = parsed.value;
       break;
     case Header::kTransferEncoding:
-      m_strTransferEncoding = TrimString(value, " ");
+      m_strTransferEncoding = TrimSpaces(parsed.value);
       break;
     case Header::kOther:
       break;

@@ -9,9 +9,11 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <charconv>
 #include <csignal>
 #include <cstdarg>
 #include <cstdio>
+#include <cstring>
 #include <ctime>
 #include <optional>
 #include <string_view>
@@ -42,22 +44,51 @@ const char* PathOf(LOG_TYPE type) {
   return nullptr;
 }
 
-// The main thread's id is the process's and is not printed twice.
-void FormatProcess(char* text) {
-  const pid_t process = getpid();
-  const pid_t thread = static_cast<pid_t>(syscall(SYS_gettid));
-  if (process == thread) {
-    snprintf(text, kPartSize, "[%d]", process);
-  } else {
-    snprintf(text, kPartSize, "[%d][%d]", process, thread);
+// A part of a line, put together without a format, which costs as much as writing it.
+class Part {
+ public:
+  Part() : m_length(0) { m_text[0] = '\0'; }
+
+  // Adds what fits.
+  void Add(const char* text) {
+    const size_t size = strnlen(text, kPartSize - 1 - m_length);
+    std::memcpy(m_text + m_length, text, size);
+    m_length += size;
+    m_text[m_length] = '\0';
   }
+
+  void Add(pid_t number) {
+    char digits[16];
+    *std::to_chars(digits, digits + sizeof(digits) - 1, number).ptr = '\0';
+    Add(digits);
+  }
+
+  const char* Text() const { return m_text; }
+
+ private:
+  char m_text[kPartSize];
+  size_t m_length;
+};
+
+template <typename T>
+void AddBracketed(T value, Part* part) {
+  part->Add("[");
+  part->Add(value);
+  part->Add("]");
 }
 
-void FormatTags(const char* categ, const char* level, char* text) {
-  text[0] = '\0';
-  if (categ != nullptr && level != nullptr) {
-    snprintf(text, kPartSize, "[%s][%s]", categ, level);
-  }
+// The main thread's id is the process's and is not printed twice.
+void FormatProcess(Part* part) {
+  const pid_t process = getpid();
+  const pid_t thread = static_cast<pid_t>(syscall(SYS_gettid));
+  AddBracketed(process, part);
+  if (process != thread) AddBracketed(thread, part);
+}
+
+void FormatTags(const char* categ, const char* level, Part* part) {
+  if (categ == nullptr || level == nullptr) return;
+  AddBracketed(categ, part);
+  AddBracketed(level, part);
 }
 
 // Milliseconds only when the administrator asked for them; no time at all when the clock's value
@@ -90,14 +121,14 @@ struct CallSite {
 };
 
 void WritePrefix(FILE* stream, const char* categ, const char* level, const CallSite& site) {
-  char process[kPartSize];
-  char tags[kPartSize];
+  Part process;
+  Part tags;
   char time[kPartSize];
-  FormatProcess(process);
-  FormatTags(categ, level, tags);
+  FormatProcess(&process);
+  FormatTags(categ, level, &tags);
   FormatTime(time);
-  fprintf(stream, "%s %s%s %s:%d:%s(): ", time, process, tags, site.file + BaseNameStart(site.file),
-          site.line, site.func);
+  fprintf(stream, "%s %s%s %s:%d:%s(): ", time, process.Text(), tags.Text(),
+          site.file + BaseNameStart(site.file), site.line, site.func);
 }
 
 // A write beyond the process's file size limit ends the process, unless the signal is held off. Few

@@ -24,8 +24,8 @@ class TARNWICK_API TWSocket {
  public:
   // What a wait is for.
   enum SELECT_TYPE {
-    SELECT_READ = 0,
-    SELECT_WRITE = 1,
+    SELECT_READ = 0,   // bytes to read, or the end of the stream
+    SELECT_WRITE = 1,  // room to write
   };
 
   // A socket without a host; SetSocketInfo must follow.
@@ -101,7 +101,8 @@ class TARNWICK_API TWSocket {
   //   error or time-out that came before any byte, and when `buf` is null or `len` negative.
   // State: a buffered read that failed clears IsConnected(), a wait that failed does not; the
   //   descriptor stays open.
-  // Blocks for `timeout` seconds a wait; a small buffered read that gets nothing makes seven.
+  // Blocks for `timeout` seconds a wait; a small buffered read that gets nothing makes seven, and one
+  // that gets a part waits twice for the rest.
   int ReadData(char* buf, int len);
 
   // Writes `len` bytes.
@@ -119,6 +120,7 @@ class TARNWICK_API TWSocket {
   // next read begins after that.
   // Results: the length stored; -1 when a read failed, when the stream ended behind a carriage
   //   return, and when `buf` is null or `bufLen` not positive; `buf` is then not terminated.
+  // Blocks as a read of one byte does, for each byte that is missing.
   int ReadToLineEnd(char* buf, int bufLen);
 
   // Pushes `len` bytes back: the next reads return them before what is buffered already.
@@ -133,7 +135,7 @@ class TARNWICK_API TWSocket {
   bool HasDataToRead(int timeout);
 
  protected:
-  static constexpr int kReadBufSize = 65536;
+  static constexpr int kReadBufSize = 65536;  // bytes
 
   int m_sockFd;  // -1: none
   std::string m_strHost;
@@ -148,14 +150,22 @@ class TARNWICK_API TWSocket {
   unsigned int m_srcAddr;  // network byte order; 0: not bound
 
  private:
+  friend class SocketAccess;  // net/socket_access.h: what the library's own client may do besides
+  struct UnsetBuffer {};
+  TARNWICK_LOCAL explicit TWSocket(UnsetBuffer unset);
+
   TARNWICK_LOCAL void CloseFd();
+  TARNWICK_LOCAL bool IsPlain() const;
   TARNWICK_LOCAL void ClearReadBuf();
+  TARNWICK_LOCAL void ForgetTaken();
   TARNWICK_LOCAL int BindRemoteAddr();
   TARNWICK_LOCAL bool ConnectWithTimeout(const struct addrinfo* address);
 
   TARNWICK_LOCAL int ReadDirect(char* buf, int len);
   TARNWICK_LOCAL int ReadBuffered(char* buf, int len);
   TARNWICK_LOCAL int TakeBuffered(char* buf, int len);
+  TARNWICK_LOCAL int TakeLineStart(char* buf, int room);
+  TARNWICK_LOCAL bool TakeLineEnd();
   TARNWICK_LOCAL bool ReadStraight(char* buf, int len, int* done);
   TARNWICK_LOCAL bool MayRetry(int retries);
   TARNWICK_LOCAL bool WaitReadable();

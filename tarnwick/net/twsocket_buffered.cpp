@@ -1,6 +1,7 @@
 // Reading: straight from the descriptor, and through the read-ahead and push-back buffer.
 #define TW_LOG_SOURCE "twsocket"
 
+#include <algorithm>
 #include <cerrno>
 #include <cstring>
 
@@ -17,6 +18,10 @@ constexpr int kPushBackRoom = 1024;
 
 // A request of this size goes straight to the caller's memory, which saves a copy.
 constexpr int kStraightSize = 1024;
+
+// How far a line is looked at in one go. More would go over the same bytes again and again where
+// the lines are short and all end in the same of the two characters.
+constexpr int kScanSize = 256;
 
 // How often a small read that delivered nothing is tried again.
 constexpr int kMaxRetries = 6;
@@ -41,7 +46,7 @@ int TWSocket::ReadBuffered(char* buf, int len) {
   int done = 0;
   for (int retries = 0; m_readLen < len - done;) {
     done += TakeBuffered(buf + done, m_readLen);
-    m_readPos = 0;
+    ForgetTaken();
     if (!ReadStraight(buf, len, &done)) return -1;
     if (done == len) return len;
     if (!WaitReadable()) return -1;
@@ -68,6 +73,37 @@ int TWSocket::TakeBuffered(char* buf, int len) {
   m_readPos += len;
   m_readLen -= len;
   return len;
+}
+
+// Begins the buffer anew when all of it has been taken.
+void TWSocket::ForgetTaken() {
+  if (IsPlain()) std::memset(m_readBuf, 0, static_cast<size_t>(m_readPos));
+  m_readPos = 0;
+}
+
+// Moves bytes of a line to the caller, at most `room`, of which none ends it. It may stop early:
+// what comes next is read byte by byte, with all that such a read does at the end of the buffer.
+int TWSocket::TakeLineStart(char* buf, int room) {
+  const size_t size = static_cast<size_t>(std::max(std::min({m_readLen, room, kScanSize}), 0));
+  const char* const begin = m_readBuf + m_readPos;
+  const void* end = std::memchr(begin, '\n', size);
+  size_t length =
+      end != nullptr ? static_cast<size_t>(static_cast<const char*>(end) - begin) : size;
+  end = std::memchr(begin, '\r', length);
+  if (end != nullptr) length = static_cast<size_t>(static_cast<const char*>(end) - begin);
+  return TakeBuffered(buf, static_cast<int>(length));
+}
+
+// Takes the end of a line, as two reads of a byte would, when these two are buffered.
+bool TWSocket::TakeLineEnd() {
+  if (m_readLen < 2) return false;
+  const char first = m_readBuf[m_readPos];
+  if (first != '\r' && first != '\n') return false;
+  const int size = first == '\r' ? 2 : 1;
+  m_bEOF = false;
+  m_readPos += size;
+  m_readLen -= size;
+  return true;
 }
 
 // Reads into the caller's memory while much is missing. After an error or the end of the stream the
@@ -121,10 +157,11 @@ int TWSocket::RestoreData(char* data, int len) {
   if (!m_bBuffered) return 0;
   if (data == nullptr || len < 0 || len > kReadBufSize - m_readLen) return -1;
   const size_t size = static_cast<size_t>(len);
-  if (m_readLen > 0) {
-    std::memmove(m_readBuf + size, m_readBuf + m_readPos, static_cast<size_t>(m_readLen));
-  }
+  const size_t unread = static_cast<size_t>(m_readLen);
+  const size_t pos = static_cast<size_t>(m_readPos);
+  if (unread > 0) std::memmove(m_readBuf + size, m_readBuf + pos, unread);
   std::memcpy(m_readBuf, data, size);
+  if (IsPlain() && pos > size) std::memset(m_readBuf + size + unread, 0, pos - size);
   m_readPos = 0;
   m_readLen += len;
   return 0;

@@ -79,6 +79,10 @@ int TWSocket::ReadToLineEnd(char* buf, int bufLen) {
   if (buf == nullptr || bufLen <= 0) return -1;
   int length = 0;
   for (;;) {
+    if (m_bBuffered) {
+      length += TakeLineStart(buf + length, bufLen - 1 - length);
+      if (TakeLineEnd()) break;
+    }
     char byte;
     const int count = ReadData(&byte, 1);
     if (count < 0) return -1;

@@ -15,7 +15,8 @@ size_t FdSet::WordsFor(int fd) {
   return static_cast<size_t>(fd) / NFDBITS + 1;
 }
 
-FdSet::FdSet(int fd) : m_fd(fd), m_small(), m_words(m_small.fds_bits) {
+// Fill sets all the words that select looks at.
+FdSet::FdSet(int fd) : m_fd(fd), m_words(m_small.fds_bits) {
   if (fd < FD_SETSIZE) return;
   m_large.reset(static_cast<fd_mask*>(std::calloc(WordsFor(fd), sizeof(fd_mask))));
   m_words = m_large.get();

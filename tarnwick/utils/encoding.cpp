@@ -1,58 +1,74 @@
 // Percent-encoding, base64, hex, decimal and time-stamp text.
 #include <cctype>
+#include <cstdint>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
 #include <ctime>
+#include <new>
 
 #include "tarnwick/utils/utils.h"
 
 namespace {
 
 // Wider than the unreserved characters of RFC 3986: cameras take these in query values as they are.
-constexpr char kUnescaped[] = "_~()*,-.";
-
-bool IsUnescaped(unsigned char byte) {
-  return std::isalnum(byte) != 0 || (byte != 0 && std::strchr(kUnescaped, byte) != nullptr);
-}
-
-void AppendEscape(unsigned char byte, std::string* out) {
-  constexpr char kDigits[] = "0123456789ABCDEF";
-  out->push_back('%');
-  out->push_back(kDigits[byte >> 4]);
-  out->push_back(kDigits[byte & 15]);
-}
-
-void AppendEncoded(unsigned char byte, const std::string& keep, std::string* out) {
-  if (IsUnescaped(byte)) {
-    out->push_back(static_cast<char>(byte));
-  } else if (std::isspace(byte) != 0) {
-    out->append("%20");  // tabs and line ends too: no request line may hold them
-  } else if (keep.find(static_cast<char>(byte)) != std::string::npos) {
-    out->push_back(static_cast<char>(byte));
-  } else {
-    AppendEscape(byte, out);
+// The one bit set for each of them, 64 characters a word.
+constexpr uint64_t MarkBits(int word) {
+  uint64_t bits = 0;
+  for (const char c : {'_', '~', '(', ')', '*', ',', '-', '.'}) {
+    if (c / 64 == word) bits |= uint64_t{1} << (c % 64);
   }
+  return bits;
+}
+constexpr uint64_t kMarks[4] = {MarkBits(0), MarkBits(1), 0, 0};
+
+bool IsMark(unsigned char byte) {
+  return (kMarks[byte / 64] >> (byte % 64) & 1) != 0;
+}
+
+char* WriteEscape(unsigned char byte, char* out) {
+  constexpr char kDigits[] = "0123456789ABCDEF";
+  out[0] = '%';
+  out[1] = kDigits[byte >> 4];
+  out[2] = kDigits[byte & 15];
+  return out + 3;
 }
 
 constexpr char kBase64[] = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789+/";
 
-// Encodes 1 to 3 bytes as 4 characters.
-void EncodeGroup(const unsigned char* in, size_t count, char* out) {
-  const unsigned second = count > 1 ? in[1] : 0U;
-  const unsigned third = count > 2 ? in[2] : 0U;
-  out[0] = kBase64[in[0] >> 2];
-  out[1] = kBase64[(in[0] & 3U) << 4 | second >> 4];
-  out[2] = count > 1 ? kBase64[(second & 15U) << 2 | third >> 6] : '=';
-  out[3] = count > 2 ? kBase64[third & 63U] : '=';
+// Encodes 3 bytes as 4 characters.
+void EncodeGroup(unsigned first, unsigned second, unsigned third, char* out) {
+  const unsigned bits = first << 16 | second << 8 | third;
+  out[0] = kBase64[bits >> 18];
+  out[1] = kBase64[bits >> 12 & 63U];
+  out[2] = kBase64[bits >> 6 & 63U];
+  out[3] = kBase64[bits & 63U];
 }
 
 }  // namespace
 
 std::string UrlEncode(std::string text, std::string keep) {
-  std::string result;
-  result.reserve(text.size());
-  for (const char c : text) AppendEncoded(static_cast<unsigned char>(c), keep, &result);
+  // What isalnum and isspace look up in the process's locale, without two calls a byte.
+  const unsigned short* const classes = *__ctype_b_loc();
+  if (text.size() > text.max_size() / 3) throw std::bad_alloc();
+  std::string result(3 * text.size(), '\0');
+  char* out = &result[0];
+  for (const char c : text) {
+    const auto byte = static_cast<unsigned char>(c);
+    const unsigned classOf = classes[byte];
+    if ((classOf & _ISalnum) != 0 || IsMark(byte)) {
+      *out++ = c;
+      continue;
+    }
+    // Tabs and line ends become blanks too, whatever `keep` holds: no request line may have them.
+    const bool isSpace = (classOf & _ISspace) != 0;
+    if (!keep.empty() && !isSpace && keep.find(c) != std::string::npos) {
+      *out++ = c;
+    } else {
+      out = WriteEscape(isSpace ? ' ' : byte, out);
+    }
+  }
+  result.resize(static_cast<size_t>(out - result.data()));
   return result;
 }
 
@@ -61,9 +77,17 @@ char* Base64Encode(const char* text) {
   const size_t length = std::strlen(text);
   char* const result = static_cast<char*>(std::malloc((length + 2) / 3 * 4 + 1));
   if (result == nullptr) return nullptr;
+  const auto* in = reinterpret_cast<const unsigned char*>(text);
   char* out = result;
-  for (size_t done = 0; done < length; done += 3, out += 4) {
-    EncodeGroup(reinterpret_cast<const unsigned char*>(text) + done, length - done, out);
+  for (const unsigned char* const end = in + length / 3 * 3; in != end; in += 3, out += 4) {
+    EncodeGroup(in[0], in[1], in[2], out);
+  }
+  const size_t rest = length % 3;
+  if (rest != 0) {
+    EncodeGroup(in[0], in[1], 0, out);  // behind a single byte stands the text's own zero
+    if (rest == 1) out[2] = '=';
+    out[3] = '=';
+    out += 4;
   }
   *out = '\0';
   return result;
@@ -71,13 +95,13 @@ char* Base64Encode(const char* text) {
 
 std::string Md5ToHex(const unsigned char* digest) {
   constexpr char kDigits[] = "0123456789abcdef";
-  std::string hex;
-  if (digest == nullptr) return hex;
-  for (int i = 0; i < 16; ++i) {
-    hex.push_back(kDigits[digest[i] >> 4]);
-    hex.push_back(kDigits[digest[i] & 15]);
+  if (digest == nullptr) return std::string();
+  char hex[32];
+  for (size_t i = 0; i < 16; ++i) {
+    hex[2 * i] = kDigits[digest[i] >> 4];
+    hex[2 * i + 1] = kDigits[digest[i] & 15];
   }
-  return hex;
+  return std::string(hex, sizeof(hex));
 }
 
 std::string IntToString(int64_t value) {

@@ -1,11 +1,23 @@
 // Removing, trimming and copying characters.
-#include <algorithm>
 #include <cstring>
 
 #include "tarnwick/utils/utils.h"
 
+// Moves what stands between two of them at once: replies of megabytes have lines of some dozen
+// bytes.
 void RemoveChar(std::string& text, char ch) {
-  text.erase(std::remove(text.begin(), text.end(), ch), text.end());
+  char* out = &text[0];
+  const char* in = out;
+  for (const char* const end = in + text.size(); in < end;) {
+    const size_t left = static_cast<size_t>(end - in);
+    const void* const found = std::memchr(in, ch, left);
+    const size_t size =
+        found != nullptr ? static_cast<size_t>(static_cast<const char*>(found) - in) : left;
+    if (out != in) std::memmove(out, in, size);
+    out += size;
+    in += size + 1;
+  }
+  text.resize(static_cast<size_t>(out - text.data()));
 }
 
 std::string TrimString(std::string text, const char* set) {

@@ -1,0 +1,116 @@
+#include "bench/compare/exchange.h"
+
+#include <openssl/evp.h>
+
+#include <algorithm>
+#include <cstdio>
+
+namespace {
+
+constexpr char kJson[] =
+    "{\"data\":{\"id\":7,\"name\":\"front door\",\"on\":true},\"success\":true}";
+
+std::string Envelope(size_t size) {
+  std::string body = "<e:Envelope xmlns:e=\"urn:e\" xmlns:tt=\"urn:tt\"><e:Body>";
+  while (body.size() < size - 100) body += "\r\n  <tt:Item Name=\"fps\" Value=\"25\"/>";
+  return body + "</e:Body></e:Envelope>";
+}
+
+Exchange Get(const std::string& path, const std::string& reply) {
+  return {Exchange::kGet, false, false, path, "", "", reply};
+}
+
+}  // namespace
+
+Exchange JsonGet() {
+  return Get("/json", kJson);
+}
+
+Exchange DigestGet() {
+  Exchange exchange = Get("/digest", kJson);
+  exchange.kind = Exchange::kDigestGet;
+  return exchange;
+}
+
+Exchange FormPost() {
+  return {Exchange::kForm,
+          false,
+          false,
+          "/form",
+          "application/x-www-form-urlencoded; charset=utf-8",
+          "name=front+door&fps=25&on=1",
+          ""};
+}
+
+Exchange SoapPost() {
+  return {Exchange::kSoap, false,         false, "/soap", "application/soap+xml; charset=utf-8",
+          Envelope(4096),  Envelope(4096)};
+}
+
+Exchange TlsGet() {
+  Exchange exchange = JsonGet();
+  exchange.tls = true;
+  return exchange;
+}
+
+Exchange BodyGet(size_t size, bool chunked) {
+  Exchange exchange =
+      Get((chunked ? "/chunked/" : "/body/") + std::to_string(size), BodyText(size));
+  exchange.chunked = chunked;
+  return exchange;
+}
+
+Exchange TlsBodyGet(size_t size) {
+  Exchange exchange = BodyGet(size, false);
+  exchange.tls = true;
+  return exchange;
+}
+
+Exchange Upload() {
+  return {Exchange::kUpload,          false, false, "/upload", "application/octet-stream", "",
+          std::to_string(kUploadSize)};
+}
+
+std::string BodyText(size_t size) {
+  std::string block;
+  for (size_t i = 0; i < 4093; ++i) block += static_cast<char>('A' + i * 7 % 26);
+  std::string text;
+  text.reserve(size + block.size());
+  while (text.size() < size) text += block;
+  text.resize(size);
+  return text;
+}
+
+std::string Chunked(const std::string& body, size_t chunk) {
+  std::string text;
+  for (size_t done = 0; done < body.size();) {
+    const size_t size = std::min(chunk, body.size() - done);
+    char line[32];
+    std::snprintf(line, sizeof(line), "%zx\r\n", size);
+    text.append(line).append(body, done, size).append("\r\n");
+    done += size;
+  }
+  return text + "0\r\n\r\n";
+}
+
+std::string Md5Hex(const std::string& text) {
+  unsigned char digest[EVP_MAX_MD_SIZE];
+  unsigned int size = 0;
+  EVP_Digest(text.data(), text.size(), digest, &size, EVP_md5(), nullptr);
+  std::string hex;
+  for (unsigned int i = 0; i < size; ++i) {
+    hex += "0123456789abcdef"[digest[i] >> 4];
+    hex += "0123456789abcdef"[digest[i] & 15];
+  }
+  return hex;
+}
+
+std::string DigestLine(const std::string& path) {
+  const std::string user = kUser, realm = kRealm, nonce = kNonce;
+  const std::string secret = Md5Hex(user + ":" + realm + ":" + kPassword);
+  const std::string request = Md5Hex("GET:" + path);
+  const std::string response = Md5Hex(secret + ":" + nonce + ":00000001:0a4f113b:auth:" + request);
+  return "Authorization: Digest username=\"" + user + "\", realm=\"" + realm + "\", nonce=\"" +
+         nonce + "\", uri=\"" + path + "\", response=\"" + response +
+         "\", qop=auth, nc=00000001, cnonce=\"0a4f113b\"";
+}

@@ -1,0 +1,24 @@
+// The command line of tarnwick_compare.
+#ifndef TARNWICK_BENCH_COMPARE_OPTIONS_H_
+#define TARNWICK_BENCH_COMPARE_OPTIONS_H_
+
+#include <string>
+#include <vector>
+
+struct Options {
+  bool list = false;
+  int rounds = 25;
+  double roundSeconds = 0.05;         // of each contender
+  int seconds = 60;                   // for all rounds of a work
+  std::vector<std::string> selected;  // sections and works; empty for all
+
+  // One measurement, for the process that looks at memory; null otherwise.
+  const char* work = nullptr;
+  const char* contender = nullptr;
+  int count = 0;
+};
+
+// Results: false for a wrong command line, behind the usage on stderr.
+bool ParseOptions(int argc, char** argv, Options* options);
+
+#endif  // TARNWICK_BENCH_COMPARE_OPTIONS_H_

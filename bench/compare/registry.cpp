@@ -1,0 +1,133 @@
+// What there is to compare.
+#include <algorithm>
+#include <chrono>
+#include <cstdio>
+#include <cstdlib>
+
+#include "bench/compare/contender.h"
+
+namespace {
+
+constexpr size_t kKiB = size_t{1} << 10;
+constexpr size_t kMiB = size_t{1} << 20;
+
+// The order of the tables.
+constexpr const char* kContenders[] = {
+    kFloor,  kRequired,     "dependencies", kLibrary, "libcurl",   "cpp-httplib", "Poco",
+    "Beast", "std::remove", "spdlog",       "glog",   "log4cplus", "syslog",
+};
+
+size_t RankOf(const std::string& contender) {
+  const auto found = std::find(std::begin(kContenders), std::end(kContenders), contender);
+  Expect(found != std::end(kContenders), contender.c_str(), "has no place in the order");
+  return static_cast<size_t>(found - std::begin(kContenders));
+}
+
+Registry* MutableRegistry() {
+  static Registry registry;
+  return &registry;
+}
+
+}  // namespace
+
+const std::vector<Work>& AllWorks() {
+  constexpr Unit kNs = Unit::kNanoseconds;
+  static const std::vector<Work> works = {
+      {"log", "log_disabled", kNs, 0, 0, true},
+      {"log", "log_disabled_record", kNs, 0, 0, false},
+      {"log", "log_line", kNs, 0, 2000, false},
+      {"log", "log_line_4_processes", kNs, 0, 16000, false},
+      {"log", "log_line_16_processes", kNs, 0, 32000, false},
+      {"request", "json_get", kNs, 0, 0, false},
+      {"request", "digest_get", kNs, 0, 0, false},
+      {"request", "form_post", kNs, 0, 0, false},
+      {"request", "soap_post_4k", kNs, 0, 0, false},
+      {"parse", "head_30", kNs, 0, 0, false},
+      {"parse", "lines", kNs, 60000, 0, false},
+      {"parse", "chunked_64", kNs, kMiB, 0, false},
+      {"parse", "chunked_4k", kNs, kMiB, 0, false},
+      {"parse", "line_ends_1m", kNs, kMiB, 0, false},
+      {"parse", "line_ends_16m", kNs, 16 * kMiB, 0, false},
+      {"body", "body_1m", kNs, kMiB, 0, false},
+      {"body", "body_64m", kNs, 64 * kMiB, 0, false},
+      {"body", "body_chunked_1m", kNs, kMiB, 0, false},
+      {"body", "body_chunked_64m", kNs, 64 * kMiB, 0, false},
+      {"body", "pieces_64m", kNs, 64 * kMiB, 0, false},
+      {"tls", "tls_get", kNs, 0, 0, false},
+      {"tls", "tls_body_16m", kNs, 16 * kMiB, 0, false},
+      {"upload", "upload_256m", kNs, 256 * kMiB, 1, false},
+      {"upload", "upload_memory", Unit::kBytes, 0, 1, true},
+      {"encoding", "url_encode_64", kNs, 64, 0, false},
+      {"encoding", "url_encode_4k", kNs, 4 * kKiB, 0, false},
+      {"encoding", "base64_32", kNs, 32, 0, false},
+      {"encoding", "base64_4k", kNs, 4 * kKiB, 0, false},
+      {"idle", "idle_64", Unit::kBytes, 0, 64, true},
+      {"idle", "idle_1000", Unit::kBytes, 0, 1000, true},
+      {"load", "load", kNs, 0, 1, false},
+  };
+  return works;
+}
+
+double TimedContender::Measure(int count) {
+  const auto start = std::chrono::steady_clock::now();
+  Run(count);
+  const auto end = std::chrono::steady_clock::now();
+  return std::chrono::duration<double, std::nano>(end - start).count() / count;
+}
+
+void Registry::Add(const std::string& work, const std::string& contender, Maker make) {
+  const auto& works = AllWorks();
+  const bool known = std::any_of(works.begin(), works.end(),
+                                 [&](const Work& candidate) { return work == candidate.name; });
+  Expect(known, work.c_str(), "is no work");
+  RankOf(contender);
+  m_entries.push_back({work, {contender, std::move(make)}});
+}
+
+void Registry::AddTimed(const std::string& work, const std::string& contender,
+                        std::function<void(int count)> operation) {
+  class Operation : public TimedContender {
+   public:
+    explicit Operation(std::function<void(int)> run) : m_run(std::move(run)) {}
+
+   private:
+    void Run(int count) override { m_run(count); }
+    const std::function<void(int)> m_run;
+  };
+  Add(work, contender, [operation] { return std::make_unique<Operation>(operation); });
+}
+
+std::vector<Registry::Entry> Registry::Of(const std::string& work) const {
+  std::vector<Entry> entries;
+  for (const Registered& registered : m_entries) {
+    if (registered.work == work) entries.push_back(registered.entry);
+  }
+  std::sort(entries.begin(), entries.end(), [](const Entry& a, const Entry& b) {
+    return RankOf(a.contender) < RankOf(b.contender);
+  });
+  return entries;
+}
+
+std::vector<std::string> Registry::LeftOut() const {
+  std::vector<std::string> names;
+  for (const char* contender : kContenders) {
+    const bool does = std::any_of(
+        m_entries.begin(), m_entries.end(),
+        [&](const Registered& registered) { return registered.entry.contender == contender; });
+    if (!does) names.emplace_back(contender);
+  }
+  return names;
+}
+
+Family::Family(void (*add)(Registry*)) {
+  add(MutableRegistry());
+}
+
+const Registry& AllContenders() {
+  return *MutableRegistry();
+}
+
+void Fail(const char* contender, const std::string& what) {
+  std::fprintf(stderr, "tarnwick_compare: %s %s\n", contender, what.c_str());
+  std::exit(1);
+}

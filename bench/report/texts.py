@@ -1,0 +1,70 @@
+"""What the tables' words mean."""
+
+SECTIONS = {
+    "log": ("The log", "Calls at a level that is off, and lines in a file."),
+    "request": ("Small requests", "Each over a connection of its own, with the answer read."),
+    "parse": ("Parsing", "Bytes that are in memory already: no system call, no network."),
+    "body": ("Large bodies", "From the server into a string, or in pieces of 64 KiB."),
+    "tls": ("TLS", "Handshake, request and answer, with nobody asked who answers."),
+    "upload": ("Upload", "256 MiB in pieces of 64 KiB, until the server has them all."),
+    "encoding": ("Encodings", "Percent-encoding of a query's value, and base64."),
+    "idle": ("Idle clients", "Memory for each further client that stays after a small GET."),
+    "load": ("Loading", "Loading the shared library, in a process that has none yet."),
+}
+
+WORKS = {
+    "log_disabled": "a log call at a level that is off, without a record of levels",
+    "log_disabled_record": "the same with a record",
+    "log_line": "one line to the file",
+    "log_line_4_processes": "the same from 4 processes at once, for each line",
+    "log_line_16_processes": "the same from 16 processes at once, for each line",
+    "json_get": "GET of a small JSON document, parsed",
+    "digest_get": "GET that is asked for a Digest login",
+    "form_post": "POST of a form",
+    "soap_post_4k": "POST of a SOAP envelope of 4 KiB, answered by another",
+    "head_30": "a response's head of 30 lines",
+    "lines": "lines of 58 bytes",
+    "chunked_64": "a body of 1 MiB in chunks of 64 bytes",
+    "chunked_4k": "a body of 1 MiB in chunks of 4 KiB",
+    "line_ends_1m": "line ends out of a SOAP reply of 1 MiB",
+    "line_ends_16m": "line ends out of a SOAP reply of 16 MiB",
+    "body_1m": "1 MiB into a string",
+    "body_64m": "64 MiB into a string",
+    "body_chunked_1m": "1 MiB in chunks of 16 KiB into a string",
+    "body_chunked_64m": "64 MiB in chunks of 16 KiB into a string",
+    "pieces_64m": "64 MiB in pieces of 64 KiB",
+    "tls_get": "GET of a small JSON document",
+    "tls_body_16m": "16 MiB into a string",
+    "upload_256m": "256 MiB",
+    "upload_memory": "what the process grows by meanwhile",
+    "url_encode_64": "percent-encoding of 64 bytes",
+    "url_encode_4k": "percent-encoding of 4 KiB",
+    "base64_32": "base64 of 32 bytes",
+    "base64_4k": "base64 of 4 KiB",
+    "idle_64": "with 64 of them",
+    "idle_1000": "with 1,000 of them",
+    "load": "loading",
+}
+
+METHOD = """\
+Each work is done by all of its contenders in turn, round by round, so that all of them see the same
+machine; a ratio is the median of the rounds' ratios. Clients and the server, a small process that
+reads a request, writes a fixed answer and closes, share one processor: what is compared is the work
+of both without transfers between processors. The lines of several processes use all processors.
+Whoever delivers a wrong body, a torn line or too few of them ends the run.
+
+| contender | is |
+|---|---|
+| floor | the bare system calls in plain C, blocking; in memory, one plain pass |
+| required | the system calls that the library's interface asks for, and nothing else: a connect \
+that does not block with `select`, `fcntl`, `getsockopt` and `ioctl`; `select` in front of each \
+read and write; open, lock, stream, write, unlock and close for each line of the log |
+| library | this library |
+| libcurl, cpp-httplib, Poco, Beast | the same request with a client object and a connection of \
+its own |
+| spdlog, glog, log4cplus | a file that stays open, flushed at each line; log4cplus with its \
+lock file |
+| syslog | `syslog(3)` to rsyslogd: the caller's time, before the line is in the file |
+| dependencies | libcurl, OpenSSL, libxml2 and jsoncpp, which programs have anyway |
+| std::remove | the standard library's algorithm |
+"""

@@ -1,0 +1,131 @@
+// A plain socket clears of its buffer what it used. That the whole is then as clear as ever is held
+// here against everything that writes into it; sockets of derived classes clear all of it.
+#include <algorithm>
+#include <memory>
+#include <random>
+
+#include "tarnwick/net/socket_access.h"
+#include "tests/net/net_test_util.h"
+
+namespace {
+
+// The fields of a socket that is of no derived class.
+struct Inside : TWSocket {
+  static char* Buffer(TWSocket* socket) { return socket->*(&Inside::m_readBuf); }
+  static int& Fd(TWSocket* socket) { return socket->*(&Inside::m_sockFd); }
+  static size_t Used(TWSocket* socket) {
+    return static_cast<size_t>(socket->*(&Inside::m_readPos) + socket->*(&Inside::m_readLen));
+  }
+};
+
+bool IsZeroFrom(TWSocket* socket, size_t from) {
+  const char* const begin = Inside::Buffer(socket);
+  return std::all_of(begin + from, begin + 65536, [](char byte) { return byte == 0; });
+}
+
+// Connects the socket to the peer whose descriptor is the result.
+int ConnectToPeer(TWSocket* socket) {
+  int ends[2] = {-1, -1};
+  EXPECT_EQ(socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0, ends), 0);
+  Inside::Fd(socket) = ends[0];
+  socket->PostConnect();
+  return ends[1];
+}
+
+void PeerSends(int peer, const std::string& bytes) {
+  EXPECT_EQ(send(peer, bytes.data(), bytes.size(), MSG_NOSIGNAL),
+            static_cast<ssize_t>(bytes.size()));
+}
+
+// One of the operations that change the buffer.
+void Operate(TWSocket* socket, int peer, std::mt19937* random) {
+  std::string data((*random)() % 3000 + 1, 'd');
+  switch ((*random)() % 4) {
+    case 0:
+      PeerSends(peer, data);
+      break;
+    case 1:
+      socket->RestoreData(data.data(), static_cast<int>(data.size() % 800));
+      break;
+    case 2:
+      if (Inside::Used(socket) > 0) ReadLine(*socket, data.size());
+      break;
+    default:
+      ReadSome(*socket, data.size());
+  }
+}
+
+TEST(Clearing, BehindThePlainSocketsUnreadBytesThereAreOnlyZeros) {
+  for (unsigned seed = 0; seed < 50; ++seed) {
+    SCOPED_TRACE(seed);
+    std::mt19937 random(seed);
+    const auto socket = std::make_unique<TWSocket>("pair", 0, 0, true);
+    const int peer = ConnectToPeer(socket.get());
+    for (int i = 0; i < 60; ++i) {
+      Operate(socket.get(), peer, &random);
+      ASSERT_TRUE(IsZeroFrom(socket.get(), Inside::Used(socket.get())));
+    }
+    socket->Disconnect();
+    ASSERT_TRUE(IsZeroFrom(socket.get(), 0));
+    close(peer);
+  }
+}
+
+TEST(Clearing, SetSocketInfoLeavesNothingOfAnEarlierConnection) {
+  const auto socket = std::make_unique<TWSocket>("pair", 0, 0, true);
+  const int peer = ConnectToPeer(socket.get());
+  PeerSends(peer, std::string(60000, 's'));
+  EXPECT_EQ(ReadSome(*socket, 10).result, 10);
+  socket->SetSocketInfo("other", 1, 2, true);
+  EXPECT_TRUE(IsZeroFrom(socket.get(), 0));
+  close(peer);
+}
+
+TEST(Clearing, WhatDirectModeLeftBehindGoesWithTheNextBufferedConnection) {
+  const auto socket = std::make_unique<TWSocket>("pair", 0, 0, true);
+  const int peer = ConnectToPeer(socket.get());
+  PeerSends(peer, std::string(5000, 's'));
+  EXPECT_EQ(ReadSome(*socket, 10).result, 10);
+  socket->SetSocketInfo("direct", 1, 2, false);
+  socket->Disconnect();
+  EXPECT_EQ(Inside::Buffer(socket.get())[4999], 's');
+  socket->SetSocketInfo("buffered", 1, 2, true);
+  EXPECT_TRUE(IsZeroFrom(socket.get(), 0));
+  close(peer);
+}
+
+// A read that says less than it wrote, as one that decodes in place does.
+class Scribbler : public PairedSocket {
+ public:
+  Scribbler() : PairedSocket(0, true) {}
+  int _Read(void* buf, unsigned int len) override {
+    memset(buf, 's', len);
+    return 1;
+  }
+};
+
+TEST(Clearing, OfADerivedClassesSocketIsOfTheWholeBuffer) {
+  const auto socket = std::make_unique<Scribbler>();
+  EXPECT_EQ(ReadSome(*socket, 1), (Delivered{1, "s"}));
+  socket->m_readBuf[65535] = 's';
+  socket->Disconnect();
+  EXPECT_TRUE(IsZeroFrom(socket.get(), 0));
+}
+
+TEST(Clearing, TheClientsSocketForgetsWhatItReadAndStartsLikeAnyOther) {
+  const std::unique_ptr<TWSocket> socket(SocketAccess::MakePlain());
+  const PlainSocket fresh;
+  EXPECT_EQ(Inside::Fd(socket.get()), fresh.m_sockFd);
+  EXPECT_EQ(Inside::Used(socket.get()), 0u);
+  EXPECT_FALSE(socket->IsConnected() || socket->IsEOF());
+  socket->SetSocketInfo("pair", 0, 0, true);
+  const int peer = ConnectToPeer(socket.get());
+  PeerSends(peer, std::string(3000, 's'));
+  EXPECT_EQ(ReadSome(*socket, 10).result, 10);
+  socket->Disconnect();
+  const char* const begin = Inside::Buffer(socket.get());
+  EXPECT_TRUE(std::all_of(begin, begin + 3000, [](char byte) { return byte == 0; }));
+  close(peer);
+}
+
+}  // namespace
