@@ -85,7 +85,7 @@ def test_bash_offers_everything_for_nothing_typed(scripts):
     def offered(line):
         return lines_of(["bash", "-uc", BASH, "bash", scripts / "bash/twlogctl", line])
 
-    assert {"status", "set", "follow", "show", "stats", "top", "doctor"} <= set(offered("twlogctl "))
+    assert {"status", "set", "follow", "show", "top", "doctor"} <= set(offered("twlogctl "))
     assert len(offered("twlogctl write -c ")) == CATEGORIES
     assert offered("twlogctl write -l ") == LEVELS
     assert len(offered("twlogctl set ")) == CATEGORIES + 1
@@ -93,11 +93,23 @@ def test_bash_offers_everything_for_nothing_typed(scripts):
     assert offered("twlogctl create --group ") == []
 
 
+def test_a_file_is_completed_from_what_is_there(scripts, tmp_path):
+    need("fish")
+    (tmp_path / "some.log").touch()
+    (tmp_path / "other.log").touch()
+    line = f"twlogctl show --file {tmp_path}/so"
+    bash = ["bash", "-uc", BASH, "bash", scripts / "bash/twlogctl", line]
+    code = f"source {scripts}/fish/twlogctl.fish; complete -C '{line}'"
+    fish = ["fish", "--no-config", "-c", code]
+    for words in (bash, fish):
+        assert lines_of(words) == [f"{tmp_path}/some.log"]
+
+
 def test_bash_completes_at_its_prompt(scripts):
-    shell = pexpect.spawn(
-        "bash", ["--norc", "--noprofile"], encoding="utf-8", timeout=HANG, env={**os.environ, "PS1": "> "}
-    )
-    shell.sendline(f"bind 'set enable-bracketed-paste off'; twlogctl() {{ echo \"<$*>\"; }}; source {scripts}/bash/twlogctl")
+    words = ["--norc", "--noprofile"]
+    shell = pexpect.spawn("bash", words, encoding="utf-8", timeout=HANG)
+    shell.sendline(f"twlogctl() {{ echo \"<$*>\"; }}; source {scripts}/bash/twlogctl; echo re''ady")
+    shell.expect_exact("ready")
     shell.send("twlogctl se\tht\tdebug3 sock\tal\t\r")
     shell.expect_exact("<set http=debug3 socket=alarm>")
     shell.close(force=True)

@@ -54,7 +54,8 @@ def plain_environment():
 @pytest.fixture(scope="session")
 def tools():
     """The path of each built tool."""
-    folder = pathlib.Path(os.environ.get("TARNWICK_TOOLS_DIR", ROOT / "build/debug/tools")).resolve()
+    named = os.environ.get("TARNWICK_TOOLS_DIR", ROOT / "build/debug/tools")
+    folder = pathlib.Path(named).resolve()
     return {name: str(folder / name / name) for name in TOOLS}
 
 

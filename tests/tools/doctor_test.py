@@ -79,7 +79,7 @@ def only(wrong, check):
 
 @pytest.fixture
 def other_process():
-    """other_process(code, *args): a Python program that has printed "ready"; ended with the test."""
+    """other_process(code, *args): a Python program that has printed "ready"; the test ends it."""
     children = []
 
     def begin(code, *args, prefix=(), **options):
@@ -353,6 +353,11 @@ def test_a_daemon_that_has_not_attached_the_record(doctor, healthy, other_proces
     finding = only(doctor(), "daemons")
     assert f"python3 ({daemon.pid}) has not attached the record" in finding["text"]
     assert finding["fix"] == "start python3 again"
+
+
+def test_a_daemon_of_another_container_is_left_out(doctor, healthy, other_process, library):
+    other_process(HAVE_LIBRARY, library, prefix=["unshare", "--ipc"])
+    assert doctor() == {}
 
 
 def test_create_names_the_daemons_that_run_without_the_record(run, other_process, library):

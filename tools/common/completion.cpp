@@ -56,15 +56,15 @@ class ModelBuilder {
   }
 
   CompletedValue Value(const std::string& name, const std::string& command) {
-    for (std::string key : {command + ":" + name, name}) {
-      const auto words = m_words.find(key);
-      if (words == m_words.end()) continue;
-      key += "=";
-      const auto assigned = m_words.find(key);
-      return {words->second,
-              assigned == m_words.end() ? std::vector<std::string>() : assigned->second};
-    }
-    return {};
+    std::string own = command;
+    own += ":" + name;
+    const std::string& key = m_words.count(own) > 0 ? own : name;
+    return {WordsOf(key), WordsOf(key + "=")};
+  }
+
+  std::vector<std::string> WordsOf(const std::string& key) {
+    const auto words = m_words.find(key);
+    return words == m_words.end() ? std::vector<std::string>() : words->second;
   }
 
   const CompletionWords& m_words;

@@ -111,8 +111,8 @@ constexpr char kBashHead[] = R"sh(_PROGRAM() {
   fi
   typed=("${typed[@]:1}"))sh";
 
-// Readline takes the characters of COMP_WORDBREAKS for the ends of words, so what stands in front of
-// the last one must not be in the candidates.
+// Readline takes the characters of COMP_WORDBREAKS for the ends of words, so what stands in
+// front of the last one must not be in the candidates.
 constexpr char kBashTail[] = R"sh(
   if [[ -n $waiting ]]; then
     place=$command:$waiting

@@ -19,8 +19,8 @@ std::vector<std::string> CategoryNames();
 std::vector<std::string> LevelNames();
 
 // The three names at most that differ least from `text` (edit distance), the nearest first; none
-// when all of them differ by more than half of their letters. Further ones than one letter more than
-// the nearest are left out.
+// when all of them differ by more than half of their letters. Those that
+// differ by two letters more than the nearest are left out.
 std::vector<std::string> NearestNames(std::string_view text, const std::vector<std::string>& names);
 
 // A span from "90", "90s", "10m", "1.5h", "2d" or "250ms"; without a unit, seconds. Nothing for a

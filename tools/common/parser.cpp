@@ -14,7 +14,8 @@ std::string NameWithCommand(const CLI::App& app) {
   return app.get_name() + (parsed.empty() ? "" : " " + parsed.front()->get_name());
 }
 
-// A word in the place of the sub-command that is none; without this, the parser would only miss one.
+// A word in the place of the sub-command that is none; without this, the parser would only miss
+// one.
 // Results: empty when the mistake is another one.
 std::string UnknownCommand(const CLI::App& app, int argc, char** argv) {
   std::vector<std::string> names;

@@ -1,27 +1,28 @@
 // Recorded exchanges: what a client and a server said, with its timing, in a folder.
 //
-// The folder holds exchanges.jsonl, a JSON object a line, in the order of the exchanges, and the raw
-// bytes that it names. Over TLS they are those inside:
+// The folder holds exchanges.jsonl, a JSON object a line, in the order of the exchanges, and the
+// raw bytes that it names. Over TLS they are those inside:
 //
 //   {"number":1,"connection":1,"tls":false,"host":"192.0.2.7","port":80,"method":"GET",
 //    "target":"/info.cgi","request":"001.request","response":"001.response",
 //    "pieces":[{"delay_ms":12,"bytes":180},{"delay_ms":250,"bytes":4096}],
 //    "end":"close","end_delay_ms":3}
 //
-//   connection    counts from 1; exchanges of one number went over one connection, one after another
-//   request       as it was sent; the values of Authorization and Cookie lines may be masked, so its
-//                 length is no more than near the real one
+//   connection    counts from 1; exchanges of one number went over one connection, one after
+//                 another
+//   request       as it was sent; the values of Authorization and Cookie lines may be masked, so
+//                 its length is no more than near the real one
 //   pieces        how the response arrived: each so many milliseconds after the one before it, the
 //                 first after the last byte of the request; together they are the response file
 //   end           what became of the connection behind the last piece: "close" (the server closed
 //                 it), "reset" (it did so by a reset), "silent" (it kept it open and sent nothing
-//                 more, until the client gave up), "kept" (the client had all it wanted, or sent its
-//                 next request over it), "refused" and "unreachable" (there was none; no bytes
+//                 more, until the client gave up), "kept" (the client had all it wanted, or sent
+//                 its next request over it), "refused" and "unreachable" (there was none; no bytes
 //                 either), "tls" (the TLS handshake failed)
 //   end_delay_ms  from the last piece to that end
 //
-// Whoever plays a recording back sends the n-th response to the n-th request that comes, whatever it
-// asks, and begins again behind the last.
+// Whoever plays a recording back sends the n-th response to the n-th request that comes, whatever
+// it asks, and begins again behind the last.
 #ifndef TARNWICK_TOOLS_COMMON_RECORDING_H_
 #define TARNWICK_TOOLS_COMMON_RECORDING_H_
 
@@ -50,8 +51,8 @@ struct RecordedExchange {
   int64_t endDelayMs = 0;
 };
 
-// Writes `exchanges` into `folder`, which is created when missing; files of an earlier recording are
-// replaced.
+// Writes `exchanges` into `folder`, which is created when missing; files of an earlier recording
+// are replaced.
 // Results: false with the reason in `error`.
 bool WriteRecording(const std::string& folder, const std::vector<RecordedExchange>& exchanges,
                     std::string* error);

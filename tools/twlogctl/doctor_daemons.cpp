@@ -39,7 +39,8 @@ Credentials CredentialsOf(pid_t pid) {
   return credentials;
 }
 
-// What the mode alone says: access lists and capabilities of other users than root do not show in it.
+// What the mode alone says: access lists and capabilities of other users than root do not show
+// in it.
 bool MayDo(const Credentials& credentials, const struct stat& state, mode_t bits) {
   if (credentials.user == 0) return true;
   if (credentials.user == state.st_uid) return (state.st_mode >> 6 & bits) == bits;

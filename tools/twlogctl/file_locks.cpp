@@ -51,8 +51,8 @@ std::vector<std::string> LockNames(int fd) {
   return names;
 }
 
-// The pid of a line "1: FLOCK ADVISORY WRITE 812 08:01:131 0 EOF" for one of these files. A waiter's
-// line has "->" in the second place.
+// The pid of a line "1: FLOCK ADVISORY WRITE 812 08:01:131 0 EOF" for one of these files. A
+// waiter's line has "->" in the second place.
 bool HoldsOneOf(const std::string& line, const std::vector<std::string>& names, pid_t* pid) {
   std::istringstream fields(line);
   std::string number, type, advisory, kind, file;

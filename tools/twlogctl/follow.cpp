@@ -58,7 +58,7 @@ class Follower {
  public:
   explicit Follower(const FollowOptions& options)
       : m_printer(options.json),
-        m_path(LogPath(options)),
+        m_path(FollowedPath(options)),
         m_selector(MakeFilter(options, Now(), Direction::kAhead), Now()),
         m_tail(m_path),
         m_absence(m_path) {}
@@ -67,8 +67,10 @@ class Follower {
 
  private:
   bool ShowExisting(std::optional<size_t> count);
+  void Take(std::string_view text, bool continues);
   void Poll();
   bool Ended();
+  int Finish();
   void Wait();
 
   LogPrinter m_printer;
@@ -100,12 +102,13 @@ bool Follower::ShowExisting(std::optional<size_t> count) {
   return false;
 }
 
+void Follower::Take(std::string_view text, bool continues) {
+  m_selector.Take(text, continues, [this](const LogMessage& message) { m_printer.Print(message); });
+}
+
 void Follower::Poll() {
   m_selector.Advance(Now());
-  m_tail.Poll([this](std::string_view text, bool continues) {
-    m_selector.Take(text, continues,
-                    [this](const LogMessage& message) { m_printer.Print(message); });
-  });
+  m_tail.Poll([this](std::string_view text, bool continues) { Take(text, continues); });
   m_absence.Look(m_tail.Error());
 }
 
@@ -120,10 +123,16 @@ void Follower::Wait() {
   WaitForLog(m_tail.Descriptor(), patience);
 }
 
+// The last message need not wait for further lines any more.
+int Follower::Finish() {
+  m_tail.Flush([this](std::string_view text, bool continues) { Take(text, continues); });
+  return m_printer.Flush() ? kExitDone : kExitWrong;
+}
+
 int Follower::Run(std::optional<size_t> count) {
   if (!ShowExisting(count)) return kExitWrong;
   while (m_printer.Flush()) {
-    if (Ended()) return kExitDone;
+    if (Ended()) return Finish();
     Wait();
     Poll();
   }

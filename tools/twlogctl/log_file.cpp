@@ -6,7 +6,7 @@
 
 namespace {
 
-constexpr size_t kPiece = 64 * 1024;
+constexpr size_t kPiece = size_t{64} * 1024;
 
 // Long enough to hold the time and the text of a line that nobody writes twice.
 constexpr size_t kMarkSize = 256;
@@ -63,6 +63,11 @@ off_t LogFile::Unread() const {
   struct stat status = {};
   if (fstat(m_fd.Get(), &status) != 0) return 0;
   return std::max<off_t>(status.st_size - m_offset, 0);
+}
+
+bool LogFile::Removed() const {
+  struct stat status = {};
+  return fstat(m_fd.Get(), &status) == 0 && status.st_nlink == 0;
 }
 
 bool LogFile::Is(const struct stat& status) const {

@@ -29,6 +29,9 @@ class LogFile {
   // How many bytes Read has not given out yet.
   off_t Unread() const;
 
+  // True when the file has no name any more.
+  bool Removed() const;
+
   // True when `status` is that of this file.
   bool Is(const struct stat& status) const;
 

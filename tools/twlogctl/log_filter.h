@@ -40,7 +40,7 @@ struct LogFilter {
   std::optional<Moment> until;  // exclusive
 
   // `line` is null for text that stands in front of a log's first message, `moment` that of `line`.
-  bool Wants(std::string_view text, const LogLine* line, std::optional<Moment> moment) const;
+  bool Wants(std::string_view message, const LogLine* line, std::optional<Moment> moment) const;
 
   bool WantsTime(std::optional<Moment> moment) const;
 

@@ -1,4 +1,5 @@
-// A reader of the writer's prefix: "%b %e %T[.%03ld] [pid][[tid]][[category][level]] file:line:func(): ".
+// A reader of what the library's writer puts in front of a message. Time, thread, category and
+// level may be missing.
 #include "tools/twlogctl/log_line.h"
 
 #include <charconv>

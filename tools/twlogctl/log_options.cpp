@@ -102,6 +102,11 @@ std::string LogPath(const LogOptions& options) {
   return options.notification ? kNotificationLogPath : kMainLogPath;
 }
 
+std::string FollowedPath(const LogOptions& options) {
+  if (options.file == "-") Refuse("--file", "standard input cannot be followed");
+  return LogPath(options);
+}
+
 LogFilter MakeFilter(const LogOptions& options, Moment now, Direction until) {
   LogFilter filter;
   TakeNames(options, &filter);

@@ -43,6 +43,9 @@ std::string IsWholeNumber(const std::string& typed);
 // The path of the log that the options choose; "-" for standard input.
 std::string LogPath(const LogOptions& options);
 
+// The same for a log that is followed. Throws CLI::ParseError for standard input.
+std::string FollowedPath(const LogOptions& options);
+
 // Throws CLI::ParseError when a value is no category, level, pattern or time. `until` says where
 // a time of day without a date and a span lie for --until.
 LogFilter MakeFilter(const LogOptions& options, Moment now, Direction until);

@@ -13,7 +13,7 @@
 
 namespace {
 
-constexpr size_t kPiece = 64 * 1024;
+constexpr size_t kPiece = size_t{64} * 1024;
 
 Moment NewestLineOf(int fd) {
   struct stat status = {};

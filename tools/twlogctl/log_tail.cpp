@@ -22,7 +22,7 @@ constexpr seconds kLook(1);
 
 constexpr minutes kQuiet(1);
 
-// Files that were renamed or removed and are read on. Rotations come hours apart.
+// Files that are read on. Rotations come hours apart.
 constexpr size_t kMostSources = 16;
 
 std::string FolderOf(const std::string& path) {
@@ -62,7 +62,6 @@ int LogTail::OpenFile() {
   }
   const int watch = m_watch.AddFile(fd.Get());
   m_sources.push_back({LogFile(std::move(fd)), MessageSplitter(), watch, Clock::now()});
-  ++m_fileCount;
   return 0;
 }
 
@@ -109,12 +108,12 @@ void LogTail::ReadAll(const MessageSink& sink) {
   }
 }
 
-void LogTail::DropQuiet(const MessageSink& sink) {
+void LogTail::DropOver(const MessageSink& sink) {
   const Clock::time_point now = Clock::now();
   for (auto source = m_sources.begin(); source != m_sources.end();) {
     const bool atPath = m_error == 0 && std::next(source) == m_sources.end();
-    const bool tooMany = m_sources.size() > kMostSources;
-    if (atPath || (now - source->changed < kQuiet && !tooMany)) {
+    const bool over = source->file.Removed() && now - source->changed >= kQuiet;
+    if (atPath || (!over && m_sources.size() <= kMostSources)) {
       ++source;
       continue;
     }
@@ -131,7 +130,7 @@ void LogTail::Poll(const MessageSink& sink) {
   ReadAll(sink);
   FindFile();
   ReadAll(sink);
-  DropQuiet(sink);
+  DropOver(sink);
 }
 
 void LogTail::Flush(const MessageSink& sink) {

@@ -10,8 +10,9 @@
 #include "tools/twlogctl/log_messages.h"
 #include "tools/twlogctl/log_watch.h"
 
-// A writer opens the file and then waits for its lock, so lines reach a file after it was renamed or
-// removed: each file that was at the path is read on until it has been quiet for a minute.
+// A writer opens the file and then waits for its lock, so lines reach a file after it was renamed
+// or removed. Each file that was at the path is read on: until it has been quiet for a minute when
+// it was removed, and as one of the last when it was renamed, because it may come back.
 class LogTail {
  public:
   using Clock = std::chrono::steady_clock;
@@ -32,9 +33,6 @@ class LogTail {
   // 0 while the path leads to a log that can be read, else the errno of opening it.
   int Error() const { return m_error; }
 
-  // How many files have been read from so far.
-  int FileCount() const { return m_fileCount; }
-
  private:
   struct Source {
     LogFile file;
@@ -50,14 +48,13 @@ class LogTail {
   void WatchFolder();
   bool ReadSource(Source* source, const MessageSink& sink);
   void ReadAll(const MessageSink& sink);
-  void DropQuiet(const MessageSink& sink);
+  void DropOver(const MessageSink& sink);
 
   std::string m_path;
   LogWatch m_watch;
   std::list<Source> m_sources;  // the last one is that at the path, if m_error is 0
   Clock::time_point m_folderWatched;
   int m_error = 0;
-  int m_fileCount = 0;
 };
 
 #endif  // TARNWICK_TOOLS_TWLOGCTL_LOG_TAIL_H_

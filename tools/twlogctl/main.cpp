@@ -1,6 +1,7 @@
 // twlogctl: the shared log levels and the logs, for people.
 #include <CLI/CLI.hpp>
 #include <cstdio>
+#include <exception>
 
 #include "tools/common/completion.h"
 #include "tools/common/names.h"
@@ -17,7 +18,7 @@ CompletionWords Words() {
       {"--category", CategoryNames()},     {"--level", LevelNames()},
       {"set:levels", categoriesAndAll},    {"set:levels=", LevelNames()},
       {"set:--for", {"5m", "10m", "1h"}},  {"timescale:state", {"on", "off"}},
-      {"create:--mode", {"0660", "0600"}},
+      {"create:--mode", {"0660", "0600"}}, {"--file", {kCompleteFiles}},
   };
 }
 
@@ -40,7 +41,7 @@ void AddCommands(CLI::App* app, int* exitCode) {
 
 }  // namespace
 
-int main(int argc, char** argv) {
+int main(int argc, char** argv) try {
   CLI::App app("Shows and changes the shared log levels, and reads the logs.", "twlogctl");
   app.require_subcommand(1);
   app.footer("Exit codes: 0 done; 1 something is wrong, or nothing was found; 2 wrong usage.");
@@ -53,4 +54,7 @@ int main(int argc, char** argv) {
     return kExitWrong;
   }
   return exitCode;
+} catch (const std::exception& error) {  // memory ran out, or the like
+  fprintf(stderr, "twlogctl: %s\n", error.what());
+  return kExitWrong;
 }

@@ -38,8 +38,8 @@ bool IsSegment(const std::string& line, const std::string& name, int segment) {
          inode == segment;
 }
 
-// The IPC namespace of a process, which has segments of its own; a container's is another one. Empty
-// when the process hides it, as it does its memory.
+// The IPC namespace of a process, which has segments of its own; a container's is another one.
+// Empty when the process hides it, as it does its memory.
 std::string IpcNamespace(const std::string& process) {
   char name[64];
   const ssize_t length = readlink(("/proc/" + process + "/ns/ipc").c_str(), name, sizeof(name));
@@ -88,8 +88,8 @@ std::vector<pid_t> AllProcesses() {
   const OwnedFolder folder(opendir("/proc"));
   if (!folder) return pids;
   while (const struct dirent* const entry = readdir(folder.get())) {
-    const int pid = std::atoi(entry->d_name);
-    if (pid > 0) pids.push_back(pid);
+    const long pid = std::strtol(entry->d_name, nullptr, 10);  // 0 for what is no process
+    if (pid > 0) pids.push_back(static_cast<pid_t>(pid));
   }
   std::sort(pids.begin(), pids.end());
   return pids;

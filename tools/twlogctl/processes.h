@@ -28,9 +28,9 @@ struct LibraryUser {
   bool hasRecord = false;   // it has attached the record with the given segment
 };
 
-// The processes but this one that have the shared library or the record in their memory, of those
-// that could share the record: the ones of this IPC namespace. Those of other users are seen by root
-// alone. `segment` is the record's id, or -1 for none.
+// The processes but this one that have the shared library or the record in their memory, of
+// those that could share the record: the ones of this IPC namespace. Those of other users are
+// seen by root alone. `segment` is the record's id, or -1 for none.
 std::vector<LibraryUser> LibraryUsers(int segment);
 
 // The whole text of a file, empty when it cannot be read. For /proc, whose files have no size.

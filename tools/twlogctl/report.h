@@ -19,8 +19,8 @@ std::string GroupName(gid_t group);
 // "0660".
 std::string ModeText(mode_t mode);
 
-// " (did you mean a, b?)" with the names nearest to `text` among all categories, or all levels; empty
-// when none is near.
+// " (did you mean a, b?)" with the names nearest to `text` among all categories, or all levels;
+// empty when none is near.
 std::string DidYouMeanCategory(const std::string& text);
 std::string DidYouMeanLevel(const std::string& text);
 

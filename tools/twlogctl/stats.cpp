@@ -96,7 +96,7 @@ class StatsWatch {
       : m_options(options),
         m_interval(interval),
         m_selector(MakeFilter(options, Now(), Direction::kAhead), Now()),
-        m_tail(LogPath(options)),
+        m_tail(FollowedPath(options)),
         m_counter(WindowOf(m_selector.Filter())) {
     m_selector.Filter().since = Now() - m_counter.Window();
   }
@@ -105,7 +105,7 @@ class StatsWatch {
 
  private:
   static seconds WindowOf(const LogFilter& filter);
-  void Take();
+  void Take(bool all);
   bool PrintNow();
   void PrintScreen(const StatsReport& report);
   void TakeUntil(Moment next);
@@ -122,13 +122,16 @@ seconds StatsWatch::WindowOf(const LogFilter& filter) {
   return std::max(std::chrono::ceil<seconds>(Now() - *filter.since), seconds(1));
 }
 
-void StatsWatch::Take() {
+// `all` takes the last message too, for which further lines may come.
+void StatsWatch::Take(bool all) {
   const Moment now = Now();
   m_selector.Advance(now);
-  m_tail.Poll([&](std::string_view text, bool continues) {
+  const auto take = [&](std::string_view text, bool continues) {
     m_selector.Take(text, continues,
                     [&](const LogMessage& message) { m_counter.Add(message, now); });
-  });
+  };
+  m_tail.Poll(take);
+  if (all) m_tail.Flush(take);
   m_counter.Advance(now);
 }
 
@@ -165,12 +168,12 @@ bool StatsWatch::PrintNow() {
 void StatsWatch::TakeUntil(Moment next) {
   for (Moment now = Now(); now < next; now = Now()) {
     WaitForLog(m_tail.Descriptor(), std::min(m_tail.Patience(), milliseconds(next - now)));
-    Take();
+    Take(false);
   }
 }
 
 int StatsWatch::Run() {
-  Take();
+  Take(true);
   if (m_tail.Error() != 0 && m_tail.Error() != ENOENT) {
     Complain(LogPath(m_options) + ": " + std::strerror(m_tail.Error()));
     return kExitWrong;

@@ -22,7 +22,6 @@ namespace {
 
 using Clock = LogTail::Clock;
 using std::chrono::milliseconds;
-using std::chrono::seconds;
 
 // A busy log is drawn so often at most.
 constexpr milliseconds kFrame(100);
@@ -53,6 +52,7 @@ class Top {
   LogTail m_tail;
   TopModel m_model;
   Clock::time_point m_read;
+  bool m_due = true;  // the log is to be looked at
 };
 
 void Top::Read() {
@@ -86,23 +86,23 @@ int Top::TakeSignals() {
   return 0;
 }
 
-// Keys and signals count at once; the log is looked at once a frame. Results: what poll says of the
-// keyboard.
+// Keys and signals count at once; the log is looked at once a frame at most. Results: what poll
+// says of the keyboard.
 short Top::Wait() {
   const auto since = std::chrono::duration_cast<milliseconds>(Clock::now() - m_read);
   const bool early = since < kFrame;
-  const milliseconds patience =
-      early ? kFrame - since : std::min(m_tail.Patience(), milliseconds(1000));
+  const milliseconds left = (early ? kFrame : m_tail.Patience()) - since;
   struct pollfd fds[] = {{STDIN_FILENO, POLLIN, 0},
                          {m_signals->Descriptor(), POLLIN, 0},
                          {early ? -1 : m_tail.Descriptor(), POLLIN, 0}};
-  poll(fds, 3, static_cast<int>(patience.count()));
+  const int ready = poll(fds, 3, static_cast<int>(std::max(left, milliseconds(0)).count()));
+  m_due = !early && (ready == 0 || fds[2].revents != 0);
   return fds[0].revents;
 }
 
 int Top::Run() {
   for (;;) {
-    if (Clock::now() - m_read >= kFrame) Read();
+    if (m_due) Read();
     Draw();
     const short keyboard = Wait();
     if (const int signal = TakeSignals()) return signal;
@@ -137,5 +137,5 @@ void AddTop(CLI::App* app, int* exitCode) {
   CLI::App* top =
       app->add_subcommand("top", "Show levels and log on the screen, and change levels.");
   AddSourceOptions(top, options.get());
-  top->callback([=] { *exitCode = RunTop(LogPath(*options)); });
+  top->callback([=] { *exitCode = RunTop(FollowedPath(*options)); });
 }

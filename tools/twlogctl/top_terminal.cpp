@@ -61,8 +61,8 @@ void TopSignals::EndBy(int signal) {
   sigemptyset(&set);
   sigaddset(&set, signal);
   std::signal(signal, SIG_DFL);
-  raise(signal);
   sigprocmask(SIG_UNBLOCK, &set, nullptr);
+  raise(signal);
 }
 
 bool TopTerminal::Open() {
