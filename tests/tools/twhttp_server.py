@@ -136,7 +136,8 @@ def make_identity(folder, name="127.0.0.1", days=1):
     key, certificate = folder / "key.pem", folder / "certificate.pem"
     subject = ["-subj", f"/CN={name}", "-addext", f"subjectAltName=IP:{name}"]
     subprocess.run(
-        ["openssl", "req", "-x509", "-newkey", "ec", "-pkeyopt", "ec_paramgen_curve:P-256", "-nodes"]
+        ["openssl", "req", "-x509", "-nodes"]
+        + ["-newkey", "ec", "-pkeyopt", "ec_paramgen_curve:P-256"]
         + ["-keyout", key, "-out", certificate, "-days", str(days), *subject],
         check=True,
         capture_output=True,

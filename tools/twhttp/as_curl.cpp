@@ -186,7 +186,9 @@ std::string Xml(const Options& options) {
 std::string RawResp(const Options& options) {
   CurlCommand command(options);
   command.Add({"--http1.0"});
+  command.Header("User-Agent:");
   command.SocketHeaders(true);
+  command.Header("Connection: close");
   command.Socket();
   return command.Finish(options.target.path);
 }

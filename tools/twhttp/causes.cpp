@@ -1,15 +1,8 @@
 // What a failure's own evidence points at.
+#include "tools/twhttp/causes.h"
+
 #include <algorithm>
 #include <cctype>
-#include <string_view>
-
-#include "tarnwick/http/digest.h"
-#include "tools/twhttp/failure.h"
-
-namespace {
-
-using Id = FailureClass;
-using Causes = std::vector<std::string>;
 
 std::string Lower(std::string text) {
   for (char& c : text) c = static_cast<char>(std::tolower(static_cast<unsigned char>(c)));
@@ -20,11 +13,15 @@ bool Has(const std::string& text, const char* word) {
   return text.find(word) != std::string::npos;
 }
 
-const Exchange& Last(const Evidence& evidence) {
-  static const Exchange none;
+const Exchange& LastOf(const Evidence& evidence) {
+  static const Exchange none = {};
   const Exchange* const last = evidence.trace.LastExchange();
   return last != nullptr ? *last : none;
 }
+
+namespace {
+
+using Id = FailureClass;
 
 std::string SystemWords(const Evidence& evidence) {
   const Connection* const connection = evidence.trace.LastConnection();
@@ -32,78 +29,15 @@ std::string SystemWords(const Evidence& evidence) {
   return connection != nullptr ? Lower(connection->handshake.text) : "";
 }
 
-// The last challenge that came, which need not be the last reply.
-std::string LastChallenge(const Evidence& evidence) {
-  std::string challenge;
-  for (const Exchange& exchange : evidence.trace.Exchanges()) {
-    if (exchange.reply.Status() == 401) challenge = exchange.reply.Value("WWW-Authenticate");
-  }
-  return challenge;
-}
-
-void AddDigest(const std::string& challenge, Causes* causes) {
-  const ChallengeMap values = ParseChallenge(challenge);
-  const std::string algorithm = Lower(values.at("algorithm"));
-  if (Lower(values.at("stale")) == "true") {
-    causes->push_back("the peer calls the nonce stale: it renews it faster than it is answered");
-  }
-  for (const char* needed : {"realm", "nonce"}) {
-    if (values.at(needed).empty()) causes->push_back(std::string("the challenge has no ") + needed);
-  }
-  if (algorithm == "md5-sess") {
-    causes->push_back("the peer asks for MD5-sess, which the library answers as plain MD5");
-  } else if (!algorithm.empty() && algorithm != "md5") {
-    causes->push_back("the peer asks for " + values.at("algorithm") +
-                      ", and the library answers by MD5 alone");
-  }
-  const std::string qop = Lower(values.at("qop"));
-  if (qop == "auth-int") {
-    causes->push_back(
-        "the peer asks for qop auth-int, which the library answers in a way of its own");
-  }
-}
-
-Causes OfLoginRefused(const Evidence& evidence) {
-  Causes causes;
-  const std::string challenge = LastChallenge(evidence);
-  if (!evidence.options.operation->Does(kLogin)) {
-    causes.push_back("the operation sends the empty login, and no other");
-  } else if (!evidence.options.target.has_login) {
-    causes.push_back("the target has no user:password@, and the empty login was sent");
-  }
-  if (Has(Lower(challenge), "digest")) AddDigest(challenge, &causes);
-  const bool by_basic = Has(Last(evidence).sent, "Authorization: Basic");
-  if (by_basic && Has(Lower(challenge), "digest")) {
-    causes.push_back("the login was sent by Basic, and the peer wants Digest");
-  }
-  return causes;
-}
-
-Causes OfLoginWanted(const Evidence& evidence) {
-  const std::string challenge = Last(evidence).reply.Value("WWW-Authenticate");
-  const std::string words = Lower(challenge);
-  if (challenge.empty()) return {"the 401 names no scheme: its head has no WWW-Authenticate"};
-  if (!Has(words, "digest") && !Has(words, "basic")) {
-    return {"the peer offers " + challenge.substr(0, challenge.find(' ')) +
-            ", and the library knows Basic and Digest"};
-  }
-  if (!evidence.options.operation->Does(kLogin)) {
-    return {"the operation sends no login; another one has to be used with this peer"};
-  }
-  Causes causes;
-  if (evidence.options.target.has_login && Has(words, "digest")) AddDigest(challenge, &causes);
-  return causes;
-}
-
 Causes OfStatus(const Evidence& evidence) {
-  const ReplyMessage& reply = Last(evidence).reply;
+  const ReplyMessage& reply = LastOf(evidence).reply;
   const int status = reply.Status();
   const std::string place = reply.Value("Location");
   if (status >= 300 && status <= 399) {
     return {place.empty() ? "the peer redirects, and does not say where to"
                           : "the peer redirects to " + place + ", and the library follows nowhere"};
   }
-  const bool old = Has(Last(evidence).sent.substr(0, 4096), " HTTP/1.0\r\n");
+  const bool old = Has(LastOf(evidence).sent.substr(0, 4096), " HTTP/1.0\r\n");
   if (status == 400 && old) return {"the peer wants HTTP/1.1 with a Host line: --http 1.1"};
   if (status == 403) return {"the login is good and may not do that, or the address is blocked"};
   if (status == 404) return {"the path does not exist there"};
@@ -163,7 +97,7 @@ Causes OfNoReply(const Evidence& evidence) {
 }
 
 Causes OfHead(const Evidence& evidence) {
-  const Exchange& last = Last(evidence);
+  const Exchange& last = LastOf(evidence);
   Causes causes;
   const std::string head = last.reply.Head().substr(0, 16);
   if (!evidence.options.target.https && head.size() > 1 && head[0] == '\x15' && head[1] == '\x03') {
@@ -175,14 +109,14 @@ Causes OfHead(const Evidence& evidence) {
   } else if (!last.reply.HeadComplete() && last.end == End::kClosed) {
     causes.push_back("the peer closed in the middle of the head");
   }
-  for (const HeadFinding& finding : InspectHead(last.reply)) {
+  for (const HeadFinding& finding : FindingsOf(evidence.trace, last)) {
     causes.push_back(finding.text + ": " + finding.rule);
   }
   return causes;
 }
 
 Causes OfCutBody(const Evidence& evidence) {
-  const Exchange& last = Last(evidence);
+  const Exchange& last = LastOf(evidence);
   if (last.reply.BodyFraming() == Framing::kChunked) {
     return {"the peer closed before the last chunk, or does not keep to the form of chunks"};
   }
@@ -197,7 +131,7 @@ Causes OfKeptOpen(const Evidence& evidence) {
 }
 
 Causes OfGaveUp(const Evidence& evidence) {
-  const Exchange& last = Last(evidence);
+  const Exchange& last = LastOf(evidence);
   if (last.send_begin >= 0 && last.received_bytes == 0) {
     return {"the request was taken, and no answer came"};
   }
@@ -213,9 +147,9 @@ Causes OfXml(const Evidence& evidence) {
 }
 
 Causes OfJson(const Evidence& evidence) {
-  const Exchange& last = Last(evidence);
-  const size_t head = std::min<size_t>(last.reply.HeadBytes(), last.received.size());
-  const std::string start = last.received.substr(head, 3);
+  const Exchange& last = LastOf(evidence);
+  const uint64_t head = std::min<uint64_t>(last.reply.HeadBytes(), last.received.size());
+  const std::string start = last.received.substr(static_cast<size_t>(head), 3);
   if (Has(evidence.outcome.content_error, "too deeply")) {
     return {"it is nested more deeply than is allowed"};
   }
@@ -223,16 +157,11 @@ Causes OfJson(const Evidence& evidence) {
   return {};
 }
 
-// Behind the usual causes: peers that renew their nonces with each refusal are nothing unusual.
-Causes AfterLoginRefused(const Evidence& evidence) {
-  std::vector<std::string> nonces;
-  for (const Exchange& exchange : evidence.trace.Exchanges()) {
-    const std::string challenge = exchange.reply.Value("WWW-Authenticate");
-    if (!challenge.empty()) nonces.push_back(ParseChallenge(challenge).at("nonce"));
-  }
-  const bool changes = nonces.size() > 1 && nonces.back() != nonces[nonces.size() - 2];
-  if (!changes) return {};
-  return {"the peer has another nonce each time, and takes an answer to the last one for wrong"};
+Causes OfNoLength(const Evidence& evidence) {
+  const ReplyMessage& reply = LastOf(evidence).reply;
+  if (reply.BodyFraming() == Framing::kChunked) return {"the service answers in chunks"};
+  if (reply.BodyFraming() == Framing::kLength) return {"the body is empty"};
+  return {"the service tells the end of the body by closing"};
 }
 
 Causes OfUnreachable(const Evidence& evidence) {
@@ -263,6 +192,7 @@ std::vector<std::string> SpecialCauses(const Evidence& evidence, FailureClass id
       {Id::kUnreachable, OfUnreachable},
       {Id::kXml, OfXml},
       {Id::kJson, OfJson},
+      {Id::kNoLength, OfNoLength},
   };
   for (const auto& finder : kFinders) {
     if (finder.id == id) return finder.find(evidence);
@@ -277,6 +207,10 @@ std::vector<std::string> FurtherCauses(const Evidence& evidence, FailureClass id
 const char* NextCommand(const Evidence& evidence, FailureClass id) {
   if (id == Id::kKeptOpen && evidence.options.version == HTTP_VERSION_1_1) {
     return "twhttp {operation} --http 1.0 {url}";
+  }
+  if (id == Id::kLoginRefused && Has(LastOf(evidence).sent, "Authorization: Basic") &&
+      Has(Lower(LastOf(evidence).reply.Value("WWW-Authenticate")), "digest")) {
+    return "twhttp get -v {url}";  // which answers as it is asked
   }
   if (id == Id::kCertificate && evidence.options.operation->Does(kVerify)) {
     return "twhttp {operation} -v --insecure {url}";

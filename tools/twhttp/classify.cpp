@@ -100,7 +100,7 @@ bool WasReset(const Evidence& evidence) {
                        evidence.trace.curl.os_error == ECONNRESET;
   const bool says_so = evidence.trace.curl.text.find("reset by peer") != std::string::npos;
   const bool in_reply = last != nullptr && last->end == End::kReset && !last->reply.BodyComplete();
-  return in_curl || says_so || in_reply ||
+  return in_curl || says_so || ConnectError(evidence, {ECONNRESET}) || in_reply ||
          (last != nullptr && last->send.failed && last->send.error == ECONNRESET);
 }
 
@@ -136,7 +136,7 @@ bool HeadMalformed(const Evidence& evidence) {
   if (last == nullptr || last->received_bytes == 0) return false;
   if (HeadMissing(*last)) return true;
   if (evidence.trace.curl.used) return false;
-  for (const HeadFinding& finding : InspectHead(last->reply)) {
+  for (const HeadFinding& finding : FindingsOf(evidence.trace, *last)) {
     if (finding.breaks) return true;
   }
   const bool refused = evidence.outcome.last == HTTP_RET_NOT_READY;
@@ -153,11 +153,12 @@ bool BodyCut(const Evidence& evidence) {
   return !last->reply.Missing().empty();
 }
 
-// libcurl goes on answering as long as the peer calls the nonce stale.
+// libcurl goes on answering as long as the peer calls the nonce stale, until it runs out of time or
+// has read too much.
 bool LoginRefusedForEver(const Evidence& evidence) {
   constexpr size_t kMany = 5;
   const std::vector<Exchange>& exchanges = evidence.trace.Exchanges();
-  if (!CurlTimedOut(evidence) || exchanges.size() < kMany) return false;
+  if (CurlCode(evidence, {CURLE_OK}) || exchanges.size() < kMany) return false;
   const Exchange& before = exchanges[exchanges.size() - 2];
   return before.reply.Status() == 401 && SentLogin(before);
 }
@@ -199,7 +200,7 @@ bool HasContent(const Evidence& evidence) {
   return evidence.outcome.content == content;
 }
 
-const Rule kRules[] = {
+constexpr Rule kRules[] = {
     {Id::kInterrupted,
      [](const Evidence& evidence) { return evidence.stop == Stop::kInterrupted; }},
     {Id::kLocalFile,
@@ -240,6 +241,10 @@ const Rule kRules[] = {
 };
 
 }  // namespace
+
+std::vector<HeadFinding> FindingsOf(const Trace& trace, const Exchange& exchange) {
+  return trace.curl.used ? std::vector<HeadFinding>() : InspectHead(exchange.reply);
+}
 
 bool SentLogin(const Exchange& exchange) {
   const size_t end = exchange.sent.find("\r\n\r\n");

@@ -104,10 +104,10 @@ std::string StatusLine(const Exchange& exchange) {
   return head.substr(0, head.find_first_of("\r\n"));
 }
 
-std::string HeadDetail(const Exchange& exchange) {
-  const std::vector<HeadFinding> found = InspectHead(exchange.reply);
+std::string HeadDetail(const Trace& trace, const Exchange& exchange) {
+  const std::vector<HeadFinding> found = FindingsOf(trace, exchange);
   for (const HeadFinding& finding : found) {
-    if (finding.breaks) return finding.text + ": " + finding.rule;
+    if (finding.breaks) return finding.text;
   }
   if (!exchange.reply.HeadComplete()) {
     return "the head ended after " + Count(exchange.received_bytes, "byte") +
@@ -117,7 +117,7 @@ std::string HeadDetail(const Exchange& exchange) {
 }
 
 // What was seen, by what the last exchange knows.
-std::string ExchangeDetail(const Exchange& last, Id id) {
+std::string ExchangeDetail(const Trace& trace, const Exchange& last, Id id) {
   switch (id) {
     case Id::kReadTimeout:
       return last.empty_waits > 0 ? Silence(last)
@@ -125,7 +125,7 @@ std::string ExchangeDetail(const Exchange& last, Id id) {
     case Id::kKeptOpen:
       return "the body was complete " + Seconds(last.waited) + " before the library gave up";
     case Id::kMalformedHead:
-      return HeadDetail(last);
+      return HeadDetail(trace, last);
     case Id::kCutBody:
       return last.reply.Missing();
     case Id::kReset:
@@ -148,7 +148,7 @@ std::string DetailOf(const Evidence& evidence, Id id) {
     return "nothing happened for " + Seconds(GiveUpLimit(evidence.options)) + " (--give-up)";
   }
   const Exchange* const last = evidence.trace.LastExchange();
-  return last != nullptr ? ExchangeDetail(*last, id) : "";
+  return last != nullptr ? ExchangeDetail(evidence.trace, *last, id) : "";
 }
 
 }  // namespace
@@ -179,7 +179,9 @@ Failure Explain(const Evidence& evidence) {
   failure.elapsed = evidence.trace.finished;
   failure.limit = LimitOf(evidence, failure.phase);
   failure.causes = SpecialCauses(evidence, failure.id);
-  failure.causes.insert(failure.causes.end(), facts.causes.begin(), facts.causes.end());
+  for (const char* cause : facts.causes) {
+    if (cause != nullptr) failure.causes.emplace_back(cause);
+  }
   for (const std::string& cause : FurtherCauses(evidence, failure.id)) {
     failure.causes.push_back(cause);
   }

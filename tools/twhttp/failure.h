@@ -43,10 +43,10 @@ enum class FailureClass {
 struct ClassFacts {
   FailureClass id;
   int exit_code;
-  const char* name;                 // for --json and --repeat
-  const char* meaning;              // one sentence
-  std::vector<const char*> causes;  // the likeliest first
-  const char* next;  // the next command; {host}, {port}, {url}, {operation} are filled in
+  const char* name;       // for --json and --repeat
+  const char* meaning;    // one sentence
+  const char* causes[4];  // the likeliest first; the rest is null
+  const char* next;       // the next command; {host}, {port}, {url}, {operation} are filled in
 };
 
 const ClassFacts& FactsOf(FailureClass id);
@@ -85,6 +85,9 @@ Failure Explain(const Evidence& evidence);
 std::vector<std::string> SpecialCauses(const Evidence& evidence, FailureClass id);
 std::vector<std::string> FurtherCauses(const Evidence& evidence, FailureClass id);  // behind them
 const char* NextCommand(const Evidence& evidence, FailureClass id);
+
+// What the library trips over in the head of `exchange`; nothing when libcurl read it.
+std::vector<HeadFinding> FindingsOf(const Trace& trace, const Exchange& exchange);
 
 // True when the request carried an Authorization line.
 bool SentLogin(const Exchange& exchange);

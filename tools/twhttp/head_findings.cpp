@@ -12,13 +12,28 @@ struct LineFacts {
   size_t longest = 0;
   int bareLineFeeds = 0;
   bool nullBytes = false;
+  std::string withoutColon;  // the first such line
+  bool withoutName = false;
+  bool onlyDelimiters = false;
 };
+
+// `line` is one behind the status line, without its end.
+void MeasureHeader(const std::string& line, LineFacts* facts) {
+  if (line.empty()) return;
+  const size_t colon = line.find(':');
+  if (colon == std::string::npos && facts->withoutColon.empty()) facts->withoutColon = line;
+  if (colon == 0) facts->withoutName = true;
+  // What the library takes for ends of a name.
+  if (line.find_first_not_of(" :;=") == std::string::npos) facts->onlyDelimiters = true;
+}
 
 LineFacts Measure(const std::string& head) {
   LineFacts facts;
   for (size_t begin = 0; begin < head.size();) {
     const size_t end = std::min(head.find('\n', begin), head.size());
     facts.longest = std::max(facts.longest, end - begin);
+    const size_t text = end > begin && head[end - 1] == '\r' ? end - 1 : end;
+    if (begin > 0) MeasureHeader(head.substr(begin, text - begin), &facts);
     if (end < head.size() && (end == begin || head[end - 1] != '\r')) ++facts.bareLineFeeds;
     begin = end + 1;
   }
@@ -56,18 +71,25 @@ void InspectLines(const ReplyMessage& reply, std::vector<HeadFinding>* found) {
   if (facts.nullBytes) {
     found->push_back({"zero bytes in the head", "the library's line ends at the first of them"});
   }
-  for (const auto& header : reply.Headers()) {
-    if (!header.first.empty()) continue;
-    found->push_back({"a header line without a colon: " + header.second.substr(0, 60),
+  if (!facts.withoutColon.empty()) {
+    found->push_back({"a header line without a colon: " + facts.withoutColon.substr(0, 60),
                       "the library takes its first word for the name"});
-    break;
+  }
+  if (facts.onlyDelimiters) {
+    found->push_back({"a header line without a name and without a value",
+                      "the library takes the whole head for malformed", true});
+  } else if (facts.withoutName) {
+    found->push_back({"a header line that begins with its colon",
+                      "the library takes the next word for the name"});
   }
   for (const char* known : {"Content-Type", "Content-Length", "Content-Range", "Set-Cookie",
                             "WWW-Authenticate", "Transfer-Encoding"}) {
     if (CountOf(reply.Headers(), known) == 0 || !reply.Value(known).empty()) continue;
+    const bool breaks = reply.Head().find(std::string(known) + ":\r\n") != std::string::npos;
     found->push_back({std::string("an empty ") + known + " line",
-                      "the library takes the whole head for malformed",
-                      reply.Head().find(std::string(known) + ":\r\n") != std::string::npos});
+                      breaks ? "the library takes the whole head for malformed"
+                             : "the blank in it keeps the library from refusing the head",
+                      breaks});
   }
 }
 
@@ -103,7 +125,8 @@ std::vector<HeadFinding> InspectHead(const ReplyMessage& reply) {
   const std::string& head = reply.Head();
   const std::string start = head.substr(0, 8);
   const bool known = start == "HTTP/1.0" || start == "HTTP/1.1";
-  if (known && reply.HeadComplete() && reply.Status() < 100) {
+  const bool complete = head.find('\n') != std::string::npos;
+  if (known && complete && reply.Interims() == 0 && reply.Status() < 100) {
     found.push_back({"the status line has no status of three digits: " + FirstLine(head),
                      "the library takes it for no success", true});
   }

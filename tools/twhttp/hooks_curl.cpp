@@ -27,6 +27,16 @@ bool BeginsWith(std::string_view text, std::string_view start) {
   return text.substr(0, start.size()) == start;
 }
 
+// What libcurl tells of the server's TLS.
+void NoteTls(Connection* connection, std::string_view text) {
+  constexpr std::string_view kUsing = "SSL connection using ";
+  if (BeginsWith(text, kUsing)) connection->tls_facts = std::string(text.substr(kUsing.size()));
+  for (const std::string_view fact : {"subject: ", "expire date: ", "issuer: "}) {
+    if (!BeginsWith(text, fact)) continue;
+    connection->certificate += (connection->certificate.empty() ? "" : ", ") + std::string(text);
+  }
+}
+
 // Only what stays the same from version to version is read out of libcurl's lines.
 void NoteText(Transfer* transfer, std::string_view text) {
   Trace* const trace = transfer->hooks->trace;
@@ -35,6 +45,7 @@ void NoteText(Transfer* transfer, std::string_view text) {
   while (!text.empty() && text.front() == ' ') text.remove_prefix(1);
   trace->notes.emplace_back(text);
   const Connection* const newest = trace->LastConnection();
+  if (newest != nullptr) NoteTls(trace->Find(newest->number), text);
   if (BeginsWith(text, "Trying ")) {
     const bool fresh = newest == nullptr || newest->connect.end >= 0;
     Connection& connection = fresh ? trace->Open(false) : *trace->Find(newest->number);
@@ -48,6 +59,15 @@ void NoteText(Transfer* transfer, std::string_view text) {
   }
 }
 
+// libcurl does not tell of the empty line behind an interim reply.
+void EndInterim(Hooks* hooks, int connection) {
+  const Exchange* const last = hooks->trace->LastExchange();
+  if (last == nullptr || last->connection != connection || last->reply.HeadComplete()) return;
+  const std::string& head = last->reply.Head();
+  const bool ended = head.size() < 4 || head.compare(head.size() - 4, 4, "\r\n\r\n") == 0;
+  if (!ended) hooks->trace->Received(connection, hooks->Now(), "\r\n");
+}
+
 int OnDebug(CURL* /*curl*/, curl_infotype type, char* data, size_t size, void* pointer) {
   Transfer* const transfer = static_cast<Transfer*>(pointer);
   Hooks* const hooks = transfer->hooks;
@@ -58,6 +78,9 @@ int OnDebug(CURL* /*curl*/, curl_infotype type, char* data, size_t size, void* p
   } else if (type == CURLINFO_HEADER_OUT || type == CURLINFO_DATA_OUT) {
     hooks->trace->Sent(transfer->Number(), now, now, bytes);
     hooks->Moved();
+  } else if (type == CURLINFO_HEADER_IN && BeginsWith(bytes, "HTTP/")) {
+    EndInterim(hooks, transfer->Number());
+    hooks->trace->Received(transfer->Number(), now, bytes);
   } else if (type == CURLINFO_HEADER_IN || type == CURLINFO_DATA_IN) {
     hooks->trace->Received(transfer->Number(), now, bytes);
     hooks->Moved();

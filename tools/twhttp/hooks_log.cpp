@@ -1,5 +1,5 @@
-// The hook of the log: the lines of the run are evidence, and belong to whoever runs the tool rather
-// than into the log of the daemons.
+// The hook of the log: the lines of the run are evidence, and belong to whoever runs the tool
+// rather than into the log of the daemons.
 #include <cstdarg>
 #include <cstdio>
 

@@ -22,7 +22,12 @@ namespace {
 Hooks* g_hooks = nullptr;
 std::map<int, int> g_connections;  // by descriptor
 int g_newest = 0;                  // the connection whose look-up comes next
-std::chrono::steady_clock::time_point g_start;
+double g_start = 0;                // seconds since boot
+
+double SinceBoot() {
+  const auto now = std::chrono::steady_clock::now().time_since_epoch();
+  return std::chrono::duration<double>(now).count();
+}
 
 Connection* Watched(int fd) {
   return g_hooks != nullptr ? g_hooks->trace->Find(ConnectionOf(fd)) : nullptr;
@@ -74,7 +79,7 @@ void NoteRead(int fd, const void* buf, ssize_t count) {
 }  // namespace
 
 double Hooks::Now() const {
-  return std::chrono::duration<double>(std::chrono::steady_clock::now() - g_start).count();
+  return SinceBoot() - g_start;
 }
 
 void Hooks::Moved() const {
@@ -92,7 +97,7 @@ int ConnectionOf(int fd) {
 }
 
 void Observe(Hooks* hooks, const std::function<void()>& operation) {
-  g_start = std::chrono::steady_clock::now();
+  g_start = SinceBoot();
   g_hooks = hooks;
   const LogAtFullDetail detail;
   operation();

@@ -44,7 +44,7 @@ std::string TimeText(const ASN1_TIME* time) {
   ASN1_TIME_print(bio, time);
   char* data = nullptr;
   const long size = BIO_get_mem_data(bio, &data);
-  const std::string text(data, static_cast<size_t>(size));
+  std::string text(data, static_cast<size_t>(size));
   BIO_free(bio);
   return text;
 }
@@ -91,10 +91,19 @@ void NoteRead(SSL* ssl, const void* buf, int count) {
                            {static_cast<const char*>(buf), static_cast<size_t>(count)});
     hooks->Moved();
   } else if (count == 0 || error == SSL_ERROR_ZERO_RETURN) {
-    Watched(ssl)->close_notice = (SSL_get_shutdown(ssl) & SSL_RECEIVED_SHUTDOWN) != 0;
     hooks->trace->Ended(number, hooks->Now(), End::kClosed, 0, "");
   } else if (error != SSL_ERROR_WANT_READ && error != SSL_ERROR_WANT_WRITE) {
     NoteFailedRead(number, hooks->Now());
+  }
+}
+
+// The library lets OpenSSL take any close for an orderly one, so the notice itself is looked for.
+void OnInfo(const SSL* ssl, int where, int value) {
+  constexpr int kAlertMask = 0xff;
+  Connection* const connection = Watched(ssl);
+  const bool notice = (value & kAlertMask) == SSL_AD_CLOSE_NOTIFY;
+  if (where == SSL_CB_READ_ALERT && connection != nullptr && notice) {
+    connection->close_notice = true;
   }
 }
 
@@ -107,6 +116,7 @@ extern "C" int __wrap_SSL_connect(SSL* ssl) {
   connection->tls = true;
   if (IsOffline()) return 1;
   connection->handshake.begin = CurrentHooks()->Now();
+  SSL_set_info_callback(ssl, OnInfo);
   const GiveUpWait wait;
   const int result = __real_SSL_connect(ssl);
   NoteHandshake(ssl, connection, result);

@@ -78,7 +78,9 @@ void Report(const Session& session) {
   }
   const bool colour = MayColour(STDERR_FILENO);
   if (options.verbose) std::fputs(ExchangesText(session, colour).c_str(), stderr);
-  if (!options.verbose) std::fputs(NotesText(session).c_str(), stderr);
+  // The causes of a malformed head are the same findings.
+  const bool told = options.verbose || session.failure.id == FailureClass::kMalformedHead;
+  if (!told) std::fputs(NotesText(session).c_str(), stderr);
   if (options.timings) std::fputs(TimingsText(session, colour).c_str(), stderr);
   if (session.failure.id != FailureClass::kNone) {
     std::fputs(FailureText(session, colour).c_str(), stderr);
@@ -100,7 +102,10 @@ int RunOnce(const Options& options, const std::string& body) {
   std::optional<Progress> progress;
   if (MayShowProgress(options)) progress.emplace(&session.trace, UploadSize(options, body));
   bool written = true;
-  const auto write = [&](const std::string& piece) { return written = WriteOut(piece); };
+  const auto write = [&](const std::string& piece) {
+    if (progress && IsTerminal(STDOUT_FILENO)) progress->Finish();
+    return written = WriteOut(piece);
+  };
   const auto moved = [&] {
     if (progress) progress->Update();
   };

@@ -8,7 +8,7 @@
 
 namespace {
 
-constexpr size_t kMaxHead = 256 * 1024;
+constexpr size_t kMaxHead = size_t{256} * 1024;
 
 std::string_view Trimmed(std::string_view text) {
   const auto blank = [](char c) { return c == ' ' || c == '\t' || c == '\r' || c == '\n'; };
@@ -22,6 +22,12 @@ std::pair<std::string, std::string> SplitHeader(std::string_view line) {
   if (colon == std::string_view::npos) return {"", std::string(Trimmed(line))};
   return {std::string(Trimmed(line.substr(0, colon))),
           std::string(Trimmed(line.substr(colon + 1)))};
+}
+
+int LeadingNumber(std::string_view text) {
+  constexpr long kMost = 999999;
+  const long value = std::strtol(std::string(text).c_str(), nullptr, 10);
+  return static_cast<int>(std::clamp(value, -1L, kMost));
 }
 
 bool IsHex(char c) {
@@ -77,7 +83,7 @@ void ReplyMessage::EndLine() {
   } else if (first_line_) {
     const size_t blank = line.find(' ');
     if (line.substr(0, 5) == "HTTP/" && blank != std::string_view::npos) {
-      status_ = std::atoi(std::string(line.substr(blank + 1)).c_str());
+      status_ = LeadingNumber(line.substr(blank + 1));
     }
     first_line_ = false;
   } else {

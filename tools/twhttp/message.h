@@ -1,7 +1,7 @@
 // A reply's head and framing, followed byte by byte as it arrives.
 //
-// It stands beside the library's own reading, which believes devices in much: what was announced and
-// what came are compared here.
+// It stands beside the library's own reading, which believes devices in much: what was announced
+// and what came are compared here.
 #ifndef TARNWICK_TOOLS_TWHTTP_MESSAGE_H_
 #define TARNWICK_TOOLS_TWHTTP_MESSAGE_H_
 

@@ -2,8 +2,7 @@
 #ifndef TARNWICK_TOOLS_TWHTTP_OPERATIONS_H_
 #define TARNWICK_TOOLS_TWHTTP_OPERATIONS_H_
 
-#include <string>
-#include <vector>
+#include <array>
 
 // What an operation takes.
 enum Takes : unsigned {
@@ -57,6 +56,8 @@ struct Operation {
   bool Does(unsigned what) const { return (takes & what) != 0; }
 };
 
-const std::vector<Operation>& Operations();
+using OperationTable = std::array<Operation, 17>;
+
+const OperationTable& Operations();
 
 #endif  // TARNWICK_TOOLS_TWHTTP_OPERATIONS_H_

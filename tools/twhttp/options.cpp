@@ -150,7 +150,8 @@ void AddOutput(CLI::App* app, const Operation& operation, Options* options) {
   }
   if (operation.Does(kStream)) {
     app->add_option("--max-body", options->max_body, "Stop after so many bytes of the body.")
-        ->type_name("BYTES");
+        ->type_name("BYTES")
+        ->check(CLI::NonNegativeNumber);
   }
   app->add_flag("-v,--verbose", options->verbose,
                 "Show each exchange, the challenge, the login chosen and the library's log.");

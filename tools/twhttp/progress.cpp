@@ -28,8 +28,7 @@ std::string ProgressLine(uint64_t done, uint64_t total, double seconds, int widt
   constexpr int kTextRoom = 52;
   constexpr int kWidestBar = 40;
   const double rate = seconds > 0 ? static_cast<double>(done) / seconds : 0;
-  const std::string speed =
-      FormatBytes(static_cast<double>(done)) + ", " + FormatBytes(rate) + "/s";
+  std::string speed = FormatBytes(static_cast<double>(done)) + ", " + FormatBytes(rate) + "/s";
   if (total == 0 || rate <= 0) return speed;
   const double share = std::min(1.0, static_cast<double>(done) / static_cast<double>(total));
   const double left = (1 - share) * static_cast<double>(total) / rate;

@@ -15,7 +15,8 @@ Json::Value HeadersJson(const Options& options, const HeaderLines& headers) {
   return list;
 }
 
-Json::Value ExchangeJson(const Options& options, const Exchange& exchange) {
+Json::Value ExchangeJson(const Session& session, const Exchange& exchange) {
+  const Options& options = session.options;
   Json::Value value(Json::objectValue);
   const std::string head = exchange.sent.substr(0, exchange.sent.find("\r\n\r\n"));
   value["number"] = exchange.number;
@@ -28,7 +29,7 @@ Json::Value ExchangeJson(const Options& options, const Exchange& exchange) {
   value["head_bytes"] = static_cast<Json::UInt64>(exchange.reply.HeadBytes());
   value["body_bytes"] = static_cast<Json::UInt64>(exchange.reply.BodyBytes());
   Json::Value& notes = value["notes"] = Json::Value(Json::arrayValue);
-  for (const HeadFinding& finding : InspectHead(exchange.reply)) {
+  for (const HeadFinding& finding : FindingsOf(session.trace, exchange)) {
     notes.append(finding.text + ": " + finding.rule);
   }
   return value;
@@ -81,7 +82,7 @@ Json::Value ReportJson(const Session& session) {
   report["body_bytes"] = static_cast<Json::UInt64>(session.outcome.body_bytes);
   Json::Value& exchanges = report["exchanges"] = Json::Value(Json::arrayValue);
   for (const Exchange& exchange : session.trace.Exchanges()) {
-    exchanges.append(ExchangeJson(options, exchange));
+    exchanges.append(ExchangeJson(session, exchange));
   }
   report["timings"] = TimingsJson(session);
   if (session.failure.id != FailureClass::kNone) report["failure"] = FailureJson(session);

@@ -84,7 +84,7 @@ std::string ChallengeText(const Exchange& exchange) {
 std::string LoginText(const Exchange& asked, const Exchange* next, const Operation& operation) {
   if (asked.reply.Status() != 401) return "";
   if (next == nullptr || !SentLogin(*next)) {
-    if (SentLogin(asked)) return "  login     refused; the library tries no third time\n";
+    if (SentLogin(asked)) return "  login     refused, and not tried again\n";
     return std::string("  login     none: ") +
            (operation.Does(kLogin) ? "the challenge names neither Digest nor Basic\n"
                                    : "the operation sends no login\n");
@@ -94,21 +94,21 @@ std::string LoginText(const Exchange& asked, const Exchange* next, const Operati
                 : "  login     Basic, because the challenge names it and no Digest\n";
 }
 
-std::string ConnectionText(const Connection& connection) {
+std::string ConnectionText(const Connection& connection, bool by_curl) {
   std::string text = "  connection " + std::to_string(connection.number) + " to " +
                      EscapeControls(connection.address);
   if (!connection.tls_facts.empty()) text += ", " + connection.tls_facts;
   text += "\n";
   if (!connection.certificate.empty()) {
     text += "  certificate " + EscapeControls(connection.certificate) +
-            ", which the library does not verify here\n";
+            (by_curl ? "\n" : ", which the library does not verify here\n");
   }
   return text;
 }
 
 std::vector<std::string> NotesOf(const Session& session, const Exchange& exchange) {
   std::vector<std::string> notes;
-  for (const HeadFinding& finding : InspectHead(exchange.reply)) {
+  for (const HeadFinding& finding : FindingsOf(session.trace, exchange)) {
     notes.push_back(EscapeControls(finding.text) + ": " + finding.rule);
   }
   if (exchange.reply.Surplus() > 0) {
@@ -129,7 +129,7 @@ std::string ExchangeText(const Session& session, const Exchange& exchange, const
   std::string text =
       Paint(Colour::kBold, "== exchange " + std::to_string(exchange.number), colour) + "\n";
   if (const Connection* const connection = session.trace.Find(exchange.connection)) {
-    text += ConnectionText(*connection);
+    text += ConnectionText(*connection, session.trace.curl.used);
   }
   const std::string sent = HeadOf(exchange.sent);
   text += HeadText("> ", MaskHead(options, sent), options.operation, colour);

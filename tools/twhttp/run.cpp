@@ -4,33 +4,17 @@
 #include <libxml/parser.h>
 #include <libxml/tree.h>
 
+#include <algorithm>
 #include <cstdio>
 #include <memory>
 
 #include "tarnwick/platform/owned.h"
 #include "tools/common/json_output.h"
 #include "tools/twhttp/client.h"
-#include "tools/twhttp/hooks.h"
+#include "tools/twhttp/content.h"
 #include "tools/twhttp/upload.h"
 
 namespace {
-
-struct DocumentDeleter {
-  void operator()(xmlDoc* document) const { xmlFreeDoc(document); }
-};
-using Document = std::unique_ptr<xmlDoc, DocumentDeleter>;
-
-std::string g_first_xml_error;
-
-// libxml2 would else print what it finds. The first finding explains the others.
-void ListenToXml() {
-  g_first_xml_error.clear();
-  xmlSetStructuredErrorFunc(nullptr, [](void* /*context*/, auto* error) {
-    if (!g_first_xml_error.empty() || error->message == nullptr) return;
-    g_first_xml_error = "line " + std::to_string(error->line) + ": " + error->message;
-    while (g_first_xml_error.back() == '\n') g_first_xml_error.pop_back();
-  });
-}
 
 class Runner {
  public:
@@ -94,7 +78,8 @@ void Runner::ReadBody() {
   if (client_.GetTransferEncoding() != "chunked") return Stream();
   std::string body;
   outcome_.read_failed = client_.ReadBody(body) != HTTP_RET_OK;
-  Write(options_.max_body > 0 ? body.substr(0, options_.max_body) : body);
+  const uint64_t wanted = options_.max_body > 0 ? options_.max_body : body.size();
+  Write(body.substr(0, static_cast<size_t>(std::min<uint64_t>(wanted, body.size()))));
 }
 
 void Runner::Stream() {
@@ -135,7 +120,7 @@ void Runner::Soap() {
 
 void Runner::NoteBadXml() {
   outcome_.content = Content::kNotXml;
-  outcome_.content_error = g_first_xml_error;
+  outcome_.content_error = FirstXmlError();
 }
 
 void Runner::SoapXml() {
@@ -226,27 +211,6 @@ void Runner::Xml() {
   xmlFreeDoc(parsed);
 }
 
-// What the parser told the log about a reply that is no JSON; an empty text for one that is.
-std::string JsonError() {
-  constexpr char kFailed[] = "JsonParse(): Failed to parse json: ";
-  constexpr char kWith[] = "] with error [";
-  for (const std::string& line : CurrentHooks()->trace->log) {
-    if (line.find(kFailed) == std::string::npos) continue;
-    const size_t begin = line.rfind(kWith);
-    if (begin == std::string::npos) return "it cannot be parsed";
-    std::string error = line.substr(begin + sizeof(kWith) - 1);
-    while (!error.empty() && (error.back() == ']' || error.back() == '\n')) error.pop_back();
-    return error;
-  }
-  return "";
-}
-
-std::string SuccessError(const Json::Value& reply) {
-  if (!reply.isObject()) return "the reply is no object";
-  if (!reply.isMember("success")) return "the member \"success\" is missing";
-  return "\"success\" is " + CompactJson(reply["success"]);
-}
-
 // The library gives one result for what is no JSON and for what is no success.
 void Runner::JudgeJson(const Json::Value& reply, int failed) {
   outcome_.good = outcome_.result == 0;
@@ -335,13 +299,6 @@ Outcome Runner::Run() {
 }
 
 }  // namespace
-
-bool IsXml(const std::string& text) {
-  ListenToXml();
-  const Document document(
-      xmlReadMemory(text.data(), static_cast<int>(text.size()), nullptr, nullptr, XML_PARSE_NONET));
-  return document != nullptr;
-}
 
 Outcome RunOperation(const Options& options, const std::string& body, const BodyWriter& write) {
   ListenToXml();

@@ -1,6 +1,7 @@
 #include "tools/twhttp/secrets.h"
 
 #include <algorithm>
+#include <cctype>
 
 #include "tarnwick/platform/owned.h"
 #include "tarnwick/utils/utils.h"
@@ -65,5 +66,7 @@ std::string MaskText(const Options& options, const std::string& text) {
   ReplaceAll(&masked, Base64(options.target.user + ":" + options.target.password));
   ReplaceAll(&masked, options.target.password);
   ReplaceAll(&masked, options.cookie);
-  return masked;
+  // A header line that the library has logged.
+  const size_t cookie = std::min(masked.find("ookie:"), masked.find("OOKIE:"));
+  return cookie == std::string::npos ? masked : masked.substr(0, cookie + 6) + " ***";
 }
