@@ -19,7 +19,7 @@ from twcamsim_support import (
     status_of,
 )
 
-# How long a client waits before it takes a silence for one: what must come has come long before.
+# How long a client waits before it takes a silence for one, behind all that must come.
 SILENCE = 1.0
 HEAD = b"HTTP/1.1 200 OK\r\n"
 
@@ -86,6 +86,13 @@ def test_fault_never_read_lets_a_large_upload_get_stuck(camera):
                 client.sendall(bytes(1 << 20))
 
 
+def test_fault_never_read_ends_with_its_client(camera):
+    running = camera("-e", "json", "-f", "never-read")
+    with running.connect() as client:
+        client.sendall(GET)
+    assert running.journal()[0]["end"] == "peer-closed"
+
+
 def test_fault_close_in_request_closes_in_a_body_too(camera):
     request = b"POST /echo.json HTTP/1.1\r\nHost: x\r\nContent-Length: 100\r\n\r\n" + b"x" * 50
     running = camera("-e", "json", "-f", f"close-in-request={len(request)}")
@@ -135,7 +142,8 @@ STALLS = {
 @pytest.mark.parametrize("fault", STALLS)
 def test_fault_stalls_there_for_good(camera, fault):
     expected = STALLS[fault](usual(camera))
-    assert ask(camera, fault, silence=SILENCE) == (expected, "silent")
+    running = camera("-e", "json", "-f", fault)
+    assert running.ask(silence=SILENCE, least=len(expected)) == (expected, "silent")
 
 
 @pytest.mark.parametrize("fault", STALLS)
@@ -427,6 +435,15 @@ def test_faults_combine_in_their_order(camera):
     assert running.journal()[0]["faults"] == ["bare-lf", "no-colon", "success-false"]
 
 
+@pytest.mark.parametrize("first", ["no-code", "no-status-line", "other-protocol", "informational"])
+def test_faults_of_the_same_place_get_along(camera, first):
+    others = ["no-reason", "http-2-status", "status-code=7", "head-lines=2", "head-lines-first=2"]
+    others += ["bare-lf", "no-blank-line", "cut-head=3", "stall-in-status=1", "long-status=9"]
+    running = camera("-e", "json", *(word for name in [first, *others] for word in ("-f", name)))
+    assert running.ask().end == "close"
+    assert running.journal()[0]["end"] == "closed"
+
+
 def test_a_fault_of_one_endpoint_leaves_the_others_alone(camera):
     running = camera("-e", "json,name=bad,fault=slow:7:1,fault=status:503", "-e", "json,name=good")
     assert status_of(running.ask(name="bad").bytes) == 503
@@ -441,7 +458,8 @@ def test_content_faults_leave_a_challenge_alone_and_wire_faults_do_not(camera):
 
 def test_each_fault_of_the_list_has_been_seen_by_these_tests(run):
     """The names in the tests' sources: a new fault needs a test."""
-    listed = [json.loads(line)["name"] for line in run("twcamsim", "--list-faults", "--json").stdout.splitlines()]
+    lines = run("twcamsim", "--list-faults", "--json").stdout.splitlines()
+    listed = [json.loads(line)["name"] for line in lines]
     assert len(listed) == len(set(listed)) >= 40
     folder = __file__.rpartition("/")[0]
     sources = "".join(

@@ -4,6 +4,7 @@ import json
 import os
 import pathlib
 import re
+import resource
 import signal
 import socket
 import ssl
@@ -11,7 +12,7 @@ import subprocess
 
 import pytest
 
-from conftest import HANG
+from conftest import HANG, wait_until
 from twcamsim_support import (
     GET,
     GET_11,
@@ -97,6 +98,7 @@ def test_a_port_in_use_is_named(camera, run):
         (["-e", "json,login=digset"], "did you mean digest"),
         (["-e", "json,fault=nothing-like-it"], "there is no fault"),
         (["-e", "json,fault=slow:x"], 'fault slow: BYTES is "x", not a number from 1 to'),
+        (["-e", "json,tls=no"], "tls takes no value"),
         (["-e", "snapshot,width=1"], "width"),
         (["-e", "multipart,rate=0"], "rate"),
         (["-e", "upload,after=-1"], "after"),
@@ -154,7 +156,8 @@ def test_a_list_comes_as_text_and_as_json(run, table):
     lines = run("twcamsim", table, "--json")
     assert (text.returncode, lines.returncode) == (0, 0)
     entries = [json.loads(line) for line in lines.stdout.splitlines()]
-    assert all(entry["name"] in text.stdout and entry["meaning"] in text.stdout for entry in entries)
+    for entry in entries:
+        assert entry["name"] in text.stdout and entry["meaning"] in text.stdout
 
 
 def test_each_fault_tells_its_arguments_and_their_standards(run):
@@ -182,7 +185,8 @@ def test_help_has_a_sentence_for_each_option(run):
 
 
 def names_of(run, table):
-    return {json.loads(line)["name"] for line in run("twcamsim", table, "--json").stdout.splitlines()}
+    lines = run("twcamsim", table, "--json").stdout.splitlines()
+    return {json.loads(line)["name"] for line in lines}
 
 
 def test_the_page_lists_every_option_fault_profile_and_login(run):
@@ -262,6 +266,17 @@ def test_many_clients_are_served_at_once(camera):
         client.close()
 
 
+def test_it_serves_again_when_there_are_descriptors_again(camera):
+    running = camera("-e", "json")
+    resource.prlimit(running.report["pid"], resource.RLIMIT_NOFILE, (24, 24))
+    clients = [running.connect() for _ in range(40)]
+    for client in clients:
+        client.close()
+    # Until the last of them has ended, a connection may be closed at once.
+    wait_until(lambda: running.ask().bytes.startswith(b"HTTP/1.1 200"), "an answer")
+    assert running.end() == 0
+
+
 # ---- the journal
 
 
@@ -332,6 +347,11 @@ def test_bytes_that_are_no_text_leave_the_journal_json(camera):
     running = camera("-e", "json")
     running.ask(b"GET /\xff\xfe\x01 HTTP/1.0\r\n\r\n")
     assert running.journal()[0]["requests"][0]["status"] in ("400", "404")
+
+
+def test_what_is_no_request_stands_in_the_access_log_with_dashes(camera, tmp_path):
+    camera("-e", "json", "--access", tmp_path / "access").ask(b"HELLO\r\n\r\n")
+    assert (tmp_path / "access").read_text() == "- - 400\n"
 
 
 def test_the_access_log_has_a_line_for_an_answer(camera, tmp_path):

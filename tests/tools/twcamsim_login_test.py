@@ -194,6 +194,12 @@ def test_a_response_without_the_qop_that_it_names_is_explained(camera):
     assert "computed without qop" in body_of(seen.bytes).decode()
 
 
+def test_a_count_without_qop_means_nothing(camera):
+    running = camera("-e", "cgi,login=digest-no-qop")
+    line = digest_line(challenge_words(challenge_of(running)), "") + ", nc=many"
+    assert status_of(running.ask(request_with(line)).bytes) == 200
+
+
 def test_auth_int_takes_the_body_into_account(camera):
     running = camera("-e", "cgi,login=digest-auth-int")
     words = challenge_words(challenge_of(running))

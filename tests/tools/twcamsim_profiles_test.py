@@ -12,7 +12,7 @@ import xml.etree.ElementTree as ElementTree
 import pytest
 
 from conftest import HANG
-from twcamsim_support import GET, body_of, camera, head_of, headers_of, read_all, reset, status_of
+from twcamsim_support import GET, body_of, camera, headers_of, read_all, reset, status_of
 
 # What an upload's client announces: 2 to the power 37.
 ENDLESS = 137438953472
@@ -91,7 +91,8 @@ def test_the_soap_device_answers_an_operation(camera):
 def test_the_soap_device_sends_a_fault_with_500(camera, body, reason):
     status, _, answer = call(camera("-e", "soap"), "POST", "/ptz", body)
     assert status == 500
-    texts = [node.text for node in ElementTree.fromstring(answer).iter() if node.tag.endswith("Text")]
+    nodes = ElementTree.fromstring(answer).iter()
+    texts = [node.text for node in nodes if node.tag.endswith("Text")]
     assert texts == [reason]
 
 

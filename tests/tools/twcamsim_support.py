@@ -45,15 +45,17 @@ class Camera:
         context.options &= ~ssl.OP_IGNORE_UNEXPECTED_EOF
         return context
 
-    def ask(self, request=GET, name=None, silence=HANG):
+    def ask(self, request=GET, name=None, silence=HANG, least=0):
         """Sends the request and reads to the connection's end, or until nothing comes for
-        `silence` seconds."""
+        `silence` seconds behind the first `least` bytes."""
         with self.connect(name) as client:
             try:
                 client.sendall(request)
-            except OSError:
+            except ConnectionResetError:
+                return Seen(b"", "reset")  # a reset is told once
+            except BrokenPipeError:
                 pass  # the peer's end is for read_all to tell
-            return read_all(client, silence)
+            return read_all(client, silence, least)
 
     def ask_tls(self, request=GET, name=None):
         """The same over TLS. An end without TLS's close notice is "cut"."""
@@ -125,15 +127,17 @@ def camera(start, tmp_path):
         nonlocal count
         count += 1
         journal = tmp_path / f"journal-{count}"
-        return Camera(start("twcamsim", "--journal", journal, *args), journal)
+        # The fixture kills it, so its folder must be in one that goes away.
+        place = {"TMPDIR": str(tmp_path)}
+        return Camera(start("twcamsim", "--journal", journal, *args, env=place), journal)
 
     return make
 
 
-def read_all(client, silence):
-    client.settimeout(silence)
+def read_all(client, silence, least=0):
     data = b""
     while True:
+        client.settimeout(HANG if len(data) < least else silence)
         try:
             piece = client.recv(65536)
         except ConnectionResetError:

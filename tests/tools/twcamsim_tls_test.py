@@ -11,8 +11,8 @@ from twcamsim_support import body_of, camera, read_all, status_of
 TLS = "json,tls"
 
 
-def handshake(running, context=None):
-    with running.connect() as raw:
+def handshake(running, context=None, name=None):
+    with running.connect(name) as raw:
         context = context or running.tls_context()
         with context.wrap_socket(raw, server_hostname="127.0.0.1") as client:
             return client.version(), client.getpeercert()
@@ -131,3 +131,9 @@ def test_a_fault_of_tls_does_nothing_to_a_plain_endpoint(camera):
     running = camera("-e", "json", "-e", TLS, "-f", "tls-garbage")
     assert status_of(running.ask(name="json").bytes) == 200
     assert running.journal()[0]["faults"] == []
+
+
+def test_the_certificate_names_each_address_of_an_endpoint(camera):
+    running = camera("-e", "json,tls,host=127.0.0.7", "-e", "cgi,tls")
+    names = handshake(running, name="cgi-tls")[1]["subjectAltName"]
+    assert ("IP Address", "127.0.0.7") in names and ("IP Address", "127.0.0.1") in names

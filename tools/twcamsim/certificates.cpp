@@ -23,7 +23,7 @@ using Key = std::unique_ptr<EVP_PKEY, Free>;
 using Certificate = std::unique_ptr<X509, Free>;
 using Settings = std::unique_ptr<SSL_CTX, Free>;
 
-constexpr long kDay = 24 * 3600;
+constexpr long kDay = 86400;
 
 struct Authority {
   Key key;
@@ -89,15 +89,22 @@ bool MakeAuthority(const char* name, Authority* authority) {
   return authority->certificate != nullptr;
 }
 
-Request RequestFor(CertificateKind kind, const std::string& host) {
-  Request request;
-  request.name = host;
-  request.alternatives = "IP:127.0.0.1,DNS:localhost";
-  in_addr ignored;
-  const bool number = inet_pton(AF_INET, host.c_str(), &ignored) == 1;
-  if (host != "127.0.0.1" && host != "localhost") {
-    request.alternatives += (number ? ",IP:" : ",DNS:") + host;
+// Each once, with the kind of name it is.
+std::string Alternatives(std::set<std::string> hosts) {
+  hosts.insert({"127.0.0.1", "localhost"});
+  std::string text;
+  for (const std::string& host : hosts) {
+    in_addr ignored;
+    const bool number = inet_pton(AF_INET, host.c_str(), &ignored) == 1;
+    text += (text.empty() ? "" : ",") + std::string(number ? "IP:" : "DNS:") + host;
   }
+  return text;
+}
+
+Request RequestFor(CertificateKind kind, const std::set<std::string>& hosts) {
+  Request request;
+  request.name = hosts.empty() ? "127.0.0.1" : *hosts.begin();
+  request.alternatives = Alternatives(hosts);
   if (kind == CertificateKind::kExpired) {
     request.from = -800 * kDay;
     request.until = -400 * kDay;
@@ -134,8 +141,8 @@ std::string OpenSslError() {
 }  // namespace
 
 struct Certificates::Impl {
-  bool Add(CertificateKind kind, const std::string& host, const Authority* issuer) {
-    const Certificate certificate = Sign(RequestFor(kind, host), key.get(), issuer);
+  bool Add(CertificateKind kind, const std::set<std::string>& hosts, const Authority* issuer) {
+    const Certificate certificate = Sign(RequestFor(kind, hosts), key.get(), issuer);
     if (!certificate) return false;
     for (const bool old_tls : {false, true}) {
       Settings context = MakeContext(key.get(), certificate.get(), old_tls);
@@ -155,16 +162,16 @@ Certificates::Certificates() : impl_(std::make_unique<Impl>()) {}
 
 Certificates::~Certificates() = default;
 
-bool Certificates::Make(const std::string& host, std::string* error) {
+bool Certificates::Make(const std::set<std::string>& hosts, std::string* error) {
   impl_->key.reset(EVP_EC_gen("P-256"));
   bool good = impl_->key && MakeAuthority("Simulated camera authority", &impl_->own) &&
               MakeAuthority("Another authority", &impl_->foreign);
   for (const CertificateKind kind : {CertificateKind::kGood, CertificateKind::kExpired,
                                      CertificateKind::kNotYet, CertificateKind::kWrongName}) {
-    good = good && impl_->Add(kind, host, &impl_->own);
+    good = good && impl_->Add(kind, hosts, &impl_->own);
   }
-  good = good && impl_->Add(CertificateKind::kForeign, host, &impl_->foreign) &&
-         impl_->Add(CertificateKind::kSelfSigned, host, nullptr);
+  good = good && impl_->Add(CertificateKind::kForeign, hosts, &impl_->foreign) &&
+         impl_->Add(CertificateKind::kSelfSigned, hosts, nullptr);
   if (!good) *error = "no certificates: " + OpenSslError();
   return good;
 }

@@ -6,8 +6,8 @@
 
 #include <map>
 #include <memory>
+#include <set>
 #include <string>
-#include <tuple>
 
 #include "tools/twcamsim/behaviour.h"
 
@@ -19,9 +19,9 @@ class Certificates {
   Certificates(const Certificates&) = delete;
   Certificates& operator=(const Certificates&) = delete;
 
-  // Makes the authority and a certificate of each kind, for `host`, localhost and 127.0.0.1.
+  // Makes the authority and a certificate of each kind, for all `hosts`, localhost and 127.0.0.1.
   // Results: false with the reason in `error`.
-  bool Make(const std::string& host, std::string* error);
+  bool Make(const std::set<std::string>& hosts, std::string* error);
 
   // Writes the authority's certificate.
   bool WriteAuthority(const std::string& path, std::string* error) const;

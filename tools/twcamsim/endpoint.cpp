@@ -74,6 +74,10 @@ bool SetCommon(const Option& option, Endpoint* endpoint, std::string* error) {
   if (name == "port") return SetPort(value, endpoint, error);
   if (name == "login") return SetLogin(value, endpoint, error);
   if (name == "fault") return AddFault(value, endpoint, error);
+  if (name == "tls" && !value.empty()) {
+    *error = "tls takes no value";
+    return false;
+  }
   if (name == "name") endpoint->name = value;
   if (name == "host") endpoint->host = value;
   if (name == "tls") endpoint->tls = true;

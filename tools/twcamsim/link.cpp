@@ -79,9 +79,11 @@ struct Link::Impl {
     timer.cancel(ignored);
   }
 
-  bool PeerBroke() {
+  // Whether one of `events` has come, without waiting. A peer that only closed its direction
+  // (POLLRDHUP) may still want its answer.
+  bool Came(int events) {
     pollfd watched = {socket.native_handle(), POLLRDHUP, 0};
-    return poll(&watched, 1, 0) > 0 && (watched.revents & (POLLERR | POLLHUP)) != 0;
+    return poll(&watched, 1, 0) > 0 && (watched.revents & events) != 0;
   }
 
   asio::io_context io{1};
@@ -171,7 +173,7 @@ Io Link::Pause(Milliseconds span) {
   for (;;) {
     const auto left = std::chrono::ceil<Milliseconds>(end - std::chrono::steady_clock::now());
     if (left.count() <= 0) return Io::kDone;
-    if (impl_->PeerBroke()) return Io::kReset;
+    if (impl_->Came(POLLERR | POLLHUP)) return Io::kReset;
     size_t ignored = 0;
     impl_->timer.expires_after(std::min(left, kStep));
     const Io result = impl_->Await(Milliseconds::max(), &ignored, [this](auto handler) {
@@ -192,9 +194,15 @@ Io Link::HoldUntilPeerLeaves(Milliseconds limit) {
   }
 }
 
+// The end of what nobody reads is not to be read either.
 Io Link::HoldUnread(Milliseconds limit) {
-  const Io result = Pause(limit);
-  return result == Io::kDone ? Io::kTimeout : result;
+  constexpr Milliseconds kStep{100};
+  for (Milliseconds left = limit; left.count() > 0; left -= kStep) {
+    if (impl_->Came(POLLRDHUP)) return Io::kEnd;
+    const Io result = Pause(std::min(left, kStep));
+    if (result != Io::kDone) return result;
+  }
+  return Io::kTimeout;
 }
 
 void Link::Close(bool close_notice) {

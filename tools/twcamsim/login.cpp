@@ -169,7 +169,8 @@ Verdict Login::CheckDigest(const LoginStyle& style, const Request& request,
                                  : "the response is " + cause);
   }
   Verdict verdict = Refused("digest", user, "", "");
-  verdict.passed = CheckNonce(style, Word(words, "nonce"), Word(words, "nc"), &verdict);
+  // Without qop, nc has no meaning and may be anything.
+  verdict.passed = CheckNonce(style, input.nonce, input.qop.empty() ? "" : input.count, &verdict);
   return verdict;
 }
 
@@ -206,7 +207,7 @@ bool Login::CheckNonce(const LoginStyle& style, const std::string& nonce, const 
 }
 
 std::string Login::NewNonce(int uses, Random* random) {
-  const std::string nonce = random->Hex(12);
+  std::string nonce = random->Hex(12);
   const std::lock_guard<std::mutex> lock(mutex_);
   if (order_.size() >= kMostNonces) {
     for (size_t i = 0; i < kMostNonces / 2; ++i) nonces_.erase(order_[i]);

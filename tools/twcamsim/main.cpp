@@ -7,6 +7,7 @@
 #include <cstring>
 #include <filesystem>
 #include <random>
+#include <set>
 
 #include "tools/common/json_output.h"
 #include "tools/twcamsim/arguments.h"
@@ -23,7 +24,8 @@ int Complain(int status, const std::string& text) {
   return status;
 }
 
-// The folder for the authority's certificate: one that stays, or one that goes away with this object.
+// The folder for the authority's certificate: one that stays, or one that goes away with this
+// object.
 class Folder {
  public:
   Folder() = default;
@@ -56,11 +58,12 @@ class Folder {
   bool temporary_ = false;
 };
 
-bool NeedsTls(const std::vector<std::unique_ptr<Endpoint>>& endpoints) {
+std::set<std::string> TlsHosts(const std::vector<std::unique_ptr<Endpoint>>& endpoints) {
+  std::set<std::string> hosts;
   for (const auto& endpoint : endpoints) {
-    if (endpoint->tls) return true;
+    if (endpoint->tls) hosts.insert(endpoint->host);
   }
-  return false;
+  return hosts;
 }
 
 bool PrepareWorld(const Arguments& arguments, World* world, std::string* error) {
@@ -79,8 +82,9 @@ int Serve(const Arguments& arguments, std::vector<std::unique_ptr<Endpoint>> end
   Json::Value report(Json::objectValue);
   report["seed"] = static_cast<Json::UInt64>(world.seed);
   report["pid"] = getpid();
-  if (NeedsTls(endpoints)) {
-    if (!folder.Make(arguments.dir, &error) || !world.certificates.Make(arguments.listen, &error) ||
+  const std::set<std::string> hosts = TlsHosts(endpoints);
+  if (!hosts.empty()) {
+    if (!folder.Make(arguments.dir, &error) || !world.certificates.Make(hosts, &error) ||
         !world.certificates.WriteAuthority(folder.Path() + "/ca.pem", &error)) {
       return Complain(kFailed, error);
     }

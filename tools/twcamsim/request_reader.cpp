@@ -98,7 +98,8 @@ Io RequestReader::ReadMore() {
   }
   if (behaviour_.request_limit >= 0) {
     if (taken_ >= behaviour_.request_limit) return result_ = Io::kEnd;
-    most = std::min(most, static_cast<size_t>(behaviour_.request_limit - taken_));
+    const int64_t left = behaviour_.request_limit - taken_;
+    most = static_cast<size_t>(std::min(static_cast<int64_t>(most), left));
   }
   const size_t before = pending_.size();
   result_ = link_->Read(&pending_, most, limit_);

@@ -10,7 +10,16 @@
 
 #include "tools/twcamsim/request.h"
 
-enum class Part { kStatusLine, kHeader, kBlank, kBody, kChunkSize, kChunkEnd, kLastChunk };
+enum class Part {
+  kEarlier,
+  kStatusLine,
+  kHeader,
+  kBlank,
+  kBody,
+  kChunkSize,
+  kChunkEnd,
+  kLastChunk
+};
 
 enum class Action {
   kSend,

@@ -1,11 +1,15 @@
 #include "tools/twcamsim/server.h"
 
+#include <unistd.h>
+
 #include <boost/asio/io_context.hpp>
 #include <boost/asio/ip/tcp.hpp>
 #include <boost/asio/signal_set.hpp>
 #include <boost/asio/steady_timer.hpp>
+#include <boost/system/system_error.hpp>
 #include <csignal>
 #include <list>
+#include <system_error>
 #include <thread>
 
 namespace asio = boost::asio;
@@ -14,7 +18,7 @@ using boost::system::error_code;
 
 namespace {
 
-constexpr size_t kMostConnections = 256;
+constexpr size_t kMostConnections = 200;  // each takes four descriptors of the usual 1024
 constexpr std::chrono::milliseconds kFullWait{20};
 
 struct Served {
@@ -44,6 +48,7 @@ struct Server::Impl {
   bool OpenQueue(Listener* listener, error_code* code);
   void FillQueue(Listener* listener);
   void Accept(Listener* listener);
+  void AcceptLater(Listener* listener);
   void Begin(Endpoint* endpoint, tcp::socket socket);
   void Reap();
   void EndAll();
@@ -114,24 +119,33 @@ void Server::Impl::FillQueue(Listener* listener) {
     listener->fillers.emplace_back(io, tcp::v4());
     tcp::socket& filler = listener->fillers.back();
     filler.native_non_blocking(true, code);
-    // Not the object's own connect, which waits for the answer whatever the socket's mode is.
-    ::connect(filler.native_handle(), own.data(), static_cast<socklen_t>(own.size()));
+    // Its result says "in progress". The object's own connect waits for the answer, whatever the
+    // socket's mode is.
+    (void)::connect(filler.native_handle(), own.data(), static_cast<socklen_t>(own.size()));
   }
 }
 
 void Server::Impl::Accept(Listener* listener) {
   Reap();
   if (served.size() >= kMostConnections) {
-    listener->timer.expires_after(kFullWait);
-    listener->timer.async_wait([this, listener](const error_code& code) {
-      if (!code) Accept(listener);
-    });
+    AcceptLater(listener);
     return;
   }
   listener->acceptor.async_accept([this, listener](const error_code& code, tcp::socket socket) {
     if (code == asio::error::operation_aborted) return;
-    if (!code) Begin(listener->endpoint, std::move(socket));
+    if (code) {  // no descriptor is left, say
+      AcceptLater(listener);
+      return;
+    }
+    Begin(listener->endpoint, std::move(socket));
     Accept(listener);
+  });
+}
+
+void Server::Impl::AcceptLater(Listener* listener) {
+  listener->timer.expires_after(kFullWait);
+  listener->timer.async_wait([this, listener](const error_code& code) {
+    if (!code) Accept(listener);
   });
 }
 
@@ -140,9 +154,16 @@ void Server::Impl::Begin(Endpoint* endpoint, tcp::socket socket) {
   error_code code;
   const int fd = socket.release(code);
   if (code) return;
-  served.push_back({std::make_unique<Session>(world, endpoint, fd, number), {}});
-  Session* session = served.back().session.get();
-  served.back().thread = std::thread([session] { session->Run(); });
+  Served& one = served.emplace_back();
+  try {
+    one.session = std::make_unique<Session>(world, endpoint, fd, number);
+    one.thread = std::thread([session = one.session.get()] { session->Run(); });
+  } catch (const std::system_error&) {  // no thread is left: the client's connection closes
+    served.pop_back();
+  } catch (const boost::system::system_error&) {  // no descriptor is, for what a session needs
+    served.pop_back();
+    ::close(fd);
+  }
 }
 
 void Server::Impl::Reap() {

@@ -69,9 +69,15 @@ Session::Session(World* world, Endpoint* endpoint, int fd, int number)
 }
 
 void Session::Run() {
-  if (Open()) {
-    while (ServeOne()) {
+  try {
+    if (Open()) {
+      while (ServeOne()) {
+      }
     }
+  } catch (const std::exception& exception) {  // no memory for what a fault or a client asks for
+    record_["error"] = exception.what();
+    link_.Reset();
+    End("error");
   }
   WriteRecord();
   finished_ = true;
@@ -126,7 +132,7 @@ void Session::NoteRequest(const Request& request, const Verdict& verdict) {
   entry["body"] = Excerpt(request.body);
   entry["body_bytes"] = static_cast<Json::UInt64>(request.body.size());
   if (!request.sloppy.empty()) entry["sloppy"] = request.sloppy;
-  entry["login"] = LoginRecord(verdict);
+  if (!verdict.scheme.empty()) entry["login"] = LoginRecord(verdict);
   record_["requests"].append(entry);
 }
 
@@ -134,7 +140,8 @@ void Session::NoteAnswer(const Request& request, const Wire& wire) {
   const std::string status = StatusOf(wire);
   Json::Value& requests = record_["requests"];
   if (!requests.empty()) requests[requests.size() - 1]["status"] = status;
-  world_->access.Write(request.method + " " + request.path + " " + status);
+  const auto word = [](const std::string& text) { return text.empty() ? "-" : text; };
+  world_->access.Write(word(request.method) + " " + word(request.path) + " " + word(status));
 }
 
 void Session::WriteRecord() {

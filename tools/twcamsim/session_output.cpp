@@ -46,10 +46,11 @@ bool Session::PlayMore(const Response& response) {
 
 bool Session::Send(const std::string& bytes) {
   if (behaviour_.output_limit < 0) return SendPaced(bytes);
-  const size_t left = static_cast<size_t>(behaviour_.output_limit - sent_);
-  sent_ += static_cast<int64_t>(std::min(left, bytes.size()));
-  if (!SendPaced(bytes.substr(0, left))) return false;
-  if (bytes.size() < left) return true;
+  const int64_t left = behaviour_.output_limit - sent_;
+  const int64_t size = std::min(left, static_cast<int64_t>(bytes.size()));
+  sent_ += size;
+  if (!SendPaced(bytes.substr(0, static_cast<size_t>(size)))) return false;
+  if (size < left) return true;
   return behaviour_.reset_at_limit ? ResetNow() : CloseNow();
 }
 

@@ -5,8 +5,9 @@ namespace {
 
 using std::chrono::milliseconds;
 
-constexpr int64_t kMostBytes = int64_t{1} << 40;
-constexpr int64_t kMostMs = 3600 * 1000;
+constexpr int64_t kMostBytes = int64_t{1} << 40;  // of an output or a request
+constexpr int64_t kMostAtOnce = INT32_MAX;
+constexpr int64_t kMostMs = 3600000;
 
 FaultHooks OnBehaviour(void (*hook)(Behaviour*, const FaultContext&)) {
   FaultHooks hooks;
@@ -122,7 +123,7 @@ std::vector<FaultType> RequestFaults() {
            [](Behaviour* to, const FaultContext&) { to->after_request = AfterRequest::kReset; })},
       {"read-slowly",
        kGroup,
-       {{"BYTES", "1024", 1, kMostBytes}, {"MS", "100", 0, kMostMs}},
+       {{"BYTES", "1024", 1, kMostAtOnce}, {"MS", "100", 0, kMostMs}},
        "reads the request by so many bytes each so many milliseconds",
        OnBehaviour([](Behaviour* to, const FaultContext& context) {
          to->read_piece = static_cast<size_t>(context.Number(0));
@@ -154,12 +155,12 @@ std::vector<FaultType> CutFaults() {
        })},
       {"cut-head",
        kGroup,
-       {{"BYTES", "-1", -1, kMostBytes}},
+       {{"BYTES", "-1", -1, kMostAtOnce}},
        "closes behind so many bytes of the head; -1: where the seed says",
        OnWire(CutHead)},
       {"cut-body",
        kGroup,
-       {{"BYTES", "-1", -1, kMostBytes}},
+       {{"BYTES", "-1", -1, kMostAtOnce}},
        "closes behind so many bytes of the body; -1: where the seed says",
        OnWire(CutBody)},
   };

@@ -1,6 +1,7 @@
 // Faults of the status line and the headers.
 #include <fmt/format.h>
 
+#include <algorithm>
 #include <cctype>
 
 #include "tools/twcamsim/faults.h"
@@ -43,14 +44,16 @@ WireStep* StatusLine(Wire* wire) {
 void EditStatus(Wire* wire, size_t first, size_t last, const std::string& text) {
   WireStep* line = StatusLine(wire);
   if (!line) return;
-  const size_t end = std::min(last, line->bytes.size() - 2);
+  const std::string& bytes = line->bytes;
+  const size_t end = std::min({last, bytes.find_first_of("\r\n"), bytes.size()});
+  if (first > end) return;  // another fault has shortened it
   line->bytes.replace(first, end - first, text);
 }
 
 void Informational(Wire* wire, const FaultContext& context) {
   std::string heads;
   for (int64_t i = 0; i < context.Number(0); ++i) heads += "HTTP/1.1 100 Continue\r\n\r\n";
-  wire->insert(wire->begin(), {Action::kSend, Part::kStatusLine, heads, {}});
+  wire->insert(wire->begin(), {Action::kSend, Part::kEarlier, heads, {}});
 }
 
 void ManyLines(Wire* wire, const FaultContext& context) {

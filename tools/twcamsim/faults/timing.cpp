@@ -5,8 +5,8 @@ namespace {
 
 using std::chrono::milliseconds;
 
-constexpr int64_t kMostMs = 3600 * 1000;
-constexpr int64_t kMostBytes = int64_t{1} << 40;
+constexpr int64_t kMostMs = 3600000;
+constexpr int64_t kMostBytes = INT32_MAX;
 const ArgumentRule kSpan = {"MS", "0", 0, kMostMs};  // 0: for good
 
 FaultType OnWire(const char* name, const char* meaning, void (*hook)(Wire*, const FaultContext&),

@@ -1,4 +1,5 @@
-// A camera's CGI programs, which answer with lines of text; in the open, behind Basic, behind Digest.
+// A camera's CGI programs, which answer with lines of text; in the open, behind Basic, behind
+// Digest.
 #include "tools/twcamsim/profile.h"
 #include "tools/twcamsim/tell.h"
 

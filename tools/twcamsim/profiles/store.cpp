@@ -1,5 +1,5 @@
-// A REST device that keeps XML documents: GET, POST, PUT and DELETE below /presets. What it keeps is
-// gone with the program.
+// A REST device that keeps XML documents: GET, POST, PUT and DELETE below /presets. What it keeps
+// is gone with the program.
 #include <fmt/format.h>
 
 #include <map>
