@@ -18,13 +18,15 @@ struct Field {
   size_t alignment;
 };
 
+template <typename Type>
+constexpr Field FieldAt(size_t offset) {
+  return {offset, sizeof(Type), alignof(Type)};
+}
+
 // The objects have bases and virtual functions, for which the compilers of both architectures know
 // the places all the same.
 #pragma GCC diagnostic ignored "-Winvalid-offsetof"
-#define TEST_FIELD(type, name)                                              \
-  Field {                                                                   \
-    offsetof(type, name), sizeof(type::name), alignof(decltype(type::name)) \
-  }
+#define TEST_FIELD(type, name) FieldAt<decltype(type::name)>(offsetof(type, name))
 
 // True when the fields stand one behind the other from `begin` on, with no more room between them
 // than alignment asks for.

@@ -4,7 +4,7 @@
 #include <string>
 #include <vector>
 
-#include "tools/common/names.h"
+#include "tools/common/words.h"
 
 namespace {
 

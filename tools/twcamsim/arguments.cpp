@@ -4,8 +4,8 @@
 #include <algorithm>
 #include <set>
 
+#include "tools/common/amounts.h"
 #include "tools/common/completion.h"
-#include "tools/common/names.h"
 #include "tools/common/parser.h"
 
 namespace {

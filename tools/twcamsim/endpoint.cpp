@@ -4,7 +4,7 @@
 
 #include <algorithm>
 
-#include "tools/common/names.h"
+#include "tools/common/words.h"
 
 namespace {
 

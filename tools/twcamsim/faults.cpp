@@ -4,7 +4,7 @@
 
 #include <charconv>
 
-#include "tools/common/names.h"
+#include "tools/common/words.h"
 
 namespace {
 

@@ -8,8 +8,8 @@
 #include <iostream>
 #include <map>
 
+#include "tools/common/amounts.h"
 #include "tools/common/completion.h"
-#include "tools/common/names.h"
 #include "tools/common/parser.h"
 #include "tools/twhttp/failure.h"
 

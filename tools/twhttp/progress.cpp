@@ -5,7 +5,7 @@
 #include <algorithm>
 #include <cstdio>
 
-#include "tools/common/names.h"
+#include "tools/common/amounts.h"
 #include "tools/common/terminal.h"
 
 namespace {

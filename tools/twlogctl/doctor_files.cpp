@@ -8,7 +8,7 @@
 #include <optional>
 
 #include "tarnwick/platform/owned.h"
-#include "tools/common/names.h"
+#include "tools/common/amounts.h"
 #include "tools/twlogctl/doctor.h"
 #include "tools/twlogctl/log_paths.h"
 #include "tools/twlogctl/report.h"

@@ -12,7 +12,7 @@
 #include <thread>
 
 #include "tarnwick/platform/owned.h"
-#include "tools/common/names.h"
+#include "tools/common/amounts.h"
 #include "tools/twlogctl/doctor.h"
 #include "tools/twlogctl/file_locks.h"
 #include "tools/twlogctl/log_paths.h"

@@ -2,7 +2,7 @@
 
 #include <cstdio>
 
-#include "tools/common/names.h"
+#include "tools/common/amounts.h"
 
 namespace {
 

@@ -2,7 +2,7 @@
 #include <CLI/CLI.hpp>
 #include <memory>
 
-#include "tools/common/names.h"
+#include "tools/common/amounts.h"
 #include "tools/twlogctl/commands.h"
 #include "tools/twlogctl/lifetime.h"
 #include "tools/twlogctl/set_levels.h"

@@ -8,6 +8,7 @@
 
 #include "tarnwick/log/twdebuglog.h"
 #include "tools/common/names.h"
+#include "tools/common/words.h"
 
 namespace {
 

@@ -8,8 +8,8 @@
 #include <ctime>
 #include <map>
 
+#include "tools/common/amounts.h"
 #include "tools/common/json_output.h"
-#include "tools/common/names.h"
 #include "tools/common/terminal.h"
 #include "tools/twlogctl/commands.h"
 #include "tools/twlogctl/guardian.h"

@@ -12,7 +12,7 @@
 #include <memory>
 #include <optional>
 
-#include "tools/common/names.h"
+#include "tools/common/amounts.h"
 #include "tools/common/terminal.h"
 #include "tools/twlogctl/commands.h"
 #include "tools/twlogctl/log_options.h"

@@ -6,8 +6,8 @@
 #include <cstdio>
 #include <cstdlib>
 
+#include "tools/common/amounts.h"
 #include "tools/common/json_output.h"
-#include "tools/common/names.h"
 #include "tools/common/terminal.h"
 #include "tools/twlogctl/log_plot.h"
 #include "tools/twlogctl/processes.h"
@@ -28,7 +28,7 @@ double Seconds(const StatsReport& report) {
 // page says.
 std::string CommandOf(const StatsReport& report, const std::string& pid) {
   if (!report.ownProcesses || pid.empty()) return "";
-  const auto process = ReadProcess(std::atoi(pid.c_str()));
+  const auto process = ReadProcess(static_cast<pid_t>(std::strtol(pid.c_str(), nullptr, 10)));
   return process ? process->name : "";
 }
 
@@ -51,7 +51,9 @@ void AddTable(const StatsReport& report, const StatsLayout& layout, const std::s
   for (size_t i = 0; i < sorted.size() && i < layout.most; ++i) {
     const auto& [name, amount] = sorted[i];
     const std::string command = title == "process" ? CommandOf(report, name) : "";
-    std::string row = Row(command.empty() ? name : name + " " + command, amount, Seconds(report));
+    std::string shown = name;
+    if (!command.empty()) shown.append(" ").append(command);
+    std::string row = Row(shown, amount, Seconds(report));
     const double part = static_cast<double>(amount.lines) /
                         static_cast<double>(std::max<uint64_t>(sorted[0].second.lines, 1));
     if (layout.width > kTableWidth + 10) {

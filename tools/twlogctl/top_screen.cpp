@@ -6,7 +6,7 @@
 #include <cstdio>
 #include <cwchar>
 
-#include "tools/common/names.h"
+#include "tools/common/amounts.h"
 #include "tools/twlogctl/report.h"
 
 namespace {
