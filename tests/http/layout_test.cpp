@@ -20,6 +20,7 @@ struct Field {
 
 template <typename Type>
 constexpr Field FieldAt(size_t offset) {
+  // NOLINTNEXTLINE(bugprone-sizeof-expression): of a pointer its own size is meant.
   return {offset, sizeof(Type), alignof(Type)};
 }
 
