@@ -15,9 +15,12 @@ size_t FdSet::WordsFor(int fd) {
   return static_cast<size_t>(fd) / NFDBITS + 1;
 }
 
-// Fill sets all the words that select looks at.
+// Of the fd_set only the words are set that select looks at.
 FdSet::FdSet(int fd) : m_fd(fd), m_words(m_small.fds_bits) {
-  if (fd < FD_SETSIZE) return;
+  if (fd < FD_SETSIZE) {
+    std::fill_n(m_words, WordsFor(fd), 0);
+    return;
+  }
   m_large.reset(static_cast<fd_mask*>(std::calloc(WordsFor(fd), sizeof(fd_mask))));
   m_words = m_large.get();
 }

@@ -10,7 +10,7 @@
 // the fd_set inside the object, so that a wait allocates nothing.
 class FdSet {
  public:
-  // A set with room for `fd`, to be filled. REQUIRES: fd >= 0.
+  // An empty set with room for `fd`. REQUIRES: fd >= 0.
   explicit FdSet(int fd);
 
   // False when there was no memory for a large descriptor; the set must not be used then.
