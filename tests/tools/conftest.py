@@ -11,6 +11,7 @@ import os
 import pathlib
 import shlex
 import shutil
+import signal
 import subprocess
 import time
 
@@ -27,7 +28,16 @@ RECORD_KEY = "0x18180004"
 HANG = 120
 
 
+def end_by_signals_again():
+    """What started the run may have it ignore these, as a shell does in the background; the tools
+    under test would inherit that and outlive Ctrl-C."""
+    for number in (signal.SIGHUP, signal.SIGINT, signal.SIGQUIT, signal.SIGTERM):
+        if signal.getsignal(number) == signal.SIG_IGN:
+            signal.signal(number, signal.SIG_DFL)
+
+
 def pytest_sessionstart(session):
+    end_by_signals_again()
     if not os.environ.get("TARNWICK_SANDBOX"):
         pytest.exit("these tests write system paths: run them in scripts/sandbox", returncode=3)
     provide_terminals()
