@@ -134,7 +134,8 @@ zpty -w inner 'compadd() {
   print -rl -- "<"${^found}${suffix%% }">"
 }'
 zpty -w inner 'bindkey "^I" complete-word; zle -C complete-word complete-word _main_complete'
-zpty -w inner 'print -r re""ady'
+# Said by the line editor: what it is sent earlier the terminal would take for plain lines.
+zpty -w inner 'zle-line-init() { print -r -- re""ady }; zle -N zle-line-init'
 while zpty -r inner line; do [[ $line == *ready* ]] && break; done
 zpty -w -n inner "$2"$'\t\C-u print -r -- e""nd\n'
 while zpty -r inner line; do

@@ -229,7 +229,10 @@ def test_the_last_ten_messages_are_shown_first(follow):
 
 def waits_for_the_log(pid):
     """True when the process has the log open and sleeps."""
-    links = [os.readlink(entry.path) for entry in os.scandir(f"/proc/{pid}/fd")]
+    try:
+        links = [os.readlink(entry.path) for entry in os.scandir(f"/proc/{pid}/fd")]
+    except FileNotFoundError:  # closed meanwhile
+        return False
     with open(f"/proc/{pid}/stat", encoding="ascii") as stat:
         return str(LOG) in links and stat.read().rsplit(")")[1].split()[0] == "S"
 
