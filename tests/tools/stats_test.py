@@ -167,7 +167,8 @@ def test_watching_takes_the_span_of_since(start):
     output = Output(start("twlogctl", "stats", "--watch", "1", "--since", "1h", "--json"))
     output.wait_for('"by":"process"')
     total = json.loads(output.lines[0])
-    assert (total["lines"], total["seconds"]) == (1, 3600)
+    assert total["lines"] == 1
+    assert 3600 <= total["seconds"] < 3600 + HANG  # the hour began when the tool was started
     output.end()
 
 
