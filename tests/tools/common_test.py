@@ -15,17 +15,6 @@ from conftest import HANG, LOG_FOLDER, ROOT, SETTINGS_FOLDER, TOOLS
 SETTINGS = SETTINGS_FOLDER / "settings.conf"
 
 
-@pytest.fixture
-def ctl(run):
-    return lambda *args, **options: run("twlogctl", *args, **options)
-
-
-@pytest.fixture
-def record(ctl):
-    assert ctl("create").returncode == 0
-    return shared_record
-
-
 # Names
 
 

@@ -17,6 +17,7 @@ import time
 
 import pexpect
 import pytest
+import shared_record
 
 ROOT = pathlib.Path(__file__).resolve().parents[2]
 TOOLS = ("twlogctl", "twhttp", "twcamsim")
@@ -96,6 +97,19 @@ def run(command):
         )
 
     return run_tool
+
+
+@pytest.fixture
+def ctl(run):
+    """ctl(*args): twlogctl's CompletedProcess."""
+    return lambda *args, **options: run("twlogctl", *args, **options)
+
+
+@pytest.fixture
+def record(ctl):
+    """A new record, every category at notice."""
+    assert ctl("create").returncode == 0
+    return shared_record
 
 
 @pytest.fixture

@@ -23,19 +23,6 @@ COMMANDS = (
 
 
 @pytest.fixture
-def ctl(run):
-    """ctl(*args): twlogctl's CompletedProcess."""
-    return lambda *args, **options: run("twlogctl", *args, **options)
-
-
-@pytest.fixture
-def record(ctl):
-    """A new record, every category at notice."""
-    assert ctl("create").returncode == 0
-    return shared_record
-
-
-@pytest.fixture
 def as_nobody(command):
     """as_nobody(*args): twlogctl's CompletedProcess as a user who owns nothing."""
     prefix = ["setpriv", "--reuid=65534", "--regid=65534", "--clear-groups"]
