@@ -9,7 +9,6 @@ import subprocess
 
 import pytest
 
-import shared_record
 from conftest import HANG, LOG_FOLDER, ROOT, SETTINGS_FOLDER, TOOLS
 
 SETTINGS = SETTINGS_FOLDER / "settings.conf"
