@@ -10,17 +10,17 @@ std::string TWHttpClient::GenBasicAccessAuth() {
 }
 
 std::string TWHttpClient::GenDigestAccessAuth(std::string method, std::string /*body*/) {
-  ChallengeMap challenge = ParseChallenge(m_strAuthenticate);
+  const ChallengeMap challenge = ParseChallenge(m_strAuthenticate);
   DIGEST_ACCESS_AUTH login;
   login.username = m_strUser;
-  login.realm = challenge["realm"];
-  login.nonce = challenge["nonce"];
+  login.realm = challenge.at("realm");
+  login.nonce = challenge.at("nonce");
   login.uri = "/" + m_strPath;
-  login.qop = challenge["qop"];
+  login.qop = challenge.at("qop");
   login.nc = "00000001";
   login.cnonce = MakeClientNonce();
-  login.algorithm = challenge["algorithm"];
-  login.opaque = challenge["opaque"];
+  login.algorithm = challenge.at("algorithm");
+  login.opaque = challenge.at("opaque");
   login.response = DigestResponse(login, m_strPassword, method);
   return DigestLine(login);
 }
