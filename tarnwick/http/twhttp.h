@@ -44,7 +44,8 @@ enum HTTP_MAP_KEY : int {
 
 // The protocol version to send. The values are libcurl's.
 enum HTTP_VERSION : int {
-  // HTTP/1.0 on the socket GET, HTTP/1.1 on the form POST, libcurl's default on the libcurl paths
+  // HTTP/1.0 on the socket GET, HTTP/1.1 on the form POST, libcurl's default in SendRequestByPost.
+  // The other requests do not look at the version.
   HTTP_VERSION_NONE = 0,
   HTTP_VERSION_1_0 = 1,  // HTTP/1.0
   HTTP_VERSION_1_1 = 2,  // HTTP/1.1
@@ -126,7 +127,8 @@ class TARNWICK_API TWHttpClient {
   void SetCurlRespFile(FILE* file);
 
   // Sets the cookie to send, as it stands. A response's head replaces it: with its last Set-Cookie,
-  // or with nothing. Results: 0.
+  // or with nothing, so that the second request of a login has the one that the 401 brought.
+  // Results: 0.
   int SetCookie(std::string cookie);
 
   // Copies the cookie to `out`. Results: 0.
@@ -135,7 +137,8 @@ class TARNWICK_API TWHttpClient {
   // The Transfer-Encoding of the last response that had one.
   std::string GetTransferEncoding();
 
-  // Stores the last response's status code in `status`, 0 when none was read.
+  // Stores the last response's status code in `status`, 0 when none was read. A request through
+  // libcurl has an outcome, and leaves the code as it was.
   // Results: HTTP_RET_NOT_READY before the first request, then the outcome of the last one.
   int CheckResponse(int& status);
 
@@ -175,7 +178,7 @@ class TARNWICK_API TWHttpClient {
   // Sends one request through libcurl, which also follows its proxy settings.
   //
   // HTTP_METHOD_GET fetches host and path. Any other method posts the path as a form to the host's
-  // root. The body is collected in memory, for the one-call functions, or written to the response
+  // root. The login is sent at once, by Basic. The body is collected in memory, for the one-call functions, or written to the response
   // file.
   // Arguments: `verifyPeer` false accepts any certificate and host name; `timeout` limits the whole
   //   transfer, in seconds, 0 does not, and a negative one fails. A name server that is silent may
@@ -357,6 +360,8 @@ class TARNWICK_API TWHttpClient {
 //   status, a read or an empty body made it fail; -2 when the body is no JSON, or "success" is
 //   missing or not true, and `result` may then hold a part of the reply.
 // Throws nothing; so the other two.
+// Blocks: as the client's GET, until the server closes.
+// Threads: any; so the other two.
 TARNWICK_API int SendHttpGet(const std::string& host, int port, std::string path,
                              Json::Value& result, int timeout, bool encodeQuery);
 
@@ -365,12 +370,14 @@ TARNWICK_API int SendHttpGet(const std::string& host, int port, std::string path
 // Arguments: `body` is encoded already; an empty `cookie` is left out, with a line in the log;
 //   `timeout` in seconds for connecting and each wait.
 // Results: 0 when the request was sent, whatever the server answered; -1 when it was not.
+// Blocks: as the client's socket requests, until the reply's head is there.
 TARNWICK_API int SendHttpPost(const std::string& host, int port, const std::string& path,
                               const std::string& body, const std::string& cookie, int timeout);
 
 // As SendHttpGet, over TLS through libcurl, with the certificate and host name verified.
 //
 // Arguments: `timeout` limits the whole transfer, in seconds, as in SendRequestByCurl.
+// Blocks: for that long.
 // Results: 0; -1 when the transfer failed or the status is not from 200 to 299; -2 when the
 //   certificate could not be verified; -3 when the body is no JSON, or "success" is missing or not
 //   true. An empty body counts as success and leaves `result` as it was.

@@ -39,7 +39,7 @@ std::string TWHttpClient::BuildFormPost(const std::string& content) const {
   if (!m_strCookie.empty()) request += "Cookie: " + m_strCookie + "\r\n";
   request += "Content-Type: application/x-www-form-urlencoded; charset=utf-8\r\n";
   request += "Content-Length: " + IntToString(static_cast<int64_t>(content.size())) + "\r\n";
-  // The semicolon is on the wire since the first release, and services compare the line.
+  // The semicolon belongs there: services compare the whole line.
   if (http11) request += "Connection: close;\r\n";
   request += "\r\n";
   request += content;

@@ -128,6 +128,7 @@ enum LOG_TYPE : int {
 
 // The names of one enumeration, LOG_CATEG or LOG_LEVEL: the default constructor fills in each name.
 // The names are literals that the map does not own.
+// Threads: as std::map.
 template <typename T>
 class TWEnum2StrMap : public std::map<T, const char*> {
  public:
@@ -211,11 +212,13 @@ static_assert(sizeof(TWDbgLogCfg) == 300, "every process of the product shares t
 TARNWICK_API extern TWDbgLogCfg* g_pDbgLogCfg;
 
 // The System V key of the record's segment: 0x18180004.
+// Threads: any.
 TARNWICK_API key_t TWShmDbgLogIPCKey();
 
 // Attaches the record's segment, read-write; never creates it.
 // Results: the record, to be released with shmdt; null when there is no segment or it may not be
 //   attached.
+// Threads: any; each call attaches once more.
 TARNWICK_API TWDbgLogCfg* TWShmDbgLogCfgAt();
 
 // Sets g_pDbgLogCfg to TWShmDbgLogCfgAt(). Runs by itself when the library is loaded; a process

@@ -72,8 +72,8 @@ class TARNWICK_API TWSocket {
   // Sets host, port, time-out and mode for the next connection and closes an open one.
   void SetSocketInfo(const std::string& host, int port, int timeout, bool buffered);
 
-  // Sets the local source address to bind before connecting, in network byte order; 0 for none. The
-  // name has historical reasons. An address that cannot be bound is logged and ignored.
+  // Sets the local source address to bind before connecting, in network byte order; 0 for none.
+  // An address that cannot be bound is logged and ignored. Callers know the function by this name.
   void SetRemoteAddr(unsigned int addr);
 
   // The connect sequence without PostConnect: the descriptor stays blocking. Results: 0 or -1.

@@ -1,9 +1,12 @@
 // Bodies and header lines, beside a plain way to read them, on input that is cut at random places.
 #include <malloc.h>
 #include <strings.h>
+#include <unistd.h>
 
 #include <algorithm>
+#include <cinttypes>
 #include <random>
+#include <sstream>
 
 #include "tarnwick/http/chunk_size.h"
 #include "tarnwick/http/head_parser.h"
@@ -81,18 +84,44 @@ std::string PlainChunks(PieceClient* client) {
   }
 }
 
+// What stands between the digits of a size line and the chunk: mostly a line end alone.
+std::string RandomLineRest(std::mt19937* random) {
+  static constexpr size_t kExtensions[] = {0, 0, 0, 0, 0, 4, 250, 253, 254, 255, 300, 9000};
+  static constexpr const char* kEnds[] = {"\r\n", "\r\n", "\n", "\rx"};
+  const std::string extension(kExtensions[(*random)() % 12], ';');
+  return extension + kEnds[(*random)() % 4];
+}
+
 std::string RandomChunks(std::mt19937* random) {
-  static constexpr size_t kSizes[] = {1, 2, 63, 64, 1023, 1024, 4096, 8191, 8192, 8193, 20000};
+  static constexpr size_t kSizes[] = {1, 2, 3, 63, 64, 65, 1023, 1024, 4096, 8191, 8192, 20000};
   std::string text;
-  for (size_t left = (*random)() % 30; left > 0; --left) {
-    const size_t size = kSizes[(*random)() % 11];
-    char line[32];
-    snprintf(line, sizeof(line), "%zx%s\r\n", size, (*random)() % 4 == 0 ? ";a=b" : "");
-    text += line + std::string(size, static_cast<char>('a' + left % 26)) + "\r\n";
+  const size_t kinds = (*random)() % 2 == 0 ? 6 : 12;  // often so small that many are read at once
+  for (size_t left = (*random)() % 200; left > 0; --left) {
+    const size_t size = kSizes[(*random)() % kinds];
+    char digits[32];
+    snprintf(digits, sizeof(digits), (*random)() % 2 == 0 ? "%zx" : "%09zX", size);
+    text += digits + RandomLineRest(random);
+    text += std::string(size, static_cast<char>('a' + left % 26));
+    text += (*random)() % 8 == 0 ? "ab" : "\r\n";
   }
   text += "0\r\n\r\nrest";
   if ((*random)() % 4 == 0) text.resize((*random)() % text.size());
   return text;
+}
+
+// The chunk at the front, by the reads of a socket that has the bytes in its buffer.
+std::string PlainWholeChunk(const std::string& bytes) {
+  PieceClient client("", 0, "chunked");
+  if (client.pieces->RestoreData(const_cast<char*>(bytes.data()), static_cast<int>(bytes.size()))) {
+    return "";
+  }
+  char piece[8192];
+  const int length = client.ReadToLineEnd(piece, sizeof(piece));
+  const uint32_t size = length < 1 ? 0 : ParseChunkSize({piece, static_cast<size_t>(length)});
+  if (size == 0 || size > sizeof(piece)) return "";
+  if (client.ReadData(piece, static_cast<int>(size)) < static_cast<int>(size)) return "";
+  char ending[2];
+  return client.ReadData(ending, 2) == 2 ? std::string(piece, size) : "";
 }
 
 // What is left on the connection, and how it was read, must be the same too.
@@ -113,6 +142,71 @@ TEST(FastBody, OfChunksIsWhatReadsIntoABufferGive) {
     EXPECT_EQ(fast.ReadBody(body), HTTP_RET_OK);
     EXPECT_TRUE(body == PlainChunks(&plain));
     ExpectTheSameBehind(&fast, &plain);
+  }
+}
+
+TEST(FastBody, OfAWholeChunkIsWhatReadsGiveOrNothing) {
+  std::mt19937 random(11);
+  static constexpr const char* kWords[] = {"1", "a",        "F",         "0",         ";x",
+                                           " ", "\r\n",     "\r\n",      "\n",        "\r",
+                                           "g", "abcdefgh", "100000001", "data of 10"};
+  size_t whole = 0;
+  for (int round = 0; round < 30000 && !testing::Test::HasFailure(); ++round) {
+    std::string bytes;
+    for (size_t words = random() % 8; words > 0; --words) bytes += kWords[random() % 14];
+    SCOPED_TRACE(testing::PrintToString(bytes));
+    EXPECT_EQ(WholeChunk(bytes), PlainWholeChunk(bytes));
+    if (!WholeChunk(bytes).empty()) ++whole;
+  }
+  EXPECT_GT(whole, 1000u);  // else nothing was compared
+}
+
+TEST(FastBody, LeavesLongSizeLinesToTheLineReader) {
+  const std::string chunk = "\r\ndata\r\n";
+  EXPECT_EQ(WholeChunk("4" + std::string(254, ';') + chunk), "data");
+  EXPECT_EQ(WholeChunk("4" + std::string(255, ';') + chunk), "");
+  EXPECT_EQ(WholeChunk(std::string(255, '0') + "4" + chunk), "");
+}
+
+// The mapping's flags; empty where the system does not tell.
+std::string FlagsOfMapping(const void* address) {
+  const auto wanted = reinterpret_cast<uintptr_t>(address);
+  std::istringstream mappings(ReadFile("/proc/self/smaps"));
+  bool found = false;
+  for (std::string line; std::getline(mappings, line);) {
+    uintptr_t begin = 0;
+    uintptr_t end = 0;
+    if (sscanf(line.c_str(), "%" SCNxPTR "-%" SCNxPTR " ", &begin, &end) == 2) {
+      found = begin <= wanted && wanted < end;
+    } else if (found && line.rfind("VmFlags:", 0) == 0) {
+      return line;
+    }
+  }
+  return "";
+}
+
+// A large body costs more for its page faults than for its bytes.
+TEST(FastBody, OfManyMegabytesLiesInLargePages) {
+  if (access("/sys/kernel/mm/transparent_hugepage/enabled", F_OK) != 0 || IsEmulated()) {
+    GTEST_SKIP() << "the kernel has no large pages to ask for";
+  }
+  const std::string text(size_t{40} << 20, 'x');
+  PieceClient client(text, 1, "");
+  std::string body;
+  EXPECT_EQ(client.ReadBody(body), HTTP_RET_OK);
+  EXPECT_TRUE(body == text);
+  const std::string flags = FlagsOfMapping(body.data() + body.size() / 2);
+  EXPECT_NE(flags.find(" hg"), std::string::npos) << flags;
+}
+
+// A body takes what arrived, whatever was announced.
+TEST(FastBody, HasAtMostFourTimesItsLengthReserved) {
+  for (const size_t size : {size_t{70000}, size_t{300000}, size_t{5} << 20}) {
+    PieceClient client(std::string(size, 'x'), 2, "");
+    std::string body;
+    EXPECT_EQ(client.ReadBody(body), HTTP_RET_OK);
+    EXPECT_EQ(body.size(), size);
+    EXPECT_LE(body.capacity(), 4 * size);
   }
 }
 

@@ -14,6 +14,17 @@ from conftest import HANG, LOG_FOLDER, ROOT, SETTINGS_FOLDER, TOOLS
 SETTINGS = SETTINGS_FOLDER / "settings.conf"
 
 
+# Versions
+
+
+@pytest.mark.parametrize("tool", TOOLS)
+def test_the_version_is_that_of_the_header(run, tool):
+    header = (ROOT / "tarnwick" / "version.h").read_text()
+    parts = re.findall(r"^#define TARNWICK_VERSION_(?:MAJOR|MINOR|PATCH) (\d+)$", header, re.MULTILINE)
+    result = run(tool, "--version")
+    assert (result.returncode, result.stdout) == (0, f"{tool} {'.'.join(parts)}\n")
+
+
 # Names
 
 

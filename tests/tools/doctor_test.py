@@ -416,6 +416,8 @@ def test_logs_that_nothing_rotates(doctor, healthy):
     assert str(LOG) in finding["text"]
     assert str(NOTIFICATIONS) in finding["text"]
     subprocess.run(finding["fix"], shell=True, check=True)
+    words = (ROTATION / "tarnwick").read_text().split()
+    assert "delaycompress" in words, "a writer may still hold the renamed file"
     assert doctor() == {}
 
 

@@ -4,6 +4,7 @@
 #include <string>
 #include <vector>
 
+#include "tarnwick/version.h"
 #include "tools/common/words.h"
 
 namespace {
@@ -32,6 +33,14 @@ std::string UnknownCommand(const CLI::App& app, int argc, char** argv) {
 }
 
 }  // namespace
+
+void AddVersionFlag(CLI::App* app) {
+  app->set_version_flag("--version",
+                        app->get_name() + " " + std::to_string(TARNWICK_VERSION_MAJOR) + "." +
+                            std::to_string(TARNWICK_VERSION_MINOR) + "." +
+                            std::to_string(TARNWICK_VERSION_PATCH),
+                        "print the version");
+}
 
 std::optional<int> ParseArguments(CLI::App* app, int argc, char** argv) try {
   app->parse(argc, argv);

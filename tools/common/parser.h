@@ -5,6 +5,10 @@
 #include <CLI/CLI.hpp>
 #include <optional>
 
+// --version, which prints the tool's name and the version that it was built as.
+// REQUIRES: `app` has the tool's name.
+void AddVersionFlag(CLI::App* app);
+
 // Parses the arguments, which runs the callbacks of `app`. A mistake is told on standard error as
 // "NAME: what is wrong" with a pointer to --help, and is wrong usage: 2. --help and its like print
 // and give 0.

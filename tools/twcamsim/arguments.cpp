@@ -130,7 +130,7 @@ std::optional<int> ParseArguments(int argc, char** argv, Arguments* arguments) {
       "A camera that behaves, and one that does not: serves the profiles of simulated "
       "devices with the faults that are asked for.",
       "twcamsim");
-  app.set_version_flag("--version", std::string("twcamsim 1.0.0"));
+  AddVersionFlag(&app);
   AddServing(&app, arguments);
   AddFiles(&app, arguments);
   AddLimits(&app, arguments);

@@ -238,6 +238,7 @@ bool ReadOptions(int argc, char** argv, Options* options, int* exit_code) {
   Raw raw;
   app.require_subcommand(1);
   app.footer(kFooter);
+  AddVersionFlag(&app);
   AddCompletion(&app, {{"--http", {"default", "1.0", "1.1"}},
                        {"--data-file", {kCompleteFiles}},
                        {"--password-file", {kCompleteFiles}},

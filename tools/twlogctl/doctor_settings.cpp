@@ -110,6 +110,7 @@ void CheckRotation(Findings* findings) {
   findings->push_back({"rotation", Verdict::kWrong,
                        "nothing rotates " + missing + ", which grows until the disk is full",
                        "printf '" + folder +
-                           "/*.log {\\n  weekly\\n  rotate 8\\n  compress\\n  missingok\\n}\\n' >" +
+                           "/*.log {\\n  size 10M\\n  rotate 5\\n  missingok\\n  nocreate\\n  "
+                           "compress\\n  delaycompress\\n}\\n' >" +
                            kRotationFolder + "/tarnwick"});
 }

@@ -45,6 +45,7 @@ int main(int argc, char** argv) try {
   CLI::App app("Shows and changes the shared log levels, and reads the logs.", "twlogctl");
   app.require_subcommand(1);
   app.footer("Exit codes: 0 done; 1 something is wrong, or nothing was found; 2 wrong usage.");
+  AddVersionFlag(&app);
   int exitCode = kExitDone;
   AddCommands(&app, &exitCode);
   AddCompletion(&app, Words());
