@@ -102,23 +102,23 @@ class TARNWICK_API TWHttpClient {
   //
   // Arguments: `path` with its query, leading "/" are stripped; `host` a name or a dotted IPv4
   //   address; `timeout` in seconds for connecting and each wait of the socket operations, negative
-  //   for none; `bufferedRead` reads ahead (wanted for speed; direct reading costs a system call a
-  //   byte of the head); `encodeQuery` percent-encodes the values of the query on the socket GET,
+  //   for none; `bufferedRead` reads ahead (wanted for speed; direct reading costs two system calls
+  //   a byte of the head); `encodeQuery` percent-encodes the values of the query on the socket GET,
   //   but the characters of `encodeKeep`; `basicAuth` sends the login with the first GET instead of
   //   waiting to be asked; `https` uses TLS.
   void Init(std::string path, std::string host, int port, std::string user, std::string password,
             int timeout, bool bufferedRead, bool encodeQuery, bool basicAuth, HTTP_VERSION version,
             std::string encodeKeep, bool https);
 
-  // Creates the socket: TLS when the client uses https. Init calls it. A socket that is there already
-  // is not released.
+  // Creates the socket: TLS when the client uses https. Init calls it. A socket that is there
+  // already is not released.
   void InitSocket(int timeout, bool bufferedRead);
 
   // Sets the path of the next request; leading "/" are stripped.
   void SetPath(std::string path);
 
-  // Sets the local source address of the next connection, in network byte order; 0 for none. Without a
-  // socket nothing happens.
+  // Sets the local source address of the next connection, in network byte order; 0 for none. Without
+  // a socket nothing happens.
   void SetSocketRemoteAddr(unsigned int addr);
 
   // Writes headers and body of SendRequestByCurl's responses to `file`, from its current position;
@@ -137,19 +137,21 @@ class TARNWICK_API TWHttpClient {
   // The Transfer-Encoding of the last response that had one.
   std::string GetTransferEncoding();
 
-  // Stores the last response's status code in `status`, 0 when none was read. A request through
-  // libcurl has an outcome, and leaves the code as it was.
-  // Results: HTTP_RET_NOT_READY before the first request, then the outcome of the last one.
+  // Stores the status code of the last response over the socket in `status`, 0 when none was read.
+  // Results: HTTP_RET_NOT_READY before the first request, then the outcome of the last one: of its
+  //   response over the socket, or of the whole transfer through libcurl. A request that could not
+  //   be written leaves both as they were.
   int CheckResponse(int& status);
 
   // Copies a header of the last response to `out`.
-  // Results: HTTP_RET_OK; HTTP_RET_BAD_KEY; HTTP_RET_NOT_READY before a head was read;
-  //   HTTP_RET_NO_CONTENT when the response had no such header. `out` stays as it is after a
-  //   failure.
+  // Results: HTTP_RET_OK; HTTP_RET_BAD_KEY; HTTP_RET_NOT_READY before a head was read, and behind a
+  //   transfer through libcurl that succeeded; HTTP_RET_NO_CONTENT when the response had
+  //   no such header. `out` stays as it is after a failure.
   int GetHttpContent(HTTP_MAP_KEY key, std::string& out) const;
 
   // Reads from and writes to the connection behind a response's head, as TWSocket does.
-  // Results: TWSocket's; -1 while no head has been read.
+  // Results: TWSocket's; -1 while no head has been read, and behind a transfer through libcurl that
+  //   succeeded.
   int ReadData(char* buf, int len);
   int WriteData(const char* buf, int len);
 
@@ -178,8 +180,8 @@ class TARNWICK_API TWHttpClient {
   // Sends one request through libcurl, which also follows its proxy settings.
   //
   // HTTP_METHOD_GET fetches host and path. Any other method posts the path as a form to the host's
-  // root. The login is sent at once, by Basic. The body is collected in memory, for the one-call functions, or written to the response
-  // file.
+  // root. The login is sent at once, by Basic. The body is collected in memory, for the one-call
+  // functions, or written to the response file.
   // Arguments: `verifyPeer` false accepts any certificate and host name; `timeout` limits the whole
   //   transfer, in seconds, 0 does not, and a negative one fails. A name server that is silent may
   //   hold the call longer.
@@ -242,7 +244,8 @@ class TARNWICK_API TWHttpClient {
   // caller has written. After the senders that read the head themselves, call ReadBody instead;
   // here the body would be taken for a status line.
   //
-  // Results: the body; the text {"error":true} when the head is no success or a read failed.
+  // Results: the body, as ReadBody gives it; the text {"error":true} when the head is no success,
+  //   or where ReadBody fails.
   std::string GetResp();
 
   // Opens a streaming upload: connects and sends the head of a multipart POST of 128 GiB, so that
@@ -262,7 +265,8 @@ class TARNWICK_API TWHttpClient {
   // Arguments: `timeout` limits the whole transfer, in seconds, as in SendRequestByCurl; the others
   //   have no limit.
   // Results: HTTP_RET_OK after a status from 200 to 299; HTTP_RET_IO_ERROR after anything else.
-  // SendReqByXMLPost sends at most 8,191 bytes of the document, indented.
+  // SendReqByXMLPost sends at most 8,191 bytes of the document, indented. Without a document both
+  // fail and send nothing.
   int SendReqByXMLGet(int timeout);
   int SendReqByXMLPost(xmlDoc*& doc);
   int SendReqByXMLPut(xmlDoc*& doc);
@@ -276,7 +280,8 @@ class TARNWICK_API TWHttpClient {
 
   // Reads and parses the head of a reply, after a request has been written.
   // Results: the codes of the status, HTTP_RET_OK to HTTP_RET_URI_TOO_LONG; HTTP_RET_NOT_READY
-  //   without a request written, or after a header line without name or value; HTTP_RET_IO_ERROR
+  //   without a request written, or after a header line without a name, or one of the names that
+  //   are kept without a value; HTTP_RET_IO_ERROR
   //   after a failed read or half a status line; HTTP_RET_BAD_RESPONSE when it is no HTTP/1.0 or
   //   HTTP/1.1 reply.
   int CheckHttpResponse();
@@ -312,7 +317,7 @@ class TARNWICK_API TWHttpClient {
   std::string m_strPassword;
   std::string m_strCookie;
   std::string m_strAuthenticate;   // the challenge of the last response
-  std::string m_strAuthorization;  // one header line for the next request, which empties it
+  std::string m_strAuthorization;  // one header line for the next GET or SOAP POST, which drops it
   std::string m_strTransferEncoding;
   std::string m_strEncodeKeep;
   std::string m_strCurlText;

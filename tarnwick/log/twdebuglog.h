@@ -127,7 +127,7 @@ enum LOG_TYPE : int {
 };
 
 // The names of one enumeration, LOG_CATEG or LOG_LEVEL: the default constructor fills in each name.
-// The names are literals that the map does not own.
+// The names are literals that the map does not own. Throws std::bad_alloc when memory runs out.
 // Threads: as std::map.
 template <typename T>
 class TWEnum2StrMap : public std::map<T, const char*> {
@@ -176,9 +176,9 @@ class TARNWICK_API TWDbgLogCfg {
   //
   // A shorter list changes the first levels only; numbers after the 74th are ignored; text that is
   // not a number counts as 0. The flag is set by "yes" exactly, and cleared by any other value.
-  // Results: 0; -1 when one of the keys is missing or empty, or the file unreadable. What is
-  //   missing stays as it is in the record; the levels are loaded even when the flag's key is
-  //   missing.
+  // Results: 0; -1 when one of the keys is missing or empty, the file unreadable or memory
+  //   short. What is missing stays as it is in the record; the levels are loaded even when the
+  //   flag's key is missing.
   int LoadDbgLogSettings();
 
   // Writes both keys from this record into the settings file, which is created when missing.
@@ -263,8 +263,8 @@ inline bool TWLogEnabled(LOG_CATEG categ, LOG_LEVEL level) {
   return level <= (cfg != nullptr ? cfg->Level(categ) : static_cast<int>(LOG_LEVEL_NOTICE));
 }
 
-// Enum2String for TW_LOG: "unknown" when there is no memory for the names, which the first call of a
-// process builds. A log call throws nothing.
+// Enum2String for TW_LOG: "unknown" when there is no memory for the names, which the first call of
+// a process builds. A log call throws nothing.
 template <typename T>
 const char* TWLogName(T value) {
   try {

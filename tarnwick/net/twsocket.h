@@ -69,7 +69,8 @@ class TARNWICK_API TWSocket {
   // One raw write of all `len` bytes. Results: the bytes written; see WriteFd.
   virtual int _Write(const void* buf, unsigned int len);
 
-  // Sets host, port, time-out and mode for the next connection and closes an open one.
+  // Sets host, port, time-out and mode for the next connection and closes an open one. With
+  // `buffered` what was read ahead is forgotten; without, it stays unread.
   void SetSocketInfo(const std::string& host, int port, int timeout, bool buffered);
 
   // Sets the local source address to bind before connecting, in network byte order; 0 for none.
@@ -98,11 +99,12 @@ class TARNWICK_API TWSocket {
   // Direct mode delivers what one read gives. Buffered mode delivers `len` bytes, and fewer only
   // when the stream ends or an error comes after some bytes.
   // Results: the bytes delivered; 0 at the end of the stream, when IsEOF() becomes true; -1 on an
-  //   error or time-out that came before any byte, and when `buf` is null or `len` negative.
+  //   error or time-out that came before any byte, on a wait that failed, which loses the bytes
+  //   before it, and when `buf` is null or `len` negative.
   // State: a buffered read that failed clears IsConnected(), a wait that failed does not; the
   //   descriptor stays open.
-  // Blocks for `timeout` seconds a wait; a small buffered read that gets nothing makes seven, and one
-  // that gets a part waits twice for the rest.
+  // Blocks for `timeout` seconds a wait; a small buffered read that gets nothing makes seven, and
+  // one that lacks 1,024 bytes or more waits twice for them.
   int ReadData(char* buf, int len);
 
   // Writes `len` bytes.
