@@ -19,6 +19,7 @@ class DisabledLine : public Operation {
   void Run(int count) override {
     for (int i = 0; i < count; ++i) {
       TW_LOG(LOG_CATEG_CAMERA, LOG_LEVEL_DEBUG, "camera %d does not answer\n", i);
+      Use(&g_pDbgLogCfg);  // it may change from call to call
     }
   }
 };
@@ -98,6 +99,6 @@ void AddLogOperations(std::vector<Entry>* entries) {
   entries->push_back(
       {"log_disabled_record", "log_disabled_floor", 10000, 0, Make<DisabledLineWithRecord>});
   entries->push_back({"log_disabled_floor", "", 10000, 0, Make<LoadAndCompare>});
-  entries->push_back({"log_line", "log_line_floor", 50, 0, Make<Line>});
-  entries->push_back({"log_line_floor", "", 50, 0, Make<LineFloor>});
+  entries->push_back({"log_line", "log_line_floor", 48, 0, Make<Line>});
+  entries->push_back({"log_line_floor", "", 48, 0, Make<LineFloor>});
 }

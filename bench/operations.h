@@ -7,6 +7,8 @@
 #include <string>
 #include <vector>
 
+#include "bench/measured.h"
+
 // One operation with everything that it needs. Instructions are counted and times are taken in Run
 // alone, so what is prepared in the constructor costs nothing.
 class Operation {
@@ -35,8 +37,5 @@ void AddRequestOperations(std::vector<Entry>* entries);
 void AddHeadOperations(std::vector<Entry>* entries);
 void AddBodyOperations(std::vector<Entry>* entries);
 void AddEncodingOperations(std::vector<Entry>* entries);
-
-// Takes what an operation has computed, so that the compiler cannot leave it out.
-void Use(const void* result);
 
 #endif  // TARNWICK_BENCH_OPERATIONS_H_

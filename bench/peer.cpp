@@ -1,35 +1,17 @@
 #include "bench/peer.h"
 
-#include <netinet/in.h>
 #include <sys/prctl.h>
 #include <sys/socket.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
 #include <csignal>
-#include <cstdio>
 #include <cstdlib>
 
+#include "bench/listen.h"
+#include "bench/measured.h"
+
 namespace {
-
-void Check(bool good, const char* what) {
-  if (good) return;
-  std::perror(what);
-  std::exit(1);
-}
-
-int Listen(int* port) {
-  const int listener = socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0);
-  struct sockaddr_in address = {};
-  socklen_t size = sizeof(address);
-  address.sin_family = AF_INET;
-  address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
-  auto* const general = reinterpret_cast<struct sockaddr*>(&address);
-  Check(bind(listener, general, size) == 0 && listen(listener, 64) == 0, "listen");
-  Check(getsockname(listener, general, &size) == 0, "getsockname");
-  *port = ntohs(address.sin_port);
-  return listener;
-}
 
 // The length that the request announces for its body.
 size_t BodyLength(const std::string& request) {
@@ -65,9 +47,9 @@ void Answer(int connection, const std::string& reply) {
 }  // namespace
 
 Peer::Peer(const std::vector<std::string>& replies) : m_port(0), m_child(-1) {
-  const int listener = Listen(&m_port);
+  const int listener = ListenOnLoopback(&m_port);
   m_child = fork();
-  Check(m_child >= 0, "fork");
+  Expect(m_child >= 0, "server", "cannot be started");
   if (m_child == 0) {
     prctl(PR_SET_PDEATHSIG, SIGKILL);  // also when the measured process is stopped
     Serve(listener, replies);

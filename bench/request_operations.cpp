@@ -16,13 +16,12 @@
 
 #include "bench/operations.h"
 #include "bench/peer.h"
+#include "bench/texts.h"
 #include "tarnwick/http/twhttp.h"
 
 namespace {
 
 constexpr char kHost[] = "127.0.0.1";
-constexpr char kJson[] =
-    "{\"data\":{\"id\":7,\"name\":\"front door\",\"on\":true},\"success\":true}";
 
 std::string Reply(const std::string& status, const std::string& headers, const std::string& body) {
   return "HTTP/1.1 " + status + "\r\nServer: camera\r\n" + headers +
@@ -30,7 +29,7 @@ std::string Reply(const std::string& status, const std::string& headers, const s
 }
 
 std::string JsonReply() {
-  return Reply("200 OK", "Content-Type: application/json\r\n", kJson);
+  return Reply("200 OK", "Content-Type: application/json\r\n", kJsonText);
 }
 
 class JsonGet : public Operation {
@@ -161,12 +160,6 @@ class FormPost : public Operation {
  private:
   Peer m_peer{{JsonReply()}};
 };
-
-std::string Envelope(size_t size) {
-  std::string body = "<e:Envelope xmlns:e=\"urn:e\" xmlns:tt=\"urn:tt\"><e:Body>";
-  while (body.size() < size - 100) body += "\r\n  <tt:Item Name=\"fps\" Value=\"25\"/>";
-  return body + "</e:Body></e:Envelope>";
-}
 
 class SoapPost : public Operation {
  public:

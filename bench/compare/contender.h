@@ -15,6 +15,8 @@
 #include <string>
 #include <vector>
 
+#include "bench/measured.h"
+
 enum class Unit { kNanoseconds, kBytes };
 
 struct Work {
@@ -25,6 +27,8 @@ struct Work {
   int count;     // operations of a round; 0: as many as fill the round's time
   bool apart;    // each measurement in a process of its own: memory is looked at, or a peer leaves
                  // threads behind
+  int counted;   // operations whose instructions and system calls are counted; 0: none, because
+                 // their number is not the same each time or tells nothing
 };
 
 const std::vector<Work>& AllWorks();
@@ -38,6 +42,9 @@ class Contender {
   // Does the work `count` times. Results: what one of them cost, in the work's unit.
   // Ends the program when the outcome is wrong: nobody is to be fast that way.
   virtual double Measure(int count) = 0;
+
+  // Does the work `count` times and nothing else, in this process, for who counts what it executes.
+  virtual void Count(int count) { Measure(count); }
 };
 
 // A contender whose cost is the time that Run takes.
@@ -90,19 +97,5 @@ const Registry& AllContenders();
 constexpr char kFloor[] = "floor";        // the bare system calls, or one plain pass
 constexpr char kRequired[] = "required";  // the system calls that the interface asks for
 constexpr char kLibrary[] = "library";
-
-// Takes what an operation has computed, so that the compiler cannot leave it out, and makes it look
-// at memory anew afterwards.
-inline void Use(const void* result) {
-  asm volatile("" : : "g"(result) : "memory");
-}
-
-// Ends the program with a line to stderr.
-[[noreturn]] void Fail(const char* contender, const std::string& what);
-
-// The same when `good` is false. It stands in what is measured, so it makes no text before.
-inline void Expect(bool good, const char* contender, const char* what) {
-  if (!good) Fail(contender, what);
-}
 
 #endif  // TARNWICK_BENCH_COMPARE_CONTENDER_H_

@@ -5,7 +5,7 @@
 
 #include "bench/compare/http_works.h"
 #include "bench/compare/server.h"
-#include "bench/compare/texts.h"
+#include "bench/texts.h"
 
 namespace {
 

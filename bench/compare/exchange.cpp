@@ -2,19 +2,9 @@
 
 #include <openssl/evp.h>
 
-#include <algorithm>
-#include <cstdio>
+#include "bench/texts.h"
 
 namespace {
-
-constexpr char kJson[] =
-    "{\"data\":{\"id\":7,\"name\":\"front door\",\"on\":true},\"success\":true}";
-
-std::string Envelope(size_t size) {
-  std::string body = "<e:Envelope xmlns:e=\"urn:e\" xmlns:tt=\"urn:tt\"><e:Body>";
-  while (body.size() < size - 100) body += "\r\n  <tt:Item Name=\"fps\" Value=\"25\"/>";
-  return body + "</e:Body></e:Envelope>";
-}
 
 Exchange Get(const std::string& path, const std::string& reply) {
   return {Exchange::kGet, false, false, path, "", "", reply};
@@ -23,11 +13,11 @@ Exchange Get(const std::string& path, const std::string& reply) {
 }  // namespace
 
 Exchange JsonGet() {
-  return Get("/json", kJson);
+  return Get("/json", kJsonText);
 }
 
 Exchange DigestGet() {
-  Exchange exchange = Get("/digest", kJson);
+  Exchange exchange = Get("/digest", kJsonText);
   exchange.kind = Exchange::kDigestGet;
   return exchange;
 }
@@ -79,18 +69,6 @@ std::string BodyText(size_t size) {
   while (text.size() < size) text += block;
   text.resize(size);
   return text;
-}
-
-std::string Chunked(const std::string& body, size_t chunk) {
-  std::string text;
-  for (size_t done = 0; done < body.size();) {
-    const size_t size = std::min(chunk, body.size() - done);
-    char line[32];
-    std::snprintf(line, sizeof(line), "%zx\r\n", size);
-    text.append(line).append(body, done, size).append("\r\n");
-    done += size;
-  }
-  return text + "0\r\n\r\n";
 }
 
 std::string Md5Hex(const std::string& text) {

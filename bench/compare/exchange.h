@@ -41,9 +41,6 @@ Exchange Upload();
 // `size` bytes whose pattern repeats at no power of two, so that a piece out of place is seen.
 std::string BodyText(size_t size);
 
-// The same bytes in chunks of `chunk` bytes, with the last one and the empty line.
-std::string Chunked(const std::string& body, size_t chunk);
-
 // The Digest login that answers the server's challenge for `path`, as one header line.
 std::string DigestLine(const std::string& path);
 

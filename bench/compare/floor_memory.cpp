@@ -1,79 +1,15 @@
 // The floors of what is parsed and encoded in memory: one plain pass each, with no system call.
-#include <openssl/evp.h>
-#include <strings.h>
-
 #include <algorithm>
 #include <cstdlib>
-#include <cstring>
-#include <map>
-#include <string_view>
 
 #include "bench/compare/contender.h"
 #include "bench/compare/exchange.h"
-#include "bench/compare/texts.h"
+#include "bench/plain.h"
+#include "bench/texts.h"
 
 namespace {
 
 constexpr size_t kMiB = size_t{1} << 20;
-
-const char* Find(const char* at, char c, const char* end) {
-  return static_cast<const char*>(std::memchr(at, c, static_cast<size_t>(end - at)));
-}
-
-// A head with memchr for line ends and colons. It keeps what the library keeps.
-class HeadParser {
- public:
-  void Parse(const std::string& head) {
-    m_kept.clear();
-    m_cookie.clear();
-    m_challenge.clear();
-    const char* at = head.data();
-    const char* const end = at + head.size();
-    m_status = static_cast<int>(std::strtol(at + 9, nullptr, 10));
-    at = Find(at, '\n', end) + 1;
-    while (at < end && *at != '\r') {
-      const char* const lineEnd = Find(at, '\n', end);
-      KeepLine(std::string_view(at, static_cast<size_t>(lineEnd - at - 1)));
-      at = lineEnd + 1;
-    }
-  }
-
-  bool IsRight() const { return m_status == 200 && m_kept.size() == 3 && !m_challenge.empty(); }
-
- private:
-  // The names have different lengths, so that one comparison is enough.
-  void KeepLine(std::string_view line) {
-    const auto name =
-        line.substr(0, static_cast<size_t>(Find(line.data(), ':', line.end()) - line.data()));
-    const std::string_view value = line.substr(name.size() + 2);
-    const auto is = [&name](const char* known) {
-      return strncasecmp(name.data(), known, name.size()) == 0;
-    };
-    switch (name.size()) {
-      case 10:
-        if (is("Set-Cookie")) m_cookie = value.substr(0, value.find(';') + 1);
-        break;
-      case 12:
-        if (is("Content-Type")) m_kept.emplace(0, value);
-        break;
-      case 13:
-        if (is("Content-Range")) m_kept.emplace(2, value);
-        break;
-      case 14:
-        if (is("Content-Length")) m_kept.emplace(1, value);
-        break;
-      case 16:
-        if (is("WWW-Authenticate")) m_challenge = value;
-        break;
-      default:
-        break;
-    }
-  }
-
-  std::map<int, std::string> m_kept;
-  std::string m_cookie, m_challenge;
-  int m_status = 0;
-};
 
 void ParseHeads(int count) {
   static const std::string head = HeadOf30Lines();
@@ -84,52 +20,19 @@ void ParseHeads(int count) {
   }
 }
 
-// Each line found by memchr and copied out.
 void ReadLines(int count) {
   static const std::string text = Lines();
-  char line[2048];
-  for (int i = 0; i < count; ++i) {
-    for (const char *at = text.data(), *const end = at + text.size(); at < end;) {
-      const char* const lineEnd = Find(at, '\n', end);
-      const auto length = static_cast<size_t>(lineEnd - at - 1);
-      std::memcpy(line, at, length);
-      line[length] = '\0';
-      Use(line);
-      at = lineEnd + 1;
-    }
-  }
+  for (int i = 0; i < count; ++i) CopyLines(text);
 }
 
-// Each chunk copied once, to the end of the body.
 template <size_t kChunk>
 void Dechunk(int count) {
   static const std::string plain = BodyText(kMiB);
   static const std::string bytes = Chunked(plain, kChunk);
   for (int i = 0; i < count; ++i) {
-    std::string body;
-    for (const char *at = bytes.data(), *const end = at + bytes.size();;) {
-      const size_t size = std::strtoul(at, nullptr, 16);
-      if (size == 0) break;
-      at = Find(at, '\n', end) + 1;
-      body.append(at, size);
-      at += size + 2;
-    }
+    const std::string body = Dechunked(bytes);
     Expect(i == 0 ? body == plain : body.size() == plain.size(), kFloor, "decodes something else");
   }
-}
-
-// What stands between two of them moved at once.
-void Remove(std::string* text, char c) {
-  char* out = &(*text)[0];
-  const char* const end = out + text->size();
-  for (const char* at = out; at < end;) {
-    const char* found = Find(at, c, end);
-    if (found == nullptr) found = end;
-    std::memmove(out, at, static_cast<size_t>(found - at));
-    out += found - at;
-    at = found + 1;
-  }
-  text->resize(static_cast<size_t>(out - text->data()));
 }
 
 template <size_t kSize>
@@ -137,8 +40,8 @@ void RemoveLineEnds(int count) {
   static const std::string reply = SoapReply(kSize);
   for (int i = 0; i < count; ++i) {
     std::string text = reply;
-    Remove(&text, '\r');
-    Remove(&text, '\n');
+    RemovePlainly(&text, '\r');
+    RemovePlainly(&text, '\n');
     Use(text.data());
   }
 }
@@ -155,22 +58,17 @@ void RemoveByAlgorithm(int count) {
   }
 }
 
-// The text goes by value, as the library's interface has it.
 template <size_t kSize>
 void EncodeUrl(int count) {
   static const std::string text = QueryText(kSize);
-  for (int i = 0; i < count; ++i) Use(UrlEncoded(std::string(text)).data());
+  for (int i = 0; i < count; ++i) Use(UrlEncoded(text).data());
 }
 
-// OpenSSL's encoder into a buffer from malloc.
 template <size_t kSize>
 void EncodeBase64(int count) {
   static const std::string text = QueryText(kSize);
   for (int i = 0; i < count; ++i) {
-    const size_t length = std::strlen(text.c_str());
-    auto* const encoded = static_cast<unsigned char*>(std::malloc((length + 2) / 3 * 4 + 1));
-    EVP_EncodeBlock(encoded, reinterpret_cast<const unsigned char*>(text.data()),
-                    static_cast<int>(length));
+    char* const encoded = Base64ByOpenssl(text.c_str());
     Use(encoded);
     std::free(encoded);
   }

@@ -4,8 +4,9 @@
 
 #include "bench/compare/contender.h"
 #include "bench/compare/exchange.h"
-#include "bench/compare/texts.h"
 #include "bench/memory_client.h"
+#include "bench/plain.h"
+#include "bench/texts.h"
 #include "tarnwick/utils/utils.h"
 
 namespace {

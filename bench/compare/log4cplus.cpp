@@ -24,7 +24,7 @@ class Log4cplusLine : public LineWriter {
     properties.setProperty("LockFile", std::string(kPath) + ".lock");
     log4cplus::SharedAppenderPtr appender(new log4cplus::FileAppender(properties));
     appender->setLayout(std::make_unique<log4cplus::PatternLayout>(
-        "%D{%b %e %H:%M:%S} [%i][%c][%p] %F:%L:%M(): %m%n"));
+        "%D{%b %e %H:%M:%S} [%i][%c][%p] %b:%L:%M: %m%n"));
     m_logger.addAppender(appender);
   }
 

@@ -6,13 +6,24 @@
 #include <vector>
 
 struct Options {
-  bool list = false;
+  enum Mode {
+    kCompare,      // all selected works, round by round
+    kList,         // what there is
+    kListCounted,  // what is counted, and how often it is done for that
+    kServe,        // becomes another program, beside the servers
+    kMeasureOne,   // one measurement, for the process that looks at memory
+    kCountOne,     // one contender's work in CountedRun, for who counts what it executes
+  };
+  Mode mode = kCompare;
+
   int rounds = 25;
   double roundSeconds = 0.05;         // of each contender
   int seconds = 60;                   // for all rounds of a work
   std::vector<std::string> selected;  // sections and works; empty for all
 
-  // One measurement, for the process that looks at memory; null otherwise.
+  char** command = nullptr;  // what kServe becomes, with its arguments
+
+  // Of kMeasureOne and kCountOne.
   const char* work = nullptr;
   const char* contender = nullptr;
   int count = 0;

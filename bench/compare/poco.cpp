@@ -14,7 +14,8 @@
 
 #include "bench/compare/http_works.h"
 #include "bench/compare/server.h"
-#include "bench/compare/texts.h"
+#include "bench/plain.h"
+#include "bench/texts.h"
 
 namespace {
 

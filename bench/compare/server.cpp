@@ -2,7 +2,6 @@
 // and simple, so that it costs all contenders the same.
 #include "bench/compare/server.h"
 
-#include <netinet/in.h>
 #include <sys/prctl.h>
 #include <sys/socket.h>
 #include <unistd.h>
@@ -17,24 +16,12 @@
 #include "bench/compare/contender.h"
 #include "bench/compare/exchange.h"
 #include "bench/compare/server_stream.h"
+#include "bench/listen.h"
+#include "bench/texts.h"
 
 namespace {
 
 constexpr const char* kPortVariables[] = {"TARNWICK_COMPARE_PORT", "TARNWICK_COMPARE_TLS_PORT"};
-
-int Listen(int* port) {
-  const int listener = socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0);
-  struct sockaddr_in address = {};
-  socklen_t size = sizeof(address);
-  address.sin_family = AF_INET;
-  address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
-  auto* const general = reinterpret_cast<struct sockaddr*>(&address);
-  Expect(bind(listener, general, size) == 0 && listen(listener, 64) == 0, "server",
-         "cannot listen");
-  Expect(getsockname(listener, general, &size) == 0, "server", "has no port");
-  *port = ntohs(address.sin_port);
-  return listener;
-}
 
 std::string Answer(const char* status, const std::string& headers, const std::string& body) {
   return std::string("HTTP/1.1 ") + status + "\r\nServer: camera\r\n" + headers +
@@ -197,7 +184,7 @@ const std::string Server::m_refusal = Answer("400 Bad Request", "Content-Length:
 
 void Start(bool tls) {
   int port = 0;
-  const int listener = Listen(&port);
+  const int listener = ListenOnLoopback(&port);
   const pid_t child = fork();
   Expect(child >= 0, "server", "cannot be started");
   if (child == 0) {

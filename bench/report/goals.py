@@ -5,6 +5,7 @@ from typing import Callable, Optional
 
 LIBRARY, REQUIRED, FLOOR = "library", "required", "floor"
 HTTP_PEERS = ("libcurl", "cpp-httplib", "Poco", "Beast")
+LOG_PEERS = ("spdlog", "glog", "log4cplus", "syslog")
 MIB = 1 << 20
 
 
@@ -28,7 +29,7 @@ class Goal:
 
 def times(work, against, limit):
     """At most so many times what another contender takes."""
-    text = f"at most {limit:.2f} times the {NAMES.get(against, against)}"
+    text = f"at most {limit:.2f} times {NAMES.get(against, against)}"
     return Goal(work, text, limit, lambda run: run.ratio(work, LIBRARY, against))
 
 
@@ -68,6 +69,30 @@ def value(work, limit, text, scale=1.0, digits=2):
     return Goal(work, text, limit, measure, digits=digits)
 
 
+def instructions_above(work, against, limit):
+    """So many instructions more than another contender's, for one operation."""
+
+    def measure(run):
+        ours, theirs = run.instructions(work, LIBRARY), run.instructions(work, against)
+        return ours - theirs if ours is not None and theirs is not None else None
+
+    text = f"at most {limit:,} instructions more than {NAMES.get(against, against)}"
+    return Goal(work, text, limit, measure, digits=0)
+
+
+def fewest_instructions(work, peers):
+    """Below each of the peers that do the work."""
+
+    def measure(run):
+        ours = run.instructions(work, LIBRARY)
+        counts = [run.instructions(work, peer) for peer in peers]
+        known = [count for count in counts if count is not None]
+        return ours / min(known) if known and ours is not None else None
+
+    text = "fewer instructions than any peer (times the fewest of theirs)"
+    return Goal(work, text, 0.99, measure)
+
+
 def as_much(work, other, limit):
     """The two works' values beside each other: each further client costs the same."""
 
@@ -78,7 +103,7 @@ def as_much(work, other, limit):
     return Goal(work, f"at most {limit:.2f} times as much a client as {other}", limit, measure)
 
 
-NAMES = {REQUIRED: "required floor", FLOOR: "floor"}
+NAMES = {REQUIRED: "the required floor", FLOOR: "the floor"}
 
 GOALS = [
     times("log_disabled", FLOOR, 1.00),
@@ -88,7 +113,9 @@ GOALS = [
     times("log_line_4_processes", REQUIRED, 1.00),
     times("log_line_16_processes", REQUIRED, 1.00),
     times("json_get", REQUIRED, 1.05),
+    instructions_above("json_get", REQUIRED, 12000),
     times("digest_get", REQUIRED, 1.05),
+    fewest_instructions("digest_get", HTTP_PEERS),
     times("form_post", REQUIRED, 1.05),
     ahead("form_post", HTTP_PEERS),
     times("soap_post_4k", REQUIRED, 1.05),

@@ -2,54 +2,74 @@
 
 import subprocess
 
-COLOURS = ["#999999", "#555555", "#c02020", "#3060a0", "#60a0d0", "#208060", "#90b040", "#c09020",
-           "#8050a0", "#b07050"]  # fmt: skip
+# One for each contender, the same in all plots, in the order of the bars.
+COLOURS = {
+    "floor": "#aaaaaa",
+    "required": "#555555",
+    "library": "#c02020",
+    "libcurl": "#3060a0",
+    "cpp-httplib": "#60a0d0",
+    "Poco": "#208060",
+    "Beast": "#90b040",
+    "std::remove": "#c09020",
+    "spdlog": "#3060a0",
+    "glog": "#60a0d0",
+    "log4cplus": "#208060",
+    "syslog": "#90b040",
+}
 
 SCRIPT = """\
 set terminal svg size 960,420 font "sans-serif,12" background "white"
 set output "{output}"
-set style data histogram
-set style histogram clustered gap 1
 set style fill solid 0.9 noborder
 set logscale y 2
 set ytics format "%g"
-set ylabel "times the reference"
+set ylabel "time, by the reference's"
 set grid ytics
 set key outside right top
-set xtics scale 0 rotate by -20
-set datafile missing "?"
-plot 1 with lines linecolor rgb "black" notitle, {columns}
+set xtics scale 0 rotate by -20 ({labels})
+set xrange [-0.6:{last}]
+set yrange [*<0.5:2<*]
+plot {bars}, 1 with lines linecolor rgb "black" notitle
 """
 
 
-def bars(run, section):
-    """The works that have a reference, and their contenders in the order of the tables."""
-    works = [work for work in run.sections[section] if run.reference(work)]
-    contenders = []
-    for work in works:
-        contenders += [name for name in run.contenders(work) if name not in contenders]
-    return works, contenders
+def works_with_reference(run, section):
+    return [work for work in run.sections[section] if run.reference(work)]
 
 
-def data(run, works, contenders):
-    lines = []
-    for work in works:
-        ratios = (run.ratio(work, name, run.reference(work)) for name in contenders)
-        cells = ["?" if ratio is None else f"{ratio:.4f}" for ratio in ratios]
-        lines.append(" ".join([work.replace("_", "-"), *cells]))
-    return "\n".join(lines) + "\n"
+def bars(run, works):
+    """{contender: its bars}; each goes from 1, which is the reference, to the contender."""
+    blocks = {}
+    for place, work in enumerate(works):
+        reference = run.reference(work)
+        contenders = [name for name in COLOURS if name in run.contenders(work)]
+        contenders.remove(reference)
+        width = 0.8 / max(5, len(contenders))
+        for index, name in enumerate(contenders):
+            left = place + (index - len(contenders) / 2) * width
+            ratio = run.ratio(work, name, reference)
+            line = f"{left + width / 2} 1 {left} {left + width} 1 {ratio:.4f}"
+            blocks.setdefault(name, []).append(line)
+    return blocks
 
 
 def plot(run, section, path):
     """Results: false when the section has nothing to compare with."""
-    works, contenders = bars(run, section)
+    works = works_with_reference(run, section)
     if not works:
         return False
-    columns = ", ".join(
-        f"$ratios using {column}:xtic(1) title '{name}' linecolor rgb '{colour}'"
-        for column, (name, colour) in enumerate(zip(contenders, COLOURS), start=2)
+    script, drawn = "", []
+    for index, (name, lines) in enumerate(sorted(bars(run, works).items(), key=place_of)):
+        script += f"$bars{index} << END\n" + "\n".join(lines) + "\nEND\n"
+        drawn.append(f"$bars{index} with boxxyerror title '{name}' linecolor rgb '{COLOURS[name]}'")
+    labels = ", ".join(f"'{work.replace('_', '-')}' {index}" for index, work in enumerate(works))
+    script += SCRIPT.format(
+        output=path, labels=labels, last=len(works) - 0.4, bars=", ".join(drawn)
     )
-    block = "$ratios << END\n" + data(run, works, contenders) + "END\n"
-    script = block + SCRIPT.format(output=path, columns=columns)
     subprocess.run(["gnuplot"], input=script, text=True, check=True)
     return True
+
+
+def place_of(item):
+    return list(COLOURS).index(item[0])

@@ -13,6 +13,7 @@ class Run:
         self.units = {}  # of a work: "ns" or "bytes"
         self._handles = {}  # bytes that one operation of a work handles
         self._values = {}  # (work, contender): a value for each round
+        self._counted = {}  # (work, contender): instructions and system calls of one operation
         with open(path, encoding="utf-8") as file:
             for line in file:
                 self._take(json.loads(line))
@@ -22,6 +23,10 @@ class Run:
             self.environment = record
             return
         work = record["work"]
+        if "instructions" in record:
+            counted = (record["instructions"], record["calls"])
+            self._counted[work, record["contender"]] = counted
+            return
         works = self.sections.setdefault(record["section"], [])
         if work not in works:
             works.append(work)
@@ -55,6 +60,14 @@ class Run:
         if not ours or not theirs or not all(theirs):
             return None
         return median(one / other for one, other in zip(ours, theirs))
+
+    def instructions(self, work, contender):
+        """Of one operation; None where they have not been counted."""
+        return self._counted.get((work, contender), (None, None))[0]
+
+    def calls(self, work, contender):
+        """System calls, as instructions."""
+        return self._counted.get((work, contender), (None, None))[1]
 
     def rate(self, work, contender):
         """GB/s."""

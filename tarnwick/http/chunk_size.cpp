@@ -1,6 +1,11 @@
 #include "tarnwick/http/chunk_size.h"
 
+#include <algorithm>
+
 namespace {
+
+// How far the end of a size line is looked for. It must stay below the lines that are cut.
+constexpr size_t kLongestLine = 256;
 
 // The digit's value, or -1. Not the C library's functions: the locale must not count here.
 int HexValue(char c) {
@@ -20,4 +25,15 @@ uint32_t ParseChunkSize(std::string_view line) {
     size = size * 16 + static_cast<uint32_t>(digit);
   }
   return size;
+}
+
+std::string_view WholeChunk(std::string_view bytes) {
+  const size_t limit = std::min(bytes.size(), kLongestLine);
+  size_t at = 0;
+  while (at < limit && bytes[at] != '\r' && bytes[at] != '\n') ++at;
+  if (at == limit) return {};
+  const size_t size = ParseChunkSize(bytes.substr(0, at));
+  at += bytes[at] == '\r' ? 2 : 1;
+  if (bytes.size() < at + 2 || bytes.size() - at - 2 < size) return {};
+  return {bytes.data() + at, size};
 }

@@ -1,9 +1,12 @@
 // Reading a response's body, whole.
 #define TW_LOG_SOURCE "twhttp"
 
+#include <sys/mman.h>
+
 #include <algorithm>
 #include <cstdint>
 #include <exception>
+#include <memory>
 #include <string_view>
 
 #include "tarnwick/http/chunk_size.h"
@@ -20,14 +23,53 @@ constexpr char kErrorText[] = "{\"error\":true}";
 // half as often, and a move costs a page fault a page. Pages that are only reserved cost nothing,
 // so memory still grows with what arrives; of larger ones an appliance has no room to spare.
 constexpr size_t kGrowsFaster = size_t{64} << 10;
-constexpr size_t kGrowsFasterUpTo = size_t{16} << 20;
+constexpr size_t kGrowsFasterUpTo = size_t{32} << 20;
+
+// From this size on large pages are asked for. Smaller bodies mostly lie where earlier ones lay,
+// and cost no page fault.
+constexpr size_t kWorthLargePages = size_t{16} << 20;
+constexpr size_t kLargePage = size_t{2} << 20;
+
+// A large body costs more for its page faults than for its bytes, and large pages spare nearly all
+// of them. Still only those take memory that bytes arrive in. Where the kernel has no large pages
+// the call fails, and all is as it was. REQUIRES: `body` is empty, so that no page is there yet.
+void AskForLargePages(std::string* body) {
+  void* begin = &(*body)[0];
+  size_t size = body->capacity();
+  if (size < kWorthLargePages || std::align(kLargePage, 1, begin, size) == nullptr) return;
+  madvise(begin, size, MADV_HUGEPAGE);
+}
+
+// Makes room for `more` bytes, and in a large body for what will follow them.
+void MakeRoom(size_t more, std::string* body) try {
+  const size_t size = body->size() + more;
+  if (size <= body->capacity() || size < kGrowsFaster) return;
+  std::string larger;
+  larger.reserve(size <= kGrowsFasterUpTo ? 4 * size : 2 * size);
+  AskForLargePages(&larger);
+  larger.append(*body);
+  body->swap(larger);
+} catch (const std::exception&) {
+  // There is less memory than that; the string itself will ask for what it needs.
+}
 
 void Append(std::string_view bytes, std::string* body) {
-  const size_t size = body->size() + bytes.size();
-  if (size > body->capacity() && size >= kGrowsFaster && size <= kGrowsFasterUpTo) {
-    body->reserve(4 * size);
-  }
+  MakeRoom(bytes.size(), body);
   body->append(bytes);
+}
+
+// The chunks that are buffered whole, with nothing to wait for.
+void AppendBufferedChunks(TWSocket* socket, std::string* body) {
+  std::string_view buffered = SocketAccess::Buffered(socket);
+  MakeRoom(buffered.size(), body);
+  for (;;) {
+    const std::string_view data = WholeChunk(buffered);
+    if (data.empty()) return;
+    const auto size = static_cast<size_t>(data.end() + 2 - buffered.begin());
+    SocketAccess::Take(socket, size);
+    buffered.remove_prefix(size);
+    body->append(data);
+  }
 }
 
 }  // namespace
@@ -67,6 +109,7 @@ int TWHttpClient::ReadBodyFor(const char* operation, std::string* body) {
 // A size line that cannot be read counts as the last chunk, and trailers stay unread.
 bool TWHttpClient::ReadChunks(std::string* body) {
   for (;;) {
+    AppendBufferedChunks(m_pSocket, body);
     char line[kPieceSize];
     const int length = ReadToLineEnd(line, kPieceSize);
     const uint32_t size = length < 1 ? 0 : ParseChunkSize({line, static_cast<size_t>(length)});
@@ -88,9 +131,11 @@ bool TWHttpClient::ReadChunk(uint32_t size, std::string* body) {
 
 // As ReadData, with what came added to the body. REQUIRES: len <= kPieceSize, and the head is read.
 int TWHttpClient::AppendPiece(int len, std::string* body) {
-  const std::string_view buffered = SocketAccess::TakeBuffered(m_pSocket, len);
-  if (!buffered.empty()) {
-    Append(buffered, body);
+  const auto size = static_cast<size_t>(len);
+  const std::string_view buffered = SocketAccess::Buffered(m_pSocket);
+  if (buffered.size() >= size) {
+    SocketAccess::Take(m_pSocket, size);
+    Append(buffered.substr(0, size), body);
     return len;
   }
   char piece[kPieceSize];
@@ -101,7 +146,6 @@ int TWHttpClient::AppendPiece(int len, std::string* body) {
 
 // The two bytes behind a chunk, whatever they are.
 void TWHttpClient::DropChunkEnd() {
-  if (!SocketAccess::TakeBuffered(m_pSocket, 2).empty()) return;
   char ending[2];
   const int count = ReadData(ending, 2);
   if (count == 1) ReadData(ending, 1);  // direct reading delivers what has arrived

@@ -31,13 +31,14 @@ int TWHttpClient::OpenRawDataUpload() try {
 }
 
 std::string TWHttpClient::BuildUploadHead() const {
-  std::string head = "POST /" + m_strPath + " HTTP/1.1\r\n";
-  head += "Host: " + m_strHost + ":" + IntToString(m_port) + "\r\n";
-  if (!m_strCookie.empty()) head += "Cookie: " + m_strCookie + "\r\n";
+  std::string head = "POST /";
+  head.append(m_strPath).append(" HTTP/1.1\r\n");
+  head.append("Host: ").append(m_strHost).append(":").append(IntToString(m_port)).append("\r\n");
+  if (!m_strCookie.empty()) head.append("Cookie: ").append(m_strCookie).append("\r\n");
   head +=
       "Content-Type: multipart/form-data; "
       "boundary=-----------QUENMULTIPART_BOUNDARY-----------\r\n";
-  head += "Content-Length: " + IntToString(kEndless) + "\r\n";
+  head.append("Content-Length: ").append(IntToString(kEndless)).append("\r\n");
   // The blank stands on the wrong side of the colon; the receivers were built against it.
   head += "Cache-Control :no-cache\r\n";
   head += "Connection: keep-alive\r\n";

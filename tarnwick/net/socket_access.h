@@ -12,16 +12,17 @@ class SocketAccess {
   // derived class looks into it. Of a daemon's many idle clients only what they used is resident.
   static TWSocket* MakePlain() { return new TWSocket(TWSocket::UnsetBuffer()); }
 
-  // Takes the next `len` bytes where all of them are buffered; ReadData would do just that and copy
-  // them. Otherwise nothing happens, and the result is empty. The next call of the socket ends it.
-  static std::string_view TakeBuffered(TWSocket* socket, int len) {
-    if (socket == nullptr || !socket->m_bBuffered) return {};
-    if (len <= 0 || len > socket->m_readLen) return {};
-    const char* const bytes = socket->m_readBuf + socket->m_readPos;
+  // What is buffered and unread. The next read of the socket ends it.
+  static std::string_view Buffered(const TWSocket* socket) {
+    if (socket == nullptr || !socket->m_bBuffered || socket->m_readLen <= 0) return {};
+    return {socket->m_readBuf + socket->m_readPos, static_cast<size_t>(socket->m_readLen)};
+  }
+
+  // Takes the next `size` bytes, as ReadData does with what is buffered. REQUIRES: they are.
+  static void Take(TWSocket* socket, size_t size) {
     socket->m_bEOF = false;
-    socket->m_readPos += len;
-    socket->m_readLen -= len;
-    return {bytes, static_cast<size_t>(len)};
+    socket->m_readPos += static_cast<int>(size);
+    socket->m_readLen -= static_cast<int>(size);
   }
 };
 

@@ -1,7 +1,7 @@
-#include "bench/compare/texts.h"
+#include "bench/texts.h"
 
-#include <cctype>
-#include <cstring>
+#include <algorithm>
+#include <cstdio>
 
 std::string HeadOf30Lines() {
   std::string head =
@@ -45,31 +45,20 @@ std::string QueryText(size_t size) {
   return text;
 }
 
-namespace {
+std::string Envelope(size_t size) {
+  std::string body = "<e:Envelope xmlns:e=\"urn:e\" xmlns:tt=\"urn:tt\"><e:Body>";
+  while (body.size() < size - 100) body += "\r\n  <tt:Item Name=\"fps\" Value=\"25\"/>";
+  return body + "</e:Body></e:Envelope>";
+}
 
-struct Table {
-  Table() {
-    for (int c = 1; c < 256; ++c) plain[c] = std::isalnum(c) || std::strchr("_~()*,-.", c);
+std::string Chunked(const std::string& body, size_t chunk) {
+  std::string text;
+  for (size_t done = 0; done < body.size();) {
+    const size_t size = std::min(chunk, body.size() - done);
+    char line[32];
+    std::snprintf(line, sizeof(line), "%zx\r\n", size);
+    text.append(line).append(body, done, size).append("\r\n");
+    done += size;
   }
-  bool plain[256] = {};
-};
-
-}  // namespace
-
-std::string UrlEncoded(const std::string& text) {
-  static const Table table;
-  std::string result(text.size() * 3, '\0');
-  char* out = &result[0];
-  for (const char c : text) {
-    const auto byte = static_cast<unsigned char>(c);
-    if (table.plain[byte]) {
-      *out++ = c;
-    } else {
-      *out++ = '%';
-      *out++ = "0123456789ABCDEF"[byte >> 4];
-      *out++ = "0123456789ABCDEF"[byte & 15];
-    }
-  }
-  result.resize(static_cast<size_t>(out - result.data()));
-  return result;
+  return text + "0\r\n\r\n";
 }
