@@ -26,8 +26,11 @@ int LeadingNumber(std::string_view text) {
   return static_cast<int>(std::clamp<long>(value, INT_MIN, INT_MAX));
 }
 
+// Names that are not it mostly have another letter where `known` ends: no call for those.
 bool BeginsWith(std::string_view text, std::string_view known) {
-  return text.size() >= known.size() && strncasecmp(text.data(), known.data(), known.size()) == 0;
+  const size_t last = known.size() - 1;
+  return text.size() > last && (text[last] | 0x20) == (known[last] | 0x20) &&
+         strncasecmp(text.data(), known.data(), known.size()) == 0;
 }
 
 struct KnownName {

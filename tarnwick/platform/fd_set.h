@@ -16,19 +16,19 @@ class FdSet {
   // False when there was no memory for a large descriptor; the set must not be used then.
   bool Valid() const { return m_words != nullptr; }
 
-  // Makes the set hold just its descriptor.
-  void Fill();
+  // Makes the set hold its descriptor. No other can be in it: select only takes out.
+  void Fill() { m_words[m_word] = m_bit; }
 
-  bool Contains() const;
+  bool Contains() const { return (m_words[m_word] & m_bit) != 0; }
 
   // For select, with Count() as the first argument.
   fd_set* Get() { return reinterpret_cast<fd_set*>(m_words); }
   int Count() const { return m_fd + 1; }
 
  private:
-  static size_t WordsFor(int fd);
-
   int m_fd;
+  size_t m_word;  // where the descriptor stands, and its bit there
+  fd_mask m_bit;
   fd_set m_small;
   OwnedMemory<fd_mask> m_large;
   fd_mask* m_words;

@@ -1,4 +1,7 @@
 // Percent-encoding, base64, hex, decimal and time-stamp text.
+#include <openssl/evp.h>
+
+#include <algorithm>
 #include <cctype>
 #include <cstdint>
 #include <cstdio>
@@ -12,38 +15,26 @@
 namespace {
 
 // Wider than the unreserved characters of RFC 3986: cameras take these in query values as they are.
-// The one bit set for each of them, 64 characters a word.
-constexpr uint64_t MarkBits(int word) {
-  uint64_t bits = 0;
-  for (const char c : {'_', '~', '(', ')', '*', ',', '-', '.'}) {
-    if (c / 64 == word) bits |= uint64_t{1} << (c % 64);
+struct Marks {
+  constexpr Marks() {
+    for (const char c : {'_', '~', '(', ')', '*', ',', '-', '.'}) {
+      contains[static_cast<unsigned char>(c)] = true;
+    }
   }
-  return bits;
-}
-constexpr uint64_t kMarks[4] = {MarkBits(0), MarkBits(1), 0, 0};
-
-bool IsMark(unsigned char byte) {
-  return (kMarks[byte / 64] >> (byte % 64) & 1) != 0;
-}
+  bool contains[256] = {};
+};
+constexpr Marks kMarks;
 
 char* WriteEscape(unsigned char byte, char* out) {
-  constexpr char kDigits[] = "0123456789ABCDEF";
+  static constexpr char kDigits[] = "0123456789ABCDEF";  // or it is built for each byte anew
   out[0] = '%';
   out[1] = kDigits[byte >> 4];
   out[2] = kDigits[byte & 15];
   return out + 3;
 }
 
-constexpr char kBase64[] = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789+/";
-
-// Encodes 3 bytes as 4 characters.
-void EncodeGroup(unsigned first, unsigned second, unsigned third, char* out) {
-  const unsigned bits = first << 16 | second << 8 | third;
-  out[0] = kBase64[bits >> 18];
-  out[1] = kBase64[bits >> 12 & 63U];
-  out[2] = kBase64[bits >> 6 & 63U];
-  out[3] = kBase64[bits & 63U];
-}
+// OpenSSL counts in int. Only the last piece may end in the middle of a group of three bytes.
+constexpr size_t kBase64Piece = size_t{3} << 28;
 
 }  // namespace
 
@@ -56,7 +47,7 @@ std::string UrlEncode(std::string text, std::string keep) {
   for (const char c : text) {
     const auto byte = static_cast<unsigned char>(c);
     const unsigned classOf = classes[byte];
-    if ((classOf & _ISalnum) != 0 || IsMark(byte)) {
+    if ((classOf & _ISalnum) != 0 || kMarks.contains[byte]) {
       *out++ = c;
       continue;
     }
@@ -75,26 +66,22 @@ std::string UrlEncode(std::string text, std::string keep) {
 char* Base64Encode(const char* text) {
   if (text == nullptr) return nullptr;
   const size_t length = std::strlen(text);
-  char* const result = static_cast<char*>(std::malloc((length + 2) / 3 * 4 + 1));
+  auto* const result = static_cast<unsigned char*>(std::malloc((length + 2) / 3 * 4 + 1));
   if (result == nullptr) return nullptr;
   const auto* in = reinterpret_cast<const unsigned char*>(text);
-  char* out = result;
-  for (const unsigned char* const end = in + length / 3 * 3; in != end; in += 3, out += 4) {
-    EncodeGroup(in[0], in[1], in[2], out);
-  }
-  const size_t rest = length % 3;
-  if (rest != 0) {
-    EncodeGroup(in[0], in[1], 0, out);  // behind a single byte stands the text's own zero
-    if (rest == 1) out[2] = '=';
-    out[3] = '=';
-    out += 4;
-  }
-  *out = '\0';
-  return result;
+  unsigned char* out = result;
+  size_t left = length;
+  do {
+    const size_t piece = std::min(left, kBase64Piece);
+    out += EVP_EncodeBlock(out, in, static_cast<int>(piece));
+    in += piece;
+    left -= piece;
+  } while (left > 0);
+  return reinterpret_cast<char*>(result);
 }
 
 std::string Md5ToHex(const unsigned char* digest) {
-  constexpr char kDigits[] = "0123456789abcdef";
+  static constexpr char kDigits[] = "0123456789abcdef";
   if (digest == nullptr) return std::string();
   char hex[32];
   for (size_t i = 0; i < 16; ++i) {
