@@ -32,6 +32,7 @@ def pytest_sessionstart(session):
 
 
 def empty(folder):
+    os.chown(folder, 0, 0)
     folder.chmod(0o755)
     for entry in folder.iterdir():
         entry.unlink()

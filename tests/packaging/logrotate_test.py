@@ -2,6 +2,7 @@
 
 import gzip
 import re
+import shutil
 import subprocess
 import time
 
@@ -12,6 +13,7 @@ from conftest import HANG, LOG_FOLDER, LOGS
 LINE = re.compile(rb"\S+ \S+ .*\[camera\]\[notice\] writer\.py:1:(writer\d)\(\): (\d+) (x*)\.\n")
 LIMIT = 10 * 1024 * 1024  # as it stands in the file
 KEPT = 5
+GROUP = "daemon"  # of Debian; any one does
 
 
 @pytest.fixture
@@ -20,11 +22,15 @@ def rotate(outside_the_checkout, tmp_path):
     configuration = outside_the_checkout("logrotate.conf")
 
     def run(*options):
-        command = ["logrotate", "-s", str(tmp_path / "state"), *options, str(configuration)]
-        done = subprocess.run(command, capture_output=True, text=True, timeout=HANG, check=False)
+        done = logrotate(configuration, tmp_path, *options)
         assert (done.returncode, done.stderr) == (0, "")
 
     return run
+
+
+def logrotate(configuration, folder, *options):
+    command = ["logrotate", "-s", str(folder / "state"), *options, str(configuration)]
+    return subprocess.run(command, capture_output=True, text=True, timeout=HANG, check=False)
 
 
 def rotated(log):
@@ -116,3 +122,21 @@ def test_the_oldest_rotation_goes(rotate):
 def test_machines_without_logs_are_no_failure(rotate):
     rotate()
     assert not list(LOG_FOLDER.iterdir())
+
+
+def test_a_folder_that_a_group_writes_wants_the_told_line(outside_the_checkout, tmp_path):
+    configuration = outside_the_checkout("logrotate.conf")
+    shutil.chown(LOG_FOLDER, group=GROUP)
+    LOG_FOLDER.chmod(0o2770)
+    for log in LOGS:
+        (LOG_FOLDER / log).write_bytes(b"a line\n")
+
+    refused = logrotate(configuration, tmp_path, "--force")
+    assert "insecure permissions" in refused.stderr
+    assert rotated(LOGS[0]) == []
+
+    line = f"\tsu root {GROUP}\n}}\n"
+    configuration.write_text(configuration.read_text().replace("}\n", line))
+    done = logrotate(configuration, tmp_path, "--force")
+    assert (done.returncode, done.stderr) == (0, "")
+    assert [len(rotated(log)) for log in LOGS] == [1, 1]
