@@ -4,6 +4,7 @@
 
 #include <functional>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "tests/support/peer_steps.h"
@@ -12,19 +13,31 @@
 inline constexpr int kTimeout = 1;
 
 // How long a peer holds a call that has no limit, in seconds: longer than any limited silence.
-inline constexpr double kHold = 17;
+inline constexpr int kHold = 17;
 
-enum class Peer { kPlain, kTls, kTlsByteByByte, kBlackHole };
+// Who is at the other end. At most one of the two is given; without both the case needs no port.
+struct Peer {
+  std::string endpoint;         // the simulated camera's, in the words of its command line
+  std::vector<Script> scripts;  // of the connections, where the camera has no such fault
+  bool byte_by_byte = false;    // the scripts speak TLS, behind a relay that lets bytes wait
+};
+
+inline Peer Camera(const std::string& endpoint) {
+  return {endpoint, {}};
+}
+
+inline Peer Scripted(std::vector<Script> scripts, bool byte_by_byte = false) {
+  return {"", std::move(scripts), byte_by_byte};
+}
 
 // A call, what its peer does, and the longest that it can take.
 struct Case {
   const char* name;   // as the document has it
   const char* bound;  // the same; T is the time-out
   double seconds;     // the bound of this run; 0 when there is none, and the peer gives way
-  std::vector<Script> scripts;
+  Peer peer;
   std::function<int(int port)> operation;
   int result;  // of the operation: what tells that the peer did what the case is about
-  Peer peer = Peer::kPlain;
 };
 
 std::vector<Case> SocketCases();
@@ -35,15 +48,7 @@ std::vector<Case> CurlCases();
 // Calls that wait for another process; the log's lock stops every other case, so they come last.
 std::vector<Case> LockCases();
 
-// Holds the connection still for so long.
-Step Pause(double seconds);
-
-// A pause, and then a byte behind the other with the same pause in between.
+// A pause in seconds, and then a byte behind the other with the same pause in between.
 Script Drip(const std::string& bytes, double pause);
-
-// What a peer does that never answers, and one that gives way after kHold.
-Script Silent();
-Script SilentBehind(const std::string& bytes);
-Script GivesWay();
 
 #endif  // TARNWICK_TESTS_LONGEST_CALL_CASES_H_

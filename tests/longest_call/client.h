@@ -8,9 +8,15 @@
 #include "tarnwick/http/twhttp.h"
 #include "tests/longest_call/cases.h"
 
-inline std::unique_ptr<TWHttpClient> NewClient(int port, bool buffered = true, bool https = false,
+// What the simulated camera has at its profiles json and cgi; the others answer at any path.
+inline constexpr char kJsonPath[] = "info.json";
+inline constexpr char kCgiPath[] = "info.cgi";
+
+// With the simulated camera's own account.
+inline std::unique_ptr<TWHttpClient> NewClient(int port, const char* path = kJsonPath,
+                                               bool buffered = true, bool https = false,
                                                const std::string& host = "127.0.0.1") {
-  return std::make_unique<TWHttpClient>(host, port, "a.cgi", "user", "password", kTimeout, https,
+  return std::make_unique<TWHttpClient>(host, port, path, "operator", "gate-7", kTimeout, https,
                                         buffered, false, false, HTTP_VERSION_1_1, "");
 }
 

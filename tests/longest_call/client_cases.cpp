@@ -1,5 +1,6 @@
 // The client's operations over its socket.
 #include <json/value.h>
+#include <libxml/tree.h>
 
 #include <memory>
 
@@ -9,13 +10,7 @@
 
 namespace {
 
-// A little less than the seven waits of a small read.
-constexpr double kJustInSeven = 6.9;
-
-constexpr char kChallenge[] =
-    "HTTP/1.1 401 Unauthorized\r\nWWW-Authenticate: Digest realm=\"r\", nonce=\"n\"\r\n"
-    "Content-Length: 0\r\n\r\n";
-constexpr char kSoapHead[] = "HTTP/1.1 200 OK\r\nContent-Length: 10\r\n\r\n";
+constexpr char kEnvelope[] = "<GetDeviceInformation/>";
 
 // What came of the request, as the last response has it.
 int Response(TWHttpClient* client) {
@@ -24,7 +19,7 @@ int Response(TWHttpClient* client) {
 }
 
 int Get(int port, bool buffered, bool https) {
-  const auto client = NewClient(port, buffered, https);
+  const auto client = NewClient(port, kJsonPath, buffered, https);
   client->SendRequestByGet();
   return Response(client.get());
 }
@@ -34,25 +29,32 @@ auto Getting(bool buffered, bool https) {
 }
 
 int LogIn(int port) {
-  const auto client = NewClient(port);
+  const auto client = NewClient(port, kCgiPath);
   client->SendRequest(HTTP_METHOD_GET, "");
   return Response(client.get());
 }
 
 int PostForm(int port) {
-  const auto client = NewClient(port);
+  const auto client = NewClient(port, kCgiPath);
   client->SendRequestBySocketPost("a=1");
   return Response(client.get());
 }
 
 int Soap(int port) {
   std::string reply;
-  return NewClient(port)->SendReqBySocketPost("<a/>", reply);
+  return NewClient(port)->SendReqBySocketPost(kEnvelope, reply);
+}
+
+int SoapXml(int port) {
+  xmlDoc* doc = nullptr;
+  const int result = NewClient(port)->SendReqByXMLSocketPost(kEnvelope, doc);
+  xmlFreeDoc(doc);
+  return result;
 }
 
 int SoapLogin(int port) {
   std::string reply;
-  return NewClient(port)->SendAuthReqBySocketPost("<a/>", reply);
+  return NewClient(port)->SendAuthReqBySocketPost(kEnvelope, reply);
 }
 
 int Upload(int port) {
@@ -63,64 +65,58 @@ int Upload(int port) {
 
 int Json(int port) {
   Json::Value value;
-  return SendHttpGet("127.0.0.1", port, "a.cgi", value, kTimeout, false);
+  return SendHttpGet("127.0.0.1", port, kJsonPath, value, kTimeout, false);
 }
 
 int Form(int port) {
-  return SendHttpPost("127.0.0.1", port, "a.cgi", "a=1", "s=1", kTimeout);
+  return SendHttpPost("127.0.0.1", port, kCgiPath, "a=1", "s=1", kTimeout);
 }
 
+// An answer is late when it comes a little before the end of the seven waits of a small read.
 std::vector<Case> GetCases() {
-  const std::vector<Script> late401 = {
-      {ExpectRequest(), Pause(kJustInSeven), Send(kChallenge), Close()}, Silent()};
+  const Peer silent = Camera("json,fault=stall-before-status");
   return {
-      {"any socket operation, nobody answers the connect",
-       "T",
-       1,
-       {},
-       Getting(true, false),
-       HTTP_RET_NOT_READY,
-       Peer::kBlackHole},
-      {"SendRequestByGet, silence", "7 T", 7, {Silent()}, Getting(true, false), HTTP_RET_IO_ERROR},
-      {"SendRequestByGet without read-ahead, silence",
-       "T",
-       1,
-       {Silent()},
-       Getting(false, false),
+      {"any socket operation, nobody answers the connect", "T", 1, Camera("json,fault=black-hole"),
+       Getting(true, false), HTTP_RET_NOT_READY},
+      {"SendRequestByGet, silence", "7 T", 7, silent, Getting(true, false), HTTP_RET_IO_ERROR},
+      {"SendRequestByGet, silence in the head", "7 T", 7, Camera("json,fault=stall-in-head"),
+       Getting(true, false), HTTP_RET_IO_ERROR},
+      // The head has 95 bytes.
+      {"SendRequestByGet, the head in two pieces, each late", "7 T for each piece", 14,
+       Camera("json,fault=stall-before-status:6900,fault=slow:60:6900"), Getting(true, false),
+       HTTP_RET_OK},
+      {"SendRequestByGet without read-ahead, silence", "T", 1, silent, Getting(false, false),
        HTTP_RET_IO_ERROR},
-      {"SendRequestByGet over TLS, silence",
-       "14 T",
-       14,
-       {Silent()},
-       Getting(true, true),
-       HTTP_RET_IO_ERROR,
-       Peer::kTls},
-      {"SendRequest(GET), a late 401 and silence", "14 T", 14, late401, LogIn, HTTP_RET_IO_ERROR},
-      {"SendHttpGet, silence", "7 T", 7, {Silent()}, Json, -1},
+      {"SendRequestByGet over TLS, silence in the head", "14 T", 14,
+       Camera("json,tls,fault=stall-in-head"), Getting(true, true), HTTP_RET_IO_ERROR},
+      {"SendRequest(GET), a late 401 and a late answer", "14 T", 14,
+       Camera("cgi-digest,fault=stall-before-status:6900"), LogIn, HTTP_RET_OK},
+      {"SendHttpGet, silence", "7 T", 7, silent, Json, -1},
+      {"SendHttpGet, a late head and silence in the body", "7 T + 3 T", 10,
+       Camera("json,fault=stall-in-body:10,fault=stall-before-status:6900"), Json, -1},
+      {"SendHttpGet, a late 401, a late head and silence in the body", "14 T + 3 T", 17,
+       Camera("json,login=digest,user=,password=,fault=stall-in-body:10,fault=stall-before-status:"
+              "6900"),
+       Json, -1},
   };
 }
 
 std::vector<Case> PostCases() {
-  const std::vector<Script> late401 = {
-      {ExpectRequest(), Pause(kJustInSeven), Send(kChallenge), Close()}, Silent()};
+  const Peer silent = Camera("cgi,fault=stall-before-status");
+  const Peer late_head = Camera("soap,fault=stall-before-status:6900,fault=stall-after-head");
   return {
-      {"SendRequestBySocketPost, silence", "7 T", 7, {Silent()}, PostForm, HTTP_RET_IO_ERROR},
-      {"SendHttpPost, silence", "7 T", 7, {Silent()}, Form, 0},
-      {"SendReqBySocketPost, silence", "7 T", 7, {Silent()}, Soap, HTTP_RET_IO_ERROR},
-      {"SendReqBySocketPost, a late head and silence",
-       "14 T",
-       14,
-       {{ExpectRequest(), Pause(kJustInSeven), Send(kSoapHead), StallUntilFinish()}},
-       Soap,
+      {"SendRequestBySocketPost, silence", "7 T", 7, silent, PostForm, HTTP_RET_IO_ERROR},
+      {"SendHttpPost, silence", "7 T", 7, silent, Form, 0},
+      {"SendReqBySocketPost, silence", "7 T", 7, Camera("soap,fault=stall-before-status"), Soap,
        HTTP_RET_IO_ERROR},
-      {"SendAuthReqBySocketPost, a late 401 and silence", "14 T", 14, late401, SoapLogin,
+      {"SendReqBySocketPost, a late head and silence", "14 T", 14, late_head, Soap,
        HTTP_RET_IO_ERROR},
-      {"GetResp behind an upload, silence",
-       "7 T",
-       7,
-       {{ExpectUntil("\r\n\r\n"), StallUntilFinish()}},
-       Upload,
-       -1},
+      {"SendReqByXMLSocketPost, a late head and silence", "14 T", 14, late_head, SoapXml,
+       HTTP_RET_IO_ERROR},
+      {"SendAuthReqBySocketPost, a late 401 and a late answer", "14 T", 14,
+       Camera("soap,login=digest,fault=stall-before-status:6900"), SoapLogin, HTTP_RET_OK},
+      {"GetResp behind an upload, silence", "7 T", 7, Camera("upload,fault=stall-after-request"),
+       Upload, -1},
   };
 }
 

@@ -1,25 +1,26 @@
 // The longest that each call can take, derived from the code, and measured with peers at their
 // worst.
 //
-//   scripts/sandbox tarnwick_longest_call [SLACK]
+//   scripts/sandbox tarnwick_longest_call TWCAMSIM [SLACK]
 //
-// All cases run at once, each against a peer of its own, with a time-out of one second. It fails
-// for a call that took longer than its bound and SLACK seconds (0.9), or ended earlier than its
-// peer let it, which shows that the bound is wrong or the case is another one.
+// All cases run at once, with a time-out of one second, each against an endpoint of the simulated
+// camera TWCAMSIM or a script of its own. It fails for a call that took longer than its bound and
+// SLACK seconds (0.9), or ended earlier than its peer let it, which shows that the bound is wrong
+// or the case is another one.
 #include <gtest/gtest.h>
 #include <openssl/ssl.h>
 
-#include <algorithm>
 #include <chrono>
 #include <cstdio>
 #include <cstdlib>
-#include <memory>
+#include <string>
 #include <thread>
+#include <vector>
 
 #include "tarnwick/http/twcurl.h"
+#include "tests/longest_call/camera.h"
 #include "tests/longest_call/cases.h"
 #include "tests/longest_call/world.h"
-#include "tests/support/ports.h"
 #include "tests/support/scripted_peer.h"
 #include "tests/support/tls_scripted_peer.h"
 
@@ -48,19 +49,20 @@ PeerOptions Patient() {
   return options;
 }
 
-Measured Play(const Case& one) {
-  if (one.peer == Peer::kBlackHole) return Time(one, BlackHolePort().Port());
-  if (one.scripts.empty()) return Time(one, 0);
-  if (one.peer == Peer::kPlain) {
-    const ScriptedPeer peer(one.scripts, Patient());
+Measured PlayScripts(const Case& one) {
+  if (!one.peer.byte_by_byte) {
+    const ScriptedPeer peer(one.peer.scripts, Patient());
     return Time(one, peer.Port());
   }
   TlsOptions tls;
   tls.max_version = TLS1_2_VERSION;  // whose records tell a session ticket from data
-  const TlsScriptedPeer peer(one.scripts, tls, Patient());
-  if (one.peer == Peer::kTls) return Time(one, peer.Port());
+  const TlsScriptedPeer peer(one.peer.scripts, tls, Patient());
   const SlowRelay relay(peer.Port());
   return Time(one, relay.Port());
+}
+
+Measured Play(const Case& one, int camera_port) {
+  return one.peer.scripts.empty() ? Time(one, camera_port) : PlayScripts(one);
 }
 
 bool IsWithin(const Case& one, const Measured& measured, double slack) {
@@ -75,12 +77,17 @@ std::string Duration(const Case& one, const Measured& measured) {
   return one.seconds == 0 ? std::string(text) + ", when the peer gave way" : text;
 }
 
+// Who was at the other end: the camera's endpoint in its own words, so that it can be had again.
+std::string PeerWords(const Case& one) {
+  return one.peer.endpoint.empty() ? "scripted" : "`" + one.peer.endpoint + "`";
+}
+
 // Results: the cases whose measured time is not what was derived.
 int Report(const std::vector<Case>& cases, const std::vector<Measured>& measured, double slack) {
   int wrong = 0;
   for (size_t i = 0; i < cases.size(); ++i) {
-    std::printf("| %s | %s | %s |\n", cases[i].name, cases[i].bound,
-                Duration(cases[i], measured[i]).c_str());
+    std::printf("| %s | %s | %s | %s |\n", cases[i].name, cases[i].bound,
+                Duration(cases[i], measured[i]).c_str(), PeerWords(cases[i]).c_str());
     if (IsWithin(cases[i], measured[i], slack)) continue;
     ++wrong;
     std::fprintf(stderr, "longest_call: %s: %.2f s, result %d; expected %.1f s, result %d\n",
@@ -90,14 +97,33 @@ int Report(const std::vector<Case>& cases, const std::vector<Measured>& measured
   return wrong;
 }
 
-int RunAll(const std::vector<Case>& cases, double slack) {
+// `ports` are those of the camera; 0 for a case without it.
+int RunAll(const std::vector<Case>& cases, const std::vector<int>& ports, double slack) {
   std::vector<Measured> measured(cases.size());
   std::vector<std::thread> threads;
   for (size_t i = 0; i < cases.size(); ++i) {
-    threads.emplace_back([&, i] { measured[i] = Play(cases[i]); });
+    threads.emplace_back([&, i] { measured[i] = Play(cases[i], ports[i]); });
   }
   for (std::thread& thread : threads) thread.join();
   return Report(cases, measured, slack);
+}
+
+int RunWithCamera(const std::string& program, const std::vector<Case>& cases, double slack) {
+  std::vector<std::string> endpoints;
+  for (const Case& one : cases) {
+    if (!one.peer.endpoint.empty()) endpoints.push_back(one.peer.endpoint);
+  }
+  const SimulatedCamera camera(program, endpoints, kHold);
+  std::vector<int> ports;
+  size_t used = 0;
+  for (const Case& one : cases) {
+    ports.push_back(one.peer.endpoint.empty() ? 0 : camera.Port(used++));
+  }
+  return RunAll(cases, ports, slack);
+}
+
+int RunWithout(const std::vector<Case>& cases, double slack) {
+  return RunAll(cases, std::vector<int>(cases.size(), 0), slack);
 }
 
 std::vector<Case> CasesOfPeers() {
@@ -116,14 +142,18 @@ int main(int argc, char** argv) {
     std::fprintf(stderr, "%s changes the system's limits: run it by scripts/sandbox\n", argv[0]);
     return 2;
   }
-  const double slack = argc > 1 ? std::atof(argv[1]) : 0.9;
+  if (argc < 2) {
+    std::fprintf(stderr, "usage: %s TWCAMSIM [SLACK]\n", argv[0]);
+    return 2;
+  }
+  const double slack = argc > 2 ? std::atof(argv[2]) : 0.9;
   const SilentNameServer nameServer;
   if (!RepeatConnectsOnce()) {
     std::perror("longest_call: tcp_syn_retries");
     return 2;
   }
   curl_easy_cleanup(TWCurlInit());
-  std::printf("| call and peer | longest | measured |\n|---|---|---|\n");
-  const int wrong = RunAll(CasesOfPeers(), slack) + RunAll(LockCases(), slack);
+  std::printf("| call and peer | longest | measured | peer |\n|---|---|---|---|\n");
+  const int wrong = RunWithCamera(argv[1], CasesOfPeers(), slack) + RunWithout(LockCases(), slack);
   return wrong == 0 && !::testing::Test::HasFailure() ? 0 : 1;
 }

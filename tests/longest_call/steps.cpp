@@ -3,6 +3,8 @@
 
 #include "tests/longest_call/cases.h"
 
+namespace {
+
 Step Pause(double seconds) {
   return {"Pause()",
           [seconds](PeerConnection&, std::string*) {
@@ -12,6 +14,8 @@ Step Pause(double seconds) {
           false};
 }
 
+}  // namespace
+
 Script Drip(const std::string& bytes, double pause) {
   Script script;
   for (const char byte : bytes) {
@@ -20,16 +24,4 @@ Script Drip(const std::string& bytes, double pause) {
   }
   script.push_back(StallUntilFinish());
   return script;
-}
-
-Script Silent() {
-  return {ExpectRequest(), StallUntilFinish()};
-}
-
-Script SilentBehind(const std::string& bytes) {
-  return {ExpectRequest(), Send(bytes), StallUntilFinish()};
-}
-
-Script GivesWay() {
-  return {Pause(kHold), Reset()};
 }
