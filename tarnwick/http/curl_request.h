@@ -33,6 +33,12 @@ class CurlRequest {
 
   // Adds a line to the header list. Results: false when memory ran out.
   bool AddHeader(const std::string& line);
+
+  // The same; a failure is logged at debug as `message` with libcurl's code for it.
+  bool AddHeader(const std::string& line, const char* message) {
+    return Accept(AddHeader(line) ? CURLE_OK : CURLE_OUT_OF_MEMORY, message, "");
+  }
+
   struct curl_slist* Headers() const {
     return m_headers;
   }

@@ -157,12 +157,13 @@ bool TWHttpClient::SetXmlUrl(CurlRequest* curl) {
 }
 
 bool TWHttpClient::SetXmlHeaders(CurlRequest* curl, bool forUpload) {
+  // It speaks of the request; support's search patterns know it so.
+  constexpr char kFailed[] = "Failed to set custom request";
   // The empty Expect keeps libcurl from waiting for a 100, which the devices never send.
-  const bool listed = curl->AddHeader("Accept: */*") &&
-                      curl->AddHeader("Content-Type: application/xml; charset=UTF-8") &&
-                      (!forUpload || curl->AddHeader("Expect:"));
-  // The message speaks of the request; support's search patterns know it so.
-  return listed && curl->Set(CURLOPT_HTTPHEADER, curl->Headers(), "Failed to set custom request");
+  return curl->AddHeader("Accept: */*", kFailed) &&
+         curl->AddHeader("Content-Type: application/xml; charset=UTF-8", kFailed) &&
+         (!forUpload || curl->AddHeader("Expect:", kFailed)) &&
+         curl->Set(CURLOPT_HTTPHEADER, curl->Headers(), kFailed);
 }
 
 bool TWHttpClient::SetCurlPut(CurlRequest* curl) {

@@ -1,13 +1,11 @@
-// Percent-encoding, base64, hex, decimal and time-stamp text.
+// Percent-encoding, base64 and hex.
 #include <openssl/evp.h>
 
 #include <algorithm>
 #include <cctype>
 #include <cstdint>
-#include <cstdio>
 #include <cstdlib>
 #include <cstring>
-#include <ctime>
 #include <new>
 
 #include "tarnwick/utils/utils.h"
@@ -91,19 +89,4 @@ std::string Md5ToHex(const unsigned char* digest) {
     hex[2 * i + 1] = kDigits[digest[i] & 15];
   }
   return std::string(hex, sizeof(hex));
-}
-
-std::string IntToString(int64_t value) {
-  return std::to_string(value);
-}
-
-std::string FormatUtcTimeStamp(int64_t microseconds) {
-  const time_t seconds = static_cast<time_t>(microseconds / 1000000);
-  struct tm utc = {};
-  char date[64] = "";
-  if (gmtime_r(&seconds, &utc) != nullptr) strftime(date, sizeof(date), "%Y%m%dT%H%M%S", &utc);
-  char milliseconds[64];
-  snprintf(milliseconds, sizeof(milliseconds), ".%03lldZ",
-           static_cast<long long>(microseconds / 1000 % 1000));
-  return std::string(date) + milliseconds;
 }

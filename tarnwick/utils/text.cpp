@@ -1,5 +1,9 @@
-// Removing, trimming and copying characters.
+// Removing, trimming and copying characters; numbers and times as text.
+#include <cstdint>
+#include <cstdio>
 #include <cstring>
+#include <ctime>
+#include <string>
 
 #include "tarnwick/utils/utils.h"
 
@@ -32,4 +36,19 @@ char* StrNCopy(char* dest, const char* src, size_t size) {
   std::strncpy(dest, src, size - 1);
   dest[size - 1] = '\0';
   return dest;
+}
+
+std::string IntToString(int64_t value) {
+  return std::to_string(value);
+}
+
+std::string FormatUtcTimeStamp(int64_t microseconds) {
+  const time_t seconds = static_cast<time_t>(microseconds / 1000000);
+  struct tm utc = {};
+  char date[64] = "";
+  if (gmtime_r(&seconds, &utc) != nullptr) strftime(date, sizeof(date), "%Y%m%dT%H%M%S", &utc);
+  char milliseconds[64];
+  snprintf(milliseconds, sizeof(milliseconds), ".%03lldZ",
+           static_cast<long long>(microseconds / 1000 % 1000));
+  return std::string(date) + milliseconds;
 }

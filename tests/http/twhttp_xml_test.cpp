@@ -549,16 +549,20 @@ TEST(XmlSenders, WithoutAHandleTheResultStaysAndALineIsLogged) {
   }
 }
 
-TEST(XmlSenders, WithoutMemoryForTheHeadersTheRequestEnds) {
+TEST(XmlSenders, WithoutMemoryForTheHeadersTheRequestEndsWithALine) {
   for (const Sender* sender : {&kPost, &kPut}) {
     for (const int nth : {1, 2}) {
       ClientProbe client(80, WithLogin());
+      LogCapture log;
       Faults faults;
       faults.FailNth(Call::kCurlSlistAppend, nth);
       EXPECT_EQ(Send(*sender, client), HTTP_RET_IO_ERROR) << sender->name;
       EXPECT_EQ(client.m_result, HTTP_RET_IO_ERROR);
       EXPECT_EQ(faults.Count(Call::kCurlEasyPerform), 0);
       EXPECT_EQ(faults.Count(Call::kCurlEasyCleanup), 1);
+      EXPECT_THAT(log.Lines(),
+                  ElementsAre(IsHttpLog("debug", sender->name,
+                                        "Failed to set custom request, return value=27\n")));
     }
   }
 }
