@@ -97,33 +97,26 @@ int Report(const std::vector<Case>& cases, const std::vector<Measured>& measured
   return wrong;
 }
 
-// `ports` are those of the camera; 0 for a case without it.
-int RunAll(const std::vector<Case>& cases, const std::vector<int>& ports, double slack) {
-  std::vector<Measured> measured(cases.size());
-  std::vector<std::thread> threads;
-  for (size_t i = 0; i < cases.size(); ++i) {
-    threads.emplace_back([&, i] { measured[i] = Play(cases[i], ports[i]); });
-  }
-  for (std::thread& thread : threads) thread.join();
-  return Report(cases, measured, slack);
-}
-
-int RunWithCamera(const std::string& program, const std::vector<Case>& cases, double slack) {
+// The words of the cases that have the camera as their peer, in the cases' order.
+std::vector<std::string> Endpoints(const std::vector<Case>& cases) {
   std::vector<std::string> endpoints;
   for (const Case& one : cases) {
     if (!one.peer.endpoint.empty()) endpoints.push_back(one.peer.endpoint);
   }
-  const SimulatedCamera camera(program, endpoints, kHold);
-  std::vector<int> ports;
-  size_t used = 0;
-  for (const Case& one : cases) {
-    ports.push_back(one.peer.endpoint.empty() ? 0 : camera.Port(used++));
-  }
-  return RunAll(cases, ports, slack);
+  return endpoints;
 }
 
-int RunWithout(const std::vector<Case>& cases, double slack) {
-  return RunAll(cases, std::vector<int>(cases.size(), 0), slack);
+// REQUIRES: the camera has the Endpoints of these cases.
+int RunAll(const std::vector<Case>& cases, const SimulatedCamera& camera, double slack) {
+  std::vector<Measured> measured(cases.size());
+  std::vector<std::thread> threads;
+  size_t endpoint = 0;
+  for (size_t i = 0; i < cases.size(); ++i) {
+    const int port = cases[i].peer.endpoint.empty() ? 0 : camera.Port(endpoint++);
+    threads.emplace_back([&, i, port] { measured[i] = Play(cases[i], port); });
+  }
+  for (std::thread& thread : threads) thread.join();
+  return Report(cases, measured, slack);
 }
 
 std::vector<Case> CasesOfPeers() {
@@ -152,8 +145,14 @@ int main(int argc, char** argv) {
     std::perror("longest_call: tcp_syn_retries");
     return 2;
   }
+  const std::vector<Case> cases = CasesOfPeers();
+  const SimulatedCamera camera(argv[1], Endpoints(cases), kHold);
+  if (!camera.Serves()) {
+    std::fprintf(stderr, "longest_call: no simulated camera\n");
+    return 2;
+  }
   curl_easy_cleanup(TWCurlInit());
   std::printf("| call and peer | longest | measured | peer |\n|---|---|---|---|\n");
-  const int wrong = RunWithCamera(argv[1], CasesOfPeers(), slack) + RunWithout(LockCases(), slack);
+  const int wrong = RunAll(cases, camera, slack) + RunAll(LockCases(), camera, slack);
   return wrong == 0 && !::testing::Test::HasFailure() ? 0 : 1;
 }
