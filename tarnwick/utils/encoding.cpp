@@ -6,30 +6,58 @@
 #include <cstdint>
 #include <cstdlib>
 #include <cstring>
+#include <iterator>
 #include <new>
 
 #include "tarnwick/utils/utils.h"
 
 namespace {
 
-// Wider than the unreserved characters of RFC 3986: cameras take these in query values as they are.
-// They are marked with the class of letters and digits, so that one test lets both through.
-struct Marks {
-  constexpr Marks() {
-    for (const char c : {'_', '~', '(', ')', '*', ',', '-', '.'}) {
-      classOf[static_cast<unsigned char>(c)] = _ISalnum;
-    }
-  }
-  unsigned short classOf[256] = {};
+// What a byte goes out as.
+struct Encoded {
+  char text[3];
+  uint8_t length;  // 1 or 3; 0 where the locale decides
 };
-constexpr Marks kMarks;
 
-char* WriteEscape(unsigned char byte, char* out) {
-  static constexpr char kDigits[] = "0123456789ABCDEF";  // or it is built for each byte anew
-  out[0] = '%';
-  out[1] = kDigits[byte >> 4];
-  out[2] = kDigits[byte & 15];
-  return out + 3;
+Encoded Plain(char c) {
+  return {{c, 0, 0}, 1};
+}
+
+Encoded Escape(unsigned char byte) {
+  static constexpr char kDigits[] = "0123456789ABCDEF";
+  return {{'%', kDigits[byte >> 4], kDigits[byte & 15]}, 3};
+}
+
+// In every locale: letters, digits and more marks than the unreserved ones of RFC 3986, which
+// cameras take in query values as they are. Tabs and line ends go out as blanks, because no request
+// line may have them. Beyond ASCII the locale has letters.
+struct EncodedAscii {
+  EncodedAscii() {
+    for (int c = 0; c < 256; ++c) of[c] = Escape(static_cast<unsigned char>(c));
+    for (int c = '0'; c <= 'z'; ++c) {
+      if (c <= '9' || (c >= 'A' && c <= 'Z') || c >= 'a') of[c] = Plain(static_cast<char>(c));
+    }
+    for (const char c : {'_', '~', '(', ')', '*', ',', '-', '.'}) {
+      of[static_cast<unsigned char>(c)] = Plain(c);
+    }
+    for (int c = '\t'; c <= '\r'; ++c) of[c] = Escape(' ');
+    for (int c = 128; c < 256; ++c) of[c].length = 0;
+  }
+  Encoded of[256];
+};
+
+Encoded EncodedInLocale(unsigned char byte) {
+  if (isalnum(byte) != 0) return Plain(static_cast<char>(byte));
+  return Escape(isspace(byte) != 0 ? ' ' : byte);
+}
+
+// Fills `own` with `usual`, and with what `keep` holds but for blanks and their like.
+void KeepToo(const std::string& keep, const Encoded (&usual)[256], Encoded (*own)[256]) {
+  std::copy(std::begin(usual), std::end(usual), *own);
+  for (const char c : keep) {
+    const auto byte = static_cast<unsigned char>(c);
+    if (isspace(byte) == 0) (*own)[byte] = Plain(c);
+  }
 }
 
 // OpenSSL counts in int. Only the last piece may end in the middle of a group of three bytes.
@@ -37,27 +65,25 @@ constexpr size_t kBase64Piece = size_t{3} << 28;
 
 }  // namespace
 
+// A table, and no decision a byte, which the processor would guess wrong at every other escape.
 std::string UrlEncode(std::string text, std::string keep) {
-  // What isalnum and isspace look up in the process's locale, without two calls a byte.
-  const unsigned short* const classes = *__ctype_b_loc();
-  if (text.size() > text.max_size() / 3) throw std::bad_alloc();
-  std::string result(3 * text.size(), '\0');
+  static const EncodedAscii usual;
+  Encoded own[256];
+  if (!keep.empty()) KeepToo(keep, usual.of, &own);
+  const Encoded* const encoded = keep.empty() ? usual.of : own;
+  if (text.size() > text.max_size() / 3 - 1) throw std::bad_alloc();
+  // A byte more than three for each, because the lengths are copied along.
+  std::string result(3 * text.size() + 1, '\0');
   char* out = &result[0];
+  Encoded inLocale;
   for (const char c : text) {
-    // Stored before it is known to stay: nearly all bytes do, and the loop has one way for them.
-    const auto byte = static_cast<unsigned char>(c);
-    *out = c;
-    const unsigned classOf = classes[byte] | kMarks.classOf[byte];
-    if ((classOf & _ISalnum) != 0) {
-      ++out;
-      continue;
+    const Encoded* code = &encoded[static_cast<unsigned char>(c)];
+    if (code->length == 0) {
+      inLocale = EncodedInLocale(static_cast<unsigned char>(c));
+      code = &inLocale;
     }
-    const bool isSpace = (classOf & _ISspace) != 0;
-    if (!keep.empty() && !isSpace && keep.find(c) != std::string::npos) {
-      ++out;
-    } else {
-      out = WriteEscape(isSpace ? ' ' : byte, out);
-    }
+    std::memcpy(out, code, sizeof(*code));
+    out += code->length;
   }
   result.resize(static_cast<size_t>(out - result.data()));
   return result;

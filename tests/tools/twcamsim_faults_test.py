@@ -435,6 +435,13 @@ def test_faults_combine_in_their_order(camera):
     assert running.journal()[0]["faults"] == ["bare-lf", "no-colon", "success-false"]
 
 
+@pytest.mark.parametrize("first", ["stall-before-status=100", "stall-in-head=100", "stall-after-head=100"])
+def test_a_wait_is_no_place_for_another_fault(camera, first):
+    expected = STALLS["stall-in-body"](usual(camera))
+    running = camera("-e", "json", "-f", first, "-f", "stall-in-body=1")
+    assert running.ask(silence=SILENCE, least=len(expected)) == (expected, "silent")
+
+
 @pytest.mark.parametrize("first", ["no-code", "no-status-line", "other-protocol", "informational"])
 def test_faults_of_the_same_place_get_along(camera, first):
     others = ["no-reason", "http-2-status", "status-code=7", "head-lines=2", "head-lines-first=2"]

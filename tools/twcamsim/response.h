@@ -12,6 +12,7 @@
 
 enum class Part {
   kEarlier,
+  kWait,  // no bytes
   kStatusLine,
   kHeader,
   kBlank,

@@ -25,7 +25,7 @@ FaultType OnBehaviour(const char* name, const char* meaning,
 }
 
 WireStep Wait(int64_t ms) {
-  return {ms == 0 ? Action::kStall : Action::kPause, Part::kBody, "", milliseconds(ms)};
+  return {ms == 0 ? Action::kStall : Action::kPause, Part::kWait, "", milliseconds(ms)};
 }
 
 void InsertAt(Wire* wire, size_t index, const WireStep& step) {
