@@ -65,7 +65,7 @@ void AppendBufferedChunks(TWSocket* socket, std::string* body) {
   for (;;) {
     const std::string_view data = WholeChunk(buffered);
     if (data.empty()) return;
-    const auto size = static_cast<size_t>(data.end() + 2 - buffered.begin());
+    const size_t size = static_cast<size_t>(data.data() - buffered.data()) + data.size() + 2;
     SocketAccess::Take(socket, size);
     buffered.remove_prefix(size);
     body->append(data);

@@ -46,6 +46,8 @@ const char* PathOf(LOG_TYPE type) {
 // The beginning of a line, put together without a format, which costs as much as writing it.
 class Head {
  public:
+  Head() : m_length(0) { m_text[0] = '\0'; }
+
   // Adds what fits.
   void Add(std::string_view text) { m_length += text.copy(m_text + m_length, kSize - m_length); }
 
@@ -84,7 +86,7 @@ class Head {
   static constexpr size_t kSize = 512;
   static constexpr size_t kSpare = 32;  // for the line's number and the marks around it
   char m_text[kSize];
-  size_t m_length = 0;
+  size_t m_length;
 };
 
 template <typename T>
