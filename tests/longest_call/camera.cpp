@@ -8,23 +8,12 @@
 #include <unistd.h>
 
 #include <chrono>
-#include <cstdio>
 #include <sstream>
 
 namespace {
 
 constexpr std::chrono::seconds kStart{30};
 constexpr std::chrono::seconds kEnd{10};
-
-[[noreturn]] void Execute(const std::vector<std::string>& command, int output) {
-  std::vector<char*> argv;
-  for (const std::string& word : command) argv.push_back(const_cast<char*>(word.c_str()));
-  argv.push_back(nullptr);
-  dup2(output, STDOUT_FILENO);
-  execv(argv[0], argv.data());
-  perror(argv[0]);
-  _exit(127);
-}
 
 // Results: the first line; empty when none came in time.
 std::string ReadLine(int fd) {

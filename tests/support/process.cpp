@@ -79,15 +79,6 @@ std::string Drain(int fd, steady_clock::time_point deadline) {
   return text;
 }
 
-[[noreturn]] void Execute(const std::vector<std::string>& command, int output) {
-  std::vector<char*> argv;
-  for (const std::string& word : command) argv.push_back(const_cast<char*>(word.c_str()));
-  argv.push_back(nullptr);
-  dup2(output, STDOUT_FILENO);
-  execvp(argv[0], argv.data());
-  _exit(127);
-}
-
 void* CallBody(void* body) {
   (*static_cast<const std::function<void()>*>(body))();
   return nullptr;
@@ -128,6 +119,16 @@ ChildResult Child::Wait(milliseconds limit) {
   result.code = result.exited ? WEXITSTATUS(status) : -1;
   result.signal = WIFSIGNALED(status) ? WTERMSIG(status) : 0;
   return result;
+}
+
+void Execute(const std::vector<std::string>& command, int output) {
+  std::vector<char*> argv;
+  for (const std::string& word : command) argv.push_back(const_cast<char*>(word.c_str()));
+  argv.push_back(nullptr);
+  dup2(output, STDOUT_FILENO);
+  execvp(argv[0], argv.data());
+  perror(argv[0]);
+  _exit(127);
 }
 
 ChildResult RunInChild(const std::function<int()>& body, milliseconds limit) {

@@ -40,6 +40,10 @@ class Child {
 ChildResult RunInChild(const std::function<int()>& body,
                        std::chrono::milliseconds limit = std::chrono::seconds(60));
 
+// What a child runs to become another program, whose standard output goes to `output`. It ends with
+// 127 and a message when there is no such program.
+[[noreturn]] void Execute(const std::vector<std::string>& command, int output);
+
 // True when the test program is built for another processor and runs in an emulator.
 bool IsEmulated();
 
