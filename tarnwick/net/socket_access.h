@@ -8,9 +8,9 @@
 
 class SocketAccess {
  public:
-  // A socket as `new TWSocket` gives it, but with a read-ahead buffer of no particular contents: no
-  // derived class looks into it. Of a daemon's many idle clients only what they used is resident.
-  static TWSocket* MakePlain() { return new TWSocket(TWSocket::UnsetBuffer()); }
+  // A socket as `new TWSocket` makes it, but with a read-ahead buffer that is never cleared: nobody
+  // derives from it. Of a daemon's many idle clients only what they used is resident.
+  static TWSocket* MakePlain() { return new TWSocket(TWSocket::HiddenBuffer()); }
 
   // What is buffered and unread. The next read of the socket ends it.
   static std::string_view Buffered(const TWSocket* socket) {

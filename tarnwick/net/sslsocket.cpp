@@ -7,6 +7,7 @@
 #include <openssl/ssl.h>
 
 #include "tarnwick/log/twdebuglog.h"
+#include "tarnwick/platform/cancel.h"
 #include "tarnwick/platform/sigpipe_guard.h"
 
 namespace {
@@ -34,6 +35,7 @@ SSLSocket::~SSLSocket() {
 }
 
 void SSLSocket::InitSSL() {
+  const NoCancel no_cancel;
   m_pSSLCtx = SSL_CTX_new(SSLv23_client_method());
   if (m_pSSLCtx == nullptr) {
     TW_LOG(LOG_CATEG_SOCKET, LOG_LEVEL_ERROR, "Failed to create SSL context object.\n");
@@ -74,6 +76,7 @@ int SSLSocket::Handshake() {
   // A connection that failed was not shut down, and its state would spoil this one.
   SSL_clear(m_pSSL);
   SSL_set_fd(m_pSSL, m_sockFd);
+  const NoCancel no_cancel;
   SigpipeGuard guard;
   const int result = SSL_connect(m_pSSL);
   if (result != 1) guard.TakeBack();
@@ -83,6 +86,7 @@ int SSLSocket::Handshake() {
 void SSLSocket::Disconnect() {
   if (IsConnected() && m_pSSL != nullptr) {
     ERR_clear_error();
+    const NoCancel no_cancel;
     SigpipeGuard guard;
     if (SSL_shutdown(m_pSSL) < 0) guard.TakeBack();
     SSL_clear(m_pSSL);

@@ -33,13 +33,14 @@ class TARNWICK_API SSLSocket : public TWSocket {
   void Disconnect() override;
 
   // As TWSocket::DoSelect, but 0 at once for SELECT_READ while decrypted bytes are waiting; so
-  // HasDataToRead answers false just then, and ReadData returns them without a wait. Behind the
-  // peer's close notice it looks, but does not wait.
+  // HasDataToRead answers false just then, and ReadData returns them without a wait. After the
+  // peer's close notice ReadData does not wait, but DoSelect and HasDataToRead do, as on TCP.
   int DoSelect(SELECT_TYPE type) override;
 
   // Reads at most `len` decrypted bytes.
-  // Results: the bytes read; 0 when the peer closed, with or without a close notice; -1 on an error
-  //   (logged). errno is 0 or the failing system call's.
+  // Results: the bytes read; 0 when the peer closed, with or without a close notice, and when it
+  //   ended the connection by a fatal alert (logged); -1 on an error (logged), and without a
+  //   connection. errno is then 0 or the failing system call's.
   // Blocks for `timeout` seconds whenever more of a record is missing; behind DoSelect, which has
   // waited as long, a silent peer costs a read twice the time-out.
   int _Read(void* buf, unsigned int len) override;
@@ -51,7 +52,6 @@ class TARNWICK_API SSLSocket : public TWSocket {
  private:
   TARNWICK_LOCAL void InitSSL();
   TARNWICK_LOCAL int Handshake();
-  TARNWICK_LOCAL bool StreamHasEnded() const;
 
   struct ssl_ctx_st* m_pSSLCtx;
   struct ssl_st* m_pSSL;

@@ -9,6 +9,7 @@
 
 #include "tarnwick/log/twdebuglog.h"
 #include "tarnwick/net/sslsocket.h"
+#include "tarnwick/platform/cancel.h"
 #include "tarnwick/platform/sigpipe_guard.h"
 
 namespace {
@@ -26,6 +27,7 @@ template <typename Operation>
 TlsResult RunTls(SSL* ssl, Operation operation) {
   ERR_clear_error();
   if (ssl == nullptr) return {-1, SSL_ERROR_SSL};
+  const NoCancel no_cancel;
   SigpipeGuard guard;
   errno = 0;
   const int count = operation(ssl);
@@ -49,16 +51,7 @@ int SSLSocket::DoSelect(SELECT_TYPE type) {
   if (m_sockFd < 0) return -1;
   // 0, not the count: what is decrypted already makes the descriptor no more readable.
   if (type == SELECT_READ && m_pSSL != nullptr && SSL_pending(m_pSSL) > 0) return 0;
-  const int configured = m_timeout;
-  // A peer may keep the connection open behind its close notice, and nothing is worth a wait there.
-  if (type == SELECT_READ && StreamHasEnded() && m_timeout > 0) m_timeout = 0;
-  const int ready = TWSocket::DoSelect(type);
-  m_timeout = configured;
-  return ready;
-}
-
-bool SSLSocket::StreamHasEnded() const {
-  return m_pSSL != nullptr && (SSL_get_shutdown(m_pSSL) & SSL_RECEIVED_SHUTDOWN) != 0;
+  return TWSocket::DoSelect(type);
 }
 
 int SSLSocket::_Read(void* buf, unsigned int len) {
@@ -67,11 +60,13 @@ int SSLSocket::_Read(void* buf, unsigned int len) {
     const TlsResult result = RunTls(m_sockFd < 0 ? nullptr : m_pSSL, [&](SSL* ssl) {
       return SSL_read(ssl, buf, static_cast<int>(len));
     });
+    m_bStreamEnded = m_pSSL != nullptr && (SSL_get_shutdown(m_pSSL) & SSL_RECEIVED_SHUTDOWN) != 0;
     if (WantsToWait(result.error)) {
       // A loop, because a record that comes byte by byte takes thousands of rounds.
       if (DoSelect(SELECT_READ) > 0) continue;
       TW_LOG(LOG_CATEG_SOCKET, LOG_LEVEL_ERROR, "Select read op error.\n");
-    } else if (result.count < 0) {
+    } else if (result.count < 0 || (result.count == 0 && ERR_peek_error() != 0)) {
+      // A peer's fatal alert gives 0 with a reason, and ends the stream.
       TW_LOG(LOG_CATEG_SOCKET, LOG_LEVEL_ERROR, "Read error [%d] [%s].\n", result.error,
              ErrorText().text);
     }

@@ -10,9 +10,9 @@
 #include <unistd.h>
 
 #include <cstring>
-#include <typeinfo>
 
 #include "tarnwick/log/twdebuglog.h"
+#include "tarnwick/platform/cancel.h"
 
 TWSocket::TWSocket() : TWSocket(std::string(), -1, -1, false) {}
 
@@ -25,19 +25,23 @@ TWSocket::TWSocket(const std::string& host, int port, int timeout, bool buffered
       m_bConnected(false),
       m_bEOF(false),
       m_readBuf(),
+      m_bBufferIsHidden(false),
+      m_bStreamEnded(false),
       m_readPos(0),
       m_readLen(0),
       m_srcAddr(0) {}
 
 // As the default constructor, but for the buffer, of which no page is touched before it is used.
 // cppcheck-suppress uninitMemberVarPrivate
-TWSocket::TWSocket(UnsetBuffer /*unset*/)
+TWSocket::TWSocket(HiddenBuffer /*hidden*/)
     : m_sockFd(-1),
       m_port(-1),
       m_timeout(-1),
       m_bBuffered(false),
       m_bConnected(false),
       m_bEOF(false),
+      m_bBufferIsHidden(true),
+      m_bStreamEnded(false),
       m_readPos(0),
       m_readLen(0),
       m_srcAddr(0) {}
@@ -47,21 +51,15 @@ TWSocket::~TWSocket() {
 }
 
 void TWSocket::CloseFd() {
+  m_bStreamEnded = false;
   if (m_sockFd < 0) return;
+  const NoCancel no_cancel;
   close(m_sockFd);
   m_sockFd = -1;
 }
 
-// A derived class sees the buffer and may write anywhere in it. In a plain socket nothing that was
-// read lies behind the unread bytes (ForgetTaken and RestoreData see to it), so the cleared buffer
-// that callers count on costs no more than what was used of it.
-bool TWSocket::IsPlain() const {
-  return typeid(*this) == typeid(TWSocket);
-}
-
 void TWSocket::ClearReadBuf() {
-  const size_t used = static_cast<size_t>(m_readPos) + static_cast<size_t>(m_readLen);
-  std::memset(m_readBuf, 0, IsPlain() ? used : sizeof(m_readBuf));
+  if (!m_bBufferIsHidden) std::memset(m_readBuf, 0, sizeof(m_readBuf));
   m_readPos = 0;
   m_readLen = 0;
 }

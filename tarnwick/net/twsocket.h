@@ -18,8 +18,12 @@ struct addrinfo;
 
 // One connection at a time to one host and port; it may be connected again and again.
 //
-// The object is large (a 64 KiB buffer lies inside it): create it on the heap.
+// The object is large (a 64 KiB buffer lies inside it): create it on the heap. A derived class may be
+// compiled without RTTI and without exceptions.
 // Threads: one thread uses an object at a time.
+// Cancellation: a thread may be cancelled in any operation. It ends in a wait for the peer, or after
+//   the operation: a name look-up is not left. The object may then be destroyed, disconnected or
+//   connected again.
 class TARNWICK_API TWSocket {
  public:
   // What a wait is for.
@@ -147,19 +151,25 @@ class TARNWICK_API TWSocket {
   bool m_bConnected;
   bool m_bEOF;
   char m_readBuf[kReadBufSize];
+
+ private:
+  // In the byte that alignment leaves free here.
+  bool m_bBufferIsHidden : 1;  // no derived class sees the buffer, so nobody clears it
+  bool m_bStreamEnded : 1;     // TLS's close notice has come, so no read waits
+
+ protected:
   int m_readPos;           // first unread byte in m_readBuf
   int m_readLen;           // unread bytes from there
   unsigned int m_srcAddr;  // network byte order; 0: not bound
 
  private:
   friend class SocketAccess;  // net/socket_access.h: what the library's own client may do besides
-  struct UnsetBuffer {};
-  TARNWICK_LOCAL explicit TWSocket(UnsetBuffer unset);
+  friend class SSLSocket;
+  struct HiddenBuffer {};
+  TARNWICK_LOCAL explicit TWSocket(HiddenBuffer hidden);
 
   TARNWICK_LOCAL void CloseFd();
-  TARNWICK_LOCAL bool IsPlain() const;
   TARNWICK_LOCAL void ClearReadBuf();
-  TARNWICK_LOCAL void ForgetTaken();
   TARNWICK_LOCAL int BindRemoteAddr();
   TARNWICK_LOCAL bool ConnectWithTimeout(const struct addrinfo* address);
 

@@ -46,7 +46,7 @@ int TWSocket::ReadBuffered(char* buf, int len) {
   int done = 0;
   for (int retries = 0; m_readLen < len - done;) {
     done += TakeBuffered(buf + done, m_readLen);
-    ForgetTaken();
+    m_readPos = 0;
     if (!ReadStraight(buf, len, &done)) return -1;
     if (done == len) return len;
     if (!WaitReadable()) return -1;
@@ -73,12 +73,6 @@ int TWSocket::TakeBuffered(char* buf, int len) {
   m_readPos += len;
   m_readLen -= len;
   return len;
-}
-
-// Begins the buffer anew when all of it has been taken.
-void TWSocket::ForgetTaken() {
-  if (IsPlain()) std::memset(m_readBuf, 0, static_cast<size_t>(m_readPos));
-  m_readPos = 0;
 }
 
 // Moves bytes of a line to the caller, at most `room`, of which none ends it. It may stop early:
@@ -136,8 +130,13 @@ bool TWSocket::MayRetry(int retries) {
   return false;
 }
 
+// A peer may keep the connection open after TLS's close notice, and nothing is worth a wait then.
 bool TWSocket::WaitReadable() {
-  if (DoSelect(SELECT_READ) >= 0) return true;
+  const int configured = m_timeout;
+  if (m_bStreamEnded && m_timeout > 0) m_timeout = 0;
+  const int ready = DoSelect(SELECT_READ);
+  m_timeout = configured;
+  if (ready >= 0) return true;
   TW_LOG_AS(kReadData, LOG_CATEG_SOCKET, LOG_LEVEL_ERROR, "Failed to select socket [%d]\n",
             m_sockFd);
   return false;
@@ -161,7 +160,6 @@ int TWSocket::RestoreData(char* data, int len) {
   const size_t pos = static_cast<size_t>(m_readPos);
   if (unread > 0) std::memmove(m_readBuf + size, m_readBuf + pos, unread);
   std::memcpy(m_readBuf, data, size);
-  if (IsPlain() && pos > size) std::memset(m_readBuf + size + unread, 0, pos - size);
   m_readPos = 0;
   m_readLen += len;
   return 0;

@@ -13,6 +13,7 @@
 
 #include "tarnwick/log/twdebuglog.h"
 #include "tarnwick/net/twsocket.h"
+#include "tarnwick/platform/cancel.h"
 #include "tarnwick/platform/fd_set.h"
 #include "tarnwick/platform/owned.h"
 #include "tarnwick/utils/utils.h"
@@ -33,6 +34,7 @@ bool LookUp(const std::string& host, int port, AddressList* addresses) {
   hints.ai_family = AF_INET;
   hints.ai_socktype = SOCK_STREAM;
   struct addrinfo* list = nullptr;
+  const NoCancel no_cancel;
   if (getaddrinfo(host.c_str(), IntToString(port).c_str(), &hints, &list) != 0) return false;
   addresses->reset(list);
   return true;

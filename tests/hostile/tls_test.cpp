@@ -569,11 +569,12 @@ const std::vector<TrafficCase> kRecords = {
           return InOrder({Alerts(tls, 10000, kNoRenegotiation), Data(tls, kReply)});
         },
         kUnread, kFailed),
-    ServesRecords("AnAlert",
-                  [](ServerTls& tls) {
-                    return InOrder({Data(tls, kHead), Alerts(tls, 1, {2, 80})});
-                  },
-                  {HTTP_RET_OK, HTTP_RET_OK, 200, ""}),
+    ServesRecords(
+        "AnAlert",
+        [](ServerTls& tls) {
+          return InOrder({Data(tls, kHead), Alerts(tls, 1, {2, 80})});
+        },
+        {HTTP_RET_OK, HTTP_RET_OK, 200, ""}, kFailed),
     ServesRecords(
         "AnEmptyAlert",
         [](ServerTls& tls) {

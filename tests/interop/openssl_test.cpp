@@ -6,8 +6,10 @@
 #include <json/json.h>
 #include <unistd.h>
 
+#include "tarnwick/net/sslsocket.h"
 #include "tests/interop/certificates.h"
 #include "tests/interop/servers.h"
+#include "tests/support/log_capture.h"
 
 namespace {
 
@@ -114,6 +116,22 @@ TEST_P(SServer, EndsABodyWithoutACloseNotice) {
   ASSERT_TRUE(server.AwaitOutput("User-Agent"));
   server.Kill();
   EXPECT_EQ(BodyOf(&client), "body");
+}
+
+// With TLS 1.3 the server asks after the client's handshake has ended.
+TEST(SServerClientCertificate, IsNamedInTheLogWhenThereIsNone) {
+  TlsServer server("good", {"-Verify", "1", "-verify_return_error", "-tls1_3"});
+  LogCapture log;
+  SSLSocket socket("127.0.0.1", server.Port(), 5, true);
+  ASSERT_EQ(socket.Connect(), 0);
+  char line[16];
+  EXPECT_EQ(socket.ReadToLineEnd(line, sizeof(line)), 0);
+  EXPECT_TRUE(socket.IsEOF());
+  EXPECT_THAT(
+      log.Lines("socket"),
+      ::testing::Contains(::testing::Field(
+          &LogLine::message,
+          ::testing::MatchesRegex("Read error \\[1\\] \\[error:.*certificate required\\].\n"))));
 }
 
 // ---- certificates

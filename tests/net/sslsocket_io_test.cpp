@@ -1,8 +1,10 @@
 // Reading and writing over TLS.
 #include <openssl/err.h>
 #include <openssl/ssl.h>
+#include <unistd.h>
 
 #include <algorithm>
+#include <chrono>
 #include <csignal>
 #include <memory>
 #include <random>
@@ -10,6 +12,7 @@
 
 #include "tests/net/net_test_util.h"
 #include "tests/support/faults.h"
+#include "tests/support/flag.h"
 #include "tests/support/process.h"
 #include "tests/support/tls_scripted_peer.h"
 
@@ -101,13 +104,37 @@ TEST_P(TlsBothModes, ACloseWithANoticeIsTheEndOfTheStreamAgainAndAgain) {
   EXPECT_THAT(log.Lines(), ElementsAre(line, line, line));
 }
 
-TEST_P(TlsBothModes, BehindACloseNoticeNothingWaitsForThePeerToClose) {
-  // Devices keep the connection open there. A wait would outlast the test's own time.
+TEST_P(TlsBothModes, AfterACloseNoticeNoReadWaitsForThePeerToClose) {
+  // A wait would outlast the test's own time.
   TlsPair tls({Send("bye"), SendCloseNotice(), StallUntilFinish()}, 3600, GetParam());
   EXPECT_EQ(ReadSome(tls.socket, 3), (Delivered{3, "bye"}));
   EXPECT_EQ(ReadSome(tls.socket, 2000), (Delivered{0, ""}));
   EXPECT_EQ(ReadSome(tls.socket, 2000), (Delivered{0, ""}));
-  EXPECT_FALSE(tls.socket.HasDataToRead(3600));
+}
+
+TEST(TlsRead, AfterACloseNoticeAProbeWaitsAsOnTcp) {
+  TlsPair tls({Send("bye"), SendCloseNotice(), StallUntilFinish()}, 1, true);
+  EXPECT_EQ(ReadSome(tls.socket, 2000), (Delivered{3, "bye"}));
+  EXPECT_TRUE(tls.socket.IsEOF());
+  const auto start = std::chrono::steady_clock::now();
+  EXPECT_FALSE(tls.socket.HasDataToRead(1));
+  EXPECT_EQ(tls.socket.DoSelect(TWSocket::SELECT_READ), 0);
+  EXPECT_GE(std::chrono::steady_clock::now() - start, std::chrono::milliseconds(1900));
+}
+
+TEST(TlsRead, AConnectionAfterOneWithACloseNoticeIsWaitedForAgain) {
+  TlsPair tls({Send("bye"), SendCloseNotice(), StallUntilFinish()}, 5, true);
+  EXPECT_EQ(ReadSome(tls.socket, 2000), (Delivered{3, "bye"}));
+  const Flag asked;
+  TlsScriptedPeer other({{Handshake(), WaitFor(asked), Send("late"), Close()}});
+  tls.socket.SetSocketInfo("127.0.0.1", other.Port(), 5, true);
+  ASSERT_EQ(tls.socket.Connect(), 0);
+  std::thread sender([&] {
+    usleep(50000);
+    asked.Set();
+  });
+  EXPECT_EQ(ReadSome(tls.socket, 4), (Delivered{4, "late"}));
+  sender.join();
 }
 
 TEST_P(TlsBothModes, ACloseWithoutANoticeIsTheEndOfTheStreamAgainAndAgain) {
