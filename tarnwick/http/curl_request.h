@@ -7,6 +7,8 @@
 
 #include <string>
 
+#include "tarnwick/platform/cancel.h"
+
 // It logs under the name of the operation that it serves.
 class CurlRequest {
  public:
@@ -54,6 +56,7 @@ class CurlRequest {
   CURLcode SetOwnOptions();
   bool Accept(CURLcode code, const char* message, const char* detail);
 
+  NoCancel m_noCancel;  // libcurl is not left in the middle
   const char* m_operation;
   CURL* m_curl;
   struct curl_slist* m_headers;

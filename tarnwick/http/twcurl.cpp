@@ -5,6 +5,7 @@
 #include <pthread.h>
 
 #include "tarnwick/log/twdebuglog.h"
+#include "tarnwick/platform/cancel.h"
 
 namespace {
 
@@ -35,5 +36,6 @@ bool CurlGlobalInit() {
 }  // namespace
 
 CURL* TWCurlInit() {
+  const NoCancel no_cancel;
   return CurlGlobalInit() ? curl_easy_init() : nullptr;
 }

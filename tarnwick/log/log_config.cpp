@@ -2,6 +2,7 @@
 #include <sys/shm.h>
 
 #include "tarnwick/log/twdebuglog.h"
+#include "tarnwick/platform/unloading.h"
 
 TWDbgLogCfg* g_pDbgLogCfg = nullptr;
 
@@ -23,11 +24,19 @@ __attribute__((constructor)) void InitDbgCfg() {
   g_pDbgLogCfg = TWShmDbgLogCfgAt();
 }
 
-__attribute__((destructor)) void FreeDbgCfg() {
+void FreeDbgCfg() {
   if (g_pDbgLogCfg == nullptr) return;
   shmdt(g_pDbgLogCfg);
   g_pDbgLogCfg = nullptr;
 }
+
+namespace {
+
+__attribute__((destructor)) void DetachRecord() {
+  if (IsBeingUnloaded()) FreeDbgCfg();
+}
+
+}  // namespace
 
 bool TWDbgLogCfg::TimeScale() const {
   return __atomic_load_n(&m_bTimeScale, __ATOMIC_RELAXED) != 0;

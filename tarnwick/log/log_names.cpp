@@ -1,8 +1,12 @@
 // The names of categories and levels.
 #include "tarnwick/log/log_names.h"
 
+#include <atomic>
+#include <memory>
+#include <new>
+
 #include "tarnwick/log/twdebuglog.h"
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/unloading.h"
 
 namespace {
 
@@ -35,6 +39,22 @@ void FillNames(const char* const (&names)[N], std::map<T, const char*>* map) {
   for (const char* name : names) (*map)[static_cast<T>(value++)] = name;
 }
 
+// The maps of the process. They are not static objects: those are destroyed by exit(), while other
+// threads may still log, and one that is being built at a fork stays so in the child.
+template <typename T>
+std::atomic<const TWEnum2StrMap<T>*> g_names{nullptr};
+
+template <typename T>
+void Release() {
+  delete g_names<T>.exchange(nullptr);
+}
+
+__attribute__((destructor)) void ReleaseNames() {
+  if (!IsBeingUnloaded()) return;
+  Release<LOG_CATEG>();
+  Release<LOG_LEVEL>();
+}
+
 }  // namespace
 
 template <>
@@ -51,13 +71,14 @@ TWEnum2StrMap<LOG_LEVEL>::TWEnum2StrMap() {
 template <>
 TWEnum2StrMap<LOG_LEVEL>::~TWEnum2StrMap() = default;
 
+// Of several first callers each builds a map, and the first to finish gives it to all.
 template <typename T>
 const TWEnum2StrMap<T>& NamesOf() {
-  // A thread that waits for another one to build the names may find errno changed, and a log line
-  // must not change its caller's.
-  const ErrnoKeeper keeper;
-  static const TWEnum2StrMap<T> names;
-  return names;
+  const TWEnum2StrMap<T>* names = g_names<T>.load(std::memory_order_acquire);
+  if (names != nullptr) return *names;
+  auto built = std::make_unique<const TWEnum2StrMap<T>>();
+  if (!g_names<T>.compare_exchange_strong(names, built.get())) return *names;
+  return *built.release();
 }
 template const TWEnum2StrMap<LOG_CATEG>& NamesOf<LOG_CATEG>();
 template const TWEnum2StrMap<LOG_LEVEL>& NamesOf<LOG_LEVEL>();
@@ -78,4 +99,16 @@ const char* Enum2String<LOG_CATEG>(LOG_CATEG value) {
 template <>
 const char* Enum2String<LOG_LEVEL>(LOG_LEVEL value) {
   return NameIn(NamesOf<LOG_LEVEL>(), value);
+}
+
+const char* TWLogName(LOG_CATEG value) noexcept try {
+  return Enum2String(value);
+} catch (const std::bad_alloc&) {
+  return "unknown";
+}
+
+const char* TWLogName(LOG_LEVEL value) noexcept try {
+  return Enum2String(value);
+} catch (const std::bad_alloc&) {
+  return "unknown";
 }

@@ -10,6 +10,7 @@
 #include <exception>
 
 #include "tarnwick/log/twdebuglog.h"
+#include "tarnwick/platform/cancel.h"
 #include "tarnwick/platform/file_lock.h"
 #include "tarnwick/platform/owned.h"
 #include "tarnwick/platform/qlibcfile.h"
@@ -63,6 +64,7 @@ int TWDbgLogCfg::Init(int /*unused*/) {
 }
 
 int TWDbgLogCfg::LoadDbgLogSettings() try {
+  const NoCancel no_cancel;
   char levels[1024];
   const int levelsRead = ReadSettingValue(kSettingsFile, kLevelsKey, levels, sizeof(levels));
   if (levelsRead >= 1) {
@@ -81,6 +83,7 @@ int TWDbgLogCfg::LoadDbgLogSettings() try {
 }
 
 int TWDbgLogCfg::SaveDbgLogSettings() try {
+  const NoCancel no_cancel;
   std::string levels;
   for (int categ = 0; categ < LOG_CATEG_COUNT; ++categ) {
     if (categ > 0) levels += ',';

@@ -19,6 +19,7 @@
 #include <optional>
 #include <string_view>
 
+#include "tarnwick/platform/cancel.h"
 #include "tarnwick/platform/file_lock.h"
 #include "tarnwick/platform/fork_hold.h"
 #include "tarnwick/platform/owned.h"
@@ -112,16 +113,20 @@ void AddTags(const char* categ, const char* level, Head* head) {
   head->Cut(start + kTagsLength);
 }
 
+// The C library has a lock for the time zone.
+bool ToLocalTime(time_t seconds, struct tm* local) {
+  if (ForkHold::LocksAreLost()) return false;
+  const ForkHold hold(ForkHold::kLibraryLock);
+  return localtime_r(&seconds, local) != nullptr;
+}
+
 // As "%b %e %T" of strftime, without the price of a format. Milliseconds only when the
 // administrator asked for them; no time at all when the clock's value cannot be converted.
 void AddTime(Head* head) {
   struct timeval now = {};
   struct tm local;
   gettimeofday(&now, nullptr);
-  // The C library has a lock for the time zone, which a fork in the middle of it would leave held
-  // in the child.
-  const ForkHold hold;
-  if (localtime_r(&now.tv_sec, &local) == nullptr) return;
+  if (!ToLocalTime(now.tv_sec, &local)) return;
   head->Add(nl_langinfo(ABMON_1 + local.tm_mon));
   head->Add(local.tm_mday < 10 ? "  " : " ");
   head->Add(local.tm_mday);
@@ -178,10 +183,13 @@ bool HasFileSizeLimit() {
   return result != 0 || limit.rlim_cur != RLIM_INFINITY;
 }
 
-// To the system log; the line number is that of the failure.
+// To the system log, which has a lock too; the line number is that of the failure.
 void ReportFailure(const char* call, int line) {
+  const int error = errno;
+  if (ForkHold::LocksAreLost()) return;
+  const ForkHold hold(ForkHold::kLibraryLock);
   syslog(LOG_ERR, "twdebuglog:%d:TWPrintf(): %s twlog file failed with errno [%d].", line, call,
-         errno);
+         error);
 }
 
 }  // namespace
@@ -194,6 +202,7 @@ void TWPrintf(LOG_TYPE type, const char* categ, const char* level, const char* f
               const char* func, const char* format, ...) {
   // Callers read errno after they have logged.
   const ErrnoKeeper keeper;
+  const NoCancel no_cancel;
   char buffer[kStreamSize];
   UninheritedFile log(PathOf(type), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, 0666);
   if (!log.Valid()) {

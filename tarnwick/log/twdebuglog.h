@@ -20,7 +20,6 @@
 
 #include <cstdint>
 #include <map>
-#include <new>
 #include <string>
 
 #include "tarnwick/platform/export.h"
@@ -147,10 +146,10 @@ TARNWICK_API TWEnum2StrMap<LOG_LEVEL>::~TWEnum2StrMap();
 
 // The name of a category or a level.
 //
-// Results: a zero-terminated text that lives as long as the library is loaded; "unknown" for a
+// Results: a zero-terminated string that lives as long as the library is loaded; "unknown" for a
 //   value outside the enumeration; never null. The first call throws std::bad_alloc when memory
 //   runs out.
-// Threads: any; the first call builds the names, concurrent first calls wait for it.
+// Threads: any, also while another thread ends the process.
 template <typename T>
 const char* Enum2String(T value);
 
@@ -228,7 +227,8 @@ TARNWICK_API TWDbgLogCfg* TWShmDbgLogCfgAt();
 TARNWICK_API void InitDbgCfg();
 
 // Detaches the record, if there is one, and sets g_pDbgLogCfg to null. Runs by itself when the
-// library is unloaded.
+// library is unloaded by dlclose. At the end of a process it does not: other threads may still log,
+// and the kernel detaches the record.
 // Threads: not while other threads log.
 TARNWICK_API void FreeDbgCfg();
 
@@ -244,8 +244,14 @@ TARNWICK_API void FreeDbgCfg();
 //   the system log; a lock that cannot be had drops the line silently. A full disk and the
 //   process's limit on file sizes cut the line or lose it; no SIGXFSZ comes of it. errno is kept.
 // Threads: any thread of any process; lines never mix, because each is written under an exclusive
-//   flock of the file. Blocks while another process holds that lock. A process may fork meanwhile:
-//   the child has none of the open log files and may log itself.
+//   flock of the file. Blocks while another process or thread holds that lock.
+// Fork: a process may fork at any moment, and the child may log. It has none of the open log files.
+//   The fork waits while another thread opens or closes a log file, reads the time zone or reports
+//   to the system log, for 100 milliseconds at most. When one of the last two has not ended by then,
+//   the child's lines have no time, and it does not report failures: it would wait for ever.
+// End of the process: a thread may log while another one calls exit.
+// Cancellation: a thread that is cancelled meanwhile ends at its next cancellation point after the
+//   line.
 TARNWICK_API void TWPrintf(LOG_TYPE type, const char* categ, const char* level, const char* file,
                            int line, const char* func, const char* format, ...)
     __attribute__((format(printf, 7, 8)));
@@ -265,14 +271,9 @@ inline bool TWLogEnabled(LOG_CATEG categ, LOG_LEVEL level) {
 
 // Enum2String for TW_LOG: "unknown" when there is no memory for the names, which the first call of
 // a process builds. A log call throws nothing.
-template <typename T>
-const char* TWLogName(T value) {
-  try {
-    return Enum2String(value);
-  } catch (const std::bad_alloc&) {
-    return "unknown";
-  }
-}
+// Threads: any.
+TARNWICK_API const char* TWLogName(LOG_CATEG value) noexcept;
+TARNWICK_API const char* TWLogName(LOG_LEVEL value) noexcept;
 
 // The source name that TW_LOG prints. A source file gives its own bare name by defining the macro
 // before its first include; without that its path is used, of which the base name is printed.

@@ -6,14 +6,27 @@
 
 #include <cstdio>
 
-// While one exists, fork() waits in every other thread, and so do other holds: keep the scope free
-// of anything that waits. A thread may fork in its own hold, as a signal handler does.
+// While one exists, fork() waits in every other thread, for 100 milliseconds at most: what is done in
+// it is short, but a hung disk or system log must not stop a process that forks. Holds do not wait
+// for each other. A thread may fork in its own hold, as a signal handler does.
 class ForkHold {
  public:
-  ForkHold();
+  enum Kind {
+    kDescriptor,   // opens or closes a file
+    kLibraryLock,  // calls a function of the C library that has a lock which fork() does not reset
+  };
+
+  explicit ForkHold(Kind kind);
   ~ForkHold();
   ForkHold(const ForkHold&) = delete;
   ForkHold& operator=(const ForkHold&) = delete;
+
+  // True in a child whose fork() did not wait for the end of every kLibraryLock: these locks may
+  // stay held for ever, so the child must not call such functions.
+  static bool LocksAreLost();
+
+ private:
+  Kind m_kind;
 };
 
 // An open file of which a forked child keeps nothing: what its stream holds is dropped and its
@@ -33,7 +46,7 @@ class UninheritedFile {
   bool Valid() const { return m_fd >= 0; }
   int Get() const { return m_fd; }
 
-  // Makes a stream on it, with a buffer of `size` bytes that outlives this object, and gives true;
+  // Makes a stream on it, with a buffer of `size` bytes that outlives this object, and returns true;
   // or false with errno. REQUIRES: no stream yet.
   bool MakeStream(const char* mode, char* buffer, size_t size);
   FILE* Stream() const { return m_stream; }
@@ -44,6 +57,9 @@ class UninheritedFile {
 
  private:
   friend void CloseInheritedFiles();
+
+  void Register();
+  void Unregister();
 
   int m_fd;
   FILE* m_stream = nullptr;

@@ -9,6 +9,8 @@
 #include <cstdlib>
 #include <memory>
 
+#include "tarnwick/platform/cancel.h"
+
 // Puts errno back as it was: for code that runs between a failing call and the caller who reads
 // errno.
 class ErrnoKeeper {
@@ -30,6 +32,7 @@ class OwnedFd {
   OwnedFd& operator=(OwnedFd&&) = delete;
   ~OwnedFd() {
     const ErrnoKeeper keeper;
+    const NoCancel no_cancel;
     if (m_fd >= 0) close(m_fd);
   }
 
@@ -53,7 +56,10 @@ template <typename T>
 using OwnedMemory = std::unique_ptr<T, FreeDeleter>;
 
 struct FileCloser {
-  void operator()(FILE* file) const { std::fclose(file); }
+  void operator()(FILE* file) const {
+    const NoCancel no_cancel;
+    std::fclose(file);
+  }
 };
 using OwnedFile = std::unique_ptr<FILE, FileCloser>;
 

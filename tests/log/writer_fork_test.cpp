@@ -1,5 +1,6 @@
 // Processes that fork while another of their threads writes a line.
 #include <fcntl.h>
+#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <signal.h>
 #include <sys/mman.h>
@@ -12,18 +13,22 @@
 #include <functional>
 #include <string>
 #include <thread>
+#include <vector>
 
 #include "tarnwick/log/twdebuglog.h"
+#include "tarnwick/platform/fork_hold.h"
 #include "tests/support/faults.h"
 #include "tests/support/files.h"
 #include "tests/support/flag.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/process.h"
+#include "tests/support/syslog_capture.h"
 
 namespace {
 
 using std::chrono::milliseconds;
 using std::chrono::seconds;
+using ::testing::MatchesRegex;
 
 void Write() {
   TWPrintf(LOG_TYPE_MAIN, "http", "warn", "name", 57, "Func", "message\n");
@@ -158,8 +163,8 @@ TEST_F(WriterFork, AChildThatEndsWritesNothingOfItsParentsLine) {
   EXPECT_EQ(ParseLog(text).size(), 1u) << text;
 }
 
-// The C library's lock of the time zone would stay held in the child, whose own line would then
-// wait for ever, with the lock of the log.
+// The C library's lock of the time zone would stay held in the child, whose own line would then have
+// no time.
 TEST_F(WriterFork, AForkWaitsWhileALineReadsTheTimeZone) {
   const Flag in_line;
   const Flag forked;
@@ -167,7 +172,7 @@ TEST_F(WriterFork, AForkWaitsWhileALineReadsTheTimeZone) {
   const Flag child_ended;
   const auto stop = [&] {
     in_line.Set();
-    forked_meanwhile = forked.Wait(milliseconds(200));
+    forked_meanwhile = forked.Wait(milliseconds(20));
   };
   std::thread writer = WriterThatStopsAt(Call::kLocaltimeR, 1, stop, child_ended);
   EXPECT_TRUE(in_line.Wait());
@@ -181,6 +186,79 @@ TEST_F(WriterFork, AForkWaitsWhileALineReadsTheTimeZone) {
   writer.join();
   EXPECT_FALSE(forked_meanwhile);
   EXPECT_EQ(ParseLog(ReadFile(kMainLog)).size(), 2u);
+}
+
+// Forks in this thread while another one is before its first call of one kind in a line. Results:
+// the child's, which writes a line to the notification log.
+ChildResult ForkBesideAStuckLine(Call call) {
+  const Flag stuck;
+  const Flag go_on;
+  const auto stop = [=] {
+    stuck.Set();
+    go_on.Wait();
+  };
+  std::thread writer = WriterThatStopsAt(call, 1, stop, go_on);
+  EXPECT_TRUE(stuck.Wait());
+  const ChildResult child = RunInChild(
+      [] {
+        TWPrintf(LOG_TYPE_NOTIFICATION, "http", "warn", "name", 57, "Func", "message\n");
+        return 0;
+      },
+      seconds(10));
+  go_on.Set();
+  writer.join();
+  return child;
+}
+
+TEST_F(WriterFork, AForkDoesNotWaitForALogThatCannotBeOpenedAtOnce) {
+  unlink(kNotificationLog);
+  const ChildResult child = ForkBesideAStuckLine(Call::kOpen);
+  EXPECT_FALSE(child.timed_out);
+  const std::vector<LogLine> lines = ParseLog(ReadFile(kNotificationLog));
+  ASSERT_EQ(lines.size(), 1u);
+  EXPECT_NE(lines[0].time, "");
+}
+
+TEST_F(WriterFork, AChildThatCannotAskForTheTimeZoneWritesALineWithoutATime) {
+  unlink(kNotificationLog);
+  const ChildResult child = ForkBesideAStuckLine(Call::kLocaltimeR);
+  EXPECT_FALSE(child.timed_out);
+  EXPECT_THAT(ReadFile(kNotificationLog),
+              MatchesRegex(" \\[[0-9]+\\]\\[http\\]\\[warn\\] name:57:Func\\(\\): message\n"));
+}
+
+TEST_F(WriterFork, ALineDoesNotWaitForAnotherLogThatCannotBeOpenedAtOnce) {
+  const Flag stuck;
+  const Flag go_on;
+  const auto stop = [=] {
+    stuck.Set();
+    go_on.Wait();
+  };
+  std::thread writer = WriterThatStopsAt(Call::kOpen, 1, stop, go_on);
+  EXPECT_TRUE(stuck.Wait());
+  Write();
+  EXPECT_EQ(ParseLog(ReadFile(kMainLog)).size(), 1u);
+  go_on.Set();
+  writer.join();
+}
+
+TEST_F(WriterFork, AChildOfAThreadInTheSystemLogDoesNotReport) {
+  const Flag stuck;
+  const Flag go_on;
+  std::thread holder([&] {
+    const ForkHold hold(ForkHold::kLibraryLock);  // as a report has it
+    stuck.Set();
+    go_on.Wait();
+  });
+  EXPECT_TRUE(stuck.Wait());
+  const ChildResult child = RunInChild([]() -> int {
+    SyslogCapture reports;
+    TWPrintf(static_cast<LOG_TYPE>(2), nullptr, nullptr, "name", 57, "Func", "message\n");
+    return static_cast<int>(reports.Take().size());
+  });
+  go_on.Set();
+  holder.join();
+  EXPECT_EQ(child.code, 0);
 }
 
 }  // namespace

@@ -7,6 +7,7 @@
 #include <sys/file.h>
 #include <unistd.h>
 
+#include <atomic>
 #include <cerrno>
 #include <chrono>
 #include <cstdio>
@@ -14,6 +15,7 @@
 #include <memory>
 #include <string>
 #include <thread>
+#include <vector>
 
 #include "tarnwick/platform/owned.h"
 #include "tests/support/faults.h"
@@ -36,9 +38,9 @@ TEST(ForkHold, AForkInAnotherThreadWaitsForItsEnd) {
   bool forked_meanwhile = false;
   std::thread holder([&] {
     {
-      const ForkHold hold;
+      const ForkHold hold(ForkHold::kDescriptor);
       held.Set();
-      forked_meanwhile = forked.Wait(std::chrono::milliseconds(200));
+      forked_meanwhile = forked.Wait(std::chrono::milliseconds(20));
     }
     child_ended.Wait();
   });
@@ -52,29 +54,68 @@ TEST(ForkHold, AForkInAnotherThreadWaitsForItsEnd) {
 }
 
 TEST(ForkHold, AThreadMayForkInItsOwnAndTheChildMayHoldAgain) {
-  const ForkHold hold;
+  const ForkHold hold(ForkHold::kDescriptor);
   const ChildResult result = RunInChild([] {
-    const ForkHold again;
+    const ForkHold again(ForkHold::kLibraryLock);
     return RunInChild([] { return 0; }).code;
   });
   EXPECT_EQ(result.code, 0);
 }
 
-TEST(ForkHold, AChildsThreadsHoldInTurn) {
-  const ChildResult result = RunInChild([] {
-    int value = 0;
-    const auto add = [&value] {
-      for (int i = 0; i < 1000; ++i) {
-        const ForkHold hold;
-        ++value;
-      }
-    };
-    std::thread other(add);
-    add();
-    other.join();
-    return value == 2000 ? 0 : 1;
+// Forks while another thread is in a hold that lasts until the child has ended. Results: the
+// child's, of which the exit code is what it sees of lost locks.
+ChildResult ForkBesideALongHold(ForkHold::Kind kind) {
+  const Flag held;
+  const Flag child_ended;
+  std::thread holder([&] {
+    const ForkHold hold(kind);
+    held.Set();
+    child_ended.Wait();
   });
+  EXPECT_TRUE(held.Wait());
+  const ChildResult result = RunInChild([] {
+    const ForkHold hold(ForkHold::kDescriptor);
+    return RunInChild([] { return ForkHold::LocksAreLost() ? 1 : 0; }).code;
+  });
+  child_ended.Set();
+  holder.join();
+  return result;
+}
+
+TEST(ForkHold, AForkDoesNotWaitForTheEndOfALongOne) {
+  const ChildResult result = ForkBesideALongHold(ForkHold::kDescriptor);
+  EXPECT_FALSE(result.timed_out);
   EXPECT_EQ(result.code, 0);
+}
+
+TEST(ForkHold, AChildOfALongOneKnowsThatLocksAreLost) {
+  EXPECT_EQ(ForkBesideALongHold(ForkHold::kLibraryLock).code, 1);
+  EXPECT_FALSE(ForkHold::LocksAreLost());
+}
+
+TEST(ForkHold, AChildOfItsOwnThreadKnowsThatLocksAreLost) {
+  const ForkHold hold(ForkHold::kLibraryLock);
+  EXPECT_EQ(RunInChild([] { return ForkHold::LocksAreLost() ? 1 : 0; }).code, 1);
+}
+
+TEST(ForkHold, HoldsDoNotWaitForEachOther) {
+  const ForkHold hold(ForkHold::kDescriptor);
+  std::thread([] { const ForkHold other(ForkHold::kDescriptor); }).join();
+}
+
+TEST(ForkHold, ThreadsMayForkAndHoldAtOnce) {
+  std::vector<std::thread> threads;
+  std::atomic<int> good{0};
+  for (int i = 0; i < 4; ++i) {
+    threads.emplace_back([&good] {
+      for (int round = 0; round < 50; ++round) {
+        { const ForkHold hold(ForkHold::kLibraryLock); }
+        good += RunInChild([] { return ForkHold::LocksAreLost() ? 1 : 0; }).code == 0 ? 1 : 0;
+      }
+    });
+  }
+  for (std::thread& thread : threads) thread.join();
+  EXPECT_EQ(good, 200);
 }
 
 TEST(UninheritedFile, OpensCreatesAndClosesAsOpenDoes) {

@@ -1,9 +1,9 @@
 // The stress program:
 //
-//   scripts/sandbox tarnwick_stress [log|settings|levels] [--quick] [--case=PART_OF_ITS_NAME]
+//   scripts/sandbox tarnwick_stress [log|settings|levels|life] [--quick] [--case=PART_OF_ITS_NAME]
 //   scripts/sandbox tarnwick_stress --self-check
 //
-// Without a section it runs all three. The exit code is 1 when a case failed, 2 for a wrong call.
+// Without a section it runs all. The exit code is 1 when a case failed, 2 for a wrong call.
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
@@ -46,7 +46,7 @@ std::vector<StressCase> CasesOf(const Wanted& wanted) {
   if (wanted.self_check) return SelfChecks();
   std::vector<StressCase> cases;
   for (const auto& part : {LogCases(), LogFaultCases(), LogForkCases(), SettingsCases(),
-                           SettingsFaultCases(), LevelsCases()}) {
+                           SettingsFaultCases(), LevelsCases(), LifeCases()}) {
     for (const StressCase& stress_case : part) {
       if (!wanted.section.empty() && wanted.section != stress_case.section) continue;
       if (std::string(stress_case.name).find(wanted.part) == std::string::npos) continue;
@@ -66,7 +66,7 @@ int main(int argc, char** argv) {
   const Wanted wanted = ReadArguments(argc, argv);
   const std::vector<StressCase> cases = CasesOf(wanted);
   if (cases.empty()) {
-    fprintf(stderr, "usage: %s [log|settings|levels] [--quick] [--case=NAME] | --self-check\n",
+    fprintf(stderr, "usage: %s [log|settings|levels|life] [--quick] [--case=NAME] | --self-check\n",
             argv[0]);
     return 2;
   }

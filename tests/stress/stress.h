@@ -56,6 +56,7 @@ std::vector<StressCase> LogForkCases();
 std::vector<StressCase> SettingsCases();
 std::vector<StressCase> SettingsFaultCases();
 std::vector<StressCase> LevelsCases();
+std::vector<StressCase> LifeCases();
 
 // Gives each verifier texts and values that are wrong, and expects it to notice.
 std::vector<StressCase> SelfChecks();
