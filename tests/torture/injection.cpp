@@ -1,5 +1,7 @@
 #include "tests/torture/injection.h"
 
+#include <pthread.h>
+
 #include <cerrno>
 #include <cstring>
 
@@ -9,7 +11,8 @@ namespace {
 
 constexpr const char* kNames[] = {"none",         "allocation", "no-memory",
                                   "nothing-left", "call",       "nothing-works",
-                                  "interrupted",  "try-again",  "short"};
+                                  "interrupted",  "try-again",  "short",
+                                  "cancelled"};
 
 bool Strike(const char* name) {
   if (!t_injection.struck) t_injection.struck_name = name;
@@ -50,6 +53,7 @@ const char* FaultName(Fault fault) {
 }
 
 Fault FaultNamed(const char* name) {
+  if (strcmp(FaultName(Fault::kCancelled), name) == 0) return Fault::kCancelled;
   for (const Fault fault : kFaults) {
     if (strcmp(FaultName(fault), name) == 0) return fault;
   }
@@ -83,6 +87,11 @@ Verdict NextCall(const CallKind& kind) {
   const Fault fault = t_injection.point.fault;
   const bool due = CountsAllocations(fault) ? TakesCallsAfterwards(fault) : IsDue(number);
   if (!due) return {Verdict::kPass, 0};
+  if (fault == Fault::kCancelled) {
+    Strike(kind.name);
+    pthread_cancel(pthread_self());
+    return {Verdict::kPass, 0};
+  }
   if (fault == Fault::kShort) {
     if (kind.length < 0) return {Verdict::kPass, 0};
     Strike(kind.name);

@@ -18,8 +18,11 @@ enum class Fault {
   kInterrupted,   // the n-th system call fails with EINTR
   kTryAgain,      // the n-th system call fails with EAGAIN
   kShort,         // the n-th system call, when it moves bytes, moves one
+  kCancelled,     // the n-th system call finds the thread cancelled
 };
 
+// Those of a usual sweep. A cancelled thread has a sweep of its own: the address sanitizer does not
+// know that its frames are left.
 constexpr Fault kFaults[] = {Fault::kAllocation, Fault::kNoMemory,     Fault::kNothingLeft,
                              Fault::kCall,       Fault::kNothingWorks, Fault::kInterrupted,
                              Fault::kTryAgain,   Fault::kShort};

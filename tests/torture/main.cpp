@@ -5,6 +5,8 @@
 //   tarnwick_torture OPERATION --fault FAULT --point N [--cold]  one run again
 //   tarnwick_torture --quick [OPERATION...]             none as the first of a process, and unless
 //                                                       named none with a TLS handshake
+//   tarnwick_torture --cancel [OPERATION...]            the thread is cancelled at each system call
+//                                                       instead, after a first run
 //   tarnwick_torture --self-check                       finds the planted mistakes
 //   tarnwick_torture --list                             names the operations and the faults
 //
@@ -45,6 +47,7 @@ struct Arguments {
   Selection selection;
   int jobs = static_cast<int>(std::max(1U, std::thread::hardware_concurrency()));
   bool quick = false;
+  bool cancel = false;
   bool list = false;
   bool self_check = false;
 };
@@ -172,7 +175,7 @@ void AddJobs(const Operation& operation, const Arguments& arguments, std::vector
   const Selection& selection = arguments.selection;
   const bool all = !selection.only_first;
   if (all || !selection.cold) jobs->push_back(NewJob(operation, selection));
-  if (!operation.cold || arguments.quick || !(all || selection.cold)) return;
+  if (!operation.cold || arguments.quick || arguments.cancel || !(all || selection.cold)) return;
   Selection cold = selection;
   cold.cold = true;
   jobs->push_back(NewJob(operation, cold));
@@ -208,6 +211,7 @@ int SelfCheck() {
   for (const PlantedOperation& planted : PlantedOperations()) {
     Selection selection;
     selection.limit_seconds = planted.limit_seconds;
+    selection.first.fault = planted.first;
     std::vector<Job> jobs = {NewJob(planted.operation, selection)};
     RunAll(jobs, 1);
     if (IsFound(planted, *jobs[0].progress)) continue;
@@ -221,6 +225,7 @@ int SelfCheck() {
 int List() {
   for (const Operation& operation : AllOperations()) printf("%s\n", operation.name);
   for (const Fault fault : kFaults) printf("--fault %s\n", FaultName(fault));
+  printf("--fault %s\n", FaultName(Fault::kCancelled));
   return 0;
 }
 
@@ -234,6 +239,9 @@ bool Parse(int argc, char** argv, Arguments* arguments) {
       arguments->self_check = true;
     } else if (word == "--quick") {
       arguments->quick = true;
+    } else if (word == "--cancel") {
+      arguments->cancel = true;
+      arguments->selection.first.fault = Fault::kCancelled;
     } else if (word == "--cold") {
       arguments->selection.cold = true;
     } else if (word.compare(0, 2, "--") != 0) {

@@ -20,6 +20,7 @@ struct PlantedOperation {
   Operation operation;
   const char* found;
   int limit_seconds = 10;
+  Fault first = Fault::kAllocation;
 };
 std::vector<PlantedOperation> PlantedOperations();
 

@@ -75,16 +75,24 @@ void UndefinedLog(Stage& stage) {
 }
 
 // The record that the process has attached stays out of it.
+// The process's own attachment, which is put aside meanwhile.
+struct OtherRecord {
+  OtherRecord() : before(g_pDbgLogCfg) { g_pDbgLogCfg = nullptr; }
+  ~OtherRecord() {
+    FreeDbgCfg();
+    g_pDbgLogCfg = before;
+  }
+  TWDbgLogCfg* before;
+};
+
 void RecordAttach(Stage& stage) {
-  TWDbgLogCfg* const before = g_pDbgLogCfg;
-  g_pDbgLogCfg = nullptr;
+  const OtherRecord other;
   stage.Run([] { InitDbgCfg(); });
   TWDbgLogCfg* const attached = g_pDbgLogCfg;
   const bool is_record = attached != nullptr && attached->Level(LOG_CATEG_HTTP) == 7;
   stage.ExpectEither(is_record, attached == nullptr, "the record is not attached");
   stage.Run([] { FreeDbgCfg(); });
   stage.Expect(g_pDbgLogCfg == nullptr, "the record is still attached");
-  g_pDbgLogCfg = before;
 }
 
 std::string LevelsText(int level) {

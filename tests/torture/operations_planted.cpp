@@ -123,6 +123,23 @@ void ShortRead(Stage& stage) {
   stage.ExpectEither(count == 4, count == -1, "the read is short");
 }
 
+// Its thread may be cancelled between the two calls.
+void LostDescriptor(Stage& stage) {
+  stage.Run([] {
+    const int fd = open("/dev/null", O_RDONLY | O_CLOEXEC);
+    if (fd >= 0) close(fd);
+  });
+}
+
+struct ClosesInItsDestructor {
+  ~ClosesInItsDestructor() { close(-1); }
+};
+
+// A cancel in a destructor ends the process.
+void CancelledDestructor(Stage& stage) {
+  stage.Run([] { const ClosesInItsDestructor closes; });
+}
+
 // Fills a cache with its first failure, which is no mistake.
 void Cache(Stage& stage) {
   static void* cache = nullptr;
@@ -151,5 +168,11 @@ std::vector<PlantedOperation> PlantedOperations() {
       {{"planted_hang", Peer::kNone, Hang}, "longer than its limit", 1},
       {{"planted_short", Peer::kNone, ShortRead}, "the read is short"},
       {{"planted_cache", Peer::kNone, Cache}, nullptr},
+#ifndef TARNWICK_TORTURE_ASAN
+      {{"planted_lost_descriptor", Peer::kNone, LostDescriptor}, "is left open", 10,
+       Fault::kCancelled},
+      {{"planted_destructor", Peer::kNone, CancelledDestructor}, "ended by signal", 10,
+       Fault::kCancelled},
+#endif
   };
 }

@@ -6,6 +6,7 @@
 #include <cstring>
 
 #include "tarnwick/log/twdebuglog.h"
+#include "tarnwick/platform/owned.h"
 #include "tarnwick/utils/utils.h"
 #include "tests/support/flag.h"
 #include "tests/torture/operations.h"
@@ -17,15 +18,26 @@ void* SetFlag(void* flag) {
   return nullptr;
 }
 
-void StartThread(Stage& stage, unsigned stack_size, int detached) {
-  Flag ran;
-  pthread_t thread;
+// Waits for the thread, if there is one.
+struct StartedThread {
+  ~StartedThread() {
+    if (result != 1) return;
+    ran.Wait();
+    if (detached == 0) pthread_join(handle, nullptr);
+  }
+  int detached;
+  Flag ran = {};
+  pthread_t handle = {};
   int result = -1;
-  stage.Run([&] { result = CreateThread(SetFlag, &ran, stack_size, detached, &thread); });
-  stage.ExpectEither(result == 1, result == 0, "the result is wrong");
-  if (result != 1) return;
-  stage.Expect(ran.Wait(), "the thread does not run");
-  if (detached == 0) pthread_join(thread, nullptr);
+};
+
+void StartThread(Stage& stage, unsigned stack_size, int detached) {
+  StartedThread thread = {detached};
+  stage.Run([&] {
+    thread.result = CreateThread(SetFlag, &thread.ran, stack_size, detached, &thread.handle);
+  });
+  stage.ExpectEither(thread.result == 1, thread.result == 0, "the result is wrong");
+  if (thread.result == 1) stage.Expect(thread.ran.Wait(), "the thread does not run");
 }
 
 void JoinableThread(Stage& stage) {
@@ -39,6 +51,8 @@ void DetachedThread(Stage& stage) {
 void WholeWrite(Stage& stage) {
   int ends[2];
   socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0, ends);
+  const OwnedFd writes(ends[0]);
+  const OwnedFd reads(ends[1]);
   const std::string text(3000, 'w');
   int result = -1;
   stage.Run([&] { result = WriteFd(ends[0], text.data(), static_cast<int>(text.size())); });
@@ -46,8 +60,6 @@ void WholeWrite(Stage& stage) {
   const ssize_t count = recv(ends[1], arrived, sizeof(arrived), MSG_DONTWAIT);
   stage.ExpectEither(result == 3000, result >= 0, "the result is wrong");
   stage.Expect(result == (count < 0 ? 0 : count), "the result is not what was written");
-  close(ends[0]);
-  close(ends[1]);
 }
 
 void Delay(Stage& stage) {

@@ -2,6 +2,8 @@
 #ifndef TARNWICK_TESTS_TORTURE_STAGE_H_
 #define TARNWICK_TESTS_TORTURE_STAGE_H_
 
+#include <pthread.h>
+
 #include <exception>
 #include <new>
 #include <string>
@@ -16,7 +18,8 @@ class Stage {
   // The peer's, on 127.0.0.1.
   int Port() const { return port_; }
 
-  // Runs a step of the library's, which the fault may strike. An exception out of it is a mistake.
+  // Runs a step of the library's, which the fault may strike. An exception out of it is a mistake. A
+  // cancelled thread ends here at the latest: what the operation holds it must own.
   template <typename Step>
   void Run(Step step) {
     if (!RunMayThrow<NoException>(step)) return;
@@ -29,6 +32,7 @@ class Stage {
     try {
       const Armed armed;
       step();
+      if (t_injection.point.fault == Fault::kCancelled) pthread_testcancel();
       return true;
     } catch (const Exception&) {
       Expect(MayFail(), "threw without a reason");

@@ -1,5 +1,6 @@
 #include "tests/torture/sweeper.h"
 
+#include <pthread.h>
 #include <unistd.h>
 
 #include "tests/support/files.h"
@@ -22,6 +23,52 @@ constexpr long kPointsBetweenChecks = 8;
 std::string LogMistake() {
   const std::string text = t_injection.write_failed ? "" : ReadFile(kMainLog);
   return text.empty() || text.back() == '\n' ? "" : "the log ends in the middle of a line; ";
+}
+
+std::string RunHere(const Operation& operation, const Point& point, Stage& stage) {
+  StartRun(point);
+  operation.run(stage);
+  return "";
+}
+
+// A run in a thread of its own, whose counts outlive it.
+struct CancelledRun {
+  const Operation& operation;
+  const Point& point;
+  Stage& stage;
+  Injection counts;
+};
+
+// What other libraries keep for a thread goes when it ends, in the first round of such destructors;
+// by setting its value again this one is called in the last round too.
+pthread_key_t MakeReportKey() {
+  static pthread_key_t key;
+  pthread_key_create(&key, [](void* argument) {
+    static_cast<CancelledRun*>(argument)->counts = t_injection;
+    pthread_setspecific(key, argument);
+  });
+  return key;
+}
+
+void* RunInThread(void* argument) {
+  static const pthread_key_t key = MakeReportKey();
+  pthread_setspecific(key, argument);
+  auto* const run = static_cast<CancelledRun*>(argument);
+  t_injection.counting_blocks = true;
+  RunHere(run->operation, run->point, run->stage);
+  return nullptr;
+}
+
+// Results: a mistake when the thread does not end as a cancelled one, or by itself.
+std::string RunCancelled(const Operation& operation, const Point& point, Stage& stage) {
+  CancelledRun run = {operation, point, stage, {}};
+  pthread_t thread;
+  if (pthread_create(&thread, nullptr, RunInThread, &run) != 0) return "there is no thread; ";
+  void* end = nullptr;
+  pthread_join(thread, &end);
+  run.counts.blocks += t_injection.blocks;
+  t_injection = run.counts;
+  return end == nullptr || end == PTHREAD_CANCELED ? "" : "the thread ends otherwise; ";
 }
 
 }  // namespace
@@ -80,6 +127,9 @@ void Sweeper::Make(const Selection& selection) {
     TryPoint(selection.first, true);
     return;
   }
+  if (selection.first.fault == Fault::kCancelled) {
+    SweepFault(Fault::kCancelled, selection.first.number);
+  }
   for (const Fault fault : kFaults) {
     if (fault < selection.first.fault) continue;
     const bool resumes = fault == selection.first.fault;
@@ -137,15 +187,15 @@ Sweeper::RunResult Sweeper::RunOnce(const Point& point) {
   // What an earlier run could not remove is gone after one without a fault.
   if (point.fault == Fault::kNone) before.files = first_files_;
   const long blocks = t_injection.blocks;
-  StartRun(point);
-  operation_.run(stage);
+  result.mistakes = point.fault == Fault::kCancelled ? RunCancelled(operation_, point, stage)
+                                                     : RunHere(operation_, point, stage);
   result.blocks_left = t_injection.blocks - blocks - (stage.Mistakes().empty() ? 0 : 1);
   const bool with_files = !t_injection.unlink_failed;
   result.struck = t_injection.struck;
   if (result.struck) struck_name_ = t_injection.struck_name;
   const long made = CountsAllocations(point.fault) ? t_injection.allocations : t_injection.calls;
   result.reached = made >= point.number;
-  result.mistakes =
+  result.mistakes +=
       stage.Mistakes() + DifferenceOf(before, TakeTraces(), with_files) + HeldLock() + LogMistake();
   return result;
 }

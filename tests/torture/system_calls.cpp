@@ -223,7 +223,7 @@ bool TrapSystemCalls() {
   dl_iterate_phdr(NoteRuntime, nullptr);
   struct sigaction action = {};
   action.sa_sigaction = OnTrap;
-  action.sa_flags = SA_SIGINFO;
+  action.sa_flags = SA_SIGINFO | SA_NODEFER;  // a cancelled thread leaves the handler for good
   if (sigaction(SIGSYS, &action, nullptr) != 0) return false;
   std::vector<sock_filter> filter = Filter();
   const sock_fprog program = {static_cast<unsigned short>(filter.size()), filter.data()};
