@@ -17,13 +17,14 @@ void NoteEnd() {
 }
 
 // Among the names that the program was started with are the library's. glibc adds the names of a
-// library that is opened later after its constructors have run, if at all (2.31 to 2.41).
+// library that is opened later after its constructors have run, if at all (2.31 to 2.41). A function
+// is asked for: of a variable the program may have a copy.
 bool CameWithTheProgram() {
   void* const program = dlopen(nullptr, RTLD_LAZY | RTLD_NOLOAD);
   if (program == nullptr) return false;
   Dl_info found;
   Dl_info own;
-  const void* const name = dlsym(program, "g_pDbgLogCfg");
+  const void* const name = dlsym(program, "_Z15TWVersionNumberv");
   const bool same = name != nullptr && dladdr(name, &found) != 0 &&
                     dladdr(reinterpret_cast<void*>(NoteEnd), &own) != 0 &&
                     found.dli_fbase == own.dli_fbase;

@@ -13,7 +13,7 @@
 
 namespace {
 
-constexpr int kSecondsOfACase = 300;
+constexpr int kSecondsOfACase = 900;
 constexpr int kSecondsOfAQuickCase = 60;
 
 constexpr char kCaseOption[] = "--case=";
