@@ -4,21 +4,22 @@
 // A JSON service, in one call:
 //
 //   Json::Value reply;
-//   int result = SendHttpGet("192.0.2.7", 80, "api/info?full=1", reply, 5, false);  // 0: success
+//   int result = SendHttpGet(host, port, "api/info?full=1", reply, 5, false);  // 0: success
 //
 // A device that asks for a login:
 //
-//   TWHttpClient client("192.0.2.7", 80, "cgi/info.cgi", "admin", "secret", 5, false, true, false,
-//                       false, HTTP_VERSION_1_1, "");
-//   client.SendRequest(HTTP_METHOD_GET, "?");
+//   // At most 5 seconds a wait, with read-ahead; the login goes out when the device asks for it.
+//   TWHttpClient client(host, port, "info.cgi", "admin", "secret", 5, false, true, false, false,
+//                       HTTP_VERSION_NONE, "");
 //   int status = 0;
-//   if (client.CheckResponse(status) == HTTP_RET_OK) {
-//     char piece[8192];
-//     for (int n; (n = client.ReadData(piece, sizeof(piece))) > 0;) Use(piece, n);
-//   }
+//   std::string body;
+//   if (client.SendRequest(HTTP_METHOD_GET, "") != HTTP_RET_OK) return "";  // not sent
+//   if (client.CheckResponse(status) != HTTP_RET_OK) return "";             // `status` tells more
+//   if (client.ReadBody(body) != HTTP_RET_OK) return "";                    // it broke off
+//   return body;
 //
-// The message syntax is that of RFC 7230, the logins are those of RFC 2617. Failures are logged in
-// category http.
+// The message syntax is after RFC 7230, the logins are after RFC 2617; docs/deliberate.md has what
+// differs. Failures are logged in category http.
 #ifndef TARNWICK_HTTP_TWHTTP_H_
 #define TARNWICK_HTTP_TWHTTP_H_
 
