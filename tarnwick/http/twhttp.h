@@ -124,9 +124,10 @@ class TARNWICK_API TWHttpClient {
   void SetSocketRemoteAddr(unsigned int addr);
 
   // Writes headers and body of SendRequestByCurl's responses to `file`, from its current position;
-  // null collects the body in memory again. The caller keeps the file open during requests and
-  // closes it afterwards. After a success all has been flushed; a write or a flush that fails makes
-  // the request fail, what failed with the stream before does not.
+  // null collects the body in memory again. Of the head, lines without a colon, as the status line
+  // mostly is, and lines with "Transfer-Encoding:" are left out. The caller keeps the file open
+  // during requests and closes it afterwards. After a success all has been flushed; a write or a
+  // flush that fails makes the request fail, what failed with the stream before does not.
   void SetCurlRespFile(FILE* file);
 
   // Sets the cookie to send, as it stands. A response's head replaces it: with its last Set-Cookie,
