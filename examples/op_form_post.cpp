@@ -23,8 +23,9 @@ int main(int argc, char** argv) {
     std::fprintf(stderr, "usage: op_form_post HOST PORT PATH FORM COOKIE\n");
     return 2;
   }
+  // After a form of HTTP/1.1 many servers keep the connection, and the end of the body is not seen.
   TWHttpClient client(argv[1], std::atoi(argv[2]), argv[3], "", "", kTimeout, false, true, false,
-                      false, HTTP_VERSION_NONE, "");
+                      false, HTTP_VERSION_1_0, "");
   client.SetCookie(argv[5]);
 
   // The form is sent as it stands: its values are encoded already.

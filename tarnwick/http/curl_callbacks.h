@@ -27,8 +27,8 @@ size_t CurlFileRead(char* buffer, size_t size, size_t count, void* file);
 size_t CurlBufferWrite(char* buffer, size_t size, size_t count, void* memBuffer);
 
 // A header callback: writes the header lines and the empty line behind them to a FILE*, without the
-// status line and without Transfer-Encoding, because libcurl has decoded the body. The file then
-// reads as one message.
+// status line and without Transfer-Encoding, because libcurl has decoded the body. A line is left
+// out by its letters: a status line that holds a colon is written, and so is "transfer-encoding:".
 size_t CurlHeaderToFile(char* buffer, size_t size, size_t count, void* file);
 
 #endif  // TARNWICK_HTTP_CURL_CALLBACKS_H_

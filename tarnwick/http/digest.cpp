@@ -35,9 +35,9 @@ std::string HexOfMd5(std::initializer_list<std::string_view> texts) {
   return Finish(&context);
 }
 
-// For "auth-int" the digest of method and uri goes back into its own context, which continues
-// behind its final step; the body does not count. Deliberate: the devices in the field that ask for
-// auth-int compute it this way and refuse the value of the standard.
+// For "auth-int" the digest of method and uri goes back into its own context, which continues after
+// its final step; the body is ignored. RFC 2617, 3.2.2.3, digests the body. Kept as it is: callers
+// may depend on it; pinned by DigestResponse.AuthIntFeedsTheDigestOfItsStartAndNeverTheBody.
 std::string A2Digest(const DIGEST_ACCESS_AUTH& login, const std::string& method) {
   MD5_CTX a2;
   MD5_Init(&a2);
@@ -55,9 +55,9 @@ std::string_view Trim(std::string_view text, char ch) {
   return text.substr(first, text.find_last_not_of(ch) + 1 - first);
 }
 
-// Deliberately simple, and the devices rely on it: the name is found wherever it first occurs, also
-// inside another word, and a quoted value is cut at its first comma, so that a list of qops gives
-// its first.
+// Deliberately simple: the name is found wherever it first occurs, also inside another word, and a
+// quoted value is cut at its first comma, so that a list of qops gives its first. Kept as it is:
+// callers may depend on it; pinned by the tests of ParseChallenge.
 std::string_view FindParameter(std::string_view challenge, std::string_view name) {
   const size_t found = challenge.find(name);
   if (found == std::string_view::npos) return {};
@@ -87,7 +87,7 @@ std::string MakeClientNonce() {
 
 std::string DigestResponse(const DIGEST_ACCESS_AUTH& login, const std::string& password,
                            const std::string& method) {
-  // The algorithm does not count: an MD5-sess challenge is answered as plain MD5.
+  // The algorithm is ignored: an MD5-sess challenge is answered as plain MD5.
   const std::string ha1 = HexOfMd5({login.username, ":", login.realm, ":", password});
   const std::string ha2 = A2Digest(login, method);
   if (login.qop != "auth" && login.qop != kAuthInt) {
@@ -97,8 +97,9 @@ std::string DigestResponse(const DIGEST_ACCESS_AUTH& login, const std::string& p
       {ha1, ":", login.nonce, ":", login.nc, ":", login.cnonce, ":", login.qop, ":", ha2});
 }
 
-// Any qop is announced, also one that the response was computed without; qop is not quoted and the
-// algorithm is. The devices are strict about both.
+// Any qop is announced, also one that the response was computed without. qop is not quoted, as RFC
+// 2617, 3.2.2, has it, and the algorithm is, as it has it not. Kept as it is: callers may depend on
+// it; pinned by GenDigestAccessAuth.ThePartsStandInTheirOrder.
 std::string DigestLine(const DIGEST_ACCESS_AUTH& login) {
   std::string line = "Authorization: Digest username=\"" + login.username + "\", realm=\"" +
                      login.realm + "\", nonce=\"" + login.nonce + "\", uri=\"" + login.uri +

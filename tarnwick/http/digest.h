@@ -1,4 +1,4 @@
-// The Digest login of RFC 2617, section 3, as the cameras take it. Pure functions.
+// The Digest login after RFC 2617, section 3; docs/deliberate.md has what differs. Pure functions.
 #ifndef TARNWICK_HTTP_DIGEST_H_
 #define TARNWICK_HTTP_DIGEST_H_
 

@@ -32,7 +32,8 @@ struct HeaderLine {
   std::string_view value;
 };
 
-// Splits a header line. A name that begins with a known one counts as that: devices append to them.
+// Splits a header line. A name that begins with a known one counts as that one; pinned by
+// CheckContentType.ALongerNameWithAKnownPrefixCountsAsTheKnownOne.
 HeaderLine ParseHeaderLine(std::string_view line);
 
 // `text` without the spaces at its ends; tabs stay.

@@ -69,7 +69,8 @@ size_t SkipComment(const std::string& text, size_t begin) {
   return end + (block ? 2 : 1);
 }
 
-// The deprecated reader is the one whose leniency (comments, any root) the services rely on.
+// The deprecated reader takes comments and any root; pinned by
+// JsonParse.CommentsAreTakenAndCollected and JsonParse.ARootOfAnotherKindHasNoSuccess.
 #pragma GCC diagnostic push
 #pragma GCC diagnostic ignored "-Wdeprecated-declarations"
 
@@ -120,11 +121,11 @@ int JsonDepth(const std::string& text) {
 }
 
 int JsonParse(const std::string& text, Json::Value& value) {
-  // Services answer some calls with an empty body; that is no failure.
+  // Pinned by SendHttpsGet.AnEmptyBodyIsSuccessAndLeavesTheResult.
   if (text.empty()) return 0;
   std::string error;
   if (!Parse(text, &value, &error)) {
-    // Without the level gate and tags: a service that answers nonsense is always worth a line.
+    // Without the level gate and without tags; pinned by JsonParse.ItsLineHasNoGate.
     TWPrintf(LOG_TYPE_MAIN, nullptr, nullptr, "twhttp", __LINE__, __func__,
              "Failed to parse json: [%s] with error [%s]\n", text.c_str(), error.c_str());
     return -1;

@@ -1,24 +1,25 @@
-// An HTTP/1.x client for cameras, devices and web services, and one-call functions for JSON
+// An HTTP client for cameras, devices and web services, and one-call functions for JSON
 // services.
 //
 // A JSON service, in one call:
 //
 //   Json::Value reply;
-//   int result = SendHttpGet("192.0.2.7", 80, "api/info?full=1", reply, 5, false);  // 0: success
+//   int result = SendHttpGet(host, port, "api/info?full=1", reply, 5, false);  // 0: success
 //
 // A device that asks for a login:
 //
-//   TWHttpClient client("192.0.2.7", 80, "cgi/info.cgi", "admin", "secret", 5, false, true, false,
-//                       false, HTTP_VERSION_1_1, "");
-//   client.SendRequest(HTTP_METHOD_GET, "?");
+//   // At most 5 seconds a wait, with read-ahead; the login goes out when the device asks for it.
+//   TWHttpClient client(host, port, "info.cgi", "admin", "secret", 5, false, true, false, false,
+//                       HTTP_VERSION_NONE, "");
 //   int status = 0;
-//   if (client.CheckResponse(status) == HTTP_RET_OK) {
-//     char piece[8192];
-//     for (int n; (n = client.ReadData(piece, sizeof(piece))) > 0;) Use(piece, n);
-//   }
+//   std::string body;
+//   if (client.SendRequest(HTTP_METHOD_GET, "") != HTTP_RET_OK) return "";  // not sent
+//   if (client.CheckResponse(status) != HTTP_RET_OK) return "";             // `status` tells more
+//   if (client.ReadBody(body) != HTTP_RET_OK) return "";                    // it broke off
+//   return body;
 //
-// The message syntax is that of RFC 7230, the logins are those of RFC 2617. Failures are logged in
-// category http.
+// The message syntax is after RFC 7230, the logins are after RFC 2617; docs/deliberate.md has what
+// differs. Failures are logged in category http.
 #ifndef TARNWICK_HTTP_TWHTTP_H_
 #define TARNWICK_HTTP_TWHTTP_H_
 
@@ -75,8 +76,8 @@ enum {
 //
 // The socket operations connect anew for each request. Authorization, cookie and other texts go
 // onto the wire as they are: it is for the caller to keep line ends out of them.
-// When memory runs out, a request operation gives its failure; constructors and functions that take
-// or return a text by value throw std::bad_alloc.
+// When memory runs out, a request operation returns its failure; constructors, functions that take
+// or return a string by value, GetCookie and GetHttpContent throw std::bad_alloc.
 // Blocks: each operation over the socket for the name look-up, which has no limit, then for the
 // client's time-out at each wait for the peer, of which a slow one may need many; a write, and the
 // TLS handshake, have no limit. docs/longest-call.md tells the sums.
@@ -105,7 +106,8 @@ class TARNWICK_API TWHttpClient {
   //   for none; `bufferedRead` reads ahead (wanted for speed; direct reading costs two system calls
   //   a byte of the head); `encodeQuery` percent-encodes the values of the query on the socket GET,
   //   but the characters of `encodeKeep`; `basicAuth` sends the login with the first GET instead of
-  //   waiting to be asked; `https` uses TLS.
+  //   waiting to be asked; `https` uses TLS, on the socket without a check of the peer, and
+  //   everywhere without a certificate of the client's own.
   void Init(std::string path, std::string host, int port, std::string user, std::string password,
             int timeout, bool bufferedRead, bool encodeQuery, bool basicAuth, HTTP_VERSION version,
             std::string encodeKeep, bool https);
@@ -117,13 +119,15 @@ class TARNWICK_API TWHttpClient {
   // Sets the path of the next request; leading "/" are stripped.
   void SetPath(std::string path);
 
-  // Sets the local source address of the next connection, in network byte order; 0 for none. Without
-  // a socket nothing happens.
+  // Sets the local source address of the next connection, in network byte order; 0 for none.
+  // Without a socket nothing happens.
   void SetSocketRemoteAddr(unsigned int addr);
 
   // Writes headers and body of SendRequestByCurl's responses to `file`, from its current position;
-  // null collects the body in memory again. The caller keeps the file open during requests and
-  // closes it afterwards.
+  // null collects the body in memory again. Of the head, lines without a colon, as the status line
+  // mostly is, and lines with "Transfer-Encoding:" are left out. The caller keeps the file open
+  // during requests and closes it afterwards. After a success all has been flushed; a write or a
+  // flush that fails makes the request fail, what failed with the stream before does not.
   void SetCurlRespFile(FILE* file);
 
   // Sets the cookie to send, as it stands. A response's head replaces it: with its last Set-Cookie,
@@ -134,7 +138,8 @@ class TARNWICK_API TWHttpClient {
   // Copies the cookie to `out`. Results: 0.
   int GetCookie(std::string& out);
 
-  // The Transfer-Encoding of the last response that had one.
+  // The Transfer-Encoding of the last response that had one. ReadBody and GetResp decode by it, so
+  // a plain body that follows a chunked one on the same client is not read rightly.
   std::string GetTransferEncoding();
 
   // Stores the status code of the last response over the socket in `status`, 0 when none was read.
@@ -144,14 +149,16 @@ class TARNWICK_API TWHttpClient {
   int CheckResponse(int& status);
 
   // Copies a header of the last response to `out`.
-  // Results: HTTP_RET_OK; HTTP_RET_BAD_KEY; HTTP_RET_NOT_READY before a head was read, and behind a
-  //   transfer through libcurl that succeeded; HTTP_RET_NO_CONTENT when the response had
-  //   no such header. `out` stays as it is after a failure.
+  // Results: HTTP_RET_OK; HTTP_RET_BAD_KEY; HTTP_RET_NOT_READY before a head was read, and after a
+  //   transfer through libcurl that succeeded; HTTP_RET_NO_CONTENT when the response had no such
+  //   header. After OpenRawDataUpload, which reads no head, it tells of the response before, or
+  //   HTTP_RET_NO_CONTENT. `out` stays as it is after a failure.
   int GetHttpContent(HTTP_MAP_KEY key, std::string& out) const;
 
-  // Reads from and writes to the connection behind a response's head, as TWSocket does.
-  // Results: TWSocket's; -1 while no head has been read, and behind a transfer through libcurl that
-  //   succeeded.
+  // Reads from and writes to the connection after a response's head, or the head of an upload, as
+  // TWSocket does.
+  // Results: TWSocket's; -1 while no head has been read nor OpenRawDataUpload succeeded, and after
+  //   a transfer through libcurl that succeeded.
   int ReadData(char* buf, int len);
   int WriteData(const char* buf, int len);
 
@@ -163,21 +170,27 @@ class TARNWICK_API TWHttpClient {
   // Sends the request by method.
   //
   // HTTP_METHOD_GET: SendRequestByGet, with Basic authorization at once when the client was set up
-  // so. When the reply is a 401 whose challenge names Digest or else Basic, the GET is sent once
-  // more with that login. `arg` is not used. Any other method: SendRequestByPost(arg).
+  // so. When the response is a 401 whose challenge names Digest or else Basic, the GET is sent once
+  // more with that login. Of several WWW-Authenticate lines the last one is the challenge, so a
+  // server that offers Digest and then Basic gets Basic. `arg` is not used. Any other method:
+  // SendRequestByPost(arg).
   // Results: those of the last request made. What the server answered is CheckResponse's to tell: a
   //   second 401 comes back as HTTP_RET_OK here and HTTP_RET_UNAUTHORIZED there.
   int SendRequest(TW_HTTP_METHOD method, std::string arg);
 
-  // Sends one GET over the client's socket and reads the head of the reply; the body is left on the
-  // connection for ReadBody or ReadData. A request of over 2,047 bytes is cut there.
+  // Sends one GET over the client's socket and reads the head of the response; the body is left on
+  // the connection for ReadBody or ReadData. A request of over 2,047 bytes is cut there. In
+  // HTTP/1.0 it names no host: a server with several sites may answer for another one. In HTTP/1.1
+  // it does not ask the server to close, and a body that is not chunked may then end by a time-out
+  // only.
   //
   // Results: HTTP_RET_OK when the request was written, whatever the server answered;
   //   HTTP_RET_IO_ERROR when connecting or writing failed, with the last response's results as they
   //   were.
   int SendRequestByGet();
 
-  // Sends one request through libcurl, which also follows its proxy settings.
+  // Sends one request through libcurl, which also follows its proxy settings, and over TLS takes
+  // HTTP/2 where the server offers it, whatever the client's version.
   //
   // HTTP_METHOD_GET fetches host and path. Any other method posts the path as a form to the host's
   // root. The login is sent at once, by Basic. The body is collected in memory, for the one-call
@@ -198,8 +211,10 @@ class TARNWICK_API TWHttpClient {
   // Blocks without a limit.
   int SendRequestByPost(std::string separators);
 
-  // Posts a form over the client's socket and reads the head of the reply; the body is left on the
-  // connection for ReadBody. `content` is encoded already. No login is sent.
+  // Posts a form over the client's socket and reads the head of the response; the body is left on
+  // the connection for ReadBody. `content` is encoded already. No login is sent. In HTTP/1.1 it
+  // asks the server to close by "Connection: close;", which many servers ignore: ReadBody then
+  // fails after three waits, with the whole body. Choose HTTP_VERSION_1_0 where the body is read.
   //
   // Results: HTTP_RET_OK when the whole request was written, whatever the server answered;
   //   HTTP_RET_IO_ERROR when connecting or writing failed.
@@ -210,13 +225,13 @@ class TARNWICK_API TWHttpClient {
   //
   // Results: HTTP_RET_OK with the body in `reply`, whatever the status: CheckResponse tells it. A
   //   read that ends early counts, and `reply` holds what came. HTTP_RET_IO_ERROR, with `reply` as
-  //   it was, for an empty `body`, when connecting, writing or reading failed, and for a reply
-  //   without a usable Content-Length.
+  //   it was, for an empty `body`, when connecting, writing or reading failed, and for a response
+  //   without a usable Content-Length, in chunks for example; CheckResponse tells its status.
   // Memory grows with what arrives: over 1 MiB, an announced length alone does not take any.
   int SendReqBySocketPost(const std::string& body, std::string& reply);
 
-  // As SendReqBySocketPost; when the reply is a 401 whose challenge names Digest or else Basic, the
-  // request is sent once more with that login.
+  // As SendReqBySocketPost; when the response is a 401 whose challenge names Digest or else Basic,
+  // the request is sent once more with that login. The challenge is that of SendRequest.
   //
   // Results: the outcome of the last response, as CheckResponse gives it, so HTTP_RET_OK only after
   //   a status from 200 to 299; HTTP_RET_IO_ERROR when the last exchange failed. `reply` may then
@@ -233,8 +248,9 @@ class TARNWICK_API TWHttpClient {
   // Reads the body behind a head that has been read: after SendRequestByGet, SendRequest with
   // HTTP_METHOD_GET and SendRequestBySocketPost, which have read the head themselves.
   //
-  // A Transfer-Encoding of exactly "chunked" is decoded; any other body ends where the server
-  // closes, whatever length it announced.
+  // A Transfer-Encoding of exactly "chunked" is decoded, also one that an earlier response of this
+  // client had and the last one does not have; any other body ends where the server closes,
+  // whatever length it announced.
   // Results: HTTP_RET_OK with the body in `body`: the whole of it, or what came of one that a
   //   closed connection, or a failed read in place of a chunk's size, has cut; HTTP_RET_IO_ERROR
   //   when another read failed, with what came before in `body`.
@@ -253,7 +269,8 @@ class TARNWICK_API TWHttpClient {
   //
   // The caller then writes the body with WriteData, with lines of the boundary
   // -----------QUENMULTIPART_BOUNDARY----------- and ends it by destroying the client. No login is
-  // sent.
+  // sent. Strict servers refuse the head for its "Cache-Control :no-cache" or its length. GetResp
+  // has a response only of a server that answers before 128 GiB have come, and then closes.
   // Results: HTTP_RET_OK; HTTP_RET_IO_ERROR when connecting or writing failed.
   int OpenRawDataUpload();
 
@@ -286,14 +303,16 @@ class TARNWICK_API TWHttpClient {
   //   HTTP/1.1 reply.
   int CheckHttpResponse();
 
-  // Reads and parses the header lines, 30 at most; further ones stay unread, in front of the body.
+  // Reads and parses the header lines, 30 at most; what follows stays unread, in front of the body:
+  // further lines, and of a head of exactly 30 lines the empty one, which makes a chunked body
+  // empty.
   // Results: HTTP_RET_OK, HTTP_RET_NOT_READY or HTTP_RET_IO_ERROR, as above. What was parsed before
   //   a failure stays.
   int CheckContentType();
 
   // The Authorization header lines for the client's login, without a line end: Basic, and Digest
-  // (RFC 2617) in answer to the last response's challenge. `body` is accepted and does not count,
-  // not even for qop "auth-int". GenBasicAccessAuth throws std::logic_error when memory for the
+  // (after RFC 2617) in answer to the last response's challenge. `body` is accepted and ignored,
+  // even for qop "auth-int". GenBasicAccessAuth throws std::logic_error when memory for the
   // encoding runs out.
   std::string GenBasicAccessAuth();
   std::string GenDigestAccessAuth(std::string method, std::string body);
@@ -357,7 +376,8 @@ class TARNWICK_API TWHttpClient {
   TARNWICK_LOCAL int PutXmlFile(CurlRequest* curl, xmlDoc* doc, FILE* file);
 };
 
-// Fetches `path` from a JSON service over HTTP and parses the reply into `result`.
+// Fetches `path` from a JSON service over HTTP and parses the response into `result`. The request
+// is one of HTTP/1.0 and names no host; chunks are not decoded.
 //
 // Arguments: `timeout` in seconds for connecting and each wait; `encodeQuery` percent-encodes the
 //   values of the query; without it, line feeds are removed from the path instead.
@@ -379,7 +399,8 @@ TARNWICK_API int SendHttpGet(const std::string& host, int port, std::string path
 TARNWICK_API int SendHttpPost(const std::string& host, int port, const std::string& path,
                               const std::string& body, const std::string& cookie, int timeout);
 
-// As SendHttpGet, over TLS through libcurl, with the certificate and host name verified.
+// As SendHttpGet, over TLS through libcurl, with the certificate and host name verified. The
+// version of HTTP is libcurl's choice, and chunks are decoded.
 //
 // Arguments: `timeout` limits the whole transfer, in seconds, as in SendRequestByCurl.
 // Blocks: for that long.

@@ -32,7 +32,8 @@ std::string TWHttpClient::PlainHostUrl() const {
   return "http://" + m_strHost + ":" + IntToString(m_port) + "/";
 }
 
-// The password stands in the log on purpose: support compares it with the device's.
+// The password stands in the log. Kept as it is: callers may depend on the messages; pinned by
+// SendRequestByPost.EachRefusedOptionHasItsLineAndEndsTheRequest.
 bool TWHttpClient::SetCurlLogin(CurlRequest* curl) {
   return curl->Set(CURLOPT_USERNAME, m_strUser.c_str(), "Failed to set Usr=", m_strUser.c_str()) &&
          curl->Set(CURLOPT_PASSWORD, m_strPassword.c_str(),

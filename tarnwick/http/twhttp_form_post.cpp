@@ -31,15 +31,17 @@ int TWHttpClient::SendRequestBySocketPost(std::string content) try {
 }
 
 std::string TWHttpClient::BuildFormPost(const std::string& content) const {
-  // Without a preference the form POST speaks HTTP/1.1, unlike the GET: the services that take
-  // forms want a Host line and a closed connection.
+  // Without a preference the form POST speaks HTTP/1.1, unlike the GET. Kept as it is: callers may
+  // depend on it; pinned by
+  // SendRequestBySocketPost.Http11IsSentForNoneAndHttp11AndHttp10ForEveryOther.
   const bool http11 = m_httpVersion == HTTP_VERSION_NONE || m_httpVersion == HTTP_VERSION_1_1;
   std::string request = "POST /" + m_strPath + (http11 ? " HTTP/1.1\r\n" : " HTTP/1.0\r\n");
   request += "Host: " + m_strHost + "\r\n";
   if (!m_strCookie.empty()) request += "Cookie: " + m_strCookie + "\r\n";
   request += "Content-Type: application/x-www-form-urlencoded; charset=utf-8\r\n";
   request += "Content-Length: " + IntToString(static_cast<int64_t>(content.size())) + "\r\n";
-  // The semicolon belongs there: services compare the whole line.
+  // With a semicolon, which RFC 7230, 6.1, has not. Kept as it is: callers may depend on it; pinned
+  // by SendRequestBySocketPost.WithoutAVersionItSendsHttp11WithHostTypeLengthAndClose.
   if (http11) request += "Connection: close;\r\n";
   request += "\r\n";
   request += content;

@@ -11,7 +11,8 @@
 
 namespace {
 
-// Longer requests are cut there; devices have small request buffers themselves.
+// Longer requests are cut there. Kept as it is: callers may depend on it; pinned by
+// SendRequestByGet.ARequestOfMoreThan2047BytesIsCutThereAndCountsAsSent.
 constexpr size_t kMaxRequest = 2047;
 
 // At least what a GET has besides the client's texts.
@@ -41,7 +42,8 @@ int TWHttpClient::SendRequestByGet() try {
 std::string TWHttpClient::BuildGetRequest() {
   const std::string path =
       m_bEncodeQuery ? EncodeQueryValues(m_strPath, m_strEncodeKeep) : m_strPath;
-  // Without a preference the GET speaks HTTP/1.0: old cameras answer nothing else.
+  // Without a preference the GET speaks HTTP/1.0: a server may not answer that in chunks, and
+  // closes after the body (RFC 7230, 3.3.1 and 6.3).
   const bool http11 = m_httpVersion == HTTP_VERSION_1_1;
   std::string request;
   request.reserve(path.size() + m_strCookie.size() + m_strAuthorization.size() + m_strHost.size() +

@@ -40,8 +40,9 @@ int TWHttpClient::CheckContentType() try {
   m_mapContent.clear();
   m_strCookie.clear();
   m_strAuthenticate.clear();
-  // The transfer encoding of an earlier response stays: callers read bodies by it after a head that
-  // repeats none.
+  // The transfer encoding of an earlier response stays, and the next body is decoded by it. Kept as
+  // it is: callers may depend on it; pinned by
+  // ReadBody.ATransferEncodingStaysForALaterReplyWithoutOne.
   for (int count = 0; count < kMaxHeaderLines; ++count) {
     char line[kLineSize];
     const int length = ReadToLineEnd(line, kLineSize);

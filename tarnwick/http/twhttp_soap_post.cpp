@@ -20,7 +20,7 @@ namespace {
 constexpr char kSendReqBySocketPost[] = "SendReqBySocketPost";
 
 // A reply up to this size is read with one call into one buffer. For a larger one memory grows with
-// what arrives: a device may announce any length.
+// what arrives: a peer may announce any length.
 constexpr int kFirstPiece = 1 << 20;
 
 int OutOfMemory(int64_t bytes) {
@@ -151,7 +151,8 @@ int TWHttpClient::SendReqByXMLSocketPost(std::string body, xmlDoc*& doc) try {
   std::string reply;
   const int result = SendReqBySocketPost(body, reply);
   if (result != HTTP_RET_OK) return result;
-  // Devices break lines in the middle of values; callers compare the joined text.
+  // All line ends go, those inside values too. Kept as it is: callers may depend on it; pinned by
+  // SendReqByXMLSocketPost.CarriageReturnsAndLineFeedsAreRemovedEverywhere.
   RemoveChar(reply, '\r');
   RemoveChar(reply, '\n');
   doc = ParseXml(reply.data(), static_cast<int>(reply.size()));

@@ -9,7 +9,7 @@
 
 namespace {
 
-// 128 GiB: so long that no server takes the stream for finished.
+// 128 GiB, more than a caller writes: a server that counts never takes the stream for finished.
 constexpr int64_t kEndless = int64_t{1} << 37;
 
 }  // namespace
@@ -39,7 +39,8 @@ std::string TWHttpClient::BuildUploadHead() const {
       "Content-Type: multipart/form-data; "
       "boundary=-----------QUENMULTIPART_BOUNDARY-----------\r\n";
   head.append("Content-Length: ").append(IntToString(kEndless)).append("\r\n");
-  // The blank stands on the wrong side of the colon; the receivers were built against it.
+  // RFC 7230, 3.2.4, forbids a blank in front of the colon. Kept as it is: callers may depend on
+  // it; pinned by OpenRawDataUpload.WithAnEmptyCookieTheHeadHasNoCookieLine.
   head += "Cache-Control :no-cache\r\n";
   head += "Connection: keep-alive\r\n";
   head += "\r\n";

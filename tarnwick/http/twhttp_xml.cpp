@@ -18,7 +18,8 @@
 
 namespace {
 
-// A longer document is cut to one character less: the receivers' own limit.
+// A longer document is cut to one character less. Kept as it is: callers may depend on it; pinned
+// by SendReqByXMLPost.OfADocumentOf10000BytesTheFirst8191AreSent.
 constexpr size_t kMaxPostBody = 8192;
 
 struct XmlDeleter {
@@ -157,9 +158,10 @@ bool TWHttpClient::SetXmlUrl(CurlRequest* curl) {
 }
 
 bool TWHttpClient::SetXmlHeaders(CurlRequest* curl, bool forUpload) {
-  // It speaks of the request; support's search patterns know it so.
+  // It speaks of the request, not of the headers. Messages are never reworded; pinned by
+  // XmlSenders.EachRefusedOptionHasItsLineAndEndsTheRequest.
   constexpr char kFailed[] = "Failed to set custom request";
-  // The empty Expect keeps libcurl from waiting for a 100, which the devices never send.
+  // The empty Expect keeps libcurl from waiting a second for a 100 (Continue), RFC 7231, 5.1.1.
   return curl->AddHeader("Accept: */*", kFailed) &&
          curl->AddHeader("Content-Type: application/xml; charset=UTF-8", kFailed) &&
          (!forUpload || curl->AddHeader("Expect:", kFailed)) &&
@@ -169,7 +171,8 @@ bool TWHttpClient::SetXmlHeaders(CurlRequest* curl, bool forUpload) {
 bool TWHttpClient::SetCurlPut(CurlRequest* curl) {
 #pragma GCC diagnostic push
 #pragma GCC diagnostic ignored "-Wdeprecated-declarations"
-  // CURLOPT_PUT is what old libcurl versions on appliances need besides.
+  // CURLOPT_PUT is deprecated since libcurl 7.12.1, and still set; pinned by
+  // XmlSenders.TheOptionsAreSetInOrder.
   return curl->Set(CURLOPT_UPLOAD, 1L, "Failed to set upload=", "1") &&
          curl->Set(CURLOPT_PUT, 1L, "Failed to set put=", "1");
 #pragma GCC diagnostic pop
@@ -179,8 +182,9 @@ bool TWHttpClient::SetXmlWriter(CurlRequest* curl) {
   return curl->Set(CURLOPT_WRITEFUNCTION, CurlBufferWrite, "Failed to set WRITEFUNCTION");
 }
 
-// The answer goes behind what an earlier request has left: callers may collect several. The two
-// fields stand side by side as a CurlMemBuffer does.
+// The response's body goes after what an earlier request has left; pinned by
+// GetResponseXML.TwoGetsInARowLeaveBothBodiesWhichTogetherAreNoDocument. The two fields stand side
+// by side as a CurlMemBuffer does.
 bool TWHttpClient::SetXmlOutput(CurlRequest* curl, const char* message) {
   return curl->Set(CURLOPT_WRITEDATA, reinterpret_cast<CurlMemBuffer*>(&m_pRespBuf), message);
 }

@@ -91,7 +91,8 @@ int TWDbgLogCfg::SaveDbgLogSettings() try {
   }
   const int levelsResult =
       WriteSettingValue(kSettingsFile, kLevelsKey, levels.c_str(), kLineFormat);
-  // Written also when the levels were not: the flag is worth having on its own.
+  // Written also when the levels were not; pinned by
+  // Settings.TheFlagIsSavedAlsoWhenTheLevelsWereNot.
   const int timeScaleResult =
       WriteSettingValue(kSettingsFile, kTimeScaleKey, TimeScale() ? "yes" : "no", kLineFormat);
   return levelsResult == -1 || timeScaleResult == -1 ? -1 : 0;

@@ -183,7 +183,7 @@ class TARNWICK_API TWDbgLogCfg {
   // Writes both keys from this record into the settings file, which is created when missing.
   //
   // Results: 0; -1 when one of the two could not be written (the other may have been).
-  // Blocks while another process holds the lock of the settings file.
+  // Blocks while another process holds the lock of the settings file or of its directory.
   int SaveDbgLogSettings();
 
   // True when log time stamps carry milliseconds.
@@ -240,9 +240,10 @@ TARNWICK_API void FreeDbgCfg();
 // The line: time, "[pid]" (or "[pid][thread id]" outside the main thread), "[category][level]",
 //   then "file:line:function(): " and the message. Milliseconds are printed when the shared record
 //   says so.
-// Failures: a file that cannot be opened, and an undefined `type` (errno EFAULT), is reported to
-//   the system log; a lock that cannot be had drops the line silently. A full disk and the
-//   process's limit on file sizes cut the line or lose it; no SIGXFSZ comes of it. errno is kept.
+// Failures: a file that cannot be opened, a stream that cannot be made for it, and an undefined
+//   `type` (errno EFAULT), are reported to the system log; a lock that cannot be had drops the line
+//   silently. A full disk and the process's limit on file sizes cut the line or lose it; no SIGXFSZ
+//   comes of it. errno is kept.
 // Threads: any thread of any process; lines never mix, because each is written under an exclusive
 //   flock of the file. Blocks while another process or thread holds that lock.
 // Fork: a process may fork at any moment, and the child may log. It has none of the open log files.

@@ -42,7 +42,8 @@ void SSLSocket::InitSSL() {
   } else {
     SSL_CTX_set_mode(m_pSSLCtx, SSL_MODE_AUTO_RETRY);
 #ifdef SSL_OP_IGNORE_UNEXPECTED_EOF
-    // Cameras close without a close notice; that ends the stream as a plain close does.
+    // A close without a close notice ends the stream as a plain close does; OpenSSL 3 takes it for
+    // an error otherwise. Pinned by SServer.EndsABodyWithoutACloseNotice.
     SSL_CTX_set_options(m_pSSLCtx, SSL_OP_IGNORE_UNEXPECTED_EOF);
 #endif
     m_pSSL = SSL_new(m_pSSLCtx);

@@ -1,8 +1,9 @@
 // A TLS client connection: TWSocket with OpenSSL underneath. Reading, writing, line reading and
 // push-back work as in TWSocket.
 //
-// Certificates are not verified, no server name is sent, and the library's default protocols and
-// ciphers apply: it protects the bytes from listeners, and does not prove who answers.
+// Certificates are not verified, no server name is sent and no certificate shown, and OpenSSL's
+// default protocols and ciphers apply: it protects the bytes from listeners, and does not prove who
+// answers.
 #ifndef TARNWICK_NET_SSLSOCKET_H_
 #define TARNWICK_NET_SSLSOCKET_H_
 
@@ -39,8 +40,8 @@ class TARNWICK_API SSLSocket : public TWSocket {
 
   // Reads at most `len` decrypted bytes.
   // Results: the bytes read; 0 when the peer closed, with or without a close notice, and when it
-  //   ended the connection by a fatal alert (logged); -1 on an error (logged), and without a
-  //   connection. errno is then 0 or the failing system call's.
+  //   ended the connection by a fatal alert (logged); -1 on an error (logged), when errno is 0 or
+  //   the failing system call's, and without a connection, when errno stays.
   // Blocks for `timeout` seconds whenever more of a record is missing; behind DoSelect, which has
   // waited as long, a silent peer costs a read twice the time-out.
   int _Read(void* buf, unsigned int len) override;

@@ -18,8 +18,8 @@ struct addrinfo;
 
 // One connection at a time to one host and port; it may be connected again and again.
 //
-// The object is large (a 64 KiB buffer lies inside it): create it on the heap. A derived class may be
-// compiled without RTTI and without exceptions.
+// The object is large (a 64 KiB buffer lies inside it): create it on the heap. A class that derives
+// from it may be compiled with -fno-rtti and -fno-exceptions.
 // Threads: one thread uses an object at a time.
 // Cancellation: a thread may be cancelled in any operation. It ends in a wait for the peer, or after
 //   the operation: a name look-up is not left. The object may then be destroyed, disconnected or
@@ -58,7 +58,8 @@ class TARNWICK_API TWSocket {
   // negative. Connect calls it. Results: always 0.
   virtual int PostConnect();
 
-  // Closes the connection, if there is one, and forgets what was read ahead. IsEOF() stays.
+  // Closes the connection, if there is one, and in buffered mode forgets what was read ahead; in
+  // direct mode that stays, unread. IsEOF() stays.
   virtual void Disconnect();
 
   // Waits until the descriptor can be read or written, or has an exceptional condition.
@@ -78,7 +79,7 @@ class TARNWICK_API TWSocket {
   void SetSocketInfo(const std::string& host, int port, int timeout, bool buffered);
 
   // Sets the local source address to bind before connecting, in network byte order; 0 for none.
-  // An address that cannot be bound is logged and ignored. Callers know the function by this name.
+  // An address that cannot be bound is logged and ignored.
   void SetRemoteAddr(unsigned int addr);
 
   // The connect sequence without PostConnect: the descriptor stays blocking. Results: 0 or -1.
@@ -107,8 +108,9 @@ class TARNWICK_API TWSocket {
   //   before it, and when `buf` is null or `len` negative.
   // State: a buffered read that failed clears IsConnected(), a wait that failed does not; the
   //   descriptor stays open.
-  // Blocks for `timeout` seconds a wait; a small buffered read that gets nothing makes seven, and
-  // one that lacks 1,024 bytes or more waits twice for them.
+  // Blocks for `timeout` seconds a wait; a small buffered read that gets nothing makes seven. One
+  // of 1,024 bytes or more that gets nothing waits once; one that got some waits twice for the rest
+  // while 1,024 or more are missing, else once.
   int ReadData(char* buf, int len);
 
   // Writes `len` bytes.
@@ -136,8 +138,9 @@ class TARNWICK_API TWSocket {
   //   pushed back. In direct mode nothing happens and the result is 0.
   int RestoreData(char* data, int len);
 
-  // True when the descriptor becomes readable within `timeout` seconds. What is in the read-ahead
-  // buffer does not count; a negative `timeout` answers false at once.
+  // True when the descriptor becomes readable, or has an exceptional condition, within `timeout`
+  // seconds. What is in the read-ahead buffer is ignored; a negative `timeout` answers false at
+  // once.
   bool HasDataToRead(int timeout);
 
  protected:

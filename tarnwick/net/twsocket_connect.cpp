@@ -111,7 +111,8 @@ bool TWSocket::ConnectWithTimeout(const struct addrinfo* address) {
     case ConnectOutcome::kConnected:
       break;
     case ConnectOutcome::kRefusedAtOnce:
-      // Says the opposite of what happened; support scripts have long searched for this text.
+      // Says the opposite of what happened. Messages are never reworded; pinned by
+      // ConnectEdges.AConnectionThatIsRefusedAtOnceIsLoggedAsConnected.
       TW_LOG(LOG_CATEG_SOCKET, LOG_LEVEL_INFO, "Socket connected.\n");
       break;
     case ConnectOutcome::kTimedOut:

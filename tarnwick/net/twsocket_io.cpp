@@ -88,7 +88,8 @@ int TWSocket::ReadToLineEnd(char* buf, int bufLen) {
     if (count < 0) return -1;
     if (count == 0 || byte == '\n') break;
     if (byte == '\r') {
-      // Whatever follows is dropped, not only a line feed: cameras exist that send other pairs.
+      // Whatever follows is dropped, not only a line feed. Kept as it is: callers may depend on it;
+      // pinned by ReadToLineEnd.ACarriageReturnDropsTheNextByteWhateverItIs.
       if (ReadData(&byte, 1) <= 0) return -1;
       break;
     }

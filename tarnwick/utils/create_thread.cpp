@@ -28,7 +28,8 @@ int CreateThread(void* (*start)(void*), void* arg, unsigned stackSize, int detac
                  pthread_t* thread) {
   ThreadAttributes attributes;
   if (attributes.Valid() && start != nullptr && thread != nullptr) {
-    // A size that the system refuses leaves the default, which is large enough for any caller.
+    // A size that the system refuses leaves the default; pinned by
+    // CreateThread.AStackSizeThatIsRefusedLeavesTheDefault.
     if (stackSize != 0) pthread_attr_setstacksize(attributes.Get(), stackSize);
     if (detached != 0) pthread_attr_setdetachstate(attributes.Get(), PTHREAD_CREATE_DETACHED);
     if (pthread_create(thread, attributes.Get(), start, arg) == 0) return 1;

@@ -28,9 +28,9 @@ Encoded Escape(unsigned char byte) {
   return {{'%', kDigits[byte >> 4], kDigits[byte & 15]}, 3};
 }
 
-// In every locale: letters, digits and more marks than the unreserved ones of RFC 3986, which
-// cameras take in query values as they are. Tabs and line ends go out as blanks, because no request
-// line may have them. Beyond ASCII the locale has letters.
+// In every locale: letters, digits and more marks than the unreserved ones of RFC 3986, 2.3. Tabs
+// and line ends go out as blanks. Both kept as they are: callers may depend on them; pinned by the
+// tests of UrlEncode. Beyond ASCII the locale has letters.
 struct EncodedAscii {
   EncodedAscii() {
     for (int c = 0; c < 256; ++c) of[c] = Escape(static_cast<unsigned char>(c));

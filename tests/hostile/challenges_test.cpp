@@ -63,7 +63,7 @@ std::string Line(const std::string& challenge) {
   return "WWW-Authenticate: " + challenge + "\r\n";
 }
 
-// The login as the devices compute it, written down a second time.
+// The login of the library, written down a second time.
 
 std::string Hex(const unsigned char* digest) {
   static const char digits[] = "0123456789abcdef";

@@ -35,6 +35,6 @@ TEST_P(NamedTests, Exist) {
 }
 
 INSTANTIATE_TEST_SUITE_P(OfTheDocument, NamedTests,
-                         ::testing::Values("deliberate.md", "../SECURITY.md"));
+                         ::testing::Values("deliberate.md", "limits.md", "../SECURITY.md"));
 
 }  // namespace

@@ -63,10 +63,28 @@ TlsIdentity::~TlsIdentity() {
   EVP_PKEY_free(key_);
 }
 
+namespace {
+
+int TakeHttp2(SSL*, const unsigned char** taken, unsigned char* length,
+              const unsigned char* offered, unsigned int size, void*) {
+  static constexpr unsigned char kHttp2[] = {2, 'h', '2'};
+  unsigned char* protocol = nullptr;
+  const int result =
+      SSL_select_next_proto(&protocol, length, kHttp2, sizeof(kHttp2), offered, size);
+  *taken = protocol;
+  return result == OPENSSL_NPN_NEGOTIATED ? SSL_TLSEXT_ERR_OK : SSL_TLSEXT_ERR_NOACK;
+}
+
+}  // namespace
+
 SSL_CTX* TlsIdentity::NewServerContext() const {
   SSL_CTX* context = SSL_CTX_new(TLS_server_method());
   SSL_CTX_use_certificate(context, certificate_);
   SSL_CTX_use_PrivateKey(context, key_);
   if (options_.max_version != 0) SSL_CTX_set_max_proto_version(context, options_.max_version);
+  if (options_.client_certificate) {
+    SSL_CTX_set_verify(context, SSL_VERIFY_PEER | SSL_VERIFY_FAIL_IF_NO_PEER_CERT, nullptr);
+  }
+  if (options_.http2) SSL_CTX_set_alpn_select_cb(context, TakeHttp2, nullptr);
   return context;
 }

@@ -14,6 +14,8 @@ struct TlsOptions {
   bool wrong_host = false;  // it names another host than 127.0.0.1 and localhost
   int max_version = 0;      // highest protocol, such as TLS1_2_VERSION; 0: what the library offers
   const char* authority = "Test authority";  // the name of who signs
+  bool client_certificate = false;           // without one of the client the handshake fails
+  bool http2 = false;                        // of the protocols that the client offers it takes h2
 };
 
 // A certificate authority, and a server certificate and key that it signed.

@@ -16,6 +16,12 @@ std::string SnapshotName(int camera, int64_t microseconds);
 int GrabThreeFrames();
 bool SendPicture(int fd, const std::string& picture);
 
+// The number that the device gives; -1 when it gives none.
+int CameraNumber(const std::string& host, int port);
+
+// Empty when the device does not give the whole page.
+std::string InfoPage(const std::string& host, int port);
+
 // Empty when the device does not answer.
 std::string Greeting(const std::string& host, int port, bool tls);
 
