@@ -49,8 +49,8 @@ struct Fiber {
 Fiber* g_fiber = nullptr;
 
 void ParseInFiber() {
-  g_fiber->few = ResultOf(Nested(60));
-  g_fiber->many = ResultOf(Nested(900));
+  g_fiber->few = ResultOf(Nested(76));
+  g_fiber->many = ResultOf(Nested(77));
 }
 
 void RunInFiber(Fiber* fiber) {
@@ -223,8 +223,8 @@ TEST(JsonParse, WhereTheSystemDoesNotTellTheStackSixtyLevelsParseAndThousandsDoN
   EXPECT_EQ(faults.Count(Call::kPthreadGetattrNp), 2);
 }
 
-TEST(JsonParse, OnAStackThatIsNotTheThreadsOwnSixtyLevelsParseAndHundredsDoNot) {
-  Fiber in_main_thread;  // whose stack lies above the heap, the others' below it or beside it
+TEST(JsonParse, OnAStackThatIsNotTheThreadsOwn77LevelsParseAndNoMore) {
+  Fiber in_main_thread;  // whose stack lies above the heap; another thread's may lie below
   RunInFiber(&in_main_thread);
   EXPECT_EQ(in_main_thread.few, 0);
   EXPECT_EQ(in_main_thread.many, -1);
