@@ -249,13 +249,13 @@ class TARNWICK_API TWHttpClient {
   std::string GetResp();
 
   // Opens a streaming upload: connects and sends the head of a multipart POST of 128 GiB, so that
-  // the server waits for whatever the caller writes.
+  // the server waits for whatever the caller writes. CheckResponse tells of the response before it,
+  // until GetResp has read the upload's.
   //
   // The caller then writes the body with WriteData, with lines of the boundary
   // -----------QUENMULTIPART_BOUNDARY----------- and ends it by destroying the client. No login is
   // sent.
-  // Results: HTTP_RET_OK; HTTP_RET_IO_ERROR when connecting or writing failed. What CheckResponse
-  //   tells stays until GetResp reads the response.
+  // Results: HTTP_RET_OK; HTTP_RET_IO_ERROR when connecting or writing failed.
   int OpenRawDataUpload();
 
   // XML REST requests through libcurl over plain HTTP, with the body, where there is one, from
