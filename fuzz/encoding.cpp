@@ -33,9 +33,7 @@ void CheckUrlEncoding(const std::string& text, const std::string& keep) {
 }
 
 void CheckQueryEncoding(const std::string& text, const std::string& keep) {
-  EncodeQueryValues(text, keep);  // a zero byte has no meaning in a path, but must not harm
-  const std::string path = UpToZero(text);
-  ExpectSame("EncodeQueryValues", EncodeQueryValues(path, keep), oracle::QueryEncoded(path, keep));
+  ExpectSame("EncodeQueryValues", EncodeQueryValues(text, keep), oracle::QueryEncoded(text, keep));
 }
 
 void CheckBase64(const std::string& text) {

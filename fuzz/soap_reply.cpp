@@ -88,7 +88,9 @@ class Exchange {
       Expect("a failure leaves the document", doc == &before);
       return;
     }
+    const std::string reports = TakeXmlReports();
     ExpectSame("the document", XmlText(doc), XmlTextOf(oracle::WithoutLineEnds(reply)));
+    ExpectSame("what is reported", reports, TakeXmlReports());
     xmlFreeDoc(doc);
   }
 

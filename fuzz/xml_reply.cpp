@@ -48,7 +48,9 @@ class Client : public TWHttpClient {
       Expect("without an answer nothing is parsed", !parsed && doc == &before);
       return;
     }
+    const std::string reports = TakeXmlReports();
     ExpectSame("the document", XmlText(doc), XmlTextOf(*text));
+    ExpectSame("what is reported", reports, TakeXmlReports());
     ExpectSame("the result", parsed, doc != nullptr);
     xmlFreeDoc(doc);
   }

@@ -85,28 +85,33 @@ std::string WithBlanks(std::string text) {
   return text;
 }
 
-// Walks the path once and knows at each byte in which part of the query it is.
+// Walks the path once and knows at each byte in which part of the query it is. A name that no "="
+// has ended yet is held back: when none comes, it is cut at the path's first zero byte.
 std::string QueryEncoded(const std::string& path, const std::string& keep) {
   enum { kBeforeQuery, kName, kValue } part = kBeforeQuery;
-  size_t nameLength = 0;
+  const size_t zero = std::min(path.find('\0'), path.size());
+  std::string name;
   std::string out;
-  for (const char c : path) {
+  size_t begin = 0;  // of the name, then of the value
+  for (size_t i = 0; i < path.size(); ++i) {
+    const char c = path[i];
     if (part == kBeforeQuery) {
       out += c;
-      if (c == '?') part = kName;
+      if (c == '?') part = kName, begin = i + 1;
     } else if (part == kName) {
-      out += c;
+      name += c;
       // The first byte of a name is never its "=".
-      if (c == '=' && nameLength > 0) part = kValue;
-      ++nameLength;
+      if (c != '=' || name.size() == 1) continue;
+      out += name;
+      part = kValue, begin = i + 1;
     } else if (c == '&') {
-      out += c;
-      part = kName;
-      nameLength = 1;
+      if (begin >= zero) return out;
+      part = kName, begin = i, name = c;
     } else {
       out += UrlEncoded(std::string(1, c), keep);
     }
   }
+  if (part == kName && begin < zero) out += name.substr(0, zero - begin);
   return out;
 }
 

@@ -2,8 +2,10 @@
 
 #include <libxml/xmlIO.h>
 
+#include <cstdarg>
 #include <cstdio>
 #include <cstdlib>
+#include <utility>
 
 namespace {
 
@@ -31,7 +33,16 @@ int NeverClosed(void*) {
   return -1;
 }
 
-void Ignore(void*, const char*, ...) {}
+std::string reports;
+
+__attribute__((format(printf, 2, 3))) void Collect(void*, const char* format, ...) {
+  char text[4096];
+  va_list arguments;
+  va_start(arguments, format);
+  std::vsnprintf(text, sizeof(text), format, arguments);
+  va_end(arguments);
+  reports += text;
+}
 
 }  // namespace
 
@@ -40,7 +51,11 @@ void WatchXml() {
   xmlSetExternalEntityLoader(LoadEntity);
   xmlCleanupInputCallbacks();
   xmlRegisterInputCallbacks(OpenInput, NeverOpened, NeverRead, NeverClosed);
-  xmlSetGenericErrorFunc(nullptr, Ignore);
+  xmlSetGenericErrorFunc(nullptr, Collect);
+}
+
+std::string TakeXmlReports() {
+  return std::exchange(reports, "");
 }
 
 std::string XmlText(xmlDoc* doc) {

@@ -8,8 +8,11 @@
 #include <string>
 
 // From now on a document that makes libxml2 look for anything outside itself aborts the program, and
-// its complaints about documents are not printed.
+// its complaints about documents are not printed, but collected.
 void WatchXml();
+
+// The complaints since the last call.
+std::string TakeXmlReports();
 
 // The document as text; "(none)" for null.
 std::string XmlText(xmlDoc* doc);

@@ -18,7 +18,8 @@ constexpr int kShallowDepth = 16;
 constexpr size_t kStackPerLevel = 640;
 constexpr size_t kStackReserve = 16384;
 
-// What is assumed where the system does not tell, without /proc for example.
+// What is assumed where the system does not tell, without /proc for example, and on a stack that is
+// not the thread's own, as makecontext gives.
 constexpr size_t kUnknownStack = 65536;
 
 // Bytes between here and the end of the thread's stack.
@@ -31,7 +32,7 @@ size_t StackLeft() {
   pthread_attr_destroy(&attributes);
   const auto here = reinterpret_cast<uintptr_t>(__builtin_frame_address(0));
   const auto end = reinterpret_cast<uintptr_t>(lowest);
-  return here > end ? here - end : 0;
+  return here >= end && here - end < size ? here - end : kUnknownStack;
 }
 
 // How often `c` stands in `text`, counted up to `limit`.

@@ -6,20 +6,23 @@
 #include "tarnwick/utils/utils.h"
 
 std::string EncodeQueryValues(const std::string& path, const std::string& keep) {
-  const std::string text(path.c_str());  // a zero byte ends the request line
-  const size_t question = text.find('?');
+  const size_t question = path.find('?');
   if (question == std::string::npos) return path;
-  std::string result = text.substr(0, question + 1);
-  size_t segment = question + 1;
-  while (segment < text.size()) {
+  // A zero byte is looked at where no value is left to encode, and nowhere else.
+  const size_t length = strlen(path.c_str());
+  std::string result = path.substr(0, question + 1);
+  for (size_t segment = question + 1;;) {
     // A part's first character is never its "=": a value without a name stays as it is.
-    const size_t equals = text.find('=', segment + 1);
-    if (equals == std::string::npos) break;
-    result.append(text, segment, equals + 1 - segment);
-    const size_t end = std::min(text.find('&', equals + 1), text.size());
-    result += UrlEncode(text.substr(equals + 1, end - equals - 1), keep);
+    const size_t equals = path.find('=', segment + 1);
+    if (equals == std::string::npos) {
+      if (segment < length) result.append(path, segment, length - segment);
+      return result;
+    }
+    const size_t value = equals + 1;
+    const size_t end = std::min(path.find('&', value), path.size());
+    result.append(path, segment, value - segment);
+    result += UrlEncode(path.substr(value, end - value), keep);
+    if (end == path.size() || value >= length) return result;
     segment = end;
   }
-  if (segment < text.size()) result.append(text, segment, std::string::npos);
-  return result;
 }

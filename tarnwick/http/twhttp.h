@@ -145,7 +145,7 @@ class TARNWICK_API TWHttpClient {
   // Stores the status code of the last response over the socket in `status`, 0 when none was read.
   // Results: HTTP_RET_NOT_READY before the first request, then the outcome of the last one: of its
   //   response over the socket, or of the whole transfer through libcurl. A request that could not
-  //   be written leaves both as they were.
+  //   be written leaves both as they were; so does an upload, until GetResp reads its response.
   int CheckResponse(int& status);
 
   // Copies a header of the last response to `out`.
@@ -261,11 +261,12 @@ class TARNWICK_API TWHttpClient {
   // here the body would be taken for a status line.
   //
   // Results: the body, as ReadBody gives it; the text {"error":true} when the head is no success,
-  //   or where ReadBody fails.
+  //   or where ReadBody fails. CheckResponse tells the outcome of the head.
   std::string GetResp();
 
   // Opens a streaming upload: connects and sends the head of a multipart POST of 128 GiB, so that
-  // the server waits for whatever the caller writes.
+  // the server waits for whatever the caller writes. CheckResponse tells of the response before it,
+  // until GetResp has read the upload's.
   //
   // The caller then writes the body with WriteData, with lines of the boundary
   // -----------QUENMULTIPART_BOUNDARY----------- and ends it by destroying the client. No login is
@@ -293,6 +294,9 @@ class TARNWICK_API TWHttpClient {
   //
   // Results: true with a new document in `doc`, which the caller frees with xmlFreeDoc; false when
   //   nothing was collected (`doc` stays) or it is not well-formed (`doc` becomes null).
+  // Here and in SendReqByXMLSocketPost libxml2's error handlers are told what is wrong with a
+  // document, when the daemon has set them for the thread. Without one, where libxml2 writes to
+  // standard error, nothing is written; stderr given to xmlSetGenericErrorFunc is no handler.
   bool GetResponseXML(xmlDoc*& doc);
 
   // Reads and parses the head of a reply, after a request has been written.
@@ -300,7 +304,7 @@ class TARNWICK_API TWHttpClient {
   //   without a request written, or after a header line without a name, or one of the names that
   //   are kept without a value; HTTP_RET_IO_ERROR
   //   after a failed read or half a status line; HTTP_RET_BAD_RESPONSE when it is no HTTP/1.0 or
-  //   HTTP/1.1 reply.
+  //   HTTP/1.1 reply. The result is not kept: CheckResponse does not tell it.
   int CheckHttpResponse();
 
   // Reads and parses the header lines, 30 at most; what follows stays unread, in front of the body:
@@ -384,6 +388,9 @@ class TARNWICK_API TWHttpClient {
 // Results: 0 when the reply is JSON whose member "success" is true; -1 when the request, the
 //   status, a read or an empty body made it fail; -2 when the body is no JSON, or "success" is
 //   missing or not true, and `result` may then hold a part of the reply.
+// Here and in SendHttpsGet a body that is nested more deeply than the thread's stack has room for
+// is no JSON; a stack that is not the thread's own, a fiber's, is taken for one with room for 77
+// levels.
 // Throws nothing; so the other two.
 // Blocks: as the client's GET, until the server closes.
 // Threads: any; so the other two.

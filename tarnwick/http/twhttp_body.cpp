@@ -76,7 +76,8 @@ void AppendBufferedChunks(TWSocket* socket, std::string* body) {
 
 std::string TWHttpClient::GetResp() try {
   m_connState = 1;
-  if (CheckHttpResponse() != HTTP_RET_OK) {
+  m_result = CheckHttpResponse();
+  if (m_result != HTTP_RET_OK) {
     TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_DEBUG, "Http Resp error\n");
     return kErrorText;
   }
@@ -144,11 +145,13 @@ int TWHttpClient::AppendPiece(int len, std::string* body) {
   return count;
 }
 
-// The two bytes behind a chunk, whatever they are.
+// The two bytes after a chunk, whatever they are. Direct reading delivers what has arrived, so one
+// may be missing; through the buffer one is missing where the stream ends or a read failed, and
+// another read would wait once more.
 void TWHttpClient::DropChunkEnd() {
   char ending[2];
   const int count = ReadData(ending, 2);
-  if (count == 1) ReadData(ending, 1);  // direct reading delivers what has arrived
+  if (count == 1 && !SocketAccess::IsBuffered(m_pSocket)) ReadData(ending, 1);
 }
 
 // The announced length does not count: the body ends where the server closes.

@@ -14,6 +14,10 @@ namespace {
 
 constexpr char kSendRequestByCurl[] = "SendRequestByCurl";
 
+// libcurl before 7.62 has this name for another code.
+constexpr CURLcode kCertificateNotVerified = CURLE_PEER_FAILED_VERIFICATION;
+static_assert(kCertificateNotVerified == 60, "HTTP_RET_CERT_ERROR stands for this code");
+
 // Results: true for CURLE_OK; any other code is logged.
 bool Accept(CURLcode code, const char* func = kSendRequestByCurl) {
   if (code == CURLE_OK) return true;
@@ -55,11 +59,24 @@ bool SetOutputFile(CurlRequest* curl, FILE* file) {
          Accept(curl->Set(CURLOPT_WRITEDATA, file));
 }
 
-// A full disk shows when stdio writes, which may be later than libcurl has handed over the bytes.
-bool IsWritten(FILE* file) {
-  if (file == nullptr || (fflush(file) == 0 && ferror(file) == 0)) return true;
-  return Accept(CURLE_WRITE_ERROR);
-}
+// Whether a transfer's own bytes have reached its file, if it has one. A full disk shows when stdio
+// writes, which may be later than libcurl has handed over the bytes.
+class FileWrites {
+ public:
+  explicit FileWrites(FILE* file) : m_file(file), m_failedBefore(file != nullptr && ferror(file)) {}
+
+  // A flush of the header lines that failed shows in the error flag alone, and glibc has dropped the
+  // bytes. A flag of before the transfer is the caller's: it tells nothing, and stays.
+  bool Finish() const {
+    if (m_file == nullptr) return true;
+    if (fflush(m_file) == 0 && (m_failedBefore || ferror(m_file) == 0)) return true;
+    return Accept(CURLE_WRITE_ERROR);
+  }
+
+ private:
+  FILE* m_file;
+  bool m_failedBefore;
+};
 
 bool AddHeader(CurlRequest* curl, const std::string& line) {
   return Accept(curl->AddHeader(line) ? CURLE_OK : CURLE_OUT_OF_MEMORY);
@@ -75,9 +92,10 @@ int TWHttpClient::SendRequestByCurl(TW_HTTP_METHOD method, bool verifyPeer, int 
   if (!verifyPeer && !SetCurlSSLOpt(&curl)) return m_result;
   if (!SetCurlOutput(&curl) || !SetCurlRequest(&curl, method, timeout)) return m_result;
   if (!SetCurlHeaders(&curl, method)) return m_result;
+  const FileWrites writes(m_pCurlRespFile);
   const CURLcode code = curl.Perform();
-  if (code == CURLE_PEER_FAILED_VERIFICATION) m_result = HTTP_RET_CERT_ERROR;
-  if (code != CURLE_OK || !curl.StatusIsSuccess() || !IsWritten(m_pCurlRespFile)) return m_result;
+  if (code == kCertificateNotVerified) m_result = HTTP_RET_CERT_ERROR;
+  if (code != CURLE_OK || !curl.StatusIsSuccess() || !writes.Finish()) return m_result;
   m_connState = 1;
   m_result = HTTP_RET_OK;
   return m_result;

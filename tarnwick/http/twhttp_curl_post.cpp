@@ -40,6 +40,11 @@ bool TWHttpClient::SetCurlLogin(CurlRequest* curl) {
                    "Failed to set Pwd=", m_strPassword.c_str());
 }
 
+static_assert(HTTP_VERSION_NONE == static_cast<int>(CURL_HTTP_VERSION_NONE) &&
+                  HTTP_VERSION_1_0 == static_cast<int>(CURL_HTTP_VERSION_1_0) &&
+                  HTTP_VERSION_1_1 == static_cast<int>(CURL_HTTP_VERSION_1_1),
+              "the versions go to libcurl as they are");
+
 bool TWHttpClient::SetCurlVersion(CurlRequest* curl) {
   if (m_httpVersion != HTTP_VERSION_1_0 && m_httpVersion != HTTP_VERSION_1_1) return true;
   return curl->Set(CURLOPT_HTTP_VERSION, static_cast<long>(m_httpVersion),

@@ -107,7 +107,7 @@ int TWHttpClient::SendReqByXMLPut(xmlDoc*& doc) try {
 // REQUIRES: `file` is open for writing and reading.
 int TWHttpClient::PutXmlFile(CurlRequest* curl, xmlDoc* doc, FILE* file) {
   const int size = xmlDocDump(file, doc);
-  if (size == -1) {
+  if (size < 0) {
     TW_LOG_AS("SendReqByXMLPut", LOG_CATEG_HTTP, LOG_LEVEL_DEBUG,
               "Failed to write xml document to temp file\n");
     return m_result;

@@ -12,6 +12,9 @@ class SocketAccess {
   // derives from it. Of a daemon's many idle clients only what they used is resident.
   static TWSocket* MakePlain() { return new TWSocket(TWSocket::HiddenBuffer()); }
 
+  // Whether the socket reads ahead.
+  static bool IsBuffered(const TWSocket* socket) { return socket->m_bBuffered; }
+
   // What is buffered and unread. The next read of the socket ends it.
   static std::string_view Buffered(const TWSocket* socket) {
     if (socket == nullptr || !socket->m_bBuffered || socket->m_readLen <= 0) return {};

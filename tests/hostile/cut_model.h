@@ -60,6 +60,7 @@ class CutReader {
   }
 
   bool Ended() const { return eof_; }
+  bool Buffered() const { return buffered_; }
 
  private:
   Cut cut_;
@@ -133,7 +134,7 @@ inline bool ReadModelChunks(CutReader& reader, std::string* body) {
       if (reader.Ended()) break;
     }
     std::string dropped;
-    if (reader.Read(2, &dropped) == 1) reader.Read(1, &dropped);
+    if (reader.Read(2, &dropped) == 1 && !reader.Buffered()) reader.Read(1, &dropped);
   }
 }
 

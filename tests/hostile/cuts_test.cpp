@@ -165,7 +165,7 @@ Expected UploadRule(const std::vector<Cut>& replies, bool buffered) {
   if (!read) {
     expected.log.push_back(success ? "GetResp: Read data error\n" : "GetResp: Http Resp error\n");
   }
-  expected.outcome = {0, 1, head.status, read ? body : error};
+  expected.outcome = {0, head.response, head.status, read ? body : error};
   return expected;
 }
 

@@ -4,6 +4,9 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <json/json.h>
+#include <ucontext.h>
+
+#include <memory>
 
 #include "tarnwick/log/twdebuglog.h"
 #include "tests/support/faults.h"
@@ -33,6 +36,33 @@ std::string Repeat(const std::string& piece, int times) {
 // An array in an array and so on, `levels` of them, beside "success".
 std::string Nested(int levels) {
   return "{\"success\":true,\"x\":" + Repeat("[", levels) + Repeat("]", levels) + "}";
+}
+
+// Results of JsonParse on a stack that makecontext was given.
+struct Fiber {
+  ucontext_t thread;
+  ucontext_t fiber;
+  int few = 1;
+  int many = 1;
+};
+
+Fiber* g_fiber = nullptr;
+
+void ParseInFiber() {
+  g_fiber->few = ResultOf(Nested(76));
+  g_fiber->many = ResultOf(Nested(77));
+}
+
+void RunInFiber(Fiber* fiber) {
+  constexpr size_t kStack = 1 << 20;
+  const auto stack = std::make_unique<char[]>(kStack);
+  g_fiber = fiber;
+  ASSERT_EQ(getcontext(&fiber->fiber), 0);
+  fiber->fiber.uc_stack.ss_sp = stack.get();
+  fiber->fiber.uc_stack.ss_size = kStack;
+  fiber->fiber.uc_link = &fiber->thread;
+  makecontext(&fiber->fiber, ParseInFiber, 0);
+  ASSERT_EQ(swapcontext(&fiber->thread, &fiber->fiber), 0);
 }
 
 }  // namespace
@@ -191,6 +221,19 @@ TEST(JsonParse, WhereTheSystemDoesNotTellTheStackSixtyLevelsParseAndThousandsDoN
   EXPECT_EQ(ResultOf(Nested(60)), 0);
   EXPECT_EQ(ResultOf(Nested(900)), -1);
   EXPECT_EQ(faults.Count(Call::kPthreadGetattrNp), 2);
+}
+
+TEST(JsonParse, OnAStackThatIsNotTheThreadsOwn77LevelsParseAndNoMore) {
+  Fiber in_main_thread;  // whose stack lies above the heap; another thread's may lie below
+  RunInFiber(&in_main_thread);
+  EXPECT_EQ(in_main_thread.few, 0);
+  EXPECT_EQ(in_main_thread.many, -1);
+  RunOnSmallStack(128 << 10, [] {
+    Fiber fiber;
+    RunInFiber(&fiber);
+    EXPECT_EQ(fiber.few, 0);
+    EXPECT_EQ(fiber.many, -1);
+  });
 }
 
 TEST(JsonParse, AWideReplyIsParsed) {

@@ -2,12 +2,16 @@
 #include "tarnwick/http/xml_reply.h"
 
 #include <gtest/gtest.h>
+#include <libxml/parser.h>
 #include <libxml/tree.h>
+#include <libxml/xmlerror.h>
 #include <libxml/xmlmemory.h>
 
 #include <cstdlib>
 #include <cstring>
 #include <string>
+
+#include "tests/support/standard_error.h"
 
 namespace {
 
@@ -37,11 +41,11 @@ void Ignore(void* /*unused*/, const char* /*format*/, ...) {}
 // libxml2's allocations are counted while one exists, and the n-th fails.
 class FailingParser {
  public:
-  explicit FailingParser(int failing) {
+  explicit FailingParser(int failing, xmlGenericErrorFunc handler = Ignore) {
     xmlInitParser();
     g_allocations = 0;
     g_failing = failing;
-    xmlSetGenericErrorFunc(nullptr, Ignore);
+    xmlSetGenericErrorFunc(nullptr, handler);
     xmlMemSetup(free, FailingMalloc, FailingRealloc, FailingStrdup);
   }
   ~FailingParser() {
@@ -96,6 +100,17 @@ TEST(ParseXml, WhicheverAllocationFailsTheDocumentIsWholeOrNone) {
     xmlFreeDoc(doc);
   }
   EXPECT_FALSE(failed);
+}
+
+TEST(ParseXml, WhicheverAllocationFailsNothingReachesStandardErrorWithoutAHandler) {
+  CapturedStandardError captured;
+  bool failed = true;
+  for (int n = 1; failed; ++n) {
+    const FailingParser parser(n, nullptr);
+    xmlFreeDoc(Parse());
+    failed = parser.Failed();
+  }
+  EXPECT_EQ(captured.End(), "");
 }
 
 TEST(ParseXml, AnEarlierFailureOfTheThreadDoesNotCount) {

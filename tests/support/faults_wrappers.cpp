@@ -1,6 +1,7 @@
 // The functions that the linker puts before the real ones.
 #include <dlfcn.h>
 #include <fcntl.h>
+#include <libxml/tree.h>
 #include <netdb.h>
 #include <openssl/ssl.h>
 #include <poll.h>
@@ -157,6 +158,7 @@ PASS(Call::kCurlEasyInit, CURL*, curl_easy_init, (), ())
 PASS(Call::kCurlEasyPerform, CURLcode, curl_easy_perform, (CURL * easy), (easy))
 PASS(Call::kCurlSlistAppend, curl_slist*, curl_slist_append, (curl_slist * list, const char* line),
      (list, line))
+PASS(Call::kXmlDocDump, int, xmlDocDump, (FILE * file, xmlDoc* doc), (file, doc))
 
 extern "C" int __real_select(int, fd_set*, fd_set*, fd_set*, struct timeval*);
 extern "C" int __wrap_select(int nfds, fd_set* reads, fd_set* writes, fd_set* exceptions,

@@ -29,7 +29,8 @@ uint32_t ReadSize(ModelSocket* socket) {
 // A socket that does not read ahead may deliver them one by one.
 void DropTwoBytes(ModelSocket* socket) {
   std::string dropped;
-  if (socket->Read(2, &dropped) == 1) socket->Read(1, &dropped);
+  const int got = socket->Read(2, &dropped);
+  if (got == 1 && !socket->ReadsAhead()) socket->Read(1, &dropped);
 }
 
 // Results: false when a read failed.

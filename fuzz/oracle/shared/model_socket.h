@@ -30,6 +30,7 @@ class ModelSocket {
   bool HasData(int timeout);
 
   int Timeout() const { return timeout_; }
+  bool ReadsAhead() const { return buffered_; }
   bool IsOpen() const { return open_; }
   bool IsConnected() const { return connected_; }
   bool IsEof() const { return eof_; }
