@@ -192,8 +192,8 @@ int ModelClient::ReadBody(std::string* body) {
 }
 
 std::string ModelClient::GetResp() {
-  head_.state = 1;
+  ReadHead();
   std::string body;
-  const bool failed = ReadModelHead(&socket_, &head_) != kOk || ReadBody(&body) != kOk;
+  const bool failed = result_ != kOk || ReadBody(&body) != kOk;
   return failed ? "{\"error\":true}" : body;
 }

@@ -76,7 +76,8 @@ void AppendBufferedChunks(TWSocket* socket, std::string* body) {
 
 std::string TWHttpClient::GetResp() try {
   m_connState = 1;
-  if (CheckHttpResponse() != HTTP_RET_OK) {
+  m_result = CheckHttpResponse();
+  if (m_result != HTTP_RET_OK) {
     TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_DEBUG, "Http Resp error\n");
     return kErrorText;
   }
