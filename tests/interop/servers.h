@@ -13,6 +13,14 @@
 WebServer& Apache();
 WebServer& Nginx();
 WebServer& Lighttpd();
+WebServer& Gsoap();
+WebServer& Microhttpd();
+WebServer& Poco();
+WebServer& Node();
+WebServer& Caddy();    // asks Node.js
+WebServer& Haproxy();  // the same
+WebServer& Stunnel();  // the same
+WebServer& Busybox();
 
 inline constexpr char kUser[] = "operator";
 inline constexpr char kPassword[] = "gate-7";
