@@ -20,18 +20,30 @@ constexpr char kUploadBody[] = "-------------QUENMULTIPART_BOUNDARY-----------\r
 
 const char* NameOf(Op op) {
   switch (op) {
-    case Op::kHttpGet: return "SendHttpGet";
-    case Op::kHttpPost: return "SendHttpPost";
-    case Op::kHttpsGet: return "SendHttpsGet";
-    case Op::kGet: return "SendRequest (GET)";
-    case Op::kForm: return "SendRequestBySocketPost with ReadBody";
-    case Op::kPost: return "SendRequest (POST)";
-    case Op::kSoap: return "SendReqBySocketPost";
-    case Op::kSoapAuth: return "SendAuthReqBySocketPost";
-    case Op::kXmlGet: return "SendReqByXMLGet with GetResponseXML";
-    case Op::kXmlPut: return "SendReqByXMLPut with GetResponseXML";
-    case Op::kCurl: return "SendRequestByCurl (GET)";
-    case Op::kUpload: return "OpenRawDataUpload with GetResp";
+    case Op::kHttpGet:
+      return "SendHttpGet";
+    case Op::kHttpPost:
+      return "SendHttpPost";
+    case Op::kHttpsGet:
+      return "SendHttpsGet";
+    case Op::kGet:
+      return "SendRequest (GET)";
+    case Op::kForm:
+      return "SendRequestBySocketPost with ReadBody";
+    case Op::kPost:
+      return "SendRequest (POST)";
+    case Op::kSoap:
+      return "SendReqBySocketPost";
+    case Op::kSoapAuth:
+      return "SendAuthReqBySocketPost";
+    case Op::kXmlGet:
+      return "SendReqByXMLGet with GetResponseXML";
+    case Op::kXmlPut:
+      return "SendReqByXMLPut with GetResponseXML";
+    case Op::kCurl:
+      return "SendRequestByCurl (GET)";
+    case Op::kUpload:
+      return "OpenRawDataUpload with GetResp";
   }
   return "";
 }
@@ -45,7 +57,9 @@ bool IsOneCall(Op op) {
   return op == Op::kHttpGet || op == Op::kHttpPost || op == Op::kHttpsGet;
 }
 
-bool IsTls(const PeerCase& c) { return std::string(c.transport) != "plain"; }
+bool IsTls(const PeerCase& c) {
+  return std::string(c.transport) != "plain";
+}
 
 // What came: the operation's result, and a text.
 struct Reply {
@@ -104,21 +118,27 @@ Reply Send(ClientProbe* client, Op op) {
   std::string text;
   int result;
   switch (op) {
-    case Op::kForm: return WithBody(client, client->SendRequestBySocketPost(kForm));
-    case Op::kPost: return {client->SendRequest(HTTP_METHOD_POST, "?"), ""};
+    case Op::kForm:
+      return WithBody(client, client->SendRequestBySocketPost(kForm));
+    case Op::kPost:
+      return {client->SendRequest(HTTP_METHOD_POST, "?"), ""};
     case Op::kSoap:
       result = client->SendReqBySocketPost(kEnvelope, text);
       return {result, text};
     case Op::kSoapAuth:
       result = client->SendAuthReqBySocketPost(kEnvelope, text);
       return {result, text};
-    case Op::kXmlGet: return WithDocument(client, client->SendReqByXMLGet(10));
-    case Op::kXmlPut: return PutXml(client);
+    case Op::kXmlGet:
+      return WithDocument(client, client->SendReqByXMLGet(10));
+    case Op::kXmlPut:
+      return PutXml(client);
     case Op::kCurl:
       result = client->SendRequestByCurl(HTTP_METHOD_GET, false, 10);
       return {result, client->GetCurlText()};
-    case Op::kUpload: return Upload(client);
-    default: return WithBody(client, client->SendRequest(HTTP_METHOD_GET, ""));
+    case Op::kUpload:
+      return Upload(client);
+    default:
+      return WithBody(client, client->SendRequest(HTTP_METHOD_GET, ""));
   }
 }
 

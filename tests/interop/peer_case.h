@@ -70,11 +70,11 @@ constexpr Outcome OneCall(int result, const char* text = "") {
 }
 
 struct PeerCase {
-  const char* name;       // of the test
+  const char* name;  // of the test
   Op op;
-  const char* note;       // what the table adds to the name of the operation
+  const char* note;  // what the table adds to the name of the operation
   const char* path;
-  const char* login;      // as the table shows it; "wrong password" sends one
+  const char* login;  // as the table shows it; "wrong password" sends one
   Outcome expected;
   const char* result = "passed";  // as the table shows it
   const char* port = "PORT";

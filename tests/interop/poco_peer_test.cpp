@@ -36,8 +36,13 @@ constexpr PeerCase kCases[] = {
     {"GetsXml", Op::kXmlGet, "", "xml", "none", ByCurl(HTTP_RET_OK, "GET")},
     {"PutsXml", Op::kXmlPut, "", "xml", "none", ByCurl(HTTP_RET_OK, "PUT")},
     {"GetsWithLibcurl", Op::kCurl, "", "stream", "none", ByCurl(HTTP_RET_OK, "true")},
-    {"Uploads", Op::kUpload, "", "upload", "none",
-     {HTTP_RET_OK, HTTP_RET_OK, 200, "{\"success\":true}", false}, kBlankTaken},
+    {"Uploads",
+     Op::kUpload,
+     "",
+     "upload",
+     "none",
+     {HTTP_RET_OK, HTTP_RET_OK, 200, "{\"success\":true}", false},
+     kBlankTaken},
 };
 
 class PocoPeer : public ::testing::TestWithParam<PeerCase> {};

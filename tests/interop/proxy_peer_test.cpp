@@ -27,8 +27,8 @@ constexpr PeerCase kHaproxyCases[] = {
      "passed", "TLS_PORT", "TLS"},
     {"GetsJsonOverTls", Op::kHttpsGet, "", "json", "none", OneCall(0, "GET"), "passed", "TLS_PORT",
      "TLS"},
-    {"GetsWithLibcurlOverTls", Op::kCurl, "", "text", "none", ByCurl(HTTP_RET_OK, "GET "),
-     "passed", "TLS_PORT", "TLS"},
+    {"GetsWithLibcurlOverTls", Op::kCurl, "", "text", "none", ByCurl(HTTP_RET_OK, "GET "), "passed",
+     "TLS_PORT", "TLS"},
 };
 
 constexpr PeerCase kStunnelCases[] = {
@@ -40,16 +40,21 @@ constexpr PeerCase kStunnelCases[] = {
      "passed", "TLS13_PORT", "TLS 1.3", HTTP_VERSION_1_1},
     {"PostsAFormOfHttp10", Op::kForm, " (HTTP/1.0)", "text", "none", Got("POST pan=3&tilt=-4"),
      "passed", "TLS12_PORT", "TLS 1.2", HTTP_VERSION_1_0},
-    {"PostsAnEnvelope", Op::kSoapAuth, "", "basic", "Basic", Got("GetInfo"), "passed",
-     "TLS13_PORT", "TLS 1.3"},
+    {"PostsAnEnvelope", Op::kSoapAuth, "", "basic", "Basic", Got("GetInfo"), "passed", "TLS13_PORT",
+     "TLS 1.3"},
     {"GetsJsonOverTls12", Op::kHttpsGet, "", "json", "none", OneCall(0, "GET"), "passed",
      "TLS12_PORT", "TLS 1.2"},
     {"GetsWithLibcurl", Op::kCurl, "", "text", "none", ByCurl(HTTP_RET_OK, "GET "), "passed",
      "TLS13_PORT", "TLS 1.3"},
-    {"ShowsNoCertificate", Op::kGet, ", client certificate wanted", "text", "none",
+    {"ShowsNoCertificate",
+     Op::kGet,
+     ", client certificate wanted",
+     "text",
+     "none",
      {HTTP_RET_IO_ERROR, HTTP_RET_IO_ERROR, 0, "", false},
      "not possible: the client has no certificate to show (the response does not come)",
-     "MUTUAL13_PORT", "TLS 1.3"},
+     "MUTUAL13_PORT",
+     "TLS 1.3"},
 };
 
 class HaproxyPeer : public ::testing::TestWithParam<PeerCase> {};

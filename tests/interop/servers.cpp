@@ -78,11 +78,12 @@ WebServer& Lighttpd() {
 }
 
 WebServer& Gsoap() {
-  return Running({"gSOAP",
-                  {TARNWICK_PEERS_FOLDER "/gsoap_server", "@PORT@", "@DIGEST_PORT@", "@CHUNK_PORT@"},
-                  {},
-                  {"PORT", "DIGEST_PORT", "CHUNK_PORT"},
-                  {}});
+  return Running(
+      {"gSOAP",
+       {TARNWICK_PEERS_FOLDER "/gsoap_server", "@PORT@", "@DIGEST_PORT@", "@CHUNK_PORT@"},
+       {},
+       {"PORT", "DIGEST_PORT", "CHUNK_PORT"},
+       {}});
 }
 
 WebServer& Microhttpd() {
@@ -142,6 +143,17 @@ WebServer& Busybox() {
                   {}},
                  FillSmall);
 }
+
+#ifdef TARNWICK_TWCAMSIM
+WebServer& SimulatedCamera() {
+  return Running({"twcamsim",
+                  Runnable({TARNWICK_TWCAMSIM, "--endpoint", "soap,port=@PORT@", "--endpoint",
+                            "soap,port=@DIGEST_PORT@,login=digest"}),
+                  {},
+                  {"PORT", "DIGEST_PORT"},
+                  {}});
+}
+#endif
 
 ClientSettings LoginTo(const Mode& mode, const std::string& path) {
   ClientSettings settings;

@@ -21,6 +21,9 @@ WebServer& Caddy();    // asks Node.js
 WebServer& Haproxy();  // the same
 WebServer& Stunnel();  // the same
 WebServer& Busybox();
+#ifdef TARNWICK_TWCAMSIM
+WebServer& SimulatedCamera();
+#endif
 
 inline constexpr char kUser[] = "operator";
 inline constexpr char kPassword[] = "gate-7";

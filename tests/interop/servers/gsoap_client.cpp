@@ -1,4 +1,4 @@
-// A client that gSOAP has generated: asks a camera for its name, and prints the response's status.
+// A client that gSOAP has generated: asks a camera for its model, and prints it or the fault.
 //
 //   gsoap_client URL [USER PASSWORD]       logs in by Digest when it is asked to
 #include <cstdio>
@@ -12,16 +12,15 @@ int main(int count, char** argv) {
   soap_set_namespaces(soap, namespaces);
   soap_register_plugin(soap, http_da);
   soap->recv_timeout = soap->send_timeout = 10;
-  char name[] = "gate";
-  char* result = nullptr;
-  int status = soap_call_ns__GetInfo(soap, argv[1], nullptr, name, &result);
+  char* model = nullptr;
+  int status = soap_call_GetDeviceInformation(soap, argv[1], nullptr, &model);
   http_da_info login = {};
   if (status == 401 && count > 3) {
     http_da_save(soap, &login, soap->authrealm, argv[2], argv[3]);
-    status = soap_call_ns__GetInfo(soap, argv[1], nullptr, name, &result);
+    status = soap_call_GetDeviceInformation(soap, argv[1], nullptr, &model);
     http_da_release(soap, &login);
   }
-  if (status == SOAP_OK) printf("ok %s\n", result);
+  if (status == SOAP_OK) printf("%s\n", model);
   if (status != SOAP_OK) soap_print_fault(soap, stdout);
   soap_destroy(soap);
   soap_end(soap);

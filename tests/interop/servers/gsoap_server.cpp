@@ -27,7 +27,7 @@ void Serve(const char* port, soap_mode mode, bool digest) {
   soap_set_namespaces(soap, namespaces);
   if (digest) soap_register_plugin(soap, http_da);
   soap->bind_flags = SO_REUSEADDR;
-  soap->accept_timeout = 0;
+  soap->socket_flags = MSG_NOSIGNAL;  // a client may leave before its response is written
   soap->recv_timeout = soap->send_timeout = 10;
   if (!soap_valid_socket(soap_bind(soap, "127.0.0.1", atoi(port), 16))) {
     soap_print_fault(soap, stderr);
@@ -43,13 +43,19 @@ void Serve(const char* port, soap_mode mode, bool digest) {
 }  // namespace
 
 int ns__GetInfo(struct soap* soap, char* name, char** result) {
-  const bool open = strstr(soap->path, "basic") == nullptr && strstr(soap->path, "digest") == nullptr;
+  const bool open =
+      strstr(soap->path, "basic") == nullptr && strstr(soap->path, "digest") == nullptr;
   if (!open && !LoggedIn(soap)) {
     soap->authrealm = kRealm;
     return 401;
   }
   *result = soap_strdup(soap, name != nullptr ? name : "");
   return SOAP_OK;
+}
+
+// What twcamsim is asked; nobody asks this server.
+int GetDeviceInformation(struct soap*, char**) {
+  return SOAP_NO_METHOD;
 }
 
 int main(int, char** argv) {

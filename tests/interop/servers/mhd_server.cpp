@@ -57,8 +57,7 @@ bool BasicLogin(MHD_Connection* connection) {
 
 MHD_Result RefuseBasic(MHD_Connection* connection) {
   MHD_Response* response = NewResponse("refused\n", "text/plain");
-  const MHD_Result result =
-      MHD_queue_basic_auth_fail_response(connection, "camera", response);
+  const MHD_Result result = MHD_queue_basic_auth_fail_response(connection, "camera", response);
   MHD_destroy_response(response);
   return result;
 }
@@ -125,11 +124,11 @@ void Forget(void*, MHD_Connection*, void** state, MHD_RequestTerminationCode) {
 
 int main(int, char** argv) {
   const char seed[] = "8 bytes";
-  MHD_Daemon* daemon = MHD_start_daemon(
-      MHD_USE_INTERNAL_POLLING_THREAD | MHD_USE_ERROR_LOG,
-      static_cast<uint16_t>(atoi(argv[1])), nullptr, nullptr, &Answer, nullptr,
-      MHD_OPTION_NOTIFY_COMPLETED, &Forget, nullptr, MHD_OPTION_DIGEST_AUTH_RANDOM, sizeof(seed),
-      seed, MHD_OPTION_NONCE_NC_SIZE, 300u, MHD_OPTION_END);
+  MHD_Daemon* daemon =
+      MHD_start_daemon(MHD_USE_INTERNAL_POLLING_THREAD | MHD_USE_ERROR_LOG,
+                       static_cast<uint16_t>(atoi(argv[1])), nullptr, nullptr, &Answer, nullptr,
+                       MHD_OPTION_NOTIFY_COMPLETED, &Forget, nullptr, MHD_OPTION_DIGEST_AUTH_RANDOM,
+                       sizeof(seed), seed, MHD_OPTION_NONCE_NC_SIZE, 300u, MHD_OPTION_END);
   if (daemon == nullptr) return 1;
   for (;;) pause();
 }
