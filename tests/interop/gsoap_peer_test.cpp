@@ -8,24 +8,24 @@ namespace {
 
 using ::testing::HasSubstr;
 
-constexpr char kReply[] = "<result>gate</result>";
+constexpr char kResult[] = "<result>gate</result>";
 
 constexpr PeerCase kCases[] = {
-    {"PostsAnEnvelope", Op::kSoap, "", "camera", "none", Got(kReply)},
-    {"GetsChunksForAnEnvelope", Op::kSoap, " (chunked)", "camera", "none", NoLength(), kChunkedSoap,
+    {"PostsAnEnvelope", Op::kSoap, "", "camera", "none", Got(kResult)},
+    {"GetsChunksForAnEnvelope", Op::kSoap, " (chunked)", "camera", "none", NoLength(), kNoLength,
      "CHUNK_PORT"},
-    {"LogsInByBasic", Op::kSoapAuth, "", "basic", "Basic", Got(kReply)},
+    {"LogsInByBasic", Op::kSoapAuth, "", "basic", "Basic", Got(kResult)},
     {"IsRefusedByBasic", Op::kSoapAuth, ", refused", "basic", "wrong password",
      Refused(HTTP_RET_UNAUTHORIZED, 401)},
-    {"LogsInByDigest", Op::kSoapAuth, "", "digest", "Digest, SHA-256 and MD5", Got(kReply),
+    {"LogsInByDigest", Op::kSoapAuth, "", "digest", "Digest, SHA-256 and MD5", Got(kResult),
      "passed", "DIGEST_PORT"},
     {"LogsInByDigestWithAQuery", Op::kSoapAuth, " (query)", "digest?channel=1",
-     "Digest, SHA-256 and MD5", Got(kReply), "passed", "DIGEST_PORT"},
+     "Digest, SHA-256 and MD5", Got(kResult), "passed", "DIGEST_PORT"},
     {"IsRefusedByDigest", Op::kSoapAuth, ", refused", "digest", "wrong password",
      Refused(HTTP_RET_UNAUTHORIZED, 401), "passed", "DIGEST_PORT"},
-    {"LogsInForChunks", Op::kSoapAuth, " (chunked)", "camera", "none", NoLength(), kChunkedSoap,
+    {"LogsInForChunks", Op::kSoapAuth, " (chunked)", "camera", "none", NoLength(), kNoLength,
      "CHUNK_PORT"},
-    {"TakesNoGet", Op::kGet, " (405)", "camera", "none", Answered(HTTP_RET_BAD_RESPONSE, 405),
+    {"TakesNoGet", Op::kGet, " (405)", "camera", "none", Responded(HTTP_RET_BAD_RESPONSE, 405),
      "passed: the server takes POST alone"},
 };
 
@@ -34,7 +34,7 @@ class GsoapPeer : public ::testing::TestWithParam<PeerCase> {};
 INSTANTIATE_TEST_SUITE_P(, GsoapPeer, ::testing::ValuesIn(kCases),
                          [](const auto& test) { return test.param.name; });
 
-TEST_P(GsoapPeer, AnswersAsTheTableSays) {
+TEST_P(GsoapPeer, RespondsAsTheTableSays) {
   Play(Gsoap(), GetParam());
 }
 

@@ -62,12 +62,12 @@ bool IsTls(const PeerCase& c) {
 }
 
 // What came: the operation's result, and a text.
-struct Reply {
+struct Response {
   int result;
   std::string text;
 };
 
-Reply SendOneCall(int port, const PeerCase& c) {
+Response SendOneCall(int port, const PeerCase& c) {
   Json::Value value;
   if (c.op == Op::kHttpPost) {
     return {SendHttpPost("127.0.0.1", port, c.path, kForm, "session=42", 1), ""};
@@ -81,25 +81,25 @@ Reply SendOneCall(int port, const PeerCase& c) {
   return {result, value.toStyledString()};
 }
 
-Reply WithBody(ClientProbe* client, int sent) {
+Response WithBody(ClientProbe* client, int sent) {
   if (sent != HTTP_RET_OK) return {sent, ""};
-  Reply reply;
-  reply.result = client->ReadBody(reply.text);
-  return reply;
+  Response response;
+  response.result = client->ReadBody(response.text);
+  return response;
 }
 
-Reply WithDocument(ClientProbe* client, int sent) {
+Response WithDocument(ClientProbe* client, int sent) {
   xmlDoc* doc = nullptr;
   if (!client->GetResponseXML(doc)) return {sent, ""};
   xmlChar* value =
       xmlGetProp(xmlDocGetRootElement(doc), reinterpret_cast<const xmlChar*>("method"));
-  const Reply reply = {sent, value != nullptr ? reinterpret_cast<const char*>(value) : ""};
+  const Response response = {sent, value != nullptr ? reinterpret_cast<const char*>(value) : ""};
   xmlFree(value);
   xmlFreeDoc(doc);
-  return reply;
+  return response;
 }
 
-Reply PutXml(ClientProbe* client) {
+Response PutXml(ClientProbe* client) {
   xmlDoc* doc =
       xmlReadDoc(reinterpret_cast<const xmlChar*>("<preset id=\"7\"/>"), nullptr, nullptr, 0);
   const int sent = client->SendReqByXMLPut(doc);
@@ -107,14 +107,14 @@ Reply PutXml(ClientProbe* client) {
   return WithDocument(client, sent);
 }
 
-Reply Upload(ClientProbe* client) {
+Response Upload(ClientProbe* client) {
   const int opened = client->OpenRawDataUpload();
   if (opened != HTTP_RET_OK) return {opened, ""};
   client->WriteData(kUploadBody, sizeof(kUploadBody) - 1);  // a server that has refused may be gone
   return {opened, client->GetResp()};
 }
 
-Reply Send(ClientProbe* client, Op op) {
+Response Send(ClientProbe* client, Op op) {
   std::string text;
   int result;
   switch (op) {
@@ -163,17 +163,21 @@ void PlayOnce(const WebServer& server, const PeerCase& c, bool buffered) {
   AddRow({operation, server.Name(), c.login, c.transport, reading, c.result});
   const int port = server.Port(c.port);
   if (IsOneCall(c.op)) {
-    const Reply reply = SendOneCall(port, c);
-    EXPECT_EQ(reply.result, c.expected.result);
-    EXPECT_THAT(reply.text, HasSubstr(c.expected.text));
+    const Response response = SendOneCall(port, c);
+    EXPECT_EQ(response.result, c.expected.result);
+    EXPECT_THAT(response.text, HasSubstr(c.expected.text));
     return;
   }
   ClientProbe client(port, SettingsOf(c, buffered));
-  const Reply reply = Send(&client, c.op);
-  Outcome came = {reply.result, HTTP_RET_OK, 0, "", false};
+  const Response response = Send(&client, c.op);
+  Outcome came = {response.result, HTTP_RET_OK, 0, "", false};
   came.check = client.CheckResponse(came.status);
+  if (c.expected.check == kIoErrorOrNotReady &&
+      (came.check == HTTP_RET_IO_ERROR || came.check == HTTP_RET_NOT_READY)) {
+    came.check = kIoErrorOrNotReady;
+  }
   EXPECT_EQ(InWords(came), InWords(c.expected)) << reading;
-  EXPECT_THAT(reply.text, HasSubstr(c.expected.text)) << reading;
+  EXPECT_THAT(response.text, HasSubstr(c.expected.text)) << reading;
 }
 
 }  // namespace

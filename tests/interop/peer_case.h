@@ -49,14 +49,31 @@ constexpr Outcome NoLength() {
   return {HTTP_RET_IO_ERROR, HTTP_RET_OK, 200, "", false};
 }
 
+// The peer ends the connection instead of responding. CheckResponse has not seen the request when
+// the end comes before that is written.
+inline constexpr int kIoErrorOrNotReady = -1;
+constexpr Outcome NoResponse(int check = kIoErrorOrNotReady) {
+  return {HTTP_RET_IO_ERROR, check, 0, "", false};
+}
+
 // A SendRequest or ReadBody that succeeds after another status.
-constexpr Outcome Answered(int check, int status, const char* text = "") {
+constexpr Outcome Responded(int check, int status, const char* text = "") {
   return {HTTP_RET_OK, check, status, text, false};
 }
 
 // SendAuthReqBySocketPost, which returns the outcome of the last response.
 constexpr Outcome Refused(int check, int status) {
   return {check, check, status, "", false};
+}
+
+// An upload whose head is refused at once.
+constexpr Outcome UploadRefused() {
+  return {HTTP_RET_OK, HTTP_RET_BAD_RESPONSE, 400, "{\"error\":true}", false};
+}
+
+// An upload without a response.
+constexpr Outcome UploadAwaited() {
+  return {HTTP_RET_OK, HTTP_RET_IO_ERROR, 0, "{\"error\":true}", true};
 }
 
 // Through libcurl: the outcome of the transfer, and no status.
@@ -85,7 +102,7 @@ struct PeerCase {
 std::ostream& operator<<(std::ostream& out, const PeerCase& c);
 
 // Results that several peers share.
-inline constexpr char kChunkedSoap[] =
+inline constexpr char kNoLength[] =
     "not possible: the response must announce its Content-Length (HTTP_RET_IO_ERROR)";
 inline constexpr char kKeptOpenForm[] =
     "not possible: the server ignores \"Connection: close;\"; the whole body, then "
@@ -95,6 +112,8 @@ inline constexpr char kKeptOpenGet[] =
     "three time-outs";
 inline constexpr char kBlankRefused[] =
     "not possible: the server refuses a header name with a blank before its colon (400)";
+inline constexpr char kUploadAwaited[] =
+    "not possible: the server waits for the 128 GiB that the head announces";
 inline constexpr char kBasicAlone[] =
     "not possible: this operation logs in by Basic alone, so the 401 stays";
 

@@ -82,17 +82,17 @@ MHD_Result Serve(MHD_Connection* connection, const std::string& path, const char
     return Send(connection, MHD_HTTP_OK, NewStream());
   }
   if (path.find("xml") != std::string::npos) {
-    const std::string reply = "<reply method=\"" + std::string(method) + "\"/>";
-    return Send(connection, MHD_HTTP_OK, NewResponse(reply, "application/xml"));
+    const std::string text = "<response method=\"" + std::string(method) + "\"/>";
+    return Send(connection, MHD_HTTP_OK, NewResponse(text, "application/xml"));
   }
   if (path.find("json") != std::string::npos) {
-    const std::string reply = R"({"success":true,"told":")" + told + "\"}";
-    return Send(connection, MHD_HTTP_OK, NewResponse(reply, "application/json"));
+    const std::string text = R"({"success":true,"told":")" + told + "\"}";
+    return Send(connection, MHD_HTTP_OK, NewResponse(text, "application/json"));
   }
   return Send(connection, MHD_HTTP_OK, NewResponse(told, "text/plain"));
 }
 
-MHD_Result Answer(void*, MHD_Connection* connection, const char* url, const char* method,
+MHD_Result Handle(void*, MHD_Connection* connection, const char* url, const char* method,
                   const char*, const char* data, size_t* size, void** state) {
   if (*state == nullptr) {
     *state = new Request;
@@ -126,7 +126,7 @@ int main(int, char** argv) {
   const char seed[] = "8 bytes";
   MHD_Daemon* daemon =
       MHD_start_daemon(MHD_USE_INTERNAL_POLLING_THREAD | MHD_USE_ERROR_LOG,
-                       static_cast<uint16_t>(atoi(argv[1])), nullptr, nullptr, &Answer, nullptr,
+                       static_cast<uint16_t>(atoi(argv[1])), nullptr, nullptr, &Handle, nullptr,
                        MHD_OPTION_NOTIFY_COMPLETED, &Forget, nullptr, MHD_OPTION_DIGEST_AUTH_RANDOM,
                        sizeof(seed), seed, MHD_OPTION_NONCE_NC_SIZE, 300u, MHD_OPTION_END);
   if (daemon == nullptr) return 1;

@@ -24,7 +24,7 @@ function stream(response, type, first, second) {
 }
 
 // The request's path, its method and what came as its body.
-function answer(request, body, response) {
+function respond(request, body, response) {
   const told = `${request.method} ${body}`;
   const json = JSON.stringify({success: true, told, cookie: request.headers.cookie || ''});
   switch (request.url.split('?')[0]) {
@@ -32,8 +32,8 @@ function answer(request, body, response) {
     case '/array': return send(response, 200, 'application/json', '[true]');
     case '/text': return send(response, 200, 'text/plain', told);
     case '/stream': return stream(response, 'application/json', '{"success":', 'true}');
-    case '/xml': return send(response, 200, 'application/xml', `<reply method="${request.method}"/>`);
-    case '/xmlstream': return stream(response, 'application/xml', '<reply>', '</reply>');
+    case '/xml': return send(response, 200, 'application/xml', `<response method="${request.method}"/>`);
+    case '/xmlstream': return stream(response, 'application/xml', '<response>', '</response>');
     case '/cookie':
       response.setHeader('Set-Cookie', ['first=1; Path=/', 'session=42; Path=/; HttpOnly']);
       return send(response, 200, 'text/plain', request.headers.cookie || 'none');
@@ -54,7 +54,7 @@ function answer(request, body, response) {
 function serve(request, response) {
   const pieces = [];
   request.on('data', (piece) => pieces.push(piece));
-  request.on('end', () => answer(request, Buffer.concat(pieces).toString(), response));
+  request.on('end', () => respond(request, Buffer.concat(pieces).toString(), response));
 }
 
 function listenTls(port, version, mutual) {

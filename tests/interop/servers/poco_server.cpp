@@ -43,8 +43,8 @@ class Handler : public HTTPRequestHandler {
     if (path == "/moved") return response.redirect("/json");
     if (path == "/stream") return SendStream(response);
     if (path == "/xml") {
-      const std::string reply = "<reply method=\"" + request.getMethod() + "\"/>";
-      return Send(response, reply, "application/xml");
+      const std::string text = "<response method=\"" + request.getMethod() + "\"/>";
+      return Send(response, text, "application/xml");
     }
     const std::string told = request.getMethod() + " " + body;
     if (path == "/text") return Send(response, told, "text/plain");
@@ -52,7 +52,7 @@ class Handler : public HTTPRequestHandler {
   }
 
  private:
-  // Answers after the first 8 bytes; the length that the head announces never comes.
+  // Responds after the first 8 bytes; the length that the head announces never comes.
   static void TakeUpload(HTTPServerRequest& request, HTTPServerResponse& response) {
     char first[8];
     request.stream().read(first, sizeof(first));
