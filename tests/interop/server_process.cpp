@@ -25,6 +25,11 @@ void ReplaceAll(std::string* text, const std::string& from, const std::string& t
   }
 }
 
+std::string WithValues(std::string text, const std::map<std::string, std::string>& values) {
+  for (const auto& [name, value] : values) ReplaceAll(&text, "@" + name + "@", value);
+  return text;
+}
+
 bool Accepts(int port) {
   const int fd = socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0);
   sockaddr_in address = {};
@@ -93,9 +98,8 @@ void ServerProcess::Kill() {
 WebServer::WebServer(const WebServerSetup& setup) : name_(setup.name) {
   mkdir(File("www").c_str(), 0755);
   WriteFile(File("good.pem"), ReadFile(Certificates().File("good")));
-  FillTemplates(setup);
-  std::vector<std::string> command = setup.command;
-  for (std::string& word : command) ReplaceAll(&word, "@CONFIG@", File(setup.templates.front()));
+  WriteFile(File("ca.pem"), ReadFile(Certificates().CaFile()));
+  const std::vector<std::string> command = FillTemplates(setup);
   process_ = std::make_unique<ServerProcess>(command, File("output.log"));
   for (const auto& [port_name, port] : ports_) {
     const int number = port;
@@ -111,7 +115,7 @@ int WebServer::Port(const std::string& name) const {
   return found != ports_.end() ? found->second : -1;
 }
 
-void WebServer::FillTemplates(const WebServerSetup& setup) {
+std::vector<std::string> WebServer::FillTemplates(const WebServerSetup& setup) {
   std::map<std::string, std::string> values = setup.values;
   values["ROOT"] = folder_.Path();
   values["FOLDER"] = TARNWICK_INTEROP_FOLDER;
@@ -121,9 +125,12 @@ void WebServer::FillTemplates(const WebServerSetup& setup) {
     values[port] = std::to_string(ports_[port]);
   }
   for (const std::string& file : setup.templates) {
-    std::string text = ReadFile(std::string(TARNWICK_INTEROP_FOLDER "/servers/") + file);
-    for (const auto& [name, value] : values) ReplaceAll(&text, "@" + name + "@", value);
-    WriteFile(File(file), text);
+    const std::string text = ReadFile(std::string(TARNWICK_INTEROP_FOLDER "/servers/") + file);
+    WriteFile(File(file), WithValues(text, values));
   }
+  if (!setup.templates.empty()) values["CONFIG"] = File(setup.templates.front());
+  std::vector<std::string> command;
+  for (const std::string& word : setup.command) command.push_back(WithValues(word, values));
   for (const int fd : taken) close(fd);
+  return command;
 }

@@ -41,8 +41,8 @@ struct WebServerSetup {
   std::string name;                           // as the table of results shows it
   std::vector<std::string> command;           // @CONFIG@ stands for the configuration file
   std::vector<std::string> templates;         // files of servers/; the first is the configuration
-  std::vector<std::string> ports;             // the names of its ports in the templates
-  std::map<std::string, std::string> values;  // further names of the templates
+  std::vector<std::string> ports;             // the names of its ports in command and templates
+  std::map<std::string, std::string> values;  // further names of command and templates
 };
 
 // A web server, configured from templates in servers/, with a folder of its own. It accepts
@@ -58,7 +58,7 @@ class WebServer {
   std::string File(const std::string& name) const { return folder_.File(name); }
 
  private:
-  void FillTemplates(const WebServerSetup& setup);
+  std::vector<std::string> FillTemplates(const WebServerSetup& setup);
 
   std::string name_;
   TempDir folder_;

@@ -2,21 +2,30 @@
 
 #include <gtest/gtest.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
 namespace {
 
-std::unique_ptr<WebServer> g_apache, g_nginx, g_lighttpd;
+std::vector<std::unique_ptr<WebServer>> g_servers;
 
 class StopServers : public ::testing::Environment {
  public:
   void TearDown() override {
-    g_nginx.reset();  // it asks Apache
-    g_lighttpd.reset();
-    g_apache.reset();
+    while (!g_servers.empty()) g_servers.pop_back();  // some ask those that started before
   }
 };
 
 const auto* const kStopServers = ::testing::AddGlobalTestEnvironment(new StopServers);
+
+// The server of that name, which the first call starts and gives its files.
+WebServer& Running(const WebServerSetup& setup, void (*fill)(const WebServer&) = nullptr) {
+  for (const auto& server : g_servers) {
+    if (server->Name() == setup.name) return *server;
+  }
+  g_servers.push_back(std::make_unique<WebServer>(setup));
+  if (fill != nullptr) fill(*g_servers.back());
+  return *g_servers.back();
+}
 
 void FillNginx(const WebServer& server) {
   mkdir(server.File("www/store").c_str(), 0755);
@@ -27,44 +36,124 @@ void FillNginx(const WebServer& server) {
   WriteFile(server.File("www/large"), large);
 }
 
+// Files in the open and with a login by Basic, and for busybox the programs of the cgi folder.
+void FillSmall(const WebServer& server) {
+  mkdir(server.File("www/basic").c_str(), 0755);
+  for (const char* folder : {"www/", "www/basic/"}) {
+    WriteFile(server.File(folder + std::string("info.json")), "{\"success\":true}");
+  }
+  WriteFile(server.File("www/info.xml"), "<response method=\"GET\"/>");
+  EXPECT_EQ(symlink(TARNWICK_INTEROP_FOLDER "/cgi", server.File("www/cgi-bin").c_str()), 0);
+}
+
+std::string Upstream(const WebServer& server) {
+  return std::to_string(server.Port());
+}
+
 }  // namespace
 
 WebServer& Apache() {
-  if (!g_apache) {
-    g_apache = std::make_unique<WebServer>(
-        WebServerSetup{"Apache httpd",
-                       {"/usr/sbin/apache2", "-D", "FOREGROUND", "-f", "@CONFIG@"},
-                       {"apache.conf"},
-                       {"PORT", "TLS_PORT", "KEEP_PORT"},
-                       {}});
-  }
-  return *g_apache;
+  return Running({"Apache httpd",
+                  {"/usr/sbin/apache2", "-D", "FOREGROUND", "-f", "@CONFIG@"},
+                  {"apache.conf"},
+                  {"PORT", "TLS_PORT", "KEEP_PORT"},
+                  {}});
 }
 
 WebServer& Nginx() {
-  if (!g_nginx) {
-    g_nginx = std::make_unique<WebServer>(
-        WebServerSetup{"nginx",
-                       {"/usr/sbin/nginx", "-c", "@CONFIG@"},
-                       {"nginx.conf", "locations.conf"},
-                       {"PORT", "TLS12_PORT", "TLS13_PORT"},
-                       {{"UPSTREAM_PORT", std::to_string(Apache().Port())}}});
-    FillNginx(*g_nginx);
-  }
-  return *g_nginx;
+  return Running({"nginx",
+                  {"/usr/sbin/nginx", "-c", "@CONFIG@"},
+                  {"nginx.conf", "locations.conf"},
+                  {"PORT", "TLS12_PORT", "TLS13_PORT", "KEEP_PORT"},
+                  {{"UPSTREAM_PORT", Upstream(Apache())}}},
+                 FillNginx);
 }
 
 WebServer& Lighttpd() {
-  if (!g_lighttpd) {
-    g_lighttpd =
-        std::make_unique<WebServer>(WebServerSetup{"lighttpd",
-                                                   {"/usr/sbin/lighttpd", "-D", "-f", "@CONFIG@"},
-                                                   {"lighttpd.conf"},
-                                                   {"PORT", "TLS_PORT"},
-                                                   {}});
-  }
-  return *g_lighttpd;
+  return Running({"lighttpd",
+                  {"/usr/sbin/lighttpd", "-D", "-f", "@CONFIG@"},
+                  {"lighttpd.conf"},
+                  {"PORT", "TLS_PORT", "KEEP_PORT"},
+                  {}});
 }
+
+WebServer& Gsoap() {
+  return Running(
+      {"gSOAP",
+       {TARNWICK_PEERS_FOLDER "/gsoap_server", "@PORT@", "@DIGEST_PORT@", "@CHUNK_PORT@"},
+       {},
+       {"PORT", "DIGEST_PORT", "CHUNK_PORT"},
+       {}});
+}
+
+WebServer& Microhttpd() {
+  return Running(
+      {"libmicrohttpd", {TARNWICK_PEERS_FOLDER "/mhd_server", "@PORT@"}, {}, {"PORT"}, {}});
+}
+
+WebServer& Poco() {
+  return Running({"Poco",
+                  {TARNWICK_PEERS_FOLDER "/poco_server", "@KEEP_PORT@", "@PORT@"},
+                  {},
+                  {"KEEP_PORT", "PORT"},
+                  {}});
+}
+
+WebServer& Node() {
+  return Running({"Node.js",
+                  {"/usr/bin/node", "@FOLDER@/servers/node_server.js", "@ROOT@", "@PORT@",
+                   "@TLS12_PORT@", "@TLS13_PORT@", "@MUTUAL12_PORT@", "@MUTUAL13_PORT@"},
+                  {},
+                  {"PORT", "TLS12_PORT", "TLS13_PORT", "MUTUAL12_PORT", "MUTUAL13_PORT"},
+                  {}});
+}
+
+WebServer& Caddy() {
+  return Running({"Caddy",
+                  {"/usr/bin/env", "HOME=@ROOT@", "/usr/bin/caddy", "run", "--adapter", "caddyfile",
+                   "--config", "@CONFIG@"},
+                  {"Caddyfile"},
+                  {"PORT", "TLS_PORT"},
+                  {{"UPSTREAM_PORT", Upstream(Node())}}},
+                 FillSmall);
+}
+
+WebServer& Haproxy() {
+  return Running({"haproxy",
+                  {"/usr/sbin/haproxy", "-db", "-f", "@CONFIG@"},
+                  {"haproxy.cfg"},
+                  {"PORT", "TLS_PORT", "DOWN_PORT"},
+                  {{"UPSTREAM_PORT", Upstream(Node())}}});
+}
+
+WebServer& Stunnel() {
+  return Running({"stunnel",
+                  {"/usr/bin/stunnel4", "@CONFIG@"},
+                  {"stunnel.conf"},
+                  {"TLS12_PORT", "TLS13_PORT", "MUTUAL13_PORT"},
+                  {{"UPSTREAM_PORT", Upstream(Node())}}});
+}
+
+WebServer& Busybox() {
+  return Running({"busybox httpd",
+                  {"/bin/busybox", "httpd", "-f", "-p", "127.0.0.1:@PORT@", "-h", "@ROOT@/www",
+                   "-c", "@CONFIG@"},
+                  {"busybox.conf"},
+                  {"PORT"},
+                  {}},
+                 FillSmall);
+}
+
+#ifdef TARNWICK_TWCAMSIM
+WebServer& SimulatedCamera() {
+  return Running({"twcamsim",
+                  Runnable({TARNWICK_TWCAMSIM, "--endpoint", "soap,port=@PORT@", "--endpoint",
+                            "soap,port=@DIGEST_PORT@,login=digest"}),
+                  {},
+                  {"PORT", "DIGEST_PORT"},
+                  {}});
+}
+#endif
 
 ClientSettings LoginTo(const Mode& mode, const std::string& path) {
   ClientSettings settings;

@@ -13,6 +13,17 @@
 WebServer& Apache();
 WebServer& Nginx();
 WebServer& Lighttpd();
+WebServer& Gsoap();
+WebServer& Microhttpd();
+WebServer& Poco();
+WebServer& Node();
+WebServer& Caddy();    // asks Node.js
+WebServer& Haproxy();  // the same
+WebServer& Stunnel();  // the same
+WebServer& Busybox();
+#ifdef TARNWICK_TWCAMSIM
+WebServer& SimulatedCamera();
+#endif
 
 inline constexpr char kUser[] = "operator";
 inline constexpr char kPassword[] = "gate-7";
