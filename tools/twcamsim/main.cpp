@@ -10,6 +10,7 @@
 #include <set>
 
 #include "tools/common/json_output.h"
+#include "tools/common/terminal.h"
 #include "tools/twcamsim/arguments.h"
 #include "tools/twcamsim/lists.h"
 #include "tools/twcamsim/server.h"
@@ -20,7 +21,7 @@ constexpr int kFailed = 1;
 constexpr int kUsage = 2;
 
 int Complain(int status, const std::string& text) {
-  fprintf(stderr, "twcamsim: %s\n", text.c_str());
+  PrintError("twcamsim", text);
   return status;
 }
 
