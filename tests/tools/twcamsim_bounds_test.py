@@ -86,10 +86,10 @@ def test_sessions_that_have_ended_go_at_once(camera):
     wait_until(lambda: count() <= before, "the descriptors of the sessions")
 
 
-@pytest.mark.parametrize("text, status", [(b"a\r\n" * 340000, 400), (b"a : b\r\n" * 140000, 200)])
-def test_a_head_of_many_lines_is_answered(camera, text, status):
+@pytest.mark.parametrize("text, count, status", [("a\r\n", 340000, 400), ("a : b\r\n", 140000, 200)])
+def test_a_head_of_many_lines_is_answered(camera, text, count, status):
     running = camera("-e", "json")
-    seen = running.ask(b"GET /info.json HTTP/1.0\r\n" + text + b"\r\n")
+    seen = running.ask(b"GET /info.json HTTP/1.0\r\n" + text.encode() * count + b"\r\n")
     assert status_of(seen.bytes) == status
 
 
