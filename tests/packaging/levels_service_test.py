@@ -67,6 +67,18 @@ def test_a_second_start_takes_the_saved_levels_again():
     assert "debug2" in next(l for l in twlogctl("status").splitlines() if "camera" in l)
 
 
+def test_a_record_that_another_user_made_first_makes_the_unit_fail_and_say_whose_it_is():
+    words = ["setpriv", "--reuid=65534", "--regid=65534", "--clear-groups"]
+    made = subprocess.run([*words, TWLOGCTL, "create"], capture_output=True, check=False)
+    if made.returncode != 0:
+        pytest.skip("there is no other user here, or the tool is out of that user's reach")
+    may_fail, create = next(commands())
+    done = subprocess.run(create, capture_output=True, text=True, timeout=HANG, check=False)
+    assert not may_fail
+    assert (done.returncode, done.stdout) == (1, "")
+    assert "there is a record already, made or owned by nobody, " in done.stderr
+
+
 def test_running_writers_do_not_keep_it_from_its_work(start_writers):
     save_level()
     writers = start_writers()

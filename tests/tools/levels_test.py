@@ -173,7 +173,7 @@ def test_status_names_the_processes_that_have_the_record(ctl, record):
 
 def test_a_level_without_a_name_is_shown_as_its_number(ctl, record):
     record.set_level(HTTP, 12)
-    assert "http           12\n" in ctl("status").stdout
+    assert "http           12, out of range\n" in ctl("status").stdout
 
 
 def test_status_on_a_terminal_is_coloured_unless_no_color_is_set(spawn, record):

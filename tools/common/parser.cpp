@@ -5,6 +5,7 @@
 #include <vector>
 
 #include "tarnwick/version.h"
+#include "tools/common/terminal.h"
 #include "tools/common/words.h"
 
 namespace {
@@ -50,8 +51,7 @@ std::optional<int> ParseArguments(CLI::App* app, int argc, char** argv) try {
 } catch (const CLI::ParseError& error) {
   if (error.get_exit_code() == static_cast<int>(CLI::ExitCodes::Success)) return app->exit(error);
   const std::string unknown = UnknownCommand(*app, argc, argv);
-  fprintf(stderr, "%s: %s\n%s: try \"%s --help\"\n", app->get_name().c_str(),
-          unknown.empty() ? error.what() : unknown.c_str(), app->get_name().c_str(),
-          NameWithCommand(*app).c_str());
+  PrintError(app->get_name(), unknown.empty() ? error.what() : unknown);
+  PrintError(app->get_name(), "try \"" + NameWithCommand(*app) + " --help\"");
   return 2;
 }

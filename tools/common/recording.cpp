@@ -1,40 +1,26 @@
 #include "tools/common/recording.h"
 
+#include <fcntl.h>
 #include <json/reader.h>
 #include <json/value.h>
 
 #include <cerrno>
 #include <cstdio>
 #include <cstring>
-#include <filesystem>
-#include <fstream>
-#include <iterator>
 #include <memory>
+#include <sstream>
 
 #include "tools/common/json_output.h"
+#include "tools/common/private_file.h"
 
 namespace {
 
 constexpr char kIndex[] = "exchanges.jsonl";
 
-bool Fail(std::string* error, const std::string& path) {
-  *error = path + ": " + std::strerror(errno);
-  return false;
-}
-
-bool WriteBytes(const std::string& path, const std::string& bytes, std::string* error) {
-  std::ofstream file(path, std::ios::binary | std::ios::trunc);
-  file.write(bytes.data(), static_cast<std::streamsize>(bytes.size()));
-  file.close();
-  return file ? true : Fail(error, path);
-}
-
-bool ReadBytes(const std::string& path, std::string* bytes, std::string* error) {
-  std::ifstream file(path, std::ios::binary);
-  if (!file) return Fail(error, path);
-  bytes->assign(std::istreambuf_iterator<char>(file), {});
-  return true;
-}
+// What a recording may hold: one of a stranger must not fill the memory, nor name a device that has
+// no end, nor wait for years.
+constexpr size_t kMostBytes = size_t{256} << 20;
+constexpr int64_t kLongestDelay = 86400000;
 
 std::string FileName(int number, const char* kind) {
   char name[32];
@@ -73,31 +59,42 @@ bool IsKnownEnd(const std::string& end) {
 }
 
 // The bytes of the file that the member names. A recording may come from a stranger.
-bool ReadNamed(const std::string& folder, const Json::Value& line, const char* member,
+bool ReadNamed(const OwnedFd& folder, const Json::Value& line, const char* member,
                std::string* bytes, std::string* error) {
   const std::string name = line.get(member, "").asString();
-  if (name.empty() || name.find('/') != std::string::npos || name == "..") {
+  if (name.empty() || name.find('/') != std::string::npos || name == ".." ||
+      name.find('\0') != std::string::npos) {
     *error = std::string("\"") + member + "\" is no name of a file in the folder";
     return false;
   }
-  return ReadBytes(folder + "/" + name, bytes, error);
+  return ReadRegularFile(folder, name, kMostBytes, bytes, error);
+}
+
+bool IsDelay(int64_t delayMs) {
+  return delayMs >= 0 && delayMs <= kLongestDelay;
 }
 
 bool ReadPieces(const Json::Value& line, RecordedExchange* exchange, std::string* error) {
-  size_t total = 0;
+  size_t left = exchange->response.size();
   for (const Json::Value& entry : line["pieces"]) {
     RecordedPiece piece;
     piece.delayMs = entry.get("delay_ms", 0).asInt64();
-    piece.bytes = static_cast<size_t>(entry.get("bytes", 0).asUInt64());
-    total += piece.bytes;
+    const uint64_t bytes = entry.get("bytes", 0).asUInt64();
+    if (!IsDelay(piece.delayMs)) {
+      *error = "a delay is not between none and a day";
+      return false;
+    }
+    if (bytes > left) break;
+    piece.bytes = static_cast<size_t>(bytes);
+    left -= piece.bytes;
     exchange->pieces.push_back(piece);
   }
-  if (total == exchange->response.size()) return true;
+  if (left == 0 && exchange->pieces.size() == line["pieces"].size()) return true;
   *error = "the pieces are not as long as the response";
   return false;
 }
 
-bool ReadExchange(const std::string& folder, const Json::Value& line, RecordedExchange* exchange,
+bool ReadExchange(const OwnedFd& folder, const Json::Value& line, RecordedExchange* exchange,
                   std::string* error) {
   exchange->number = line.get("number", 0).asInt();
   exchange->connection = line.get("connection", exchange->number).asInt();
@@ -112,12 +109,16 @@ bool ReadExchange(const std::string& folder, const Json::Value& line, RecordedEx
     *error = "\"end\" is none of the known ends";
     return false;
   }
+  if (!IsDelay(exchange->endDelayMs)) {
+    *error = "\"end_delay_ms\" is not between none and a day";
+    return false;
+  }
   return ReadNamed(folder, line, "request", &exchange->request, error) &&
          ReadNamed(folder, line, "response", &exchange->response, error) &&
          ReadPieces(line, exchange, error);
 }
 
-bool ParseLine(const std::string& folder, const std::string& text, RecordedExchange* exchange,
+bool ParseLine(const OwnedFd& folder, const std::string& text, RecordedExchange* exchange,
                std::string* error) {
   const std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
   Json::Value line;
@@ -133,38 +134,51 @@ bool ParseLine(const std::string& folder, const std::string& text, RecordedExcha
 
 bool WriteRecording(const std::string& folder, const std::vector<RecordedExchange>& exchanges,
                     std::string* error) {
-  std::error_code code;
-  std::filesystem::create_directories(folder, code);
-  if (code) {
-    *error = folder + ": " + code.message();
-    return false;
-  }
+  const OwnedFd opened = OpenPrivateFolder(folder, error);
+  if (!opened.Valid()) return false;
   std::string index;
+  bool written = true;
   for (const RecordedExchange& exchange : exchanges) {
-    const std::string base = folder + "/";
-    if (!WriteBytes(base + FileName(exchange.number, "request"), exchange.request, error) ||
-        !WriteBytes(base + FileName(exchange.number, "response"), exchange.response, error)) {
-      return false;
-    }
+    written =
+        written &&
+        WritePrivateFile(opened, FileName(exchange.number, "request"), exchange.request, error) &&
+        WritePrivateFile(opened, FileName(exchange.number, "response"), exchange.response, error);
     index += CompactJson(IndexLine(exchange)) + "\n";
   }
-  return WriteBytes(folder + "/" + kIndex, index, error);
+  if (written && WritePrivateFile(opened, kIndex, index, error)) return true;
+  *error = folder + "/" + *error;
+  return false;
 }
 
 bool ReadRecording(const std::string& folder, std::vector<RecordedExchange>* exchanges,
                    std::string* error) {
-  std::ifstream index(folder + "/" + kIndex);
-  if (!index) return Fail(error, folder + "/" + kIndex);
+  const OwnedFd opened(open(folder.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+  if (!opened.Valid()) {
+    *error = folder + "/" + kIndex + ": " + std::strerror(errno);
+    return false;
+  }
+  std::string text;
+  if (!ReadRegularFile(opened, kIndex, kMostBytes, &text, error)) {
+    *error = folder + "/" + *error;
+    return false;
+  }
+  std::istringstream index(text);
+  size_t total = 0;
   int number = 0;
-  for (std::string text; std::getline(index, text);) {
+  for (std::string line; std::getline(index, line);) {
     ++number;
-    if (text.empty()) continue;
+    if (line.empty()) continue;
     RecordedExchange exchange;
     bool read = false;
     try {
-      read = ParseLine(folder, text, &exchange, error);
+      read = ParseLine(opened, line, &exchange, error);
     } catch (const Json::Exception& exception) {  // a member of another kind
       *error = exception.what();
+    }
+    total += exchange.request.size() + exchange.response.size();
+    if (read && total > kMostBytes) {
+      *error = "the recording is larger than 256 MiB";
+      read = false;
     }
     if (!read) {
       *error = std::string(kIndex) + ":" + std::to_string(number) + ": " + *error;

@@ -10,8 +10,8 @@
 //
 //   connection    counts from 1; exchanges of one number went over one connection, one after
 //                 another
-//   request       as it was sent; the values of Authorization and Cookie lines may be masked, so
-//                 its length is no more than near the real one
+//   request       as it was sent; logins, cookies and secrets of its query may be masked, so its
+//                 length is no more than near the real one
 //   pieces        how the response arrived: each so many milliseconds after the one before it, the
 //                 first after the last byte of the request; together they are the response file
 //   end           what became of the connection behind the last piece: "close" (the server closed
@@ -51,14 +51,15 @@ struct RecordedExchange {
   int64_t endDelayMs = 0;
 };
 
-// Writes `exchanges` into `folder`, which is created when missing; files of an earlier recording
-// are replaced.
+// Writes `exchanges` into `folder`, which is created when missing, for the caller alone; files of an
+// earlier recording are replaced. A link, or a folder of another user, is refused.
 // Results: false with the reason in `error`.
 bool WriteRecording(const std::string& folder, const std::vector<RecordedExchange>& exchanges,
                     std::string* error);
 
-// Reads a recording. A name of a file that leads out of the folder, an unknown end, and pieces that
-// do not add up to the response are errors.
+// Reads a recording. A name of a file that leads out of the folder, a link or anything else that is
+// no regular file, an unknown end, a delay of more than a day, pieces that do not add up to the
+// response, and more than 256 MiB are errors.
 // Results: false with the reason in `error`; `exchanges` is then to be thrown away.
 bool ReadRecording(const std::string& folder, std::vector<RecordedExchange>* exchanges,
                    std::string* error);

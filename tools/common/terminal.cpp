@@ -3,9 +3,11 @@
 #include <sys/ioctl.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <iterator>
 
 #include "tools/common/utf8.h"
 
@@ -33,6 +35,35 @@ const char* CodeOf(Colour colour) {
       return "\x1b[1m";
   }
   return "";
+}
+
+struct Range {
+  char32_t first;
+  char32_t last;
+};
+
+// Characters of Unicode 15 that change the direction of what stands around them, and those that
+// have neither width nor shape: the soft hyphen, marks and isolates of direction, joiners, line and
+// paragraph separators, byte order mark, annotations, tags.
+constexpr Range kHidden[] = {
+    {0x00AD, 0x00AD}, {0x061C, 0x061C}, {0x180E, 0x180E}, {0x200B, 0x200F},   {0x2028, 0x202E},
+    {0x2060, 0x206F}, {0xFEFF, 0xFEFF}, {0xFFF9, 0xFFFB}, {0xE0000, 0xE007F},
+};
+
+// REQUIRES: valid UTF-8, one character.
+char32_t CodePoint(std::string_view character) {
+  constexpr unsigned char kLeadBits[] = {0, 0x7F, 0x1F, 0x0F, 0x07};
+  char32_t code = static_cast<unsigned char>(character[0]) & kLeadBits[character.size()];
+  for (const char byte : character.substr(1)) {
+    code = code << 6 | (static_cast<unsigned char>(byte) & 0x3F);
+  }
+  return code;
+}
+
+bool IsHidden(char32_t code) {
+  return std::any_of(std::begin(kHidden), std::end(kHidden), [code](const Range& range) {
+    return code >= range.first && code <= range.last;
+  });
 }
 
 // Terminals take U+0080 to U+009F for control sequences as well.
@@ -63,10 +94,17 @@ void AppendEscaped(char byte, std::string* result) {
   result->append(text);
 }
 
-bool IsPlain(std::string_view character) {
+void AppendHidden(char32_t code, std::string* result) {
+  char text[16];
+  snprintf(text, sizeof(text), "\\u%04X", static_cast<unsigned>(code));
+  result->append(text);
+}
+
+bool IsPlain(std::string_view character, Backslash backslash) {
   const char first = character[0];
   if (character.size() > 1) return !IsC1Control(character);
-  return first >= ' ' && first != '\x7F' && first != '\\';
+  if (first == '\\') return backslash == Backslash::kKept;
+  return first >= ' ' && first != '\x7F';
 }
 
 }  // namespace
@@ -96,13 +134,15 @@ int TerminalWidth(int fd) {
   return 80;
 }
 
-std::string EscapeControls(std::string_view text) {
+std::string EscapeControls(std::string_view text, Backslash backslash) {
   std::string result;
   result.reserve(text.size());
   while (!text.empty()) {
     const size_t length = Utf8CharacterLength(text);
     const std::string_view character = text.substr(0, length == 0 ? 1 : length);
-    if (length > 0 && IsPlain(character)) {
+    if (length > 1 && IsHidden(CodePoint(character))) {
+      AppendHidden(CodePoint(character), &result);
+    } else if (length > 0 && IsPlain(character, backslash)) {
       result.append(character);
     } else {
       for (const char byte : character) AppendEscaped(byte, &result);
@@ -110,4 +150,10 @@ std::string EscapeControls(std::string_view text) {
     text.remove_prefix(character.size());
   }
   return result;
+}
+
+void PrintError(std::string_view program, std::string_view text) {
+  const std::string line =
+      EscapeControls(program) + ": " + EscapeControls(text, Backslash::kKept) + "\n";
+  fputs(line.c_str(), stderr);
 }

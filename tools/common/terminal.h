@@ -20,8 +20,16 @@ std::string Paint(Colour colour, std::string_view text, bool enabled);
 // Columns of the terminal behind `fd`; 80 when it is none or does not tell.
 int TerminalWidth(int fd);
 
+enum class Backslash { kDoubled, kKept };
+
 // `text` with every control byte, and every byte that is not part of valid UTF-8, written as \n,
-// \r, \t or \xNN, and a backslash doubled: what a peer sent cannot move the cursor.
-std::string EscapeControls(std::string_view text);
+// \r, \t or \xNN, and every character that turns the direction of text or shows as nothing as
+// \uNNNN: what a peer or another user wrote can neither move the cursor nor show in another order
+// than it has. A backslash is doubled, so that the text can be told from what stands for bytes; it
+// is kept in commands, where it has a meaning, and in messages that may have been escaped already.
+std::string EscapeControls(std::string_view text, Backslash backslash = Backslash::kDoubled);
+
+// "program: text" on standard error, escaped, with kept backslashes.
+void PrintError(std::string_view program, std::string_view text);
 
 #endif  // TARNWICK_TOOLS_COMMON_TERMINAL_H_

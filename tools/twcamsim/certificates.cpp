@@ -1,6 +1,7 @@
 #include "tools/twcamsim/certificates.h"
 
 #include <arpa/inet.h>
+#include <fcntl.h>
 #include <openssl/err.h>
 #include <openssl/evp.h>
 #include <openssl/pem.h>
@@ -9,6 +10,8 @@
 
 #include <cerrno>
 #include <cstring>
+
+#include "tools/common/private_file.h"
 
 namespace {
 
@@ -177,7 +180,11 @@ bool Certificates::Make(const std::set<std::string>& hosts, std::string* error) 
 }
 
 bool Certificates::WriteAuthority(const std::string& path, std::string* error) const {
-  FILE* file = std::fopen(path.c_str(), "we");
+  OwnedFd fd =
+      OpenOwnFile(path, O_WRONLY | O_TRUNC, 0644, error);  // clients of other users read it
+  if (!fd.Valid()) return false;
+  FILE* file = fdopen(fd.Get(), "w");
+  if (file) fd.Release();
   bool good = file && PEM_write_X509(file, impl_->own.certificate.get()) == 1;
   if (file) good = std::fclose(file) == 0 && good;
   if (!good) *error = path + ": " + std::strerror(errno);

@@ -1,10 +1,13 @@
 #include "tools/twcamsim/journal.h"
 
+#include <fcntl.h>
 #include <sys/time.h>
 
 #include <cerrno>
 #include <cstring>
 #include <ctime>
+
+#include "tools/common/private_file.h"
 
 Journal::~Journal() {
   if (file_ && file_ != stdout) std::fclose(file_);
@@ -12,9 +15,19 @@ Journal::~Journal() {
 
 bool Journal::Open(const std::string& path, std::string* error) {
   if (path.empty()) return true;
-  file_ = path == "-" ? stdout : std::fopen(path.c_str(), "ae");
-  if (!file_) *error = path + ": " + std::strerror(errno);
-  return file_ != nullptr;
+  if (path == "-") {
+    file_ = stdout;
+    return true;
+  }
+  OwnedFd fd = OpenOwnFile(path, O_WRONLY | O_APPEND, 0600, error);
+  if (!fd.Valid()) return false;
+  file_ = fdopen(fd.Get(), "a");
+  if (!file_) {
+    *error = path + ": " + std::strerror(errno);
+    return false;
+  }
+  fd.Release();
+  return true;
 }
 
 void Journal::Write(const std::string& line) {

@@ -5,11 +5,13 @@
 #include <cerrno>
 #include <cstdio>
 #include <cstring>
+#include <exception>
 #include <filesystem>
 #include <random>
 #include <set>
 
 #include "tools/common/json_output.h"
+#include "tools/common/terminal.h"
 #include "tools/twcamsim/arguments.h"
 #include "tools/twcamsim/lists.h"
 #include "tools/twcamsim/server.h"
@@ -20,7 +22,7 @@ constexpr int kFailed = 1;
 constexpr int kUsage = 2;
 
 int Complain(int status, const std::string& text) {
-  fprintf(stderr, "twcamsim: %s\n", text.c_str());
+  PrintError("twcamsim", text);
   return status;
 }
 
@@ -40,10 +42,9 @@ class Folder {
     path_ = wish;
     std::error_code code;
     if (wish.empty()) {
-      std::string name = std::filesystem::temp_directory_path(code).string() + "/twcamsim.XXXXXX";
-      temporary_ = mkdtemp(name.data()) != nullptr;
-      path_ = name;
-      if (!temporary_) code = std::error_code(errno, std::generic_category());
+      path_ = std::filesystem::temp_directory_path(code).string();
+      if (code) path_ = "the directory for temporary files (TMPDIR)";
+      if (!code) MakeTemporary(&code);
     } else {
       std::filesystem::create_directories(wish, code);
     }
@@ -54,6 +55,12 @@ class Folder {
   const std::string& Path() const { return path_; }
 
  private:
+  void MakeTemporary(std::error_code* code) {
+    path_ += "/twcamsim.XXXXXX";
+    temporary_ = mkdtemp(path_.data()) != nullptr;
+    if (!temporary_) *code = std::error_code(errno, std::generic_category());
+  }
+
   std::string path_;
   bool temporary_ = false;
 };
@@ -74,6 +81,17 @@ bool PrepareWorld(const Arguments& arguments, World* world, std::string* error) 
          world->access.Open(arguments.access, error);
 }
 
+// A simulated camera takes what it gets, from whoever reaches it, and its passwords stand in its
+// manual page.
+void WarnOfNetwork(const std::vector<std::unique_ptr<Endpoint>>& endpoints) {
+  for (const auto& endpoint : endpoints) {
+    if (endpoint->host.compare(0, 4, "127.") == 0) continue;
+    Complain(0, "WARNING: " + endpoint->name + " listens at " + endpoint->host +
+                    ", not on the loopback interface alone: whoever reaches this machine can use"
+                    " it, and it is made to misbehave");
+  }
+}
+
 int Serve(const Arguments& arguments, std::vector<std::unique_ptr<Endpoint>> endpoints) {
   World world;
   Folder folder;
@@ -83,6 +101,7 @@ int Serve(const Arguments& arguments, std::vector<std::unique_ptr<Endpoint>> end
   report["seed"] = static_cast<Json::UInt64>(world.seed);
   report["pid"] = getpid();
   const std::set<std::string> hosts = TlsHosts(endpoints);
+  WarnOfNetwork(endpoints);
   if (!hosts.empty()) {
     if (!folder.Make(arguments.dir, &error) || !world.certificates.Make(hosts, &error) ||
         !world.certificates.WriteAuthority(folder.Path() + "/ca.pem", &error)) {
@@ -100,7 +119,7 @@ int Serve(const Arguments& arguments, std::vector<std::unique_ptr<Endpoint>> end
 
 }  // namespace
 
-int main(int argc, char** argv) {
+int main(int argc, char** argv) try {
   Arguments arguments;
   if (const std::optional<int> status = ParseArguments(argc, argv, &arguments)) return *status;
   if (arguments.list_faults) return ListFaults(arguments.json) ? 0 : kFailed;
@@ -110,4 +129,6 @@ int main(int argc, char** argv) {
   std::string error;
   if (!MakeEndpoints(arguments, &endpoints, &error)) return Complain(kUsage, error);
   return Serve(arguments, std::move(endpoints));
+} catch (const std::exception& error) {  // memory ran out, or the like
+  return Complain(kFailed, error.what());
 }

@@ -4,6 +4,8 @@
 #include <boost/beast/http/parser.hpp>
 #include <boost/beast/http/string_body.hpp>
 #include <limits>
+#include <string_view>
+#include <utility>
 
 namespace beast = boost::beast;
 namespace http = boost::beast::http;
@@ -13,12 +15,6 @@ namespace {
 constexpr size_t kMostHead = 1 << 20;
 constexpr int64_t kMostBody = 64 << 20;
 
-// The size of the head, its blank line included; npos when that has not come.
-size_t HeadSize(const std::string& bytes) {
-  const size_t end = bytes.find("\r\n\r\n");
-  return end == std::string::npos ? end : end + 4;
-}
-
 // A client of TLS waits for its answer, so that its blank line would never come.
 bool MayBecomeHead(const std::string& bytes, std::string* complaint) {
   if (bytes.size() > kMostHead) *complaint = "the head is longer than 1 MiB";
@@ -27,19 +23,25 @@ bool MayBecomeHead(const std::string& bytes, std::string* complaint) {
 }
 
 // Clients in the field put a blank in front of a colon, which the parser refuses. Takes it out of
-// the header lines and tells whether there was one.
+// the header lines and tells whether there was one. One pass: a head has up to 1 MiB of lines.
 bool RemoveBlanksBeforeColons(std::string* head) {
+  std::string cleaned;
+  cleaned.reserve(head->size());
   bool found = false;
-  for (size_t line = head->find("\r\n"); line != std::string::npos;
-       line = head->find("\r\n", line + 2)) {
-    const size_t colon = head->find(':', line);
-    const size_t end = head->find("\r\n", line + 2);
-    if (colon == std::string::npos || colon > end) continue;
-    const size_t name = head->find_last_not_of(" \t", colon - 1);
-    if (name + 1 == colon || name <= line + 1) continue;
-    head->erase(name + 1, colon - name - 1);
-    found = true;
+  for (size_t line = 0; line < head->size();) {
+    const size_t end = std::min(head->find("\r\n", line), head->size());
+    const std::string_view text = std::string_view(*head).substr(line, end - line);
+    const size_t colon = line == 0 ? std::string_view::npos : text.find(':');
+    const size_t name = text.substr(0, std::min(colon, text.size())).find_last_not_of(" \t");
+    const bool blank =
+        colon != std::string_view::npos && name != std::string_view::npos && name + 1 < colon;
+    cleaned.append(text.substr(0, blank ? name + 1 : 0)).append(text.substr(blank ? colon : 0));
+    const size_t next = std::min(end + 2, head->size());
+    cleaned.append(*head, end, next - end);
+    found = found || blank;
+    line = next;
   }
+  if (found) *head = std::move(cleaned);
   return found;
 }
 
@@ -84,10 +86,28 @@ struct RequestReader::Parser {
   http::request_parser<http::string_body> parser;
 };
 
-RequestReader::RequestReader(Link* link, const Behaviour& behaviour, Milliseconds limit)
-    : link_(link), behaviour_(behaviour), limit_(limit) {}
+RequestReader::RequestReader(Link* link, const Behaviour& behaviour, Milliseconds limit,
+                             MemoryBudget* budget)
+    : link_(link), behaviour_(behaviour), limit_(limit), budget_(budget) {}
 
-RequestReader::~RequestReader() = default;
+RequestReader::~RequestReader() {
+  budget_->Give(held_);
+}
+
+// The size of the head, its blank line included; npos when that has not come. What was searched is
+// not searched again: a client may send its head byte by byte.
+size_t RequestReader::HeadSize() {
+  const size_t end = pending_.find("\r\n\r\n", searched_);
+  if (end != std::string::npos) return end + 4;
+  searched_ = pending_.size() < 3 ? 0 : pending_.size() - 3;
+  return end;
+}
+
+void RequestReader::Release() {
+  parser_.reset();
+  budget_->Give(held_ - pending_.size());
+  held_ = pending_.size();
+}
 
 Io RequestReader::ReadMore() {
   size_t most = 65536;
@@ -103,12 +123,22 @@ Io RequestReader::ReadMore() {
   }
   const size_t before = pending_.size();
   result_ = link_->Read(&pending_, most, limit_);
-  taken_ += static_cast<int64_t>(pending_.size() - before);
-  return result_;
+  const size_t got = pending_.size() - before;
+  taken_ += static_cast<int64_t>(got);
+  full_ = !budget_->Take(got);
+  if (!full_) {
+    held_ += got;
+    return result_;
+  }
+  pending_.resize(before);
+  return result_ = Io::kError;
 }
 
 Reading RequestReader::ReadHead(Request* request) {
-  while (HeadSize(pending_) == std::string::npos) {
+  Release();
+  searched_ = 0;
+  size_t size = HeadSize();
+  for (; size == std::string::npos; size = HeadSize()) {
     if (behaviour_.request_limit >= 0 && taken_ >= behaviour_.request_limit) {
       request->head = pending_;
       return Reading::kLimit;
@@ -116,10 +146,10 @@ Reading RequestReader::ReadHead(Request* request) {
     if (!MayBecomeHead(pending_, &request->sloppy)) return Reading::kBad;
     if (ReadMore() != Io::kDone) {
       request->head = pending_;
+      if (full_) return Reading::kFull;
       return pending_.empty() ? Reading::kNothing : Reading::kBroken;
     }
   }
-  const size_t size = HeadSize(pending_);
   request->head = pending_.substr(0, size);
   pending_.erase(0, size);
   return Parse(request);
@@ -170,13 +200,16 @@ Reading RequestReader::ReadBody(Request* request) {
       return Reading::kBad;
     }
   }
-  request->body = parser.get().body();
-  return parser.is_done() ? Reading::kDone : Reading::kBroken;
+  const bool done = parser.is_done();
+  request->body = std::move(parser.get().body());
+  if (full_) return Reading::kFull;
+  return done ? Reading::kDone : Reading::kBroken;
 }
 
 Io RequestReader::ReadStream(std::string* bytes) {
   if (pending_.empty() && ReadMore() != Io::kDone) return result_;
   bytes->append(pending_);
   pending_.clear();
+  Release();
   return Io::kDone;
 }

@@ -8,6 +8,7 @@
 
 #include "tools/twcamsim/behaviour.h"
 #include "tools/twcamsim/link.h"
+#include "tools/twcamsim/memory_budget.h"
 #include "tools/twcamsim/request.h"
 
 enum class Reading {
@@ -15,6 +16,7 @@ enum class Reading {
   kNothing,  // the peer ended the connection between two requests
   kBroken,   // it did so inside of one, or the connection failed; Result tells
   kBad,      // what came is no HTTP; the request's `sloppy` tells
+  kFull,     // all connections together hold as much as they may
   kLimit,    // the behaviour's limit is reached
 };
 
@@ -23,10 +25,10 @@ class RequestReader {
  public:
   using Milliseconds = std::chrono::milliseconds;
 
-  RequestReader(Link* link, const Behaviour& behaviour, Milliseconds limit);
+  RequestReader(Link* link, const Behaviour& behaviour, Milliseconds limit, MemoryBudget* budget);
   ~RequestReader();
 
-  // Reads up to the blank line.
+  // Reads up to the blank line. What the request before held is given back to the budget.
   Reading ReadHead(Request* request);
 
   // Reads the body that the head announces, chunks decoded.
@@ -42,6 +44,8 @@ class RequestReader {
   struct Parser;
 
   Io ReadMore();
+  void Release();
+  size_t HeadSize();
   Reading Parse(Request* request);
 
   Link* link_;
@@ -49,7 +53,11 @@ class RequestReader {
   const Milliseconds limit_;
   Io result_ = Io::kDone;
   std::string pending_;  // came, and belongs to nothing yet
+  size_t searched_ = 0;  // of pending_, for the end of the head
   int64_t taken_ = 0;    // of the behaviour's limit
+  MemoryBudget* budget_;
+  size_t held_ = 0;  // of the budget
+  bool full_ = false;
   std::unique_ptr<Parser> parser_;
 };
 

@@ -4,6 +4,7 @@
 
 #include <boost/asio/io_context.hpp>
 #include <boost/asio/ip/tcp.hpp>
+#include <boost/asio/post.hpp>
 #include <boost/asio/signal_set.hpp>
 #include <boost/asio/steady_timer.hpp>
 #include <boost/system/system_error.hpp>
@@ -157,7 +158,10 @@ void Server::Impl::Begin(Endpoint* endpoint, tcp::socket socket) {
   Served& one = served.emplace_back();
   try {
     one.session = std::make_unique<Session>(world, endpoint, fd, number);
-    one.thread = std::thread([session = one.session.get()] { session->Run(); });
+    one.thread = std::thread([this, session = one.session.get()] {
+      session->Run();
+      asio::post(io, [this] { Reap(); });
+    });
   } catch (const std::system_error&) {  // no thread is left: the client's connection closes
     served.pop_back();
   } catch (const boost::system::system_error&) {  // no descriptor is, for what a session needs

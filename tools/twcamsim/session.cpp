@@ -4,6 +4,9 @@
 
 namespace {
 
+// Of one connection in the journal.
+constexpr size_t kMostNoted = size_t{4} << 20;
+
 const char* EndName(Io result) {
   switch (result) {
     case Io::kEnd:
@@ -55,7 +58,7 @@ Session::Session(World* world, Endpoint* endpoint, int fd, int number)
       link_(fd),
       random_(world->seed, static_cast<uint64_t>(endpoint->index), static_cast<uint64_t>(number)),
       behaviour_(BehaviourOf(endpoint->faults, &random_)),
-      reader_(&link_, behaviour_, world->idle),
+      reader_(&link_, behaviour_, world->idle, &world->budget),
       start_(std::chrono::steady_clock::now()),
       record_(Json::objectValue) {
   record_["time"] = TimeText();
@@ -124,7 +127,14 @@ bool Session::Hold() {
   return End(link_.HoldUntilPeerLeaves(world_->hold));
 }
 
+// A client that keeps its connection may send requests for days, and the record is written at the
+// end.
 void Session::NoteRequest(const Request& request, const Verdict& verdict) {
+  if (!world_->journal.IsOpen()) return;
+  if (noted_ > kMostNoted) {
+    ++unnoted_;
+    return;
+  }
   Json::Value entry(Json::objectValue);
   entry["method"] = request.method;
   entry["target"] = request.target;
@@ -134,12 +144,14 @@ void Session::NoteRequest(const Request& request, const Verdict& verdict) {
   if (!request.sloppy.empty()) entry["sloppy"] = request.sloppy;
   if (!verdict.scheme.empty()) entry["login"] = LoginRecord(verdict);
   record_["requests"].append(entry);
+  constexpr size_t kOverhead = 1024;
+  noted_ += kOverhead + entry["head"].asString().size() + entry["body"].asString().size();
 }
 
 void Session::NoteAnswer(const Request& request, const Wire& wire) {
   const std::string status = StatusOf(wire);
   Json::Value& requests = record_["requests"];
-  if (!requests.empty()) requests[requests.size() - 1]["status"] = status;
+  if (!requests.empty() && unnoted_ == 0) requests[requests.size() - 1]["status"] = status;
   const auto word = [](const std::string& text) { return text.empty() ? "-" : text; };
   world_->access.Write(word(request.method) + " " + word(request.path) + " " + word(status));
 }
@@ -148,6 +160,7 @@ void Session::WriteRecord() {
   record_["tls"] = link_.TlsVersion();
   Json::Value& faults = record_["faults"] = Json::Value(Json::arrayValue);
   for (const std::string& fault : faults_) faults.append(fault);
+  if (unnoted_ > 0) record_["more_requests"] = static_cast<Json::UInt64>(unnoted_);
   record_["bytes_in"] = static_cast<Json::UInt64>(link_.BytesIn());
   record_["bytes_out"] = static_cast<Json::UInt64>(link_.BytesOut());
   const auto span = std::chrono::steady_clock::now() - start_;

@@ -25,6 +25,7 @@ struct World {
   Certificates certificates;
   Journal journal;
   Journal access;
+  MemoryBudget budget;
 };
 
 // What the faults of an endpoint make of a connection.
@@ -50,7 +51,7 @@ class Session {
   // One request and its answer; false when the connection is over.
   bool ServeOne();
   bool TakeRequest(Request* request);
-  bool RefuseBad(const Request& request);
+  bool Refuse(const Request& request, int status, const std::string& text);
   bool BeforeAnswer();
   Response MakeAnswer(const Request& request, const LoginStyle& style, const Verdict& verdict);
   Response Refuse(const LoginStyle& style, const Verdict& verdict);
@@ -90,6 +91,8 @@ class Session {
   std::chrono::steady_clock::time_point start_;
   std::string end_;
   std::set<std::string> faults_;
+  size_t noted_ = 0;    // bytes of requests in the record
+  size_t unnoted_ = 0;  // requests behind those
   Json::Value record_;
 };
 

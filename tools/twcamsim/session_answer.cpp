@@ -19,7 +19,9 @@ bool Session::TakeRequest(Request* request) {
   if (!request->head.empty()) NoteRequest(*request, Verdict());
   switch (reading) {
     case Reading::kBad:
-      return RefuseBad(*request);
+      return Refuse(*request, 400, "Bad request: " + request->sloppy + "\n");
+    case Reading::kFull:
+      return Refuse(*request, 503, "All connections together hold 80 MiB of requests\n");
     case Reading::kLimit:
       return CloseNow();
     default:
@@ -27,8 +29,8 @@ bool Session::TakeRequest(Request* request) {
   }
 }
 
-bool Session::RefuseBad(const Request& request) {
-  Response response = MakeResponse(400, "text/plain", "Bad request: " + request.sloppy + "\n");
+bool Session::Refuse(const Request& request, int status, const std::string& text) {
+  Response response = MakeResponse(status, "text/plain", text);
   response.close = true;
   const Wire wire = RenderResponse(response, request);
   NoteAnswer(request, wire);

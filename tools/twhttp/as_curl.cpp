@@ -5,19 +5,11 @@
 #include <algorithm>
 
 #include "tarnwick/http/query_encoding.h"
+#include "tools/common/shell.h"
 
 namespace {
 
 constexpr char kAgent[] = "Quenrith Tarnwick";
-
-std::string ShellWord(const std::string& text) {
-  const std::string plain =
-      "abcdefghijklmnopqrstuvwxyzABCDEFGHIJKLMNOPQRSTUVWXYZ0123456789-_./:=@,+%";
-  if (!text.empty() && text.find_first_not_of(plain) == std::string::npos) return text;
-  std::string quoted = "'";
-  for (const char c : text) quoted += c == '\'' ? std::string("'\\''") : std::string(1, c);
-  return quoted + "'";
-}
 
 class CurlCommand {
  public:
@@ -26,7 +18,7 @@ class CurlCommand {
   }
 
   void Add(const std::vector<std::string>& words) {
-    for (const std::string& word : words) text_ += (text_.empty() ? "" : " ") + ShellWord(word);
+    for (const std::string& word : words) text_ += (text_.empty() ? "" : " ") + QuoteForShell(word);
   }
   void Header(const std::string& line) { Add({"--header", line}); }
 

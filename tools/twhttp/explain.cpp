@@ -2,6 +2,7 @@
 #include <algorithm>
 #include <cstdio>
 
+#include "tools/common/shell.h"
 #include "tools/twhttp/failure.h"
 
 namespace {
@@ -19,23 +20,24 @@ std::string Count(uint64_t count, const char* what) {
 }
 
 void Replace(std::string* text, const std::string& from, const std::string& to) {
-  for (size_t at; (at = text->find(from)) != std::string::npos;) text->replace(at, from.size(), to);
+  for (size_t at = 0; (at = text->find(from, at)) != std::string::npos; at += to.size()) {
+    text->replace(at, from.size(), to);
+  }
 }
 
-std::string Quoted(const std::string& text) {
-  std::string quoted = text;
-  for (size_t at = 0; (at = quoted.find('\'', at)) != std::string::npos; at += 4) {
-    quoted.replace(at, 1, "'\\''");
-  }
-  return "'" + quoted + "'";
+// A URL is quoted whether it must be or not: a person may add a query to it.
+std::string QuotedUrl(const Options& options) {
+  const std::string url = options.target.Url(options.show_secrets);
+  const std::string word = QuoteForShell(url);
+  return word == url ? "'" + url + "'" : word;
 }
 
 std::string FillIn(const char* command, const Options& options) {
   std::string text = command;
   Replace(&text, "{operation}", options.operation->name);
-  Replace(&text, "{host}", options.target.host);
+  Replace(&text, "{host}", QuoteForShell(options.target.host));
   Replace(&text, "{port}", std::to_string(options.target.port));
-  Replace(&text, "{url}", Quoted(options.target.Url(options.show_secrets)));
+  Replace(&text, "{url}", QuotedUrl(options));
   return text;
 }
 

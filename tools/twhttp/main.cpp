@@ -93,7 +93,7 @@ int Record(const Session& session) {
       WriteRecording(session.options.record, RecordingOf(session), &error)) {
     return 0;
   }
-  std::fprintf(stderr, "twhttp: %s\n", error.c_str());
+  PrintError("twhttp", error);
   return ExitCode(FailureClass::kLocalFile);
 }
 
@@ -138,7 +138,7 @@ int main(int argc, char** argv) {
   try {
     return Run(argc, argv);
   } catch (const std::exception& error) {
-    std::fprintf(stderr, "twhttp: %s\n", error.what());
+    PrintError("twhttp", error.what());
     return ExitCode(FailureClass::kOther);
   }
 }

@@ -11,6 +11,7 @@
 #include "tools/common/amounts.h"
 #include "tools/common/completion.h"
 #include "tools/common/parser.h"
+#include "tools/common/terminal.h"
 #include "tools/twhttp/failure.h"
 
 namespace {
@@ -260,8 +261,8 @@ bool ReadOptions(int argc, char** argv, Options* options, int* exit_code) {
   }
   const std::string wrong = FinishOptions(command, raw, options);
   if (wrong.empty()) return true;
-  std::fprintf(stderr, "twhttp: %s\ntwhttp: try \"twhttp %s --help\"\n", wrong.c_str(),
-               command.get_name().c_str());
+  PrintError("twhttp", wrong);
+  PrintError("twhttp", "try \"twhttp " + command.get_name() + " --help\"");
   *exit_code = 2;
   return false;
 }

@@ -2,7 +2,7 @@
 
 #include <cmath>
 
-#include "tools/twhttp/secrets.h"
+#include "tools/twhttp/record_masks.h"
 
 namespace {
 
@@ -44,8 +44,8 @@ void AddRequestLine(RecordedExchange* record) {
 
 RecordedExchange RecordOf(const Session& session, const Exchange& exchange, int number) {
   RecordedExchange record = BeginRecord(session, session.trace.Find(exchange.connection), number);
-  record.request = MaskHead(session.options, exchange.sent);
-  record.response = exchange.received;
+  record.request = MaskRequest(session.options, exchange.sent);
+  record.response = MaskResponse(session.options, exchange.received);
   AddRequestLine(&record);
   double before = exchange.send_end;
   for (const Piece& piece : exchange.pieces) {

@@ -164,7 +164,7 @@ std::string FailureText(const Session& session, bool colour) {
   const std::string limit = failure.limit.empty() ? "" : " (limit: " + failure.limit + ")";
   text += Field("elapsed", Seconds(failure.elapsed) + limit);
   text += CausesText(failure.causes);
-  return text + Field("next", EscapeControls(failure.next));
+  return text + Field("next", EscapeControls(failure.next, Backslash::kKept));
 }
 
 std::string ExchangesText(const Session& session, bool colour) {

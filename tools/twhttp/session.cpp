@@ -5,6 +5,7 @@
 #include <cstring>
 
 #include "tarnwick/platform/owned.h"
+#include "tools/common/terminal.h"
 #include "tools/twhttp/hooks.h"
 
 namespace {
@@ -26,7 +27,7 @@ bool ReadBodyFile(const std::string& path, std::string* body) {
 bool SuitsOperation(const Options& options, const std::string& body) {
   const OperationId id = options.operation->id;
   if ((id != OperationId::kXmlPost && id != OperationId::kXmlPut) || IsXml(body)) return true;
-  std::fprintf(stderr, "twhttp: the body to send is no well-formed XML\n");
+  PrintError("twhttp", "the body to send is no well-formed XML");
   return false;
 }
 
@@ -42,7 +43,7 @@ bool LoadBody(const Options& options, std::string* body) {
   } else if (ReadBodyFile(options.body_file, body)) {
     return SuitsOperation(options, *body);
   }
-  std::fprintf(stderr, "twhttp: %s: %s\n", options.body_file.c_str(), std::strerror(errno));
+  PrintError("twhttp", options.body_file + ": " + std::strerror(errno));
   return false;
 }
 

@@ -31,8 +31,9 @@ void PrintText(const Finding& finding, bool colour) {
   std::string word = WordOf(finding.verdict);
   word.resize(5, ' ');
   printf("%s  %-9s %s\n", Paint(ColourOf(finding.verdict), word, colour).c_str(),
-         finding.check.c_str(), EscapeControls(finding.text).c_str());
-  if (!finding.fix.empty()) printf("       fix:      %s\n", finding.fix.c_str());
+         finding.check.c_str(), EscapeControls(finding.text, Backslash::kKept).c_str());
+  if (!finding.fix.empty())
+    printf("       fix:      %s\n", EscapeControls(finding.fix, Backslash::kKept).c_str());
 }
 
 void PrintJson(const Finding& finding) {

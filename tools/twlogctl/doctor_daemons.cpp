@@ -1,9 +1,11 @@
 // The doctor's look at the processes that have the library in their memory.
 #include <sys/stat.h>
 
+#include <optional>
 #include <sstream>
 #include <vector>
 
+#include "tools/common/shell.h"
 #include "tools/twlogctl/doctor.h"
 #include "tools/twlogctl/log_paths.h"
 #include "tools/twlogctl/processes.h"
@@ -59,25 +61,52 @@ bool MayWrite(const Credentials& credentials, const char* path) {
   return !exists || MayDo(credentials, file, S_IWOTH);
 }
 
-std::string NameOf(const ProcessInfo& process) {
-  return process.name + " (" + std::to_string(process.pid) + ")";
+// Anybody can run a process that has the library in its memory, under any name. So a finding about
+// a process of another user than root says whose it is, and proposes nothing but a look at it.
+Finding OtherUsersProcess(const LibraryUser& user, uid_t owner, const std::string& what) {
+  return {"daemons", Verdict::kWrong,
+          NameAndPid(user.process) + " runs as " + UserName(owner) + ", who may not " + what,
+          LookAtProcess(user.process.pid)};
 }
 
-void CheckDaemon(const LibraryUser& user, bool recordThere, Findings* findings) {
-  if (recordThere && !user.hasRecord) {
-    findings->push_back({"daemons", Verdict::kWrong,
-                         NameOf(user.process) +
-                             " has not attached the record: it was started before the record was"
-                             " made, or may not attach it, and all its levels are notice",
-                         "start " + user.process.name + " again"});
+// What shmat asks for, as the library does.
+bool MayAttach(const Credentials& credentials, const RecordSegment& segment) {
+  struct stat state = {};
+  state.st_uid = segment.owner;
+  state.st_gid = segment.group;
+  state.st_mode = segment.mode;
+  Credentials effective = credentials;
+  if (effective.user == segment.creator) effective.user = segment.owner;
+  return MayDo(effective, state, S_IROTH | S_IWOTH);
+}
+
+void CheckAttached(const LibraryUser& user, const Credentials& credentials,
+                   const std::optional<RecordSegment>& segment, Findings* findings) {
+  if (!segment || user.hasRecord) return;
+  if (!MayAttach(credentials, *segment)) {
+    findings->push_back(OtherUsersProcess(
+        user, credentials.user,
+        "attach the record of " + UserName(segment->owner) + ":" + GroupName(segment->group) +
+            " with mode " + ModeText(segment->mode) +
+            ", so all its levels are notice; \"twlogctl create --group\" makes one for a group"));
+    return;
   }
+  findings->push_back({"daemons", Verdict::kWrong,
+                       NameAndPid(user.process) +
+                           " has not attached the record: it was started before the record was"
+                           " made, and all its levels are notice",
+                       "start " + QuoteForShell(user.process.name) + " again"});
+}
+
+void CheckDaemon(const LibraryUser& user, const std::optional<RecordSegment>& segment,
+                 Findings* findings) {
   const Credentials credentials = CredentialsOf(user.process.pid);
-  if (!MayWrite(credentials, kMainLogPath)) {
-    findings->push_back({"daemons", Verdict::kWrong,
-                         NameOf(user.process) + " runs as " + UserName(credentials.user) +
-                             ", who may not write " + kMainLogPath,
-                         "setfacl -R -m u:" + UserName(credentials.user) + ":rwX " + kLogFolder});
-  }
+  CheckAttached(user, credentials, segment, findings);
+  if (MayWrite(credentials, kMainLogPath)) return;
+  findings->push_back(OtherUsersProcess(
+      user, credentials.user,
+      std::string("write ") + kMainLogPath +
+          "; when it is a daemon of this machine, the folder needs a group for its user"));
 }
 
 }  // namespace
@@ -89,7 +118,7 @@ void CheckDaemons(Findings* findings) {
   for (const LibraryUser& user : LibraryUsers(segment ? segment->id : -1)) {
     if (user.process.name.compare(0, 8, "twlogctl") == 0) continue;  // another of these tools
     ++count;
-    CheckDaemon(user, segment.has_value(), findings);
+    CheckDaemon(user, segment, findings);
   }
   if (findings->size() > before) return;
   findings->push_back({"daemons", Verdict::kRight,

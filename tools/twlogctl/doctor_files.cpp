@@ -1,15 +1,21 @@
 // The doctor's look at the log folder and the files in it.
 #include <fcntl.h>
+#include <grp.h>
+#include <pwd.h>
 #include <sys/statvfs.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <cstring>
 #include <optional>
+#include <vector>
 
 #include "tarnwick/platform/owned.h"
 #include "tools/common/amounts.h"
+#include "tools/common/shell.h"
 #include "tools/twlogctl/doctor.h"
+#include "tools/twlogctl/doctor_paths.h"
 #include "tools/twlogctl/log_paths.h"
 #include "tools/twlogctl/report.h"
 
@@ -19,71 +25,105 @@ namespace {
 constexpr double kFewBytes = 1 << 20;
 constexpr unsigned long kFewFiles = 16;
 
-std::optional<struct stat> StateOf(const std::string& path) {
-  struct stat state = {};
-  if (stat(path.c_str(), &state) != 0) return std::nullopt;
-  return state;
-}
-
-std::string Describe(const struct stat& state) {
-  return UserName(state.st_uid) + ":" + GroupName(state.st_gid) + ", mode " +
-         ModeText(state.st_mode);
-}
-
 // Opens it as the library does, but makes no file and waits for nobody. Results: 0 or errno.
 int TryToOpen(const char* path) {
-  const OwnedFd fd(open(path, O_WRONLY | O_APPEND | O_CLOEXEC | O_NONBLOCK));
+  const OwnedFd fd(open(path, O_WRONLY | O_APPEND | O_CLOEXEC | O_NONBLOCK | O_NOFOLLOW));
   return fd.Valid() ? 0 : errno;
 }
 
-void CheckFile(const char* path, Findings* findings) {
-  const std::string name = path;
-  const auto state = StateOf(path);
-  struct stat link = {};
-  if (!state && lstat(path, &link) == 0) {
-    findings->push_back(
-        {"file", Verdict::kWrong, name + " is a link that leads nowhere", "rm " + name});
-    return;
+// The users that may make files in the log's folder are those of its group, when that may write it:
+// daemons that do not run as root are set up like this, and make logs of their own.
+bool MayMakeLogs(uid_t user) {
+  const auto folder = StateAt(kLogFolder);
+  if (!folder || (folder->st_mode & S_IWGRP) == 0) return false;
+  const struct passwd* const entry = getpwuid(user);
+  if (entry == nullptr) return false;
+  std::vector<gid_t> groups(64);
+  auto count = static_cast<int>(groups.size());
+  if (getgrouplist(entry->pw_name, entry->pw_gid, groups.data(), &count) < 0) return false;
+  groups.resize(static_cast<size_t>(count));
+  return std::find(groups.begin(), groups.end(), folder->st_gid) != groups.end();
+}
+
+// Results: nothing when only those may change it who may change all logs.
+std::optional<Finding> ForeignLog(const std::string& path, const struct stat& state) {
+  if (!IsRootOrCaller(state.st_uid) && !MayMakeLogs(state.st_uid)) {
+    return Finding{"file", Verdict::kWrong,
+                   path + " was made by " + UserName(state.st_uid) +
+                       ", who can change what it says: " + DescribeState(state),
+                   "mv " + path + " " + path + ".old"};
   }
-  if (!state) return;  // the first line makes it
-  if (!S_ISREG(state->st_mode)) {
-    findings->push_back({"file", Verdict::kWrong, name + " is no regular file",
-                         "mv " + name + " " + name + ".old"});
-    return;
-  }
-  const int error = TryToOpen(path);
-  if (error == 0) {
-    findings->push_back(
-        {"file", Verdict::kRight,
-         name + ", " + Describe(*state) + ", " + FormatBytes(static_cast<double>(state->st_size)),
-         ""});
-    return;
-  }
-  const std::string text =
-      name + " cannot be written: " + strerror(error) + "; " + Describe(*state);
+  if ((state.st_mode & S_IWOTH) == 0) return std::nullopt;
+  return Finding{"file", Verdict::kWrong,
+                 path + ": anybody can change what it says: " + DescribeState(state),
+                 "chmod o-w " + path};
+}
+
+Finding UnwritableLog(const std::string& path, const struct stat& state, int error) {
   const bool attribute = error == EPERM;  // of chattr: root is refused too
-  const std::string allow = "setfacl -m u:" + UserName(geteuid()) + ":rw " + name;
-  findings->push_back({"file", Verdict::kWrong, text, attribute ? "chattr -i " + name : allow});
+  const std::string allow = "setfacl -m u:" + QuoteForShell(UserName(geteuid())) + ":rw " + path;
+  return {"file", Verdict::kWrong,
+          path + " cannot be written: " + strerror(error) + "; " + DescribeState(state),
+          attribute ? "chattr -i " + path : allow};
+}
+
+Finding LookAtLog(const char* path, const struct stat& state) {
+  if (const auto odd = OddFile("file", path, state)) return *odd;
+  if (const auto foreign = ForeignLog(path, state)) return *foreign;
+  const int error = TryToOpen(path);
+  if (error != 0) return UnwritableLog(path, state, error);
+  return {"file", Verdict::kRight,
+          std::string(path) + ", " + DescribeState(state) + ", " +
+              FormatBytes(static_cast<double>(state.st_size)),
+          ""};
+}
+
+void CheckFile(const char* path, Findings* findings) {
+  const auto state = StateAt(path);
+  if (state) findings->push_back(LookAtLog(path, *state));  // otherwise the first line makes it
+}
+
+// Who may open a log, even for reading, can hold its lock, and every daemon then waits.
+Finding LookAtFolder(const std::string& folder, const struct stat& state) {
+  if ((state.st_mode & S_IRWXU) != S_IRWXU) {
+    return {"folder", Verdict::kWrong,
+            folder + " keeps its owner from making files: " + DescribeState(state),
+            "chmod u+rwx " + folder};
+  }
+  if (const auto open = OpenDirectory("folder", folder, state)) return *open;
+  if ((state.st_mode & S_IRWXO) != 0) {
+    return {
+        "folder", Verdict::kWrong,
+        folder + " lets other users open the logs, and hold their locks: " + DescribeState(state),
+        "chmod o= " + folder};
+  }
+  const bool shared = (state.st_mode & S_IWGRP) != 0 && state.st_gid != 0;
+  return {
+      "folder", shared ? Verdict::kNote : Verdict::kRight,
+      folder + ", " + DescribeState(state) +
+          (shared ? ": each user of the group can put other files in the place of the logs" : ""),
+      ""};
 }
 
 }  // namespace
 
+// Root may lead the folder elsewhere by a link: nobody else can change that one.
 void CheckFolder(Findings* findings) {
   const std::string folder = kLogFolder;
-  const auto state = StateOf(folder);
-  const int error = errno;
-  const std::string make = "install -d -m 0755 " + folder;
-  if (!state) {
+  const auto link = StateAt(folder);
+  struct stat state = {};
+  const int error = stat(kLogFolder, &state) == 0 ? 0 : errno;
+  const std::string make = "install -d -m 0750 " + folder;
+  if (link && S_ISLNK(link->st_mode) && (error != 0 || !IsRootOrCaller(link->st_uid))) {
+    const auto odd = OddFile("folder", folder, *link);
+    findings->push_back({"folder", Verdict::kWrong, odd->text, odd->fix + " && " + make});
+  } else if (error != 0) {
     findings->push_back({"folder", Verdict::kWrong, folder + ": " + strerror(error), make});
-  } else if (!S_ISDIR(state->st_mode)) {
+  } else if (!S_ISDIR(state.st_mode)) {
     findings->push_back(
         {"folder", Verdict::kWrong, folder + " is no folder", "rm " + folder + " && " + make});
-  } else if ((state->st_mode & S_IRWXU) != S_IRWXU) {
-    findings->push_back({"folder", Verdict::kWrong,
-                         folder + " keeps its owner from making files: " + Describe(*state),
-                         "chmod u+rwx " + folder});
   } else {
-    findings->push_back({"folder", Verdict::kRight, folder + ", " + Describe(*state), ""});
+    findings->push_back(LookAtFolder(folder, state));
   }
 }
 

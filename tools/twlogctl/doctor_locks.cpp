@@ -13,11 +13,13 @@
 
 #include "tarnwick/platform/owned.h"
 #include "tools/common/amounts.h"
+#include "tools/common/shell.h"
 #include "tools/twlogctl/doctor.h"
 #include "tools/twlogctl/file_locks.h"
 #include "tools/twlogctl/log_paths.h"
 #include "tools/twlogctl/processes.h"
 #include "tools/twlogctl/record.h"
+#include "tools/twlogctl/report.h"
 
 namespace {
 
@@ -58,8 +60,8 @@ bool IsStopped(const ProcessInfo& process) {
 std::string Describe(pid_t pid, const std::optional<ProcessInfo>& process) {
   if (pid < 1) return "a process of another PID namespace";
   if (!process) return "process " + std::to_string(pid) + ", which has ended";
-  return process->name + " (" + std::to_string(pid) + ", started " + SpanText(process->ageSeconds) +
-         " ago" + (IsStopped(*process) ? ", stopped" : "") + ")";
+  return QuoteForShell(process->name) + " (" + std::to_string(pid) + ", started " +
+         SpanText(process->ageSeconds) + " ago" + (IsStopped(*process) ? ", stopped" : "") + ")";
 }
 
 std::string FixFor(pid_t pid, const std::optional<ProcessInfo>& process, const std::string& path) {
@@ -96,7 +98,7 @@ void TellHolders(int fd, const std::string& path, Findings* findings) {
 
 void CheckLock(const char* path, Findings* findings) {
   // No more than reading is asked for, which is enough for a lock and harms no file.
-  const OwnedFd fd(open(path, O_RDONLY | O_CLOEXEC | O_NONBLOCK));
+  const OwnedFd fd(open(path, O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOFOLLOW));
   if (!fd.Valid()) {
     const int error = errno;
     if (error == ENOENT) return;
@@ -121,15 +123,20 @@ std::optional<long long> FileSizeLimit(pid_t pid) {
   return limit;
 }
 
+// Only root's own processes get more than they have: the others may be anybody's.
 void CompareLimit(const ProcessInfo& process, const char* path, Findings* findings) {
   struct stat state = {};
   const std::optional<long long> limit = FileSizeLimit(process.pid);
   if (!limit || stat(path, &state) != 0 || state.st_size < *limit) return;
+  const uid_t user = UserOf(process.pid);
+  const std::string who = user == 0 ? "" : " of " + UserName(user);
   findings->push_back({"limit", Verdict::kWrong,
-                       process.name + " (" + std::to_string(process.pid) + ") may write files of " +
+                       NameAndPid(process) + who + " may write files of " +
                            FormatBytes(static_cast<double>(*limit)) + ", and " + path + " has " +
                            FormatBytes(static_cast<double>(state.st_size)) + ": its lines are lost",
-                       "prlimit --pid " + std::to_string(process.pid) + " --fsize=unlimited"});
+                       user == 0
+                           ? "prlimit --pid " + std::to_string(process.pid) + " --fsize=unlimited"
+                           : LookAtProcess(process.pid)});
 }
 
 }  // namespace

@@ -1,14 +1,18 @@
 // The doctor's look at the shared record and its levels.
 #include <sys/shm.h>
+#include <sys/stat.h>
 
 #include <cerrno>
 #include <cstring>
+#include <map>
 
 #include "tools/twlogctl/doctor.h"
 #include "tools/twlogctl/record.h"
 #include "tools/twlogctl/report.h"
 
 namespace {
+
+constexpr char kReplace[] = "twlogctl remove --yes && twlogctl create";
 
 std::string Describe(const RecordSegment& segment) {
   return std::to_string(segment.size) + " bytes, " + UserName(segment.owner) + ":" +
@@ -27,6 +31,37 @@ bool OwnerMayWrite(const RecordSegment& segment) {
   return (segment.mode & 0600) == 0600;
 }
 
+// "http", "http and 3 more", "all 74 categories".
+std::string NamesOf(const std::vector<std::string>& names) {
+  if (names.size() == 1) return names.front();
+  if (names.size() == LOG_CATEG_COUNT) return "all " + std::to_string(names.size()) + " categories";
+  return names.front() + " and " + std::to_string(names.size() - 1) + " more";
+}
+
+std::string BackToNotice(const std::vector<std::string>& names) {
+  if (names.size() == LOG_CATEG_COUNT) return "twlogctl set all=notice";
+  std::string command = "twlogctl set";
+  for (const std::string& name : names) command += " " + name + "=notice";
+  return command;
+}
+
+// A number that is no level was nobody's choice; the low levels may be somebody's.
+void TellLevel(int level, const std::vector<std::string>& names, Findings* findings) {
+  const bool one = names.size() == 1;
+  const std::string what = NamesOf(names);
+  if (level >= LOG_LEVEL_ALARM && level <= LOG_LEVEL_DEBUG3) {
+    findings->push_back(
+        {"levels", Verdict::kNote,
+         what + (one ? " writes " : " write ") + LevelText(level) + " and worse alone", ""});
+    return;
+  }
+  findings->push_back({"levels", Verdict::kWrong,
+                       what + (one ? " stands at " : " stand at ") + LevelWords(level) +
+                           ", which lets " + (level < LOG_LEVEL_ALARM ? "no" : "every") +
+                           " line through",
+                       BackToNotice(names)});
+}
+
 }  // namespace
 
 void CheckRecord(Findings* findings) {
@@ -41,11 +76,19 @@ void CheckRecord(Findings* findings) {
                          "the record has another size than " + std::to_string(sizeof(TWDbgLogCfg)) +
                              ": " + Describe(*segment),
                          "stop the daemons, twlogctl remove, twlogctl create, start them again"});
+  } else if (const auto stranger = segment->Stranger()) {
+    findings->push_back({"record", Verdict::kWrong,
+                         "the record was made or is owned by " + UserName(*stranger) +
+                             ", who can change every level: " + Describe(*segment),
+                         kReplace});
+  } else if ((segment->mode & S_IWOTH) != 0) {
+    findings->push_back({"record", Verdict::kWrong,
+                         "anybody can change every level in the record: " + Describe(*segment),
+                         kReplace});
   } else if (!OwnerMayWrite(*segment)) {
     findings->push_back(
         {"record", Verdict::kWrong,
-         "its mode keeps processes from attaching the record: " + Describe(*segment),
-         "twlogctl remove --yes && twlogctl create"});
+         "its mode keeps processes from attaching the record: " + Describe(*segment), kReplace});
   } else if (!Attach(*segment)) {
     const std::string reason = strerror(errno);
     findings->push_back(
@@ -62,17 +105,12 @@ void CheckLevels(Findings* findings) {
   const auto segment = FindRecord();
   const AttachedRecord record = segment && segment->HasRightSize() ? Attach(*segment) : nullptr;
   if (!record) return;
+  std::map<int, std::vector<std::string>> byLevel;
   for (int value = 0; value < LOG_CATEG_COUNT; ++value) {
     const auto categ = static_cast<LOG_CATEG>(value);
-    const int level = record->Level(categ);
-    if (level >= LOG_LEVEL_NOTICE) continue;
-    const std::string name = Enum2String(categ);
-    // A level below zero lets nothing through; the other low ones are somebody's choice.
-    findings->push_back(
-        {"levels", level < LOG_LEVEL_ALARM ? Verdict::kWrong : Verdict::kNote,
-         level < LOG_LEVEL_ALARM
-             ? name + " stands at " + LevelText(level) + ", which lets no line through"
-             : name + " writes " + LevelText(level) + " and worse alone",
-         level < LOG_LEVEL_ALARM ? "twlogctl set " + name + "=notice" : ""});
+    byLevel[record->Level(categ)].emplace_back(Enum2String(categ));
+  }
+  for (const auto& [level, names] : byLevel) {
+    if (level < LOG_LEVEL_NOTICE || level > LOG_LEVEL_DEBUG3) TellLevel(level, names, findings);
   }
 }

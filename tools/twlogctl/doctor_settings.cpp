@@ -6,19 +6,16 @@
 #include <vector>
 
 #include "tools/twlogctl/doctor.h"
+#include "tools/twlogctl/doctor_paths.h"
 #include "tools/twlogctl/log_paths.h"
 #include "tools/twlogctl/owned_folder.h"
 #include "tools/twlogctl/processes.h"
+#include "tools/twlogctl/report.h"
 #include "tools/twlogctl/settings_file.h"
 
 namespace {
 
 constexpr char kRotationFolder[] = "/etc/logrotate.d";
-
-bool IsRegular(const std::string& path) {
-  struct stat state = {};
-  return stat(path.c_str(), &state) == 0 && S_ISREG(state.st_mode);
-}
 
 // Those that logrotate leaves out are what editors and package managers leave behind.
 bool IsLeftOver(const std::string& name) {
@@ -68,9 +65,36 @@ std::string RotatedBy(const char* path) {
   return "";
 }
 
+// Results: nothing when the file is there, or none, and nobody else chooses what it says.
+std::optional<Finding> ForeignSettings(const std::string& path) {
+  const std::string folder = path.substr(0, path.rfind('/'));
+  const auto above = StateAt(folder);
+  if (above && S_ISDIR(above->st_mode)) {
+    if (const auto open = OpenDirectory("settings", folder, *above)) return open;
+  }
+  const auto state = StateAt(path);
+  if (!state) return std::nullopt;
+  if (const auto odd = OddFile("settings", path, *state)) return odd;
+  if (!IsRootOrCaller(state->st_uid)) {
+    return Finding{"settings", Verdict::kWrong,
+                   path + " belongs to " + UserName(state->st_uid) +
+                       ", who can choose the levels of the next start: " + DescribeState(*state),
+                   "chown -h root:root " + path};
+  }
+  if ((state->st_mode & S_IWOTH) == 0) return std::nullopt;
+  return Finding{
+      "settings", Verdict::kWrong,
+      path + ": anybody can choose the levels of the next start: " + DescribeState(*state),
+      "chmod o-w " + path};
+}
+
 }  // namespace
 
 void CheckSettings(Findings* findings) {
+  if (const auto foreign = ForeignSettings(kSettingsPath)) {
+    findings->push_back(*foreign);
+    return;
+  }
   SavedLevels saved;
   SettingsFault fault;
   const std::string path = kSettingsPath;
@@ -84,9 +108,7 @@ void CheckSettings(Findings* findings) {
           {"settings", Verdict::kNote, "no levels are saved: " + fault.Describe(), ""});
       return;
     case SettingsState::kUnreadable:
-      findings->push_back(
-          {"settings", Verdict::kWrong, fault.Describe(),
-           IsRegular(path) ? "chmod u+r " + path : "mv " + path + " " + path + ".old"});
+      findings->push_back({"settings", Verdict::kWrong, fault.Describe(), "chmod u+r " + path});
       return;
     case SettingsState::kBroken:
       findings->push_back({"settings", Verdict::kWrong, fault.Describe(),

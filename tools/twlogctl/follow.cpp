@@ -8,6 +8,7 @@
 
 #include "tools/twlogctl/commands.h"
 #include "tools/twlogctl/log_options.h"
+#include "tools/twlogctl/log_paths.h"
 #include "tools/twlogctl/log_printer.h"
 #include "tools/twlogctl/log_tail.h"
 #include "tools/twlogctl/log_wait.h"
@@ -57,9 +58,9 @@ class Absence {
 class Follower {
  public:
   explicit Follower(const FollowOptions& options)
-      : m_printer(options.json),
+      : m_printer(options.json, options.mark),
         m_path(FollowedPath(options)),
-        m_selector(MakeFilter(options, Now(), Direction::kAhead), Now()),
+        m_selector(MakeFilter(options, Now(), Direction::kAhead), Now(), IsOwnLog(m_path)),
         m_tail(m_path),
         m_absence(m_path) {}
 
@@ -148,6 +149,7 @@ void AddFollow(CLI::App* app, int* exitCode) {
   AddFilterOptions(follow, options.get());
   AddTimeOptions(follow, options.get());
   AddJsonOption(follow, options.get());
+  AddMarkOption(follow, options.get());
   follow
       ->add_option("-n,--lines", options->count,
                    "Show so many of the messages that are there already (10, or all of --since).")

@@ -37,6 +37,11 @@ struct Wanted {
 };
 
 int AlreadyThere(const RecordSegment& segment, const CreateOptions& options, const Wanted& wanted) {
+  if (const auto stranger = segment.Stranger()) {
+    Complain("there is a record already, made or owned by " + UserName(*stranger) +
+             ", who can change every level; root removes it by \"twlogctl remove\"");
+    return kExitWrong;
+  }
   if (!segment.HasRightSize()) {
     Complain("there is a segment of " + std::to_string(segment.size) +
              " bytes under the record's key, and the record has " +
@@ -100,8 +105,7 @@ bool MakeSegment(const Wanted& wanted, bool* loaded) {
 void WarnOfRunningDaemons() {
   std::string names;
   for (const LibraryUser& user : LibraryUsers(-1)) {
-    names += (names.empty() ? "" : ", ") + EscapeControls(user.process.name) + " (" +
-             std::to_string(user.process.pid) + ")";
+    names += (names.empty() ? "" : ", ") + NameAndPid(user.process);
   }
   Complain(
       "a daemon attaches the record when it loads the library, and not later: start the"
@@ -128,7 +132,7 @@ std::string Count(unsigned long attached) {
 
 bool Confirmed(const RecordSegment& segment) {
   fprintf(stderr, "The record is attached by %s.\n",
-          EscapeControls(DescribeAttached(segment)).c_str());
+          EscapeControls(DescribeAttached(segment), Backslash::kKept).c_str());
   fputs("They keep their levels until they end, and nobody can change them.\nRemove it? [y/N] ",
         stderr);
   char answer[16] = "";

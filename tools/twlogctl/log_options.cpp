@@ -66,6 +66,11 @@ void AddJsonOption(CLI::App* app, LogOptions* options) {
   app->add_flag("--json", options->json, "Print one JSON object a line.");
 }
 
+void AddMarkOption(CLI::App* app, LogOptions* options) {
+  app->add_flag("--mark", options->mark,
+                "Mark doubtful messages and further lines without a terminal, too.");
+}
+
 void AddTimeOptions(CLI::App* app, LogOptions* options) {
   app->add_option("--since", options->since,
                   "Take messages from this time on: 14:00, \"2026-03-05 14:00\", or 10m ago.")

@@ -24,12 +24,16 @@ struct LogOptions {
   std::string since;
   std::string until;
   bool json = false;
+  bool mark = false;
 };
 
 // --notification and --file.
 void AddSourceOptions(CLI::App* app, LogOptions* options);
 
 void AddJsonOption(CLI::App* app, LogOptions* options);
+
+// --mark.
+void AddMarkOption(CLI::App* app, LogOptions* options);
 
 // --since and --until.
 void AddTimeOptions(CLI::App* app, LogOptions* options);

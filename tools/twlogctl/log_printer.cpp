@@ -60,24 +60,31 @@ Json::Value ToJson(const LogMessage& message) {
   value["file"] = line != nullptr ? JsonText(line->file) : Json::Value();
   value["line"] = line != nullptr ? Json::Value(line->line) : Json::Value();
   value["function"] = line != nullptr ? JsonText(line->function) : Json::Value();
+  if (message.doubtful) value["doubtful"] = true;
   value["message"] = JsonText(WithoutLineEnd(line != nullptr ? line->message : message.text));
   return value;
 }
 
 }  // namespace
 
-LogPrinter::LogPrinter(bool json)
-    : m_json(json), m_terminal(IsTerminal(STDOUT_FILENO)), m_colour(MayColour(STDOUT_FILENO)) {}
+LogPrinter::LogPrinter(bool json, bool mark)
+    : m_json(json),
+      m_terminal(IsTerminal(STDOUT_FILENO)),
+      m_mark(mark || m_terminal),
+      m_colour(MayColour(STDOUT_FILENO)) {}
 
 void LogPrinter::PrintText(const LogMessage& message) {
-  if (!m_terminal) return Put(message.text);
+  if (!m_mark) return Put(message.text);
   const Colour colour = ColourOf(message.line);
   std::string_view rest = message.text;
+  const char* mark = message.continues ? "| " : message.doubtful ? "? " : "";
   while (!rest.empty()) {
     const std::string_view line = rest.substr(0, rest.find('\n'));
-    Put(Paint(colour, EscapeControls(line), m_colour));
+    Put(mark);
+    m_terminal ? Put(Paint(colour, EscapeControls(line), m_colour)) : Put(line);
     Put("\n");
     rest.remove_prefix(std::min(rest.size(), line.size() + 1));
+    mark = "| ";
   }
 }
 

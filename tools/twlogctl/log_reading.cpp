@@ -10,6 +10,7 @@
 
 #include "tarnwick/platform/owned.h"
 #include "tools/twlogctl/log_messages.h"
+#include "tools/twlogctl/log_paths.h"
 
 namespace {
 
@@ -38,7 +39,7 @@ int ReadMessages(int fd, const MessageSink& sink) {
 int ReadLog(const std::string& path, const LogFilter& filter, const WantedSink& sink) {
   const OwnedFd file(path == "-" ? dup(STDIN_FILENO) : open(path.c_str(), O_RDONLY | O_CLOEXEC));
   if (!file.Valid()) return errno;
-  LogSelector selector(filter, NewestLineOf(file.Get()));
+  LogSelector selector(filter, NewestLineOf(file.Get()), IsOwnLog(path));
   return ReadMessages(file.Get(), [&](std::string_view text, bool continues) {
     selector.Take(text, continues, sink);
   });

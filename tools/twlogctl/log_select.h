@@ -7,6 +7,7 @@
 #include <string_view>
 #include <utility>
 
+#include "tools/twlogctl/log_doubt.h"
 #include "tools/twlogctl/log_filter.h"
 #include "tools/twlogctl/log_line.h"
 #include "tools/twlogctl/log_time.h"
@@ -15,14 +16,17 @@ struct LogMessage {
   std::string_view text;  // as it stands in the log
   const LogLine* line;    // null for lines without a message's beginning
   std::optional<Moment> moment;
-  bool continues;  // lines that belong to the message given out before
+  bool continues;         // lines that belong to the message given out before
+  bool doubtful = false;  // its first line cannot be what it says
 };
 
 using WantedSink = std::function<void(const LogMessage& message)>;
 
 class LogSelector {
  public:
-  LogSelector(LogFilter filter, Moment newest) : m_filter(std::move(filter)), m_clock(newest) {}
+  // With `ownLog` the log is one of this machine's processes.
+  LogSelector(LogFilter filter, Moment newest, bool ownLog)
+      : m_filter(std::move(filter)), m_clock(newest), m_doubts(ownLog) {}
 
   // Takes a message as a MessageSink does and hands it on if it is wanted. Lines that continue a
   // message share its fate.
@@ -34,6 +38,7 @@ class LogSelector {
  private:
   LogFilter m_filter;
   LogClock m_clock;
+  LineDoubts m_doubts;
   bool m_wantedLast = false;
 };
 

@@ -26,6 +26,7 @@ class LogClock {
 
   // A log that grows has newer lines by and by.
   void Advance(Moment newest) { m_newest = newest; }
+  Moment Newest() const { return m_newest; }
 
   // No value for a line without a time.
   std::optional<Moment> MomentOf(const LogStamp& stamp);

@@ -22,6 +22,7 @@ class LogWindow {
   struct Kept {
     std::string text;
     std::optional<Moment> moment;
+    bool doubtful = false;
   };
   size_t m_size;
   std::deque<Kept> m_kept;

@@ -56,6 +56,6 @@ int main(int argc, char** argv) try {
   }
   return exitCode;
 } catch (const std::exception& error) {  // memory ran out, or the like
-  fprintf(stderr, "twlogctl: %s\n", error.what());
+  Complain(error.what());
   return kExitWrong;
 }

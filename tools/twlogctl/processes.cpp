@@ -1,5 +1,6 @@
 #include "tools/twlogctl/processes.h"
 
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -11,6 +12,7 @@
 #include <sstream>
 
 #include "tarnwick/log/twdebuglog.h"
+#include "tools/common/shell.h"
 #include "tools/twlogctl/owned_folder.h"
 
 namespace {
@@ -62,6 +64,20 @@ LibraryUser LookAtMemory(pid_t pid, int segment) {
 std::string ReadWholeFile(const std::string& path) {
   std::ifstream file(path, std::ios::binary);
   return std::string(std::istreambuf_iterator<char>(file), {});
+}
+
+std::string NameAndPid(const ProcessInfo& process) {
+  return QuoteForShell(process.name) + " (" + std::to_string(process.pid) + ")";
+}
+
+std::string LookAtProcess(pid_t pid) {
+  return "ps -o user,pid,lstart,args -p " + std::to_string(pid);
+}
+
+uid_t UserOf(pid_t pid) {
+  struct stat state = {};
+  if (stat(("/proc/" + std::to_string(pid)).c_str(), &state) != 0) return static_cast<uid_t>(-1);
+  return state.st_uid;
 }
 
 std::optional<ProcessInfo> ReadProcess(pid_t pid) {

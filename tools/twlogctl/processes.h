@@ -15,6 +15,16 @@ struct ProcessInfo {
   double ageSeconds = 0;  // since it was started
 };
 
+// "camerad (812)". The name is what the process calls itself; one that is not plain is quoted for the
+// shell, so that it cannot look like several processes.
+std::string NameAndPid(const ProcessInfo& process);
+
+// A command that shows whose process it is and what it runs, and changes nothing.
+std::string LookAtProcess(pid_t pid);
+
+// The user a process runs as; nobody's number when it has gone.
+uid_t UserOf(pid_t pid);
+
 // Results: nothing when there is no such process (any more).
 std::optional<ProcessInfo> ReadProcess(pid_t pid);
 

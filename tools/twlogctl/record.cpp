@@ -21,15 +21,22 @@ std::optional<RecordSegment> FindInTable(int id) {
   while (std::getline(table, line)) {
     std::istringstream fields(line);
     RecordSegment segment;
-    long key = 0, creator = 0, last = 0;
-    fields >> key >> segment.id >> std::oct >> segment.mode >> std::dec >> segment.size >>
-        creator >> last >> segment.attached >> segment.owner >> segment.group;
+    long key = 0, maker = 0, last = 0;
+    fields >> key >> segment.id >> std::oct >> segment.mode >> std::dec >> segment.size >> maker >>
+        last >> segment.attached >> segment.owner >> segment.group >> segment.creator;
     if (fields && segment.id == id) return segment;
   }
   return std::nullopt;
 }
 
 }  // namespace
+
+std::optional<uid_t> RecordSegment::Stranger() const {
+  for (const uid_t user : {creator, owner}) {
+    if (!IsRootOrCaller(user)) return user;
+  }
+  return std::nullopt;
+}
 
 std::optional<RecordSegment> FindRecord() {
   const int id = shmget(TWShmDbgLogIPCKey(), 0, 0);
@@ -40,6 +47,7 @@ std::optional<RecordSegment> FindRecord() {
   segment.id = id;
   segment.size = state.shm_segsz;
   segment.owner = state.shm_perm.uid;
+  segment.creator = state.shm_perm.cuid;
   segment.group = state.shm_perm.gid;
   segment.mode = state.shm_perm.mode & 0777;
   segment.attached = state.shm_nattch;
@@ -56,8 +64,7 @@ std::string DescribeAttached(const RecordSegment& segment) {
   std::string names;
   for (const LibraryUser& user : LibraryUsers(segment.id)) {
     if (!user.hasRecord) continue;
-    names += (names.empty() ? ": " : ", ") + user.process.name + " (" +
-             std::to_string(user.process.pid) + ")";
+    names += (names.empty() ? ": " : ", ") + NameAndPid(user.process);
   }
   return std::to_string(count) + (count == 1 ? " process" : " processes") + names;
 }

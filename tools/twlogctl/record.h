@@ -15,9 +15,13 @@ struct RecordSegment {
   int id = -1;
   size_t size = 0;
   uid_t owner = 0;
+  uid_t creator = 0;  // keeps the owner's rights, whoever the owner is
   gid_t group = 0;
   mode_t mode = 0;
   unsigned long attached = 0;  // all processes, this one included when it has the record
+
+  // The user who made it or owns it and is neither root nor this one; nothing when there is none.
+  std::optional<uid_t> Stranger() const;
 
   bool HasRightSize() const { return size == sizeof(TWDbgLogCfg); }
 };

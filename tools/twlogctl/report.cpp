@@ -2,12 +2,14 @@
 
 #include <grp.h>
 #include <pwd.h>
+#include <unistd.h>
 
 #include <cstdio>
 #include <vector>
 
 #include "tarnwick/log/twdebuglog.h"
 #include "tools/common/names.h"
+#include "tools/common/terminal.h"
 #include "tools/common/words.h"
 
 namespace {
@@ -21,12 +23,21 @@ std::string DidYouMean(const std::vector<std::string>& nearest) {
 }  // namespace
 
 void Complain(const std::string& text) {
-  fprintf(stderr, "twlogctl: %s\n", text.c_str());
+  PrintError("twlogctl", text);
+}
+
+bool IsRootOrCaller(uid_t user) {
+  return user == 0 || user == geteuid();
 }
 
 std::string LevelText(int level) {
   if (level < LOG_LEVEL_ALARM || level > LOG_LEVEL_DEBUG3) return std::to_string(level);
   return Enum2String(static_cast<LOG_LEVEL>(level));
+}
+
+std::string LevelWords(int level) {
+  const bool known = level >= LOG_LEVEL_ALARM && level <= LOG_LEVEL_DEBUG3;
+  return LevelText(level) + (known ? "" : ", out of range");
 }
 
 std::string UserName(uid_t user) {

@@ -6,11 +6,17 @@
 
 #include <string>
 
-// "twlogctl: text" on standard error.
+// "twlogctl: text" on standard error, escaped for a terminal.
 void Complain(const std::string& text);
+
+// True for root and for the user who runs this: nobody else's files and records are to be trusted.
+bool IsRootOrCaller(uid_t user);
 
 // The name of a level, or the number when the record or a file holds one that has no name.
 std::string LevelText(int level);
+
+// The same for people: "99, out of range" for such a number.
+std::string LevelWords(int level);
 
 // The names of users and groups, or their numbers when nobody knows them.
 std::string UserName(uid_t user);

@@ -19,27 +19,25 @@
 namespace {
 
 void PrintChange(const LevelChange& change, bool json) {
-  const std::string before = LevelText(change.before);
-  const std::string after = LevelText(change.after);
   if (json) {
     Json::Value line;
     line["category"] = Enum2String(change.categ);
-    line["old"] = before;
-    line["new"] = after;
+    line["old"] = LevelText(change.before);
+    line["new"] = LevelText(change.after);
     PrintJsonLine(line);
     return;
   }
   const bool colour = MayColour(1);
-  printf("%s: %s -> %s\n", Enum2String(change.categ), before.c_str(),
-         Paint(Colour::kBold, after, colour).c_str());
+  printf("%s: %s -> %s\n", Enum2String(change.categ), LevelWords(change.before).c_str(),
+         Paint(Colour::kBold, LevelWords(change.after), colour).c_str());
 }
 
 // Categories that "all" changes from one level to another. Many have one line, which says as much.
 void PrintGroup(const std::vector<LevelChange>& group) {
   constexpr size_t kFew = 4;
   if (group.size() > kFew) {
-    printf("%zu categories: %s -> %s\n", group.size(), LevelText(group.front().before).c_str(),
-           LevelText(group.front().after).c_str());
+    printf("%zu categories: %s -> %s\n", group.size(), LevelWords(group.front().before).c_str(),
+           LevelWords(group.front().after).c_str());
     return;
   }
   for (const LevelChange& change : group) PrintChange(change, false);
@@ -63,7 +61,7 @@ std::string TimeAfter(std::chrono::milliseconds span) {
 void TellLeft(const std::vector<LevelChange>& left, const TWDbgLogCfg& record) {
   for (const LevelChange& change : left) {
     Complain(std::string(Enum2String(change.categ)) + " was changed to " +
-             LevelText(record.Level(change.categ)) + " meanwhile and stays so");
+             LevelWords(record.Level(change.categ)) + " meanwhile and stays so");
   }
 }
 

@@ -20,7 +20,7 @@ struct ShowOptions : LogOptions {
 // Counts what was shown, because nothing found is a result of its own.
 class Shower {
  public:
-  explicit Shower(bool json) : m_printer(json) {}
+  explicit Shower(const LogOptions& options) : m_printer(options.json, options.mark) {}
 
   void Show(const LogMessage& message) {
     m_printer.Print(message);
@@ -37,7 +37,7 @@ class Shower {
 int Show(const ShowOptions& options) {
   const std::string path = LogPath(options);
   const LogFilter filter = MakeFilter(options, Now(), Direction::kBack);
-  Shower shower(options.json);
+  Shower shower(options);
   LogWindow window(options.count.value_or(0));
   const int error = ReadLog(path, filter, [&](const LogMessage& message) {
     options.count ? window.Add(message) : shower.Show(message);
@@ -62,6 +62,7 @@ void AddShow(CLI::App* app, int* exitCode) {
   AddFilterOptions(show, options.get());
   AddTimeOptions(show, options.get());
   AddJsonOption(show, options.get());
+  AddMarkOption(show, options.get());
   show->add_option("-n,--lines", options->count, "Show the last messages only, so many of them.")
       ->check(IsWholeNumber)
       ->type_name("COUNT");

@@ -95,7 +95,7 @@ class StatsWatch {
   StatsWatch(const StatsOptions& options, milliseconds interval)
       : m_options(options),
         m_interval(interval),
-        m_selector(MakeFilter(options, Now(), Direction::kAhead), Now()),
+        m_selector(MakeFilter(options, Now(), Direction::kAhead), Now(), false),
         m_tail(FollowedPath(options)),
         m_counter(WindowOf(m_selector.Filter())) {
     m_selector.Filter().since = Now() - m_counter.Window();

@@ -74,9 +74,10 @@ int ShowJson(const RecordSegment& segment, bool all) {
 void PrintSegment(const RecordSegment& segment) {
   printf("record       present, key %s\n", KeyText().c_str());
   printf("size         %zu bytes\n", segment.size);
-  printf("owner        %s:%s\n", UserName(segment.owner).c_str(), GroupName(segment.group).c_str());
+  const std::string owner = UserName(segment.owner) + ":" + GroupName(segment.group);
+  printf("owner        %s\n", EscapeControls(owner).c_str());
   printf("mode         %s\n", ModeText(segment.mode).c_str());
-  printf("attached     %s\n", EscapeControls(DescribeAttached(segment)).c_str());
+  printf("attached     %s\n", EscapeControls(DescribeAttached(segment), Backslash::kKept).c_str());
 }
 
 Colour ColourOf(int level) {
@@ -89,7 +90,7 @@ void PrintLevels(const TWDbgLogCfg& record, bool all) {
   const auto levels = LevelsOf(record, all);
   const size_t others = LOG_CATEG_COUNT - levels.size();
   for (const auto& [name, level] : levels) {
-    printf("%-15s%s\n", name.c_str(), Paint(ColourOf(level), LevelText(level), colour).c_str());
+    printf("%-15s%s\n", name.c_str(), Paint(ColourOf(level), LevelWords(level), colour).c_str());
   }
   if (others > 0) printf("%zu %s at notice\n", others, others == 1 ? "category" : "categories");
 }

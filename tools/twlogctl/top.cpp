@@ -32,7 +32,7 @@ class Top {
       : m_path(std::move(path)),
         m_terminal(terminal),
         m_signals(signals),
-        m_selector(LogFilter(), Now()),
+        m_selector(LogFilter(), Now(), false),
         m_tail(m_path) {}
 
   // Results: the signal that ended it, or 0.

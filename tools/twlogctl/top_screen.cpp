@@ -7,6 +7,7 @@
 #include <cwchar>
 
 #include "tools/common/amounts.h"
+#include "tools/common/terminal.h"
 #include "tools/twlogctl/report.h"
 
 namespace {
@@ -147,7 +148,9 @@ void DrawTooSmall() {
 }
 
 void DrawAll(const TopModel& model, const std::string& log) {
-  DrawBar(0, " twlogctl top   " + FormatClock(Now()) + Rate(model.Total()) + "   " + log,
+  DrawBar(0,
+          " twlogctl top   " + FormatClock(Now()) + Rate(model.Total()) + "   " +
+              EscapeControls(log, Backslash::kKept),
           A_REVERSE);
   DrawLine(1, " " + model.Note(), A_NORMAL);
   DrawLine(2, " category       level    lines/s      bytes/s      lines", A_BOLD);

@@ -3,9 +3,11 @@
 #include <ncurses.h>
 #include <sys/ioctl.h>
 #include <sys/signalfd.h>
+#include <term.h>
 #include <unistd.h>
 
 #include <cstdio>
+#include <cstdlib>
 #include <utility>
 
 #include "tools/common/terminal.h"
@@ -46,6 +48,25 @@ void DefineShortKeys() {
   define_key("\x1b[D", KEY_LEFT);
 }
 
+// A description of a terminal says what is sent to it, and root's environment may still name those
+// of the user who became root.
+void TakeSystemTerminalsAlone() {
+  if (geteuid() != 0) return;
+  for (const char* name : {"TERMINFO", "TERMINFO_DIRS", "TERMCAP", "TERMPATH", "HOME"}) {
+    unsetenv(name);
+  }
+}
+
+// Nothing can be drawn without it.
+bool MovesTheCursor() {
+  int error = 0;
+  if (setupterm(nullptr, STDOUT_FILENO, &error) != OK) return false;
+  const char* const cup = tigetstr("cup");
+  const bool moves = cup != nullptr && cup != reinterpret_cast<const char*>(-1);
+  del_curterm(cur_term);
+  return moves;
+}
+
 }  // namespace
 
 TopSignals::TopSignals() : m_fd(OpenSignals()) {}
@@ -66,6 +87,8 @@ void TopSignals::EndBy(int signal) {
 }
 
 bool TopTerminal::Open() {
+  TakeSystemTerminalsAlone();
+  if (!MovesTheCursor()) return false;
   // Not initscr, which ends the program when it fails.
   SCREEN* const screen = newterm(nullptr, stdout, stdin);
   if (screen == nullptr) return false;

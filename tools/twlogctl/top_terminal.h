@@ -29,7 +29,8 @@ class TopSignals {
 // The screen, put back as it was when this goes.
 class TopTerminal {
  public:
-  // Results: false when the type of the terminal is unknown.
+  // Results: false when the type of the terminal is unknown, or has no movement of the cursor. For
+  // root its description is one of the system's.
   bool Open();
   TopTerminal() = default;
   ~TopTerminal();

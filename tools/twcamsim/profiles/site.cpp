@@ -1,10 +1,11 @@
 // A whole camera: information, commands, services and an upload, in the open, below /basic behind
 // Basic and below /digest behind Digest.
+#include <fcntl.h>
 #include <fmt/format.h>
 
-#include <fstream>
 #include <mutex>
 
+#include "tools/common/private_file.h"
 #include "tools/twcamsim/profile.h"
 #include "tools/twcamsim/tell.h"
 #include "tools/twcamsim/upload_counter.h"
@@ -59,8 +60,15 @@ class Site : public Profile {
 
   Response Command(const Request& request) {
     const std::lock_guard<std::mutex> lock(mutex_);
-    if (!posted_.empty()) std::ofstream(posted_, std::ios::binary) << request.body;
+    if (!posted_.empty()) Keep(request.body);
     return MakeResponse(200, "text/plain", "ok\n");
+  }
+
+  // It may hold a password. What cannot be written is missed by whoever looks for it.
+  void Keep(const std::string& body) const {
+    std::string error;
+    const OwnedFd fd = OpenOwnFile(posted_, O_WRONLY | O_TRUNC, 0600, &error);
+    if (fd.Valid()) (void)WriteAll(fd, body);
   }
 
   const std::string posted_;
@@ -70,8 +78,8 @@ class Site : public Profile {
 std::unique_ptr<Profile> MakeSite(const ProfileOptions& options, std::string* error) {
   const auto found = options.find("posted");
   const std::string posted = found == options.end() ? "" : found->second;
-  if (!posted.empty() && !std::ofstream(posted, std::ios::binary)) {
-    *error = posted + " cannot be written";
+  if (!posted.empty() && !OpenOwnFile(posted, O_WRONLY | O_TRUNC, 0600, error).Valid()) {
+    *error = posted + " cannot be written (" + *error + ")";
     return nullptr;
   }
   return std::make_unique<Site>(posted);

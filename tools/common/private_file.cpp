@@ -1,0 +1,118 @@
+#include "tools/common/private_file.h"
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstring>
+#include <filesystem>
+
+namespace {
+
+OwnedFd Refuse(const std::string& path, const std::string& reason, std::string* error) {
+  *error = path + ": " + reason;
+  return OwnedFd(-1);
+}
+
+// A slash at the end would follow a link.
+std::string WithoutSlashes(std::string path) {
+  while (path.size() > 1 && path.back() == '/') path.pop_back();
+  return path;
+}
+
+bool IsBelow(const std::string& path, const char* folder) {
+  return path.compare(0, std::strlen(folder), folder) == 0;
+}
+
+bool ReadAll(int fd, size_t most, std::string* bytes) {
+  char piece[65536];
+  for (;;) {
+    const ssize_t count = read(fd, piece, sizeof(piece));
+    if (count == 0) return true;
+    if (count == -1 && errno == EINTR) continue;
+    if (count == -1) return false;
+    bytes->append(piece, static_cast<size_t>(count));
+    if (bytes->size() <= most) continue;
+    errno = EFBIG;
+    return false;
+  }
+}
+
+}  // namespace
+
+bool WriteAll(const OwnedFd& fd, const std::string& bytes) {
+  for (size_t done = 0; done < bytes.size();) {
+    const ssize_t count = write(fd.Get(), bytes.data() + done, bytes.size() - done);
+    if (count == -1 && errno == EINTR) continue;
+    if (count == -1) return false;
+    done += static_cast<size_t>(count);
+  }
+  return true;
+}
+
+OwnedFd OpenPrivateFolder(const std::string& path, std::string* error) {
+  const std::string folder = WithoutSlashes(path);
+  std::error_code ignored;  // mkdir tells what is wrong
+  const auto above = std::filesystem::path(folder).parent_path();
+  if (!above.empty()) std::filesystem::create_directories(above, ignored);
+  if (mkdir(folder.c_str(), 0700) != 0 && errno != EEXIST) {
+    return Refuse(folder, std::strerror(errno), error);
+  }
+  OwnedFd fd(open(folder.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
+  if (!fd.Valid()) {
+    struct stat state = {};
+    const int reason = errno;
+    const bool link = lstat(folder.c_str(), &state) == 0 && S_ISLNK(state.st_mode);
+    return Refuse(folder, link ? "it is a link" : std::strerror(reason), error);
+  }
+  struct stat state = {};
+  if (fstat(fd.Get(), &state) != 0) return Refuse(folder, std::strerror(errno), error);
+  if (state.st_uid != geteuid()) return Refuse(folder, "it belongs to another user", error);
+  return fd;
+}
+
+bool WritePrivateFile(const OwnedFd& folder, const std::string& name, const std::string& bytes,
+                      std::string* error) {
+  unlinkat(folder.Get(), name.c_str(), 0);  // where it cannot, the next call tells
+  const int flags = O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC;
+  const OwnedFd fd(openat(folder.Get(), name.c_str(), flags, 0600));
+  if (fd.Valid() && WriteAll(fd, bytes)) return true;
+  *error = name + ": " + std::strerror(errno);
+  return false;
+}
+
+OwnedFd OpenOwnFile(const std::string& path, int flags, mode_t mode, std::string* error) {
+  const bool system = IsBelow(path, "/dev/") || IsBelow(path, "/proc/");
+  struct stat state = {};
+  const auto foreign = [&] { return !S_ISCHR(state.st_mode) && state.st_uid != geteuid(); };
+  // Before it is opened, too: the open of somebody else's FIFO would wait.
+  if (!system && lstat(path.c_str(), &state) == 0) {
+    if (S_ISLNK(state.st_mode)) return Refuse(path, "it is a link", error);
+    if (foreign()) return Refuse(path, "it belongs to another user", error);
+  }
+  OwnedFd fd(open(path.c_str(), flags | O_CREAT | O_CLOEXEC | (system ? 0 : O_NOFOLLOW), mode));
+  if (!fd.Valid() || fstat(fd.Get(), &state) != 0) {
+    return Refuse(path, std::strerror(errno), error);
+  }
+  if (!system && foreign()) return Refuse(path, "it belongs to another user", error);
+  return fd;
+}
+
+bool ReadRegularFile(const OwnedFd& folder, const std::string& name, size_t most,
+                     std::string* bytes, std::string* error) {
+  const int flags = O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC;
+  const OwnedFd fd(openat(folder.Get(), name.c_str(), flags));
+  struct stat state = {};
+  if (!fd.Valid() || fstat(fd.Get(), &state) != 0) {
+    *error = name + ": " + (errno == ELOOP ? "it is a link" : std::strerror(errno));
+    return false;
+  }
+  if (!S_ISREG(state.st_mode)) {
+    *error = name + ": it is no regular file";
+    return false;
+  }
+  if (ReadAll(fd.Get(), most, bytes)) return true;
+  *error = name + ": " + std::strerror(errno);
+  return false;
+}

@@ -1,0 +1,45 @@
+// Lines that cannot be what they say.
+#ifndef TARNWICK_TOOLS_TWLOGCTL_LOG_DOUBT_H_
+#define TARNWICK_TOOLS_TWLOGCTL_LOG_DOUBT_H_
+
+#include <map>
+#include <optional>
+
+#include "tools/twlogctl/log_time.h"
+
+// Whether a process can have written a line, as far as /proc knows: not one with a number that this
+// system does not give; and not one that runs and was started after the line. The latter is certain
+// only while no number was given twice since the start of the system.
+class ProcessNumbers {
+ public:
+  ProcessNumbers();
+
+  bool CannotHaveWritten(int pid, std::optional<Moment> moment);
+
+ private:
+  std::optional<Moment> StartOf(int pid);
+
+  int m_largest;
+  std::optional<Moment> m_uniqueSince;
+  std::map<int, std::optional<Moment>> m_starts;
+};
+
+// Judges the first lines of a log's messages one after another.
+class LineDoubts {
+ public:
+  // With `ownLog` the log's writers are processes of this machine, which /proc knows.
+  explicit LineDoubts(bool ownLog) {
+    if (ownLog) m_numbers.emplace();
+  }
+
+  // `newest` is no earlier than the log's last line.
+  bool Doubts(int pid, std::optional<Moment> moment, Moment newest);
+
+ private:
+  bool RunsBack(std::optional<Moment> moment, Moment newest);
+
+  std::optional<ProcessNumbers> m_numbers;
+  std::optional<Moment> m_before;
+};
+
+#endif  // TARNWICK_TOOLS_TWLOGCTL_LOG_DOUBT_H_
