@@ -7,7 +7,7 @@
 #include <cstdlib>
 #include <cstring>
 
-#include "tools/common/utf8.h"
+#include "tarnwick/utils/utf8.h"
 
 namespace {
 
@@ -100,7 +100,7 @@ std::string EscapeControls(std::string_view text) {
   std::string result;
   result.reserve(text.size());
   while (!text.empty()) {
-    const size_t length = Utf8CharacterLength(text);
+    const size_t length = tarnwick::Utf8CharacterLength(text);
     const std::string_view character = text.substr(0, length == 0 ? 1 : length);
     if (length > 0 && IsPlain(character)) {
       result.append(character);
