@@ -16,7 +16,22 @@ target_compile_definitions(tarnwick_options INTERFACE _GNU_SOURCE _FILE_OFFSET_B
 if(CMAKE_BUILD_TYPE STREQUAL "Debug")
   target_compile_definitions(tarnwick_options INTERFACE _GLIBCXX_ASSERTIONS)
 elseif(NOT TARNWICK_SANITIZE)
-  target_compile_options(tarnwick_options INTERFACE -U_FORTIFY_SOURCE -D_FORTIFY_SOURCE=2)
+  # The C library's checks of buffer sizes, unless the flags or the compiler's default have decided:
+  # a distribution's choice may be a stronger one. A default shows only when it optimises.
+  string(TOUPPER "${CMAKE_BUILD_TYPE}" build_type)
+  set(flags "${CMAKE_CXX_FLAGS} ${CMAKE_CXX_FLAGS_${build_type}}")
+  include(CheckCXXSourceCompiles)
+  set(CMAKE_REQUIRED_FLAGS "${CMAKE_CXX_FLAGS_${build_type}} -O2")
+  unset(fortify_is_open CACHE)  # the flags may have changed
+  check_cxx_source_compiles("
+    #ifdef _FORTIFY_SOURCE
+    #error decided
+    #endif
+    int main() {}" fortify_is_open)
+  unset(CMAKE_REQUIRED_FLAGS)
+  if(fortify_is_open AND NOT flags MATCHES "_FORTIFY_SOURCE")
+    target_compile_options(tarnwick_options INTERFACE -D_FORTIFY_SOURCE=2)
+  endif()
 endif()
 if(TARNWICK_SANITIZE)
   # Undefined behaviour is looked for in the library: in GoogleTest's macros it would double the

@@ -9,7 +9,7 @@
 // Programs that were built with the same major version run with this library; a minor version adds
 // names, a patch adds none.
 #define TARNWICK_VERSION_MAJOR 1
-#define TARNWICK_VERSION_MINOR 0
+#define TARNWICK_VERSION_MINOR 1
 #define TARNWICK_VERSION_PATCH 0
 
 // The version as one number that grows: 10203 is 1.2.3.

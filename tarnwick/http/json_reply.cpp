@@ -7,6 +7,7 @@
 #include <cstdint>
 
 #include "tarnwick/log/twdebuglog.h"
+#include "tarnwick/net/request_settings.h"
 
 namespace {
 
@@ -128,7 +129,8 @@ int JsonParse(const std::string& text, Json::Value& value) {
   if (!Parse(text, &value, &error)) {
     // Without the level gate and without tags; pinned by JsonParse.ItsLineHasNoGate.
     TWPrintf(LOG_TYPE_MAIN, nullptr, nullptr, "twhttp", __LINE__, __func__,
-             "Failed to parse json: [%s] with error [%s]\n", text.c_str(), error.c_str());
+             "Failed to parse json: [%s] with error [%s]\n", tarnwick::PeerText(text.c_str()).Get(),
+             tarnwick::PeerText(error.c_str()).Get());
     return -1;
   }
   return IsSuccess(value) ? 0 : -2;

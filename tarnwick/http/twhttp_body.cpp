@@ -12,6 +12,7 @@
 #include "tarnwick/http/chunk_size.h"
 #include "tarnwick/http/twhttp.h"
 #include "tarnwick/log/twdebuglog.h"
+#include "tarnwick/net/request_settings.h"
 #include "tarnwick/net/socket_access.h"
 
 namespace {
@@ -103,7 +104,8 @@ int TWHttpClient::ReadBodyFor(const char* operation, std::string* body) {
     TW_LOG_AS(operation, LOG_CATEG_HTTP, LOG_LEVEL_DEBUG, "Read data error\n");
     return HTTP_RET_IO_ERROR;
   }
-  TW_LOG_AS(operation, LOG_CATEG_HTTP, LOG_LEVEL_DEBUG2, "strRet = %s\n", body->c_str());
+  TW_LOG_AS(operation, LOG_CATEG_HTTP, LOG_LEVEL_DEBUG2, "strRet = %s\n",
+            tarnwick::PeerText(body->c_str()).Get());
   return HTTP_RET_OK;
 }
 

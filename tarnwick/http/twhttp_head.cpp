@@ -6,6 +6,7 @@
 #include "tarnwick/http/head_parser.h"
 #include "tarnwick/http/twhttp.h"
 #include "tarnwick/log/twdebuglog.h"
+#include "tarnwick/net/request_settings.h"
 
 namespace {
 
@@ -51,7 +52,7 @@ int TWHttpClient::CheckContentType() try {
       return HTTP_RET_IO_ERROR;
     }
     if (length == 0) break;
-    TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_DEBUG3, "%s\n", line);
+    TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_DEBUG3, "%s\n", tarnwick::PeerText(line).Get());
     if (!KeepHeader(line)) return HTTP_RET_NOT_READY;
   }
   // Lines beyond the last allowed one are left in front of the body.

@@ -7,6 +7,7 @@
 #include "tarnwick/http/json_reply.h"
 #include "tarnwick/http/twhttp.h"
 #include "tarnwick/log/twdebuglog.h"
+#include "tarnwick/net/request_settings.h"
 #include "tarnwick/utils/utils.h"
 
 namespace {
@@ -55,7 +56,7 @@ int GetJson(const std::string& host, int port, std::string path, Json::Value& re
   }
   if (JsonParse(body, result) != 0) {
     TW_LOG_AS(kSendHttpGet, LOG_CATEG_HTTP, LOG_LEVEL_ERROR, "Failed to parse json [%s].\n",
-              body.c_str());
+              tarnwick::PeerText(body.c_str()).Get());
     return -2;
   }
   return 0;
@@ -86,7 +87,7 @@ int GetJsonOverTls(const std::string& host, int port, const std::string& path, J
   const std::string text = client.GetCurlText();
   if (JsonParse(text, result) != 0) {
     TW_LOG_AS(kSendHttpsGet, LOG_CATEG_HTTP, LOG_LEVEL_ERROR,
-              "Failed to parse json. Result is [%s]\n", text.c_str());
+              "Failed to parse json. Result is [%s]\n", tarnwick::PeerText(text.c_str()).Get());
     return -3;
   }
   return 0;

@@ -14,6 +14,7 @@
 #include "tarnwick/platform/file_lock.h"
 #include "tarnwick/platform/owned.h"
 #include "tarnwick/platform/qlibcfile.h"
+#include "tarnwick/platform/settings_file.h"
 
 namespace {
 
@@ -47,12 +48,18 @@ int ReadSettingValue(const char* path, const char* key, char* value, int size) {
   return QLIBCFileGetKeyValue(path, key, value, size, 0);
 }
 
-int WriteSettingValue(const char* path, const char* key, const char* value, const char* format) {
-  const OwnedFd fd(open(path, O_RDONLY | O_CREAT | O_CLOEXEC, 0644));
+int WriteSettingValue(const char* path, const char* key, const char* value,
+                      const char* format) try {
+  std::string file;
+  struct stat attributes;
+  if (!tarnwick::FollowSettingsLinks(path, &file)) return -1;
+  const OwnedFd fd(tarnwick::OpenSettings(file.c_str(), O_CREAT | O_NOFOLLOW, 0644, &attributes));
   if (!fd.Valid()) return -1;
   const FileLock lock(fd.Get());
   if (!lock.Held()) return -1;
   return QLIBCFileSetKeyValue(path, key, value, format);
+} catch (const std::exception&) {  // memory ran out
+  return -1;
 }
 
 int TWDbgLogCfg::Init(int /*unused*/) {

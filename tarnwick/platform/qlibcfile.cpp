@@ -11,6 +11,7 @@
 
 #include "tarnwick/platform/file_lock.h"
 #include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/settings_file.h"
 #include "tarnwick/platform/settings_text.h"
 
 namespace {
@@ -18,19 +19,6 @@ namespace {
 // The name under which the new text is written: fixed, because writers exclude each other, and so a
 // crashed writer's leftover is found and removed by the next.
 constexpr char kNewSuffix[] = ".tarnwick-new";
-
-bool ReadAll(int fd, std::string* text) {
-  char piece[4096];
-  for (;;) {
-    const ssize_t count = read(fd, piece, sizeof(piece));
-    if (count == 0) return true;
-    if (count > 0) {
-      text->append(piece, static_cast<size_t>(count));
-    } else if (errno != EINTR) {
-      return false;
-    }
-  }
-}
 
 bool WriteAll(int fd, std::string_view text) {
   while (!text.empty()) {
@@ -51,11 +39,12 @@ struct OldFile {
   std::string text;
 };
 
+// REQUIRES: the folder's lock. Links were followed before; one that took the file's place is not.
 bool ReadOldFile(const std::string& path, OldFile* old) {
-  const OwnedFd fd(open(path.c_str(), O_RDONLY | O_CLOEXEC));
+  const OwnedFd fd(tarnwick::OpenSettings(path.c_str(), O_NOFOLLOW, 0, &old->attributes));
   if (!fd.Valid()) return errno == ENOENT;
   old->exists = true;
-  return fstat(fd.Get(), &old->attributes) == 0 && ReadAll(fd.Get(), &old->text);
+  return tarnwick::ReadSettings(fd.Get(), &old->text);
 }
 
 // Owner first: changing it clears mode bits.
@@ -65,8 +54,15 @@ bool KeepAttributes(int fd, const OldFile& old) {
          fchmod(fd, old.attributes.st_mode & 07777) == 0;
 }
 
+// Who opens the new file before it has the old one's attributes could read the text that follows:
+// it starts with no right that the old one does not give its owner.
+mode_t FirstMode(const OldFile& old) {
+  return old.exists ? old.attributes.st_mode & 0600 : 0644;
+}
+
 bool WriteNewFile(const std::string& path, const OldFile& old, std::string_view text) {
-  const OwnedFd fd(open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, 0644));
+  constexpr int kNew = O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC;
+  const OwnedFd fd(open(path.c_str(), kNew, FirstMode(old)));
   return fd.Valid() && KeepAttributes(fd.Get(), old) && WriteAll(fd.Get(), text) &&
          fsync(fd.Get()) == 0;
 }
@@ -81,30 +77,33 @@ bool ReplaceFile(const std::string& path, const OldFile& old, std::string_view t
   return false;
 }
 
-// The file behind symbolic links, so that the rename replaces the file and not the link. A path
-// that does not exist yet stays as it is. Results: empty for a link to nowhere.
-std::string ResolvePath(const char* path) {
-  const OwnedMemory<char> real(realpath(path, nullptr));
-  if (real) return real.get();
-  struct stat attributes;
-  return lstat(path, &attributes) == 0 ? "" : path;
-}
+// What a rewrite is about.
+struct Rewrite {
+  std::string path;  // no link
+  bool mayBeNew;
+  std::string_view key;
+  std::string_view line;
+};
 
-std::string FolderOf(const std::string& path) {
-  const size_t slash = path.rfind('/');
-  if (slash == std::string::npos) return ".";
-  return slash == 0 ? "/" : path.substr(0, slash);
+// REQUIRES: the folder's lock.
+bool ReplaceKey(const Rewrite& rewrite) {
+  OldFile old;
+  if (!ReadOldFile(rewrite.path, &old)) return false;
+  if (!old.exists && !rewrite.mayBeNew) return false;
+  const std::string text = ReplaceSettingsLine(old.text, rewrite.key, rewrite.line);
+  if (text.size() <= tarnwick::kMostSettings) return ReplaceFile(rewrite.path, old, text);
+  errno = EFBIG;
+  return false;
 }
 
 // Replaces the key's line under the lock of the file's folder. The file itself cannot carry the
 // lock: callers hold its flock already, and it is another file after each rewrite.
-bool RewriteKey(const std::string& path, std::string_view key, std::string_view line) {
-  const OwnedFd folder(open(FolderOf(path).c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+bool RewriteKey(const Rewrite& rewrite) {
+  const std::string path = tarnwick::FolderOf(rewrite.path);
+  const OwnedFd folder(open(path.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
   if (!folder.Valid()) return false;
   const FileLock lock(folder.Get());
-  OldFile old;
-  if (!lock.Held() || !ReadOldFile(path, &old)) return false;
-  if (!ReplaceFile(path, old, ReplaceSettingsLine(old.text, key, line))) return false;
+  if (!lock.Held() || !ReplaceKey(rewrite)) return false;
   // The new text is in place; only a crash of the machine could still undo the renaming.
   fsync(folder.Get());
   return true;
@@ -127,9 +126,10 @@ __attribute__((weak)) int QLIBCFileGetKeyValue(const char* path, const char* key
   if (path == nullptr || key == nullptr || key[0] == '\0' || value == nullptr || size < 1) {
     return RefuseFor(EINVAL);
   }
-  const OwnedFd fd(open(path, O_RDONLY | O_CLOEXEC));
+  struct stat attributes;
+  const OwnedFd fd(tarnwick::OpenSettings(path, 0, 0, &attributes));
   std::string text;
-  if (!fd.Valid() || !ReadAll(fd.Get(), &text)) return -1;
+  if (!fd.Valid() || !tarnwick::ReadSettings(fd.Get(), &text)) return -1;
   const SettingsLine line = IsKey(key) ? FindSettingsLine(text, key) : SettingsLine();
   const size_t stored = line.value.copy(value, static_cast<size_t>(size) - 1);
   value[stored] = '\0';
@@ -146,8 +146,10 @@ __attribute__((weak)) int QLIBCFileSetKeyValue(const char* path, const char* key
   if (strchr(value, '\n') != nullptr || !FormatSettingsLine(format, key, value, &line)) {
     return RefuseFor(EINVAL);
   }
-  const std::string file = ResolvePath(path);
-  return !file.empty() && RewriteKey(file, key, line) ? 0 : -1;
+  std::string file;
+  if (!tarnwick::FollowSettingsLinks(path, &file)) return -1;
+  // A link to nowhere stays one.
+  return RewriteKey({file, file == path, key, line}) ? 0 : -1;
 } catch (const std::exception&) {
   return RefuseFor(ENOMEM);
 }

@@ -2,7 +2,8 @@
 //
 // The file holds one `key="value"` pair a line. Blanks around the key and a value without quotes
 // are accepted when reading; lines that start with "#" and lines of any other shape are left alone.
-// When a key stands on several lines, the first one is meant.
+// When a key stands on several lines, the first one is meant. It is a regular file of at most 1 MiB:
+// a directory, a FIFO or a device at its path is refused without a wait, unread and unwritten.
 //
 // libtarnwick brings a stand-alone version of both. They are weak symbols: a program that has
 // functions of these names in its own objects replaces them, whether it links the shared library or
@@ -21,7 +22,9 @@ extern "C" {
 //   terminating zero byte are stored. `flags` is accepted for the platform's sake and not used.
 // Results: the length of the whole value in bytes when the key was found, also when the buffer held
 //   only a part of it; 0 when the key is not in the file or its value is empty; -1 when the file
-//   could not be read (errno tells why) or an argument is null, empty or not positive.
+//   could not be read (errno tells why: EFBIG beyond 1 MiB, EISDIR for a directory, EINVAL for a
+//   FIFO or a device) or an argument is null, empty or not positive.
+// A symbolic link is followed, whoever made it: nothing is written.
 // After 0, `value` is an empty string; after -1, `value` is untouched.
 // Threads: safe from any thread and process. A reader never sees a half-written file. Does not wait
 //   for writers.
@@ -33,11 +36,17 @@ TARNWICK_API int QLIBCFileGetKeyValue(const char* path, const char* key, char* v
 // Arguments: `format` is the line to write, with two "%s" for key and value in this order and no
 //   other conversion but "%%", for example "%s=\"%s\"\n". The key is a word without blanks, "=" and
 //   "#", the value holds no line feed: the file could not be read back.
-// Results: 0 on success; -1 on failure (errno tells why), with the file as it was.
+// Results: 0 on success; -1 on failure (errno tells why; EFBIG when the old or the new text is longer
+//   than 1 MiB, ELOOP for a link that is not followed), with the file as it was.
 // The file is replaced in one step (written beside the old one, synchronised, renamed over it), so
 //   a reader or a crash finds the old or the new text. Other keys, comments and unknown lines, the
-//   file's mode and its owner stay; when the owner cannot be kept, the call fails. A new file gets
-//   mode 0644 less the umask. A symbolic link stays a link.
+//   file's mode and its owner stay; when the owner cannot be kept, the call fails. The text is
+//   written after the new file has all three, and before that the new file gives no right that the
+//   old one does not give its owner. A new file gets mode 0644 less the umask.
+// A symbolic link at the path is followed and stays a link when it belongs to root or to the caller
+//   (effective user), and so is one that it leads to; any other user's is refused (ELOOP), wherever
+//   it points. A link to a missing file is refused (ENOENT). The directories of the path are those
+//   that the system finds: keep them closed to other users.
 // Threads: safe from any thread and process. Writers, whether they lock the settings file
 //   themselves or not, wait for each other on a lock of the directory for as long as it takes.
 TARNWICK_API int QLIBCFileSetKeyValue(const char* path, const char* key, const char* value,

@@ -77,6 +77,14 @@ TEST(ManPlatform, TheSettingIsDoubled) {
   EXPECT_EQ(DoubleSetting(folder.File("none").c_str(), "rate"), -1);
 }
 
+TEST(ManScope, TheDevicesTextIsEscaped) {
+  ScriptedPeer peer({Exchange("HTTP/1.1 200 OK\r\n\r\n<a>\n")});
+  const LogCapture log(1);
+  EXPECT_EQ(AskDevice("127.0.0.1", peer.Port()), -2);
+  EXPECT_THAT(log.Lines("http"), ElementsAre(IsLog("http", "error", "twhttp", "SendHttpGet",
+                                                   "Failed to parse json [<a>\\x0A].\n")));
+}
+
 TEST(ManVersion, TheLibraryIsTheOneOfTheBuild) {
   EXPECT_TRUE(LibraryIsNewEnough());
 }

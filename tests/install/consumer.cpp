@@ -15,6 +15,7 @@
 #include "tarnwick/http/twhttp.h"
 #include "tarnwick/log/twdebuglog.h"
 #include "tarnwick/net/sslsocket.h"
+#include "tarnwick/net/twrequestscope.h"
 #include "tarnwick/net/twsocket.h"
 #include "tarnwick/platform/export.h"
 #include "tarnwick/platform/qlibcfile.h"
@@ -66,6 +67,9 @@ void CheckUtilsAndNet() {
 
 void CheckHttp() {
   Json::Value reply;
+  TWRequestScope scope;
+  scope.SetEscapedLog(true);
+  Expect(scope.Valid(), "there is memory for a scope");
   Expect(SendHttpGet("127.0.0.1", 1, "/", reply, 1, false) == -1, "a request fails");
   CURL* handle = TWCurlInit();
   Expect(handle != nullptr, "libcurl is ready");

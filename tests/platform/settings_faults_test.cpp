@@ -97,8 +97,17 @@ TEST_F(SettingsFile, EachSynchronisationMayFail) {
 TEST_F(SettingsFile, TheRemovalOfALeftoverMayFail) {
   ExpectAllOrNothing(Call::kUnlink, true);
 }
-TEST_F(SettingsFile, ThePathMayBeUnresolvable) {
-  ExpectAllOrNothing(Call::kRealpath, true);
+TEST_F(SettingsFile, ALinkMayBeUnreadable) {
+  const TempDir folder;
+  const std::string link = folder.File("link");
+  ASSERT_EQ(symlink(kPath, link.c_str()), 0);
+  const int runs = ForEachFailingCall(Call::kReadlinkat, [&](Faults& faults) {
+    WriteFile(kPath, kOld);
+    const int result = QLIBCFileSetKeyValue(link.c_str(), "name", "new", kFormat);
+    EXPECT_EQ(result, faults.Struck() ? -1 : 0);
+    EXPECT_EQ(ReadFile(kPath), result == 0 ? kNew : kOld);
+  });
+  EXPECT_EQ(runs, 1);
 }
 
 TEST_F(SettingsFile, TheFilesOwnSynchronisationIsNotSkipped) {

@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 #include <sched.h>
 #include <sys/mount.h>
+#include <sys/prctl.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -48,6 +49,7 @@ std::string Serialize(const CaseResult& result) {
 
 [[noreturn]] void RunInOwnProcess(const StressCase& stress_case, bool quick, int output) {
   setpgid(0, 0);
+  prctl(PR_SET_PDEATHSIG, SIGKILL);  // it does not outlive a run that is stopped
   EnterFreshFolders();
   CaseResult result(quick);
   stress_case.body(result);

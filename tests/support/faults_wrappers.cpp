@@ -109,9 +109,11 @@ PASS(Call::kFchown, int, fchown, (int fd, uid_t user, gid_t group), (fd, user, g
 PASS(Call::kFsync, int, fsync, (int fd), (fd))
 PASS(Call::kRename, int, rename, (const char* from, const char* to), (from, to))
 PASS(Call::kUnlink, int, unlink, (const char* path), (path))
-PASS(Call::kRealpath, char*, realpath, (const char* path, char* resolved), (path, resolved))
-PASS(Call::kRealpath, char*, __realpath_chk, (const char* path, char* resolved, size_t room),
-     (path, resolved, room))
+PASS(Call::kReadlinkat, ssize_t, readlinkat, (int fd, const char* path, char* target, size_t room),
+     (fd, path, target, room))
+PASS(Call::kReadlinkat, ssize_t, __readlinkat_chk,
+     (int fd, const char* path, char* target, size_t length, size_t room),
+     (fd, path, target, length, room))
 PASS(Call::kMkostemp, int, mkostemp, (char* pattern, int flags), (pattern, flags))
 PASS(Call::kMkostemp, int, mkostemp64, (char* pattern, int flags), (pattern, flags))
 PASS(Call::kMkostemp, int, mkstemp, (char* pattern), (pattern))

@@ -7,6 +7,8 @@
 
 #include "tarnwick/log/log_settings.h"
 #include "tarnwick/log/twdebuglog.h"
+#include "tarnwick/net/request_settings.h"
+#include "tarnwick/net/twrequestscope.h"
 #include "tarnwick/platform/qlibcfile.h"
 #include "tests/support/files.h"
 #include "tests/support/log_capture.h"
@@ -65,6 +67,28 @@ void GatedLine(Stage& stage) {
   stage.ExpectEither(EndsWith(text, "(): message 5\n"), IsCut(text),
                      "the line is not whole: " + text);
   stage.Expect(named || unnamed || text.empty(), "the names are wrong: " + text);
+  unlink(kMainLog);
+}
+
+// Without memory for the scope the text stands as it is, without memory for the text the line says
+// so.
+void EscapedLine(Stage& stage) {
+  unlink(kMainLog);
+  const std::string tail(40, 'b');
+  const std::string text = "a\n" + tail;
+  bool valid = false;
+  stage.Run([&] {
+    TWRequestScope scope;
+    valid = scope.Valid();
+    scope.SetEscapedLog(true);
+    TWPrintf(LOG_TYPE_MAIN, "http", "warn", "file", 7, "func", "%s\n",
+             tarnwick::PeerText(text.c_str()).Get());
+  });
+  const std::string log = ReadFile(kMainLog);
+  const bool lost =
+      valid ? EndsWith(log, "(): (no memory)\n") : EndsWith(log, "(): " + text + "\n");
+  stage.ExpectEither(valid && EndsWith(log, "(): a\\x0A" + tail + "\n"), lost || IsCut(log),
+                     "the line is wrong: " + log);
   unlink(kMainLog);
 }
 
@@ -193,6 +217,7 @@ std::vector<Operation> LogOperations() {
       {"log_line", Peer::kNone, MainLogLine},
       {"log_notification", Peer::kNone, NotificationLine},
       {"log_gate", Peer::kNone, GatedLine, true},
+      {"log_escaped", Peer::kNone, EscapedLine},
       {"log_undefined", Peer::kNone, UndefinedLog},
       {"record_attach", Peer::kNone, RecordAttach},
       {"settings_load", Peer::kNone, SettingsLoad, true},

@@ -98,6 +98,7 @@ constexpr NumberedCall kCalls[] = {
     PLAIN(rename, EIO),
     PLAIN(unlink, EACCES),
     PLAIN(readlink, EACCES),
+    PLAIN(readlinkat, EACCES),
     PLAIN(shmget, ENOENT),
     PLAIN(shmat, EACCES),
     PLAIN(mmap, ENOMEM),

@@ -5,7 +5,7 @@
 #include <cstdio>
 #include <string_view>
 
-#include "tools/common/utf8.h"
+#include "tarnwick/utils/utf8.h"
 
 namespace {
 
@@ -16,7 +16,7 @@ std::string ReplaceInvalid(std::string_view text) {
   std::string result;
   result.reserve(text.size());
   while (!text.empty()) {
-    const size_t length = Utf8CharacterLength(text);
+    const size_t length = tarnwick::Utf8CharacterLength(text);
     result.append(length > 0 ? text.substr(0, length) : kReplacement);
     text.remove_prefix(length > 0 ? length : 1);
   }

@@ -9,7 +9,7 @@
 #include <cstring>
 #include <iterator>
 
-#include "tools/common/utf8.h"
+#include "tarnwick/utils/utf8.h"
 
 namespace {
 
@@ -138,7 +138,7 @@ std::string EscapeControls(std::string_view text, Backslash backslash) {
   std::string result;
   result.reserve(text.size());
   while (!text.empty()) {
-    const size_t length = Utf8CharacterLength(text);
+    const size_t length = tarnwick::Utf8CharacterLength(text);
     const std::string_view character = text.substr(0, length == 0 ? 1 : length);
     if (length > 1 && IsHidden(CodePoint(character))) {
       AppendHidden(CodePoint(character), &result);

@@ -31,6 +31,9 @@ long StatusOf(const std::string& url);
 // Results: 0, or -1 with the file as it was.
 int DoubleSetting(const char* path, const char* key);
 
+// The result of SendHttpGet; what it logs of the device is escaped.
+int AskDevice(const std::string& host, int port);
+
 bool LibraryIsNewEnough();
 
 #endif  // TARNWICK_DOCS_MAN_EXAMPLES_EXAMPLES_H_

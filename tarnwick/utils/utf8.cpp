@@ -1,4 +1,6 @@
-#include "tools/common/utf8.h"
+#include "tarnwick/utils/utf8.h"
+
+namespace tarnwick {
 
 namespace {
 
@@ -40,3 +42,5 @@ size_t Utf8CharacterLength(std::string_view text) {
   }
   return 0;
 }
+
+}  // namespace tarnwick
