@@ -8,6 +8,7 @@
 
 #include "tarnwick/log/twdebuglog.h"
 #include "tarnwick/net/request_settings.h"
+#include "tarnwick/platform/cancel.h"
 
 namespace {
 
@@ -25,6 +26,7 @@ constexpr size_t kUnknownStack = 65536;
 
 // Bytes between here and the end of the thread's stack.
 size_t StackLeft() {
+  const NoCancel no_cancel;
   pthread_attr_t attributes;
   if (pthread_getattr_np(pthread_self(), &attributes) != 0) return kUnknownStack;
   void* lowest = nullptr;

@@ -82,6 +82,10 @@ enum {
 // client's time-out at each wait for the peer, of which a slow one may need many; a write, and the
 // TLS handshake, have no limit. docs/longest-call.md tells the sums.
 // Threads: one thread uses an object at a time; separate objects may run in separate threads.
+// Cancellation: a thread may be cancelled (pthread_cancel, the deferred kind) in any operation, of
+//   the one-call functions too. It ends at a wait for the peer, or after a name look-up, a TLS
+//   handshake or a transfer through libcurl, which are not left in the middle. The client may then
+//   be destroyed, or used for another request.
 class TARNWICK_API TWHttpClient {
  public:
   // A client without a server; Init must follow. Until then every operation fails.

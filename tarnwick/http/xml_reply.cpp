@@ -9,6 +9,8 @@
 #include <cstring>
 #include <memory>
 
+#include "tarnwick/platform/cancel.h"
+
 namespace {
 
 struct XmlParserDeleter {
@@ -127,6 +129,7 @@ void HandleError(void* context, xmlError* error) {
 // The parser hands out what it has when there is no memory for a text or an attribute, and callers
 // would take half a document for a whole one.
 xmlDoc* ParseXml(const char* text, int size) {
+  const NoCancel no_cancel;
   const QuietErrors quiet;
   xmlResetLastError();
   const std::unique_ptr<xmlParserCtxt, XmlParserDeleter> parser(

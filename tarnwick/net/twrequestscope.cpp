@@ -10,9 +10,7 @@ namespace tarnwick {
 
 namespace {
 
-// In the memory that each thread starts with: of a library that dlopen has loaded, the first access
-// of a thread would else allocate, and glibc (2.36) ends the process when it cannot.
-__attribute__((tls_model("initial-exec"))) thread_local RequestSettings* t_settings = nullptr;
+thread_local RequestSettings* t_settings = nullptr;
 
 }  // namespace
 

@@ -21,9 +21,9 @@ struct addrinfo;
 // The object is large (a 64 KiB buffer lies inside it): create it on the heap. A class that derives
 // from it may be compiled with -fno-rtti and -fno-exceptions.
 // Threads: one thread uses an object at a time.
-// Cancellation: a thread may be cancelled in any operation. It ends in a wait for the peer, or after
-//   the operation: a name look-up is not left. The object may then be destroyed, disconnected or
-//   connected again.
+// Cancellation: a thread may be cancelled (pthread_cancel, the deferred kind) in any operation. It
+//   ends at a wait for the peer, or after a name look-up or a call of OpenSSL, which are not left in
+//   the middle. The object may then be destroyed, disconnected or connected again.
 class TARNWICK_API TWSocket {
  public:
   // What a wait is for.

@@ -9,6 +9,7 @@
 #include <string>
 #include <string_view>
 
+#include "tarnwick/platform/cancel.h"
 #include "tarnwick/platform/file_lock.h"
 #include "tarnwick/platform/owned.h"
 #include "tarnwick/platform/settings_file.h"
@@ -123,6 +124,7 @@ int RefuseFor(int error) {
 
 __attribute__((weak)) int QLIBCFileGetKeyValue(const char* path, const char* key, char* value,
                                                int size, int /*flags*/) try {
+  const NoCancel no_cancel;
   if (path == nullptr || key == nullptr || key[0] == '\0' || value == nullptr || size < 1) {
     return RefuseFor(EINVAL);
   }
@@ -140,6 +142,7 @@ __attribute__((weak)) int QLIBCFileGetKeyValue(const char* path, const char* key
 
 __attribute__((weak)) int QLIBCFileSetKeyValue(const char* path, const char* key, const char* value,
                                                const char* format) try {
+  const NoCancel no_cancel;
   if (path == nullptr || !IsKey(key) || value == nullptr || format == nullptr)
     return RefuseFor(EINVAL);
   std::string line;

@@ -1,7 +1,8 @@
 // Small helpers that the daemons share: pacing, text and encodings, whole-buffer writes, threads.
 //
 // Unless a declaration says otherwise, the functions are safe from any thread and do not log. Those
-// that return std::string throw std::bad_alloc when memory runs out.
+// that return std::string throw std::bad_alloc when memory runs out. WriteFd and DelayTimer::Delay are
+// cancellation points (pthread_cancel); nothing is lost there but what is not yet written.
 #ifndef TARNWICK_UTILS_UTILS_H_
 #define TARNWICK_UTILS_UTILS_H_
 
@@ -14,6 +15,18 @@
 
 #include "tarnwick/platform/export.h"
 
+// Where time_t has 64 bits on a 32-bit system, a class that holds a time has another size than with
+// 32 bits, so it has other names for the linker too: a program and a library of different kinds do
+// not load together.
+#if __SIZEOF_POINTER__ == 4 && (!defined(__GLIBC__) || __TIMESIZE == 64 || \
+                                defined(__USE_TIME_BITS64) || defined(__USE_TIME64_REDIRECTS))
+#define TARNWICK_HOLDS_TIME __attribute__((abi_tag("time64")))
+static_assert(sizeof(time_t) == 8, "of this kind are systems with 64 bits");
+#else
+#define TARNWICK_HOLDS_TIME
+static_assert(sizeof(time_t) == sizeof(void*), "of this kind are systems with a word's bits");
+#endif
+
 // Paces a loop to a fixed period without drift:
 //
 //   DelayTimer timer(40000);  // 25 rounds a second
@@ -23,7 +36,7 @@
 //   }
 //
 // Threads: one thread uses an object at a time.
-class TARNWICK_API DelayTimer {
+class TARNWICK_API TARNWICK_HOLDS_TIME DelayTimer {
  public:
   // Starts a period of `periodUs` microseconds now.
   explicit DelayTimer(int periodUs);

@@ -9,10 +9,9 @@ __thread Injection t_injection;
 
 namespace {
 
-constexpr const char* kNames[] = {"none",         "allocation", "no-memory",
-                                  "nothing-left", "call",       "nothing-works",
-                                  "interrupted",  "try-again",  "short",
-                                  "cancelled"};
+constexpr const char* kNames[] = {"none",  "allocation",    "no-memory",   "nothing-left",
+                                  "call",  "nothing-works", "interrupted", "try-again",
+                                  "short", "cancelled"};
 
 bool Strike(const char* name) {
   if (!t_injection.struck) t_injection.struck_name = name;

@@ -169,9 +169,13 @@ std::vector<PlantedOperation> PlantedOperations() {
       {{"planted_short", Peer::kNone, ShortRead}, "the read is short"},
       {{"planted_cache", Peer::kNone, Cache}, nullptr},
 #ifndef TARNWICK_TORTURE_ASAN
-      {{"planted_lost_descriptor", Peer::kNone, LostDescriptor}, "is left open", 10,
+      {{"planted_lost_descriptor", Peer::kNone, LostDescriptor},
+       "is left open",
+       10,
        Fault::kCancelled},
-      {{"planted_destructor", Peer::kNone, CancelledDestructor}, "ended by signal", 10,
+      {{"planted_destructor", Peer::kNone, CancelledDestructor},
+       "ended by signal",
+       10,
        Fault::kCancelled},
 #endif
   };
