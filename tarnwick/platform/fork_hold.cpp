@@ -17,8 +17,8 @@ namespace {
 constexpr int kKinds = 2;
 
 // How long a fork waits for the holds of other threads, and how often it looks.
-constexpr long kLongestWaitNs = 100 * 1000 * 1000;
-constexpr long kPauseNs = 50 * 1000;
+constexpr long kLongestWaitNs = 100L * 1000 * 1000;
+constexpr long kPauseNs = 50L * 1000;
 
 // The holds of all threads, and of this one. A hold is counted here first and there last, so that a
 // signal handler that forks in between takes its own thread's hold for another's.
@@ -151,7 +151,6 @@ UninheritedFile::UninheritedFile(const char* path, int flags, mode_t mode) : m_f
     errno = EFAULT;  // what open gives for a path that is none
     return;
   }
-  const NoCancel no_cancel;
   const ForkHold hold(ForkHold::kDescriptor);
   m_fd = open(path, flags, mode);
   if (Valid()) Register();
@@ -160,7 +159,6 @@ UninheritedFile::UninheritedFile(const char* path, int flags, mode_t mode) : m_f
 UninheritedFile::~UninheritedFile() {
   if (!Valid()) return;
   const ErrnoKeeper keeper;
-  const NoCancel no_cancel;
   const ForkHold hold(ForkHold::kDescriptor);
   Unregister();
   if (m_stream != nullptr) {

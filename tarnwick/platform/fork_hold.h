@@ -33,6 +33,7 @@ class ForkHold {
 // descriptor closed before fork() returns there. A child that stays would otherwise keep the file's
 // lock when the parent dies, and one that ends would write the stream's contents again.
 // A thread that forks while it has one must not use it in the child.
+// REQUIRES: a NoCancel around it.
 class UninheritedFile {
  public:
   // Opens it as open(2) does; a null `path` fails with EFAULT.
