@@ -19,20 +19,21 @@ struct Encoded {
   uint8_t length;  // 1 or 3; 0 where the locale decides
 };
 
-Encoded Plain(char c) {
+constexpr char kUpperDigits[] = "0123456789ABCDEF";
+
+constexpr Encoded Plain(char c) {
   return {{c, 0, 0}, 1};
 }
 
-Encoded Escape(unsigned char byte) {
-  static constexpr char kDigits[] = "0123456789ABCDEF";
-  return {{'%', kDigits[byte >> 4], kDigits[byte & 15]}, 3};
+constexpr Encoded Escape(unsigned char byte) {
+  return {{'%', kUpperDigits[byte >> 4], kUpperDigits[byte & 15]}, 3};
 }
 
 // In every locale: letters, digits and more marks than the unreserved ones of RFC 3986, 2.3. Tabs
 // and line ends go out as blanks. Both kept as they are: callers may depend on them; pinned by the
 // tests of UrlEncode. Beyond ASCII the locale has letters.
 struct EncodedAscii {
-  EncodedAscii() {
+  constexpr EncodedAscii() {
     for (int c = 0; c < 256; ++c) of[c] = Escape(static_cast<unsigned char>(c));
     for (int c = '0'; c <= 'z'; ++c) {
       if (c <= '9' || (c >= 'A' && c <= 'Z') || c >= 'a') of[c] = Plain(static_cast<char>(c));
@@ -43,8 +44,10 @@ struct EncodedAscii {
     for (int c = '\t'; c <= '\r'; ++c) of[c] = Escape(' ');
     for (int c = 128; c < 256; ++c) of[c].length = 0;
   }
-  Encoded of[256];
+  Encoded of[256] = {};
 };
+
+constexpr EncodedAscii kUsual;
 
 Encoded EncodedInLocale(unsigned char byte) {
   if (isalnum(byte) != 0) return Plain(static_cast<char>(byte));
@@ -67,10 +70,9 @@ constexpr size_t kBase64Piece = size_t{3} << 28;
 
 // A table, and no decision a byte, which the processor would guess wrong at every other escape.
 std::string UrlEncode(std::string text, std::string keep) {
-  static const EncodedAscii usual;
   Encoded own[256];
-  if (!keep.empty()) KeepToo(keep, usual.of, &own);
-  const Encoded* const encoded = keep.empty() ? usual.of : own;
+  if (!keep.empty()) KeepToo(keep, kUsual.of, &own);
+  const Encoded* const encoded = keep.empty() ? kUsual.of : own;
   if (text.size() > text.max_size() / 3 - 1) throw std::bad_alloc();
   // A byte more than three for each, because the lengths are copied along.
   std::string result(3 * text.size() + 1, '\0');
