@@ -25,7 +25,7 @@ std::optional<long long> SystemFigure(const std::string& name) {
 }
 
 int LargestNumber() {
-  const int largest = std::atoi(ReadWholeFile("/proc/sys/kernel/pid_max").c_str());
+  const long largest = std::strtol(ReadWholeFile("/proc/sys/kernel/pid_max").c_str(), nullptr, 10);
   return largest > 0 ? largest : std::numeric_limits<int>::max();
 }
 
