@@ -26,7 +26,8 @@ std::optional<long long> SystemFigure(const std::string& name) {
 
 int LargestNumber() {
   const long largest = std::strtol(ReadWholeFile("/proc/sys/kernel/pid_max").c_str(), nullptr, 10);
-  return largest > 0 ? largest : std::numeric_limits<int>::max();
+  constexpr int kMost = std::numeric_limits<int>::max();
+  return largest > 0 && largest < kMost ? static_cast<int>(largest) : kMost;
 }
 
 // When the system was started, unless it has begun to give numbers again since.
