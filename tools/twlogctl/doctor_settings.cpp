@@ -70,11 +70,11 @@ std::optional<Finding> ForeignSettings(const std::string& path) {
   const std::string folder = path.substr(0, path.rfind('/'));
   const auto above = StateAt(folder);
   if (above && S_ISDIR(above->st_mode)) {
-    if (const auto open = OpenDirectory("settings", folder, *above)) return open;
+    if (auto open = OpenDirectory("settings", folder, *above)) return open;
   }
   const auto state = StateAt(path);
   if (!state) return std::nullopt;
-  if (const auto odd = OddFile("settings", path, *state)) return odd;
+  if (auto odd = OddFile("settings", path, *state)) return odd;
   if (!IsRootOrCaller(state->st_uid)) {
     return Finding{"settings", Verdict::kWrong,
                    path + " belongs to " + UserName(state->st_uid) +
