@@ -45,6 +45,15 @@ template <typename T>
 std::atomic<const TWEnum2StrMap<T>*> g_names{nullptr};
 
 template <typename T>
+const char* NameWithoutException(T value) {
+  try {
+    return Enum2String(value);
+  } catch (const std::bad_alloc&) {
+    return "unknown";
+  }
+}
+
+template <typename T>
 void Release() {
   delete g_names<T>.exchange(nullptr);
 }
@@ -101,14 +110,10 @@ const char* Enum2String<LOG_LEVEL>(LOG_LEVEL value) {
   return NameIn(NamesOf<LOG_LEVEL>(), value);
 }
 
-const char* TWLogName(LOG_CATEG value) noexcept try {
-  return Enum2String(value);
-} catch (const std::bad_alloc&) {
-  return "unknown";
+const char* TWLogName(LOG_CATEG value) noexcept {
+  return NameWithoutException(value);
 }
 
-const char* TWLogName(LOG_LEVEL value) noexcept try {
-  return Enum2String(value);
-} catch (const std::bad_alloc&) {
-  return "unknown";
+const char* TWLogName(LOG_LEVEL value) noexcept {
+  return NameWithoutException(value);
 }
