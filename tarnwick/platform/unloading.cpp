@@ -2,19 +2,13 @@
 
 #include <dlfcn.h>
 
-#include <cstdlib>
-
 namespace {
 
 // The library came with the program, which is never unloaded.
 bool g_stays = false;
 
-// Set by exit().
+// Set by exit(), and after the destructor functions by dlclose.
 bool g_is_ending = false;
-
-void NoteEnd() {
-  g_is_ending = true;
-}
 
 // Among the names that the program was started with are the library's. glibc adds the names of a
 // library that is opened later after its constructors have run, if at all (2.31 to 2.41). A function
@@ -25,18 +19,18 @@ bool CameWithTheProgram() {
   Dl_info found;
   Dl_info own;
   const void* const name = dlsym(program, "_Z15TWVersionNumberv");
-  const bool same = name != nullptr && dladdr(name, &found) != 0 &&
-                    dladdr(reinterpret_cast<void*>(NoteEnd), &own) != 0 &&
+  const bool same = name != nullptr && dladdr(name, &found) != 0 && dladdr(&g_stays, &own) != 0 &&
                     found.dli_fbase == own.dli_fbase;
   dlclose(program);
   return same;
 }
 
-// What exit() calls for a library that was opened later, it calls before the library's destructors.
-// For one that came with the program it is the other way round.
-__attribute__((constructor)) void WatchTheEnd() {
-  g_stays = CameWithTheProgram() || atexit(NoteEnd) != 0;
-}
+// exit() destroys the objects of a library that was opened later before it calls the library's
+// destructor functions. For a library that came with the program it is the other way round.
+struct EndOfProcess {
+  EndOfProcess() { g_stays = CameWithTheProgram(); }
+  ~EndOfProcess() { g_is_ending = true; }
+} const g_end;
 
 }  // namespace
 
