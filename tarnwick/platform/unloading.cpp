@@ -28,7 +28,7 @@ bool CameWithTheProgram() {
 // exit() destroys the objects of a library that was opened later before it calls the library's
 // destructor functions. For a library that came with the program it is the other way round.
 struct EndOfProcess {
-  EndOfProcess() { g_stays = CameWithTheProgram(); }
+  EndOfProcess() noexcept { g_stays = CameWithTheProgram(); }
   ~EndOfProcess() { g_is_ending = true; }
 } const g_end;
 
