@@ -251,7 +251,7 @@ TARNWICK_API void FreeDbgCfg();
 //   to the system log, for 100 milliseconds at most. When one of the last two has not ended by then,
 //   the child's lines have no time, and it does not report failures: it would wait for ever.
 // End of the process: a thread may log while another one calls exit.
-// Cancellation: no cancellation point. So are the functions of the record and of the settings.
+// Cancellation: it is no cancellation point; nor are the functions of the record and the settings.
 TARNWICK_API void TWPrintf(LOG_TYPE type, const char* categ, const char* level, const char* file,
                            int line, const char* func, const char* format, ...)
     __attribute__((format(printf, 7, 8)));
