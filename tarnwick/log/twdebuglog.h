@@ -248,8 +248,8 @@ TARNWICK_API void FreeDbgCfg();
 //   flock of the file. Blocks while another process or thread holds that lock.
 // Fork: a process may fork at any moment, and the child may log. It has none of the open log files.
 //   The fork waits while another thread opens or closes a log file, reads the time zone or reports
-//   to the system log, for 100 milliseconds at most. When one of the last two has not ended by then,
-//   the child's lines have no time, and it does not report failures: it would wait for ever.
+//   to the system log, for 100 milliseconds at most. When one of the last two has not ended by
+//   then, the child's lines have no time, and it does not report failures: it would wait for ever.
 // End of the process: a thread may log while another one calls exit.
 // Cancellation: it is no cancellation point; nor are the functions of the record and the settings.
 TARNWICK_API void TWPrintf(LOG_TYPE type, const char* categ, const char* level, const char* file,
