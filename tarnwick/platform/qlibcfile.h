@@ -7,8 +7,9 @@
 //
 // libtarnwick brings a stand-alone version of both. They are weak symbols: a program that has
 // functions of these names in its own objects replaces them, whether it links the shared library or
-// the archive. Neither function is a cancellation point. Functions that stand in another archive must be pulled into the program, with
-// --whole-archive for example, because a linker does not look for what it has already.
+// the archive. Neither function is a cancellation point. Functions that stand in another archive
+// must be pulled into the program, with --whole-archive for example, because a linker does not look
+// for what it has already.
 #ifndef TARNWICK_PLATFORM_QLIBCFILE_H_
 #define TARNWICK_PLATFORM_QLIBCFILE_H_
 
