@@ -270,19 +270,16 @@ def test_the_folder_may_be_a_link_of_roots(doctor, healthy, tmp_path):
 # The record
 
 
-def test_a_record_of_another_user_is_wrong_and_create_refuses_it(run, doctor, healthy):
+def test_a_record_of_another_user_is_wrong_and_create_refuses_it(command, run, doctor, healthy):
     new_record(uid=NOBODY)
     finding = only(doctor(), "record")
     assert "made or is owned by nobody, who can change every level" in finding["text"]
     result = run("twlogctl", "create")
     assert (result.returncode, result.stdout) == (1, "")
     assert "made or owned by nobody" in result.stderr
-    subprocess.run(finding["fix"].replace("twlogctl", _tool(run)), shell=True, check=True)
+    tool = shlex.join(command("twlogctl"))
+    subprocess.run(finding["fix"].replace("twlogctl", tool), shell=True, check=True)
     assert doctor() == {}
-
-
-def _tool(run):
-    return shlex.quote(run("twlogctl", "--version").args[-2])
 
 
 def test_a_record_that_its_maker_has_given_to_root_is_still_the_makers(run, healthy):
