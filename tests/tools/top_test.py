@@ -245,7 +245,7 @@ def test_a_record_without_the_right_to_change_it_is_shown(command, terminal):
     make_segment(300, 0o400)  # its levels are all zero
     screen = Screen(terminal(without_privileges(command("twlogctl", "top"))))
     screen.wait_for("may not be changed: read only")
-    assert row_of(screen, "account").split()[1] == "alarm"
+    screen.wait_for(lambda rows: (row_of(screen, "account") or "- -").split()[1] == "alarm")
     press(screen, RIGHT)
     screen.wait_for("refused")
 
