@@ -32,7 +32,7 @@ struct HeaderLine {
   std::string_view value;
 };
 
-// Splits a header line. A name that begins with a known one counts as that one; pinned by
+// Splits a header line. A name that begins with a known one is taken for that one; pinned by
 // CheckContentType.ALongerNameWithAKnownPrefixCountsAsTheKnownOne.
 HeaderLine ParseHeaderLine(std::string_view line);
 

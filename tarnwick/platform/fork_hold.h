@@ -6,9 +6,8 @@
 
 #include <cstdio>
 
-// While one exists, fork() waits in every other thread, for 100 milliseconds at most: what is done in
-// it is short, but a hung disk or system log must not stop a process that forks. Holds do not wait
-// for each other. A thread may fork in its own hold, as a signal handler does.
+// While one exists, fork() waits in every other thread, for 100 milliseconds at most: a disk or a
+// system log that hangs must not stop a process that forks. Holds do not wait for each other. A thread may fork in its own hold, as a signal handler does.
 class ForkHold {
  public:
   enum Kind {

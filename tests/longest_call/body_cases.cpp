@@ -33,7 +33,7 @@ std::vector<Case> BodyCases() {
       Stops("ReadBody, silence behind a chunk", "14 T", 14,
             "fault=chunks:10,fault=stall-in-body:10", HTTP_RET_OK),
       // The head has 103 bytes; 14 of the body follow at once, and nothing for 20 seconds.
-      Stops("ReadBody, silence behind a chunk's carriage return", "8 T", 8,
+      Stops("ReadBody, silence after a chunk's carriage return", "8 T", 8,
             "fault=chunks:10,fault=slow:117:20000", HTTP_RET_OK),
   };
 }
