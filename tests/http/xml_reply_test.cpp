@@ -11,6 +11,7 @@
 #include <cstring>
 #include <string>
 
+#include "tests/http/xml_test_util.h"
 #include "tests/support/standard_error.h"
 
 namespace {
@@ -57,15 +58,6 @@ class FailingParser {
 
   bool Failed() const { return g_allocations >= g_failing; }
 };
-
-std::string TextOf(xmlDoc* doc) {
-  xmlChar* text = nullptr;
-  int length = 0;
-  xmlDocDumpMemory(doc, &text, &length);
-  const std::string copy(reinterpret_cast<const char*>(text), static_cast<size_t>(length));
-  xmlFree(text);
-  return copy;
-}
 
 xmlDoc* Parse() {
   return ParseXml(kText, static_cast<int>(strlen(kText)));

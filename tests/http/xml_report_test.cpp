@@ -16,6 +16,7 @@
 #include <vector>
 
 #include "tarnwick/http/xml_reply.h"
+#include "tests/http/xml_test_util.h"
 #include "tests/support/standard_error.h"
 
 using namespace std::string_literals;
@@ -68,16 +69,6 @@ std::vector<std::string> Documents() {
 
 xmlDoc* ByLibxml2(const char* text, int size) {
   return xmlParseMemory(text, size);
-}
-
-std::string TextOf(xmlDoc* doc) {
-  if (doc == nullptr) return "(none)";
-  xmlChar* text = nullptr;
-  int length = 0;
-  xmlDocDumpMemory(doc, &text, &length);
-  const std::string copy(reinterpret_cast<const char*>(text), static_cast<size_t>(length));
-  xmlFree(text);
-  return copy;
 }
 
 // Parses the document. Results: it as text.

@@ -7,10 +7,10 @@
 #include <sys/ipc.h>
 #include <sys/shm.h>
 
-#include <cstdio>
 #include <cstring>
 #include <memory>
 
+#include "expect.h"
 #include "tarnwick/http/twcurl.h"
 #include "tarnwick/http/twhttp.h"
 #include "tarnwick/log/twdebuglog.h"
@@ -28,14 +28,6 @@ extern "C" int QLIBCFileGetKeyValue(const char*, const char* key, char* value, i
 }
 
 namespace {
-
-int failures = 0;
-
-void Expect(bool condition, const char* what) {
-  if (condition) return;
-  std::printf("not so: %s\n", what);
-  ++failures;
-}
 
 void CheckLog() {
   Expect(g_pDbgLogCfg == nullptr, "no record of levels without a managing process");

@@ -1,9 +1,9 @@
 // A program of somebody who compiles without RTTI, without exceptions, or without both: it derives from
 // the sockets, logs, and asks a JSON service.
-#include <cstdio>
 #include <cstring>
 #include <memory>
 
+#include "expect.h"
 #include "tarnwick/http/twcurl.h"
 #include "tarnwick/http/twhttp.h"
 #include "tarnwick/log/twdebuglog.h"
@@ -12,14 +12,6 @@
 #include "tarnwick/utils/utils.h"
 
 namespace {
-
-int failures = 0;
-
-void Expect(bool condition, const char* what) {
-  if (condition) return;
-  std::printf("not so: %s\n", what);
-  ++failures;
-}
 
 // Reads from memory what a peer would send.
 class FromMemory : public TWSocket {
