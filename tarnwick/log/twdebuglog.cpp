@@ -209,7 +209,7 @@ void TWPrintf(LOG_TYPE type, const char* categ, const char* level, const char* f
     ReportFailure("open", __LINE__);
     return;
   }
-  if (!log.MakeStream("a", buffer, sizeof(buffer))) {
+  if (!log.MakeStream(buffer, sizeof(buffer))) {
     ReportFailure("fdopen", __LINE__);
     return;
   }

@@ -240,8 +240,9 @@ TARNWICK_API void FreeDbgCfg();
 // The line: time, "[pid]" (or "[pid][thread id]" outside the main thread), "[category][level]",
 //   then "file:line:function(): " and the message. Milliseconds are printed when the shared record
 //   says so.
-// Failures: a file that cannot be opened, a stream that cannot be made for it, and an undefined
-//   `type` (errno EFAULT), are reported to the system log; a lock that cannot be had drops the line
+// Failures: a file that cannot be opened, one that is not regular (errno ENXIO: a FIFO or a device
+//   is neither waited for nor written), a stream that cannot be made for it, and an undefined `type`
+//   (errno EFAULT), are reported to the system log; a lock that cannot be had drops the line
 //   silently. A full disk and the process's limit on file sizes cut the line or lose it; no SIGXFSZ
 //   comes of it. errno is kept.
 // Threads: any thread of any process; lines never mix, because each is written under an exclusive

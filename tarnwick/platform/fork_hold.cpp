@@ -3,6 +3,7 @@
 #include <fcntl.h>
 #include <pthread.h>
 #include <stdio_ext.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <atomic>
@@ -124,6 +125,35 @@ bool MayWait() {
          t_holds[ForkHold::kLibraryLock] == 0;
 }
 
+bool IsRegular(int fd) {
+  struct stat attributes;
+  if (fstat(fd, &attributes) != 0) return false;
+  if (S_ISREG(attributes.st_mode)) return true;
+  errno = ENXIO;  // what open gives for a FIFO without a reader
+  return false;
+}
+
+// A regular file that is leased is waited for, as without O_NONBLOCK (F_SETLEASE in fcntl(2)).
+int OpenRegular(const char* path, int flags, mode_t mode) {
+  flags |= O_NOCTTY;
+  int opened = open(path, flags | O_NONBLOCK, mode);
+  if (opened < 0 && errno == EWOULDBLOCK) opened = open(path, flags, mode);
+  OwnedFd fd(opened);
+  return fd.Valid() && IsRegular(fd.Get()) ? fd.Release() : -1;
+}
+
+// What stdio calls for a stream of an UninheritedFile. A result of 0 tells it of a failure.
+ssize_t WriteToFile(void* file, const char* data, size_t size) {
+  const int fd = static_cast<UninheritedFile*>(file)->Get();
+  size_t written = 0;
+  while (written < size) {
+    const ssize_t count = write(fd, data + written, size - written);
+    if (count <= 0) break;
+    written += static_cast<size_t>(count);
+  }
+  return static_cast<ssize_t>(written);
+}
+
 }  // namespace
 
 ForkHold::ForkHold(Kind kind) : m_kind(kind) {
@@ -152,7 +182,7 @@ UninheritedFile::UninheritedFile(const char* path, int flags, mode_t mode) : m_f
     return;
   }
   const ForkHold hold(ForkHold::kDescriptor);
-  m_fd = open(path, flags, mode);
+  m_fd = OpenRegular(path, flags, mode);
   if (Valid()) Register();
 }
 
@@ -161,11 +191,8 @@ UninheritedFile::~UninheritedFile() {
   const ErrnoKeeper keeper;
   const ForkHold hold(ForkHold::kDescriptor);
   Unregister();
-  if (m_stream != nullptr) {
-    fclose(m_stream);
-  } else {
-    close(m_fd);
-  }
+  if (m_stream != nullptr) fclose(m_stream);
+  close(m_fd);
 }
 
 void UninheritedFile::Register() {
@@ -184,11 +211,12 @@ void UninheritedFile::Unregister() {
   UnlockList();
 }
 
-bool UninheritedFile::MakeStream(const char* mode, char* buffer, size_t size) {
-  FILE* const stream = fdopen(m_fd, mode);
-  if (stream != nullptr) setvbuf(stream, buffer, _IOFBF, size);
-  m_stream = stream;
-  return stream != nullptr;
+// fdopen asks the kernel for the flags of the descriptor, which are known here: the call goes into
+// the look at the file's type instead.
+bool UninheritedFile::MakeStream(char* buffer, size_t size) {
+  m_stream = fopencookie(this, "a", {nullptr, WriteToFile, nullptr, nullptr});
+  if (m_stream != nullptr) setvbuf(m_stream, buffer, _IOFBF, size);
+  return m_stream != nullptr;
 }
 
 bool UninheritedFile::Flush() {

@@ -7,7 +7,8 @@
 #include <cstdio>
 
 // While one exists, fork() waits in every other thread, for 100 milliseconds at most: a disk or a
-// system log that hangs must not stop a process that forks. Holds do not wait for each other. A thread may fork in its own hold, as a signal handler does.
+// system log that hangs must not stop a process that forks. Holds do not wait for each other. A
+// thread may fork in its own hold, as a signal handler does.
 class ForkHold {
  public:
   enum Kind {
@@ -28,14 +29,15 @@ class ForkHold {
   Kind m_kind;
 };
 
-// An open file of which a forked child keeps nothing: what its stream holds is dropped and its
-// descriptor closed before fork() returns there. A child that stays would otherwise keep the file's
+// An open regular file of which a forked child keeps nothing: what its stream holds is dropped and
+// its descriptor closed before fork() returns there. A child that stays would otherwise keep the file's
 // lock when the parent dies, and one that ends would write the stream's contents again.
 // A thread that forks while it has one must not use it in the child.
 // REQUIRES: a NoCancel around it.
 class UninheritedFile {
  public:
-  // Opens it as open(2) does; a null `path` fails with EFAULT.
+  // Opens it for writing as open(2) does; a null `path` fails with EFAULT. A FIFO or a device fails
+  // with ENXIO: it is neither waited for nor written, and becomes no controlling terminal.
   UninheritedFile(const char* path, int flags, mode_t mode);
 
   // Closes it; errno is kept.
@@ -46,9 +48,9 @@ class UninheritedFile {
   bool Valid() const { return m_fd >= 0; }
   int Get() const { return m_fd; }
 
-  // Makes a stream on it, with a buffer of `size` bytes that outlives this object, and returns true;
-  // or false with errno. REQUIRES: no stream yet.
-  bool MakeStream(const char* mode, char* buffer, size_t size);
+  // Makes a stream that appends to it, with a buffer of `size` bytes that outlives this object, and
+  // returns true; or false with errno. REQUIRES: no stream yet.
+  bool MakeStream(char* buffer, size_t size);
   FILE* Stream() const { return m_stream; }
 
   // Writes what the stream holds. When this or an earlier write has failed, the rest is dropped, and

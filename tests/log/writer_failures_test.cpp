@@ -23,6 +23,7 @@
 
 namespace {
 
+using ::testing::EndsWith;
 using ::testing::IsEmpty;
 using ::testing::MatchesRegex;
 using ::testing::SizeIs;
@@ -60,7 +61,7 @@ class WriterFailure : public ::testing::Test {
 TEST_F(WriterFailure, Type2GivesJustTheOpenMessageAndNoFileAccess) {
   Faults faults;
   Write(static_cast<LOG_TYPE>(2));
-  EXPECT_EQ(faults.Count(Call::kOpen) + faults.Count(Call::kFdopen), 0);
+  EXPECT_EQ(faults.Count(Call::kOpen) + faults.Count(Call::kFopencookie), 0);
   EXPECT_THAT(ListFolder(kLogFolder), IsEmpty());
   ExpectOneReport(
       "twdebuglog:[0-9]+:TWPrintf\\(\\): open twlog file failed with errno \\[14\\]\\.");
@@ -81,7 +82,7 @@ TEST_F(WriterFailure, AFileThatCannotBeOpenedIsReportedToTheSystemLog) {
   Write();
   ExpectOneReport(
       "twdebuglog:[0-9]+:TWPrintf\\(\\): open twlog file failed with errno \\[13\\]\\.");
-  EXPECT_EQ(faults.Count(Call::kFdopen) + faults.Count(Call::kFlock), 0);
+  EXPECT_EQ(faults.Count(Call::kFopencookie) + faults.Count(Call::kFlock), 0);
 }
 
 TEST_F(WriterFailure, AMissingFolderIsReportedWithItsErrno) {
@@ -97,7 +98,7 @@ TEST_F(WriterFailure, AStreamThatCannotBeMadeIsReportedAndTheDescriptorClosed) {
   syslog_.Take();
   DescriptorGuard descriptors;
   Faults faults;
-  faults.FailNth(Call::kFdopen, 1, ENOMEM);
+  faults.FailNth(Call::kFopencookie, 1, ENOMEM);
   Write();
   ExpectOneReport(
       "twdebuglog:[0-9]+:TWPrintf\\(\\): fdopen twlog file failed with errno \\[12\\]\\.");
@@ -115,10 +116,20 @@ TEST_F(WriterFailure, WithoutTheLockTheLineIsLostInSilence) {
 }
 
 TEST_F(WriterFailure, WriteErrorsAreIgnored) {
-  ASSERT_EQ(symlink("/dev/full", kMainLog), 0);
   DescriptorGuard descriptors;
+  Faults faults;
+  faults.FailFrom(Call::kWrite, 1, ENOSPC);
   Write();
   EXPECT_THAT(syslog_.Take(), IsEmpty());
+  EXPECT_EQ(ReadFile(kMainLog), "");
+}
+
+TEST_F(WriterFailure, AShortWriteIsGoneOnWith) {
+  Faults faults;
+  faults.Limit(Call::kWrite, 7);
+  Write();
+  EXPECT_THAT(ReadFile(kMainLog), EndsWith("message 1\n"));
+  EXPECT_THAT(ParseLog(ReadFile(kMainLog)), SizeIs(1));
 }
 
 TEST_F(WriterFailure, NoDescriptorIsLeftOpen) {
@@ -128,8 +139,9 @@ TEST_F(WriterFailure, NoDescriptorIsLeftOpen) {
 }
 
 TEST_F(WriterFailure, ErrnoStaysOnEveryPath) {
-  for (const Call call : {Call::kOpen, Call::kFdopen, Call::kFlock, Call::kGettimeofday,
-                          Call::kLocaltimeR, Call::kMalloc, Call::kClose, Call::kFclose}) {
+  for (const Call call :
+       {Call::kOpen, Call::kFstat, Call::kFopencookie, Call::kFlock, Call::kGettimeofday,
+        Call::kLocaltimeR, Call::kMalloc, Call::kClose, Call::kFclose}) {
     ForEachFailingCall(call, [](Faults&) {
       for (const int error : {0, ETIMEDOUT, EAGAIN}) {
         errno = error;
@@ -151,7 +163,8 @@ TEST_F(WriterFailure, AClockThatCannotBeReadStandsAtItsStart) {
 }
 
 TEST_F(WriterFailure, ErrnoStaysForAnUndefinedTypeAndAFullDisk) {
-  ASSERT_EQ(symlink("/dev/full", kMainLog), 0);
+  Faults faults;
+  faults.FailFrom(Call::kWrite, 1, ENOSPC);
   errno = ETIMEDOUT;
   Write();
   EXPECT_EQ(errno, ETIMEDOUT);

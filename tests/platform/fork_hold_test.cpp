@@ -176,7 +176,7 @@ TEST(UninheritedFile, ItsStreamWritesWhenItIsFlushedAndIsClosedWithIt) {
   const DescriptorGuard descriptors;
   char buffer[1024];
   UninheritedFile file(folder.File("log").c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
-  ASSERT_TRUE(file.MakeStream("a", buffer, sizeof(buffer)));
+  ASSERT_TRUE(file.MakeStream(buffer, sizeof(buffer)));
   fprintf(file.Stream(), "%s", "text");
   EXPECT_EQ(ReadFile(folder.File("log")), "");
   EXPECT_TRUE(file.Flush());
@@ -186,7 +186,7 @@ TEST(UninheritedFile, ItsStreamWritesWhenItIsFlushedAndIsClosedWithIt) {
 TEST(UninheritedFile, WhatCannotBeWrittenIsDropped) {
   char buffer[1024];
   UninheritedFile file("/dev/full", O_WRONLY | O_CLOEXEC, 0);
-  ASSERT_TRUE(file.MakeStream("a", buffer, sizeof(buffer)));
+  ASSERT_TRUE(file.MakeStream(buffer, sizeof(buffer)));
   fprintf(file.Stream(), "%s", "text");
   EXPECT_FALSE(file.Flush());
   EXPECT_EQ(__fpending(file.Stream()), 0u);
@@ -196,7 +196,7 @@ TEST(UninheritedFile, AChildThatEndsWritesNothingOfItsStream) {
   const TempDir folder;
   char buffer[1024];
   UninheritedFile file(folder.File("log").c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
-  ASSERT_TRUE(file.MakeStream("a", buffer, sizeof(buffer)));
+  ASSERT_TRUE(file.MakeStream(buffer, sizeof(buffer)));
   fprintf(file.Stream(), "%s", "text");
   // The number of the closed descriptor is the next one that the child opens.
   const std::string other = folder.File("other");
@@ -214,10 +214,10 @@ TEST(UninheritedFile, AStreamThatCannotBeMadeLeavesTheDescriptorToItsOwner) {
   const TempDir folder;
   const DescriptorGuard descriptors;
   Faults faults;
-  faults.FailNth(Call::kFdopen, 1, ENOMEM);
+  faults.FailNth(Call::kFopencookie, 1, ENOMEM);
   char buffer[1024];
   UninheritedFile file(folder.File("log").c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
-  EXPECT_FALSE(file.MakeStream("a", buffer, sizeof(buffer)));
+  EXPECT_FALSE(file.MakeStream(buffer, sizeof(buffer)));
   EXPECT_EQ(errno, ENOMEM);
 }
 

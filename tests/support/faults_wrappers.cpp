@@ -98,7 +98,8 @@ PASS_SIZED(Call::kRead, ssize_t, read, (int fd, void* buf, size_t len), (fd, buf
 PASS_SIZED(Call::kRead, ssize_t, __read_chk, (int fd, void* buf, size_t len, size_t room),
            (fd, buf, len, room), len)
 PASS_SIZED(Call::kWrite, ssize_t, write, (int fd, const void* buf, size_t len), (fd, buf, len), len)
-PASS(Call::kFdopen, FILE*, fdopen, (int fd, const char* mode), (fd, mode))
+PASS(Call::kFopencookie, FILE*, fopencookie,
+     (void* cookie, const char* mode, cookie_io_functions_t calls), (cookie, mode, calls))
 PASS(Call::kFopen, FILE*, fopen, (const char* path, const char* mode), (path, mode))
 PASS(Call::kFopen, FILE*, fopen64, (const char* path, const char* mode), (path, mode))
 PASS(Call::kFlock, int, flock, (int fd, int operation), (fd, operation))
