@@ -20,6 +20,8 @@
 #include "tarnwick/http/challenge_words.h"
 #include "tarnwick/http/twhttp.h"
 
+using namespace tarnwick;
+
 namespace {
 
 class Client : public TWHttpClient {

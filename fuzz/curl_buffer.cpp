@@ -21,6 +21,8 @@
 #include "fuzz/support/target.h"
 #include "tarnwick/http/curl_callbacks.h"
 
+using namespace tarnwick;
+
 namespace {
 
 constexpr uint64_t kMemory = 1 << 20;  // no larger block is to be had

@@ -15,6 +15,8 @@
 #include "tarnwick/http/curl_callbacks.h"
 #include "tarnwick/platform/owned.h"
 
+using namespace tarnwick;
+
 namespace {
 
 // A file in memory whose space ends after `room` bytes.

@@ -14,6 +14,8 @@
 #include "fuzz/oracle/json_reply.h"
 #include "fuzz/support/target.h"
 
+using namespace tarnwick;
+
 namespace {
 
 constexpr int kSurelyParsed = 900;    // levels that fit the parser's own limit and a usual stack

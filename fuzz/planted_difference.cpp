@@ -9,6 +9,8 @@
 #include "fuzz/support/target.h"
 #include "tarnwick/http/chunk_size.h"
 
+using namespace tarnwick;
+
 namespace {
 
 uint32_t FaultySize(const std::string& line) {

@@ -31,6 +31,8 @@
 #include "tarnwick/log/twdebuglog.h"
 #include "tarnwick/platform/qlibcfile.h"
 
+using namespace tarnwick;
+
 namespace {
 
 std::string g_product_settings;  // stands in for the product's own settings file

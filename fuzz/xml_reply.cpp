@@ -15,6 +15,8 @@
 #include "tarnwick/http/curl_callbacks.h"
 #include "tarnwick/http/twhttp.h"
 
+using namespace tarnwick;
+
 namespace {
 
 constexpr std::string_view kGet = "<<get>>";

@@ -6,6 +6,8 @@
 #include <cctype>
 #include <string>
 
+namespace tarnwick {
+
 inline bool CharEqualsIgnoreCase(char a, char b) {
   return std::tolower(static_cast<unsigned char>(a)) == std::tolower(static_cast<unsigned char>(b));
 }
@@ -16,5 +18,7 @@ inline bool ContainsIgnoreCase(const std::string& text, const std::string& word)
   return std::search(text.begin(), text.end(), word.begin(), word.end(), CharEqualsIgnoreCase) !=
          text.end();
 }
+
+}  // namespace tarnwick
 
 #endif  // TARNWICK_HTTP_CHALLENGE_WORDS_H_

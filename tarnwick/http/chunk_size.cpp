@@ -2,6 +2,8 @@
 
 #include <algorithm>
 
+namespace tarnwick {
+
 namespace {
 
 // How far the end of a size line is looked for. It must stay below the lines that are cut.
@@ -37,3 +39,5 @@ std::string_view WholeChunk(std::string_view bytes) {
   if (bytes.size() < at + 2 || bytes.size() - at - 2 < size) return {};
   return {bytes.data() + at, size};
 }
+
+}  // namespace tarnwick

@@ -5,6 +5,8 @@
 #include <cstdint>
 #include <string_view>
 
+namespace tarnwick {
+
 // The leading hexadecimal digits of `line` as a number of 32 bits; higher bits are lost. 0 when
 // there are none. What follows them, a chunk extension for example, does not count.
 uint32_t ParseChunkSize(std::string_view line);
@@ -13,5 +15,7 @@ uint32_t ParseChunkSize(std::string_view line);
 // bytes behind it, whatever these are. Empty otherwise, for the last chunk, and where the line is
 // long: then it is read as any other line, which cuts it.
 std::string_view WholeChunk(std::string_view bytes);
+
+}  // namespace tarnwick
 
 #endif  // TARNWICK_HTTP_CHUNK_SIZE_H_

@@ -8,6 +8,8 @@
 #include <string>
 #include <string_view>
 
+namespace tarnwick {
+
 namespace {
 
 // Memory for the buffer and `more` bytes behind it, or null. What an earlier failure has lost reads
@@ -70,3 +72,5 @@ size_t CurlHeaderToFile(char* buffer, size_t size, size_t count, void* file) {
   std::fflush(static_cast<FILE*>(file));
   return written;
 }
+
+}  // namespace tarnwick

@@ -5,6 +5,8 @@
 
 #include <cstddef>
 
+namespace tarnwick {
+
 // A growing buffer. The client hands two of its own fields, laid out in the same way, to
 // CurlBufferWrite.
 struct CurlMemBuffer {
@@ -30,5 +32,7 @@ size_t CurlBufferWrite(char* buffer, size_t size, size_t count, void* memBuffer)
 // status line and without Transfer-Encoding, because libcurl has decoded the body. A line is left
 // out by its letters: a status line that holds a colon is written, and so is "transfer-encoding:".
 size_t CurlHeaderToFile(char* buffer, size_t size, size_t count, void* file);
+
+}  // namespace tarnwick
 
 #endif  // TARNWICK_HTTP_CURL_CALLBACKS_H_

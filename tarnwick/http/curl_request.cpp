@@ -8,6 +8,8 @@
 #include "tarnwick/log/twdebuglog.h"
 #include "tarnwick/platform/sigpipe_guard.h"
 
+namespace tarnwick {
+
 namespace {
 
 // Connections that programs started meanwhile do not inherit.
@@ -74,3 +76,5 @@ bool CurlRequest::Accept(CURLcode code, const char* message, const char* detail)
             detail, code);
   return false;
 }
+
+}  // namespace tarnwick

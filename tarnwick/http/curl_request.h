@@ -9,6 +9,8 @@
 
 #include "tarnwick/platform/cancel.h"
 
+namespace tarnwick {
+
 // It logs under the name of the operation that it serves.
 class CurlRequest {
  public:
@@ -61,5 +63,7 @@ class CurlRequest {
   CURL* m_curl;
   struct curl_slist* m_headers;
 };
+
+}  // namespace tarnwick
 
 #endif  // TARNWICK_HTTP_CURL_REQUEST_H_

@@ -14,6 +14,8 @@
 
 #include "tarnwick/utils/utils.h"
 
+namespace tarnwick {
+
 namespace {
 
 constexpr char kAuthInt[] = "auth-int";
@@ -111,3 +113,5 @@ std::string DigestLine(const DIGEST_ACCESS_AUTH& login) {
   if (!login.opaque.empty()) line += ", opaque=\"" + login.opaque + "\"";
   return line;
 }
+
+}  // namespace tarnwick

@@ -5,6 +5,8 @@
 #include <map>
 #include <string>
 
+namespace tarnwick {
+
 // The values of one Digest login.
 struct DIGEST_ACCESS_AUTH {
   std::string username;
@@ -34,5 +36,7 @@ std::string DigestResponse(const DIGEST_ACCESS_AUTH& login, const std::string& p
 
 // The header line, without a line end.
 std::string DigestLine(const DIGEST_ACCESS_AUTH& login);
+
+}  // namespace tarnwick
 
 #endif  // TARNWICK_HTTP_DIGEST_H_

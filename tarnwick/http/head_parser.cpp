@@ -7,6 +7,8 @@
 #include <cstdlib>
 #include <string>
 
+namespace tarnwick {
+
 namespace {
 
 constexpr char kNameEnds[] = " :;=";
@@ -91,3 +93,5 @@ std::string_view CookieOf(std::string_view value) {
   if (semicolon == std::string_view::npos) return {};
   return TrimSpaces(value.substr(0, semicolon + 1));
 }
+
+}  // namespace tarnwick

@@ -4,6 +4,8 @@
 
 #include <string_view>
 
+namespace tarnwick {
+
 enum class StatusLine {
   kParsed,
   kIncomplete,  // no version or no status
@@ -42,5 +44,7 @@ std::string_view TrimSpaces(std::string_view text);
 // The cookie of a Set-Cookie value: up to its first ";", which stays, without spaces at the ends.
 // Without a ";" there is no cookie.
 std::string_view CookieOf(std::string_view value);
+
+}  // namespace tarnwick
 
 #endif  // TARNWICK_HTTP_HEAD_PARSER_H_

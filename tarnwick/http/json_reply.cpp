@@ -10,6 +10,8 @@
 #include "tarnwick/net/request_settings.h"
 #include "tarnwick/platform/cancel.h"
 
+namespace tarnwick {
+
 namespace {
 
 // A reply of so few levels is parsed without a look at the stack.
@@ -137,3 +139,5 @@ int JsonParse(const std::string& text, Json::Value& value) {
   }
   return IsSuccess(value) ? 0 : -2;
 }
+
+}  // namespace tarnwick

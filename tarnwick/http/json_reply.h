@@ -6,6 +6,8 @@
 
 #include <string>
 
+namespace tarnwick {
+
 // Parses a JSON service's reply into `value`.
 //
 // Results: 0 when the member "success" of the object is true (for a number: not 0), and for an
@@ -17,5 +19,7 @@ int JsonParse(const std::string& text, Json::Value& value);
 
 // The deepest nesting of objects and arrays in `text`, strings and comments aside.
 int JsonDepth(const std::string& text);
+
+}  // namespace tarnwick
 
 #endif  // TARNWICK_HTTP_JSON_REPLY_H_

@@ -5,6 +5,8 @@
 
 #include "tarnwick/utils/utils.h"
 
+namespace tarnwick {
+
 std::string EncodeQueryValues(const std::string& path, const std::string& keep) {
   const size_t question = path.find('?');
   if (question == std::string::npos) return path;
@@ -26,3 +28,5 @@ std::string EncodeQueryValues(const std::string& path, const std::string& keep) 
     segment = end;
   }
 }
+
+}  // namespace tarnwick

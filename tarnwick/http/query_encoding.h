@@ -4,6 +4,8 @@
 
 #include <string>
 
+namespace tarnwick {
+
 // `path` with the values of its query percent-encoded, except the characters of `keep`. What stands
 // before the "?", the names, the separators and parts without "=" stay as they are.
 //
@@ -11,5 +13,7 @@
 // "=", or whose value begins, after the path's first zero byte; of a part without "=" only what
 // stands before that byte is copied.
 std::string EncodeQueryValues(const std::string& path, const std::string& keep);
+
+}  // namespace tarnwick
 
 #endif  // TARNWICK_HTTP_QUERY_ENCODING_H_

@@ -7,6 +7,8 @@
 #include "tarnwick/log/twdebuglog.h"
 #include "tarnwick/platform/cancel.h"
 
+using namespace tarnwick;
+
 namespace {
 
 pthread_mutex_t g_mutex = PTHREAD_MUTEX_INITIALIZER;

@@ -7,6 +7,8 @@
 #include "tarnwick/net/socket_access.h"
 #include "tarnwick/net/sslsocket.h"
 
+using namespace tarnwick;
+
 namespace {
 
 std::string WithoutLeadingSlashes(std::string path) {

@@ -33,7 +33,9 @@
 #include "tarnwick/net/twsocket.h"
 #include "tarnwick/platform/export.h"
 
+namespace tarnwick {
 class CurlRequest;
+}
 typedef struct _xmlDoc xmlDoc;  // libxml2's document
 
 // The response headers that a client keeps.
@@ -369,19 +371,20 @@ class TARNWICK_API TWHttpClient {
   TARNWICK_LOCAL void DropChunkEnd();
   TARNWICK_LOCAL bool ReadToEnd(std::string* body);
 
-  TARNWICK_LOCAL bool SetCurlOutput(CurlRequest* curl);
-  TARNWICK_LOCAL bool SetCurlRequest(CurlRequest* curl, TW_HTTP_METHOD method, int timeout);
-  TARNWICK_LOCAL bool SetCurlHeaders(CurlRequest* curl, TW_HTTP_METHOD method);
+  TARNWICK_LOCAL bool SetCurlOutput(tarnwick::CurlRequest* curl);
+  TARNWICK_LOCAL bool SetCurlRequest(tarnwick::CurlRequest* curl, TW_HTTP_METHOD method,
+                                     int timeout);
+  TARNWICK_LOCAL bool SetCurlHeaders(tarnwick::CurlRequest* curl, TW_HTTP_METHOD method);
   TARNWICK_LOCAL std::string PlainHostUrl() const;
-  TARNWICK_LOCAL bool SetCurlLogin(CurlRequest* curl);
-  TARNWICK_LOCAL bool SetCurlVersion(CurlRequest* curl);
-  TARNWICK_LOCAL int PerformByCurl(CurlRequest* curl);
-  TARNWICK_LOCAL bool SetXmlUrl(CurlRequest* curl);
-  TARNWICK_LOCAL bool SetXmlHeaders(CurlRequest* curl, bool forUpload);
-  TARNWICK_LOCAL bool SetXmlWriter(CurlRequest* curl);
-  TARNWICK_LOCAL bool SetXmlOutput(CurlRequest* curl, const char* message);
-  TARNWICK_LOCAL bool SetCurlPut(CurlRequest* curl);
-  TARNWICK_LOCAL int PutXmlFile(CurlRequest* curl, xmlDoc* doc, FILE* file);
+  TARNWICK_LOCAL bool SetCurlLogin(tarnwick::CurlRequest* curl);
+  TARNWICK_LOCAL bool SetCurlVersion(tarnwick::CurlRequest* curl);
+  TARNWICK_LOCAL int PerformByCurl(tarnwick::CurlRequest* curl);
+  TARNWICK_LOCAL bool SetXmlUrl(tarnwick::CurlRequest* curl);
+  TARNWICK_LOCAL bool SetXmlHeaders(tarnwick::CurlRequest* curl, bool forUpload);
+  TARNWICK_LOCAL bool SetXmlWriter(tarnwick::CurlRequest* curl);
+  TARNWICK_LOCAL bool SetXmlOutput(tarnwick::CurlRequest* curl, const char* message);
+  TARNWICK_LOCAL bool SetCurlPut(tarnwick::CurlRequest* curl);
+  TARNWICK_LOCAL int PutXmlFile(tarnwick::CurlRequest* curl, xmlDoc* doc, FILE* file);
 };
 
 // Fetches `path` from a JSON service over HTTP and parses the response into `result`. The request

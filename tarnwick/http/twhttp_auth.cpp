@@ -4,6 +4,8 @@
 #include "tarnwick/platform/owned.h"
 #include "tarnwick/utils/utils.h"
 
+using namespace tarnwick;
+
 std::string TWHttpClient::GenBasicAccessAuth() {
   const OwnedMemory<char> encoded(Base64Encode((m_strUser + ":" + m_strPassword).c_str()));
   return "Authorization: Basic " + std::string(encoded.get());  // throws when there is no encoding

@@ -15,6 +15,8 @@
 #include "tarnwick/net/request_settings.h"
 #include "tarnwick/net/socket_access.h"
 
+using namespace tarnwick;
+
 namespace {
 
 constexpr int kPieceSize = 8192;

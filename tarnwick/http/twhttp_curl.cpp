@@ -10,6 +10,8 @@
 #include "tarnwick/log/twdebuglog.h"
 #include "tarnwick/utils/utils.h"
 
+using namespace tarnwick;
+
 namespace {
 
 constexpr char kSendRequestByCurl[] = "SendRequestByCurl";

@@ -7,6 +7,8 @@
 #include "tarnwick/http/twhttp.h"
 #include "tarnwick/utils/utils.h"
 
+using namespace tarnwick;
+
 int TWHttpClient::SendRequestByPost(std::string separators) try {
   CurlRequest curl(__func__);
   if (!curl.Valid()) return HTTP_RET_IO_ERROR;

@@ -9,6 +9,8 @@
 #include "tarnwick/http/twhttp.h"
 #include "tarnwick/log/twdebuglog.h"
 
+using namespace tarnwick;
+
 namespace {
 
 // Longer requests are cut there. Kept as it is: callers may depend on it; pinned by

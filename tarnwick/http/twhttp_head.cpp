@@ -8,6 +8,8 @@
 #include "tarnwick/log/twdebuglog.h"
 #include "tarnwick/net/request_settings.h"
 
+using namespace tarnwick;
+
 namespace {
 
 constexpr int kLineSize = 2048;

@@ -10,6 +10,8 @@
 #include "tarnwick/net/request_settings.h"
 #include "tarnwick/utils/utils.h"
 
+using namespace tarnwick;
+
 namespace {
 
 constexpr char kSendHttpGet[] = "SendHttpGet";

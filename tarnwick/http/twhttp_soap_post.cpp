@@ -15,6 +15,8 @@
 #include "tarnwick/platform/owned.h"
 #include "tarnwick/utils/utils.h"
 
+using namespace tarnwick;
+
 namespace {
 
 constexpr char kSendReqBySocketPost[] = "SendReqBySocketPost";

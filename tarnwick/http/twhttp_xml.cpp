@@ -16,6 +16,8 @@
 #include "tarnwick/log/twdebuglog.h"
 #include "tarnwick/platform/owned.h"
 
+using namespace tarnwick;
+
 namespace {
 
 // A longer document is cut to one character less. Kept as it is: callers may depend on it; pinned

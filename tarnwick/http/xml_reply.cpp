@@ -11,6 +11,8 @@
 
 #include "tarnwick/platform/cancel.h"
 
+namespace tarnwick {
+
 namespace {
 
 struct XmlParserDeleter {
@@ -143,3 +145,5 @@ xmlDoc* ParseXml(const char* text, int size) {
   xmlFreeDoc(parser->myDoc);
   return nullptr;
 }
+
+}  // namespace tarnwick

@@ -4,6 +4,8 @@
 #include "tarnwick/log/twdebuglog.h"
 #include "tarnwick/platform/unloading.h"
 
+using namespace tarnwick;
+
 TWDbgLogCfg* g_pDbgLogCfg = nullptr;
 
 key_t TWShmDbgLogIPCKey() {

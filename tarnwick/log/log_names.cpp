@@ -8,6 +8,8 @@
 #include "tarnwick/log/twdebuglog.h"
 #include "tarnwick/platform/unloading.h"
 
+using namespace tarnwick;
+
 namespace {
 
 // In the order of the values. The tags are those of the product's modules.
@@ -80,6 +82,8 @@ TWEnum2StrMap<LOG_LEVEL>::TWEnum2StrMap() {
 template <>
 TWEnum2StrMap<LOG_LEVEL>::~TWEnum2StrMap() = default;
 
+namespace tarnwick {
+
 // Of several first callers each builds a map, and the first to finish gives it to all.
 template <typename T>
 const TWEnum2StrMap<T>& NamesOf() {
@@ -99,6 +103,8 @@ const char* NameIn(const std::map<T, const char*>& names, T value) {
 }
 template const char* NameIn(const std::map<LOG_CATEG, const char*>& names, LOG_CATEG value);
 template const char* NameIn(const std::map<LOG_LEVEL, const char*>& names, LOG_LEVEL value);
+
+}  // namespace tarnwick
 
 template <>
 const char* Enum2String<LOG_CATEG>(LOG_CATEG value) {

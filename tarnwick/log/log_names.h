@@ -6,6 +6,8 @@
 
 #include "tarnwick/log/twdebuglog.h"
 
+namespace tarnwick {
+
 // The one map of the process for LOG_CATEG or LOG_LEVEL, built by the first call and never changed.
 template <typename T>
 const TWEnum2StrMap<T>& NamesOf();
@@ -13,5 +15,7 @@ const TWEnum2StrMap<T>& NamesOf();
 // The name of `value`, or "unknown".
 template <typename T>
 const char* NameIn(const std::map<T, const char*>& names, T value);
+
+}  // namespace tarnwick
 
 #endif  // TARNWICK_LOG_LOG_NAMES_H_

@@ -16,6 +16,8 @@
 #include "tarnwick/platform/qlibcfile.h"
 #include "tarnwick/platform/settings_file.h"
 
+using namespace tarnwick;
+
 namespace {
 
 constexpr char kSettingsFile[] = "/var/packages/Tarnwick/etc/settings.conf";
@@ -30,6 +32,8 @@ int ToInt(const char* text) {
 }
 
 }  // namespace
+
+namespace tarnwick {
 
 std::vector<int> SplitToIntList(const std::string& text, const std::string& delimiters) {
   std::vector<int> list;
@@ -52,8 +56,8 @@ int WriteSettingValue(const char* path, const char* key, const char* value,
                       const char* format) try {
   std::string file;
   struct stat attributes;
-  if (!tarnwick::FollowSettingsLinks(path, &file)) return -1;
-  const OwnedFd fd(tarnwick::OpenSettings(file.c_str(), O_CREAT | O_NOFOLLOW, 0644, &attributes));
+  if (!FollowSettingsLinks(path, &file)) return -1;
+  const OwnedFd fd(OpenSettings(file.c_str(), O_CREAT | O_NOFOLLOW, 0644, &attributes));
   if (!fd.Valid()) return -1;
   const FileLock lock(fd.Get());
   if (!lock.Held()) return -1;
@@ -61,6 +65,8 @@ int WriteSettingValue(const char* path, const char* key, const char* value,
 } catch (const std::exception&) {  // memory ran out
   return -1;
 }
+
+}  // namespace tarnwick
 
 int TWDbgLogCfg::Init(int /*unused*/) {
   SetTimeScale(false);

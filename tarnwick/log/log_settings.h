@@ -5,6 +5,8 @@
 #include <string>
 #include <vector>
 
+namespace tarnwick {
+
 // The signed decimal integers of `text` between any of the characters `delimiters`. Empty fields
 // are skipped; a field that is no number counts as 0, and what follows a number is ignored.
 std::vector<int> SplitToIntList(const std::string& text, const std::string& delimiters);
@@ -16,5 +18,7 @@ int ReadSettingValue(const char* path, const char* key, char* value, int size);
 // missing. Results: those of the platform's function; -1 when the file could not be opened or
 // locked.
 int WriteSettingValue(const char* path, const char* key, const char* value, const char* format);
+
+}  // namespace tarnwick
 
 #endif  // TARNWICK_LOG_LOG_SETTINGS_H_

@@ -25,6 +25,8 @@
 #include "tarnwick/platform/owned.h"
 #include "tarnwick/platform/signal_guard.h"
 
+using namespace tarnwick;
+
 namespace {
 
 // Longer tags are cut there.

@@ -6,6 +6,8 @@
 
 #include "tarnwick/net/twsocket.h"
 
+namespace tarnwick {
+
 class SocketAccess {
  public:
   // A socket as `new TWSocket` makes it, but with a read-ahead buffer that is never cleared: nobody
@@ -28,5 +30,7 @@ class SocketAccess {
     socket->m_readLen -= static_cast<int>(size);
   }
 };
+
+}  // namespace tarnwick
 
 #endif  // TARNWICK_NET_SOCKET_ACCESS_H_

@@ -10,6 +10,8 @@
 #include "tarnwick/platform/cancel.h"
 #include "tarnwick/platform/sigpipe_guard.h"
 
+using namespace tarnwick;
+
 namespace {
 
 // Daemons expect TLS to be usable from any thread as soon as the library is there.

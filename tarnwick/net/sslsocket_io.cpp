@@ -12,6 +12,8 @@
 #include "tarnwick/platform/cancel.h"
 #include "tarnwick/platform/sigpipe_guard.h"
 
+using namespace tarnwick;
+
 namespace {
 
 constexpr unsigned int kMaxPiece = 32000;

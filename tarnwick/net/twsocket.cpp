@@ -14,6 +14,8 @@
 #include "tarnwick/log/twdebuglog.h"
 #include "tarnwick/platform/cancel.h"
 
+using namespace tarnwick;
+
 TWSocket::TWSocket() : TWSocket(std::string(), -1, -1, false) {}
 
 TWSocket::TWSocket(const std::string& host, int port, int timeout, bool buffered)

@@ -15,6 +15,9 @@
 #include "tarnwick/platform/export.h"
 
 struct addrinfo;
+namespace tarnwick {
+class SocketAccess;
+}
 
 // One connection at a time to one host and port; it may be connected again and again.
 //
@@ -166,7 +169,8 @@ class TARNWICK_API TWSocket {
   unsigned int m_srcAddr;  // network byte order; 0: not bound
 
  private:
-  friend class SocketAccess;  // net/socket_access.h: what the library's own client may do besides
+  // net/socket_access.h: what the library's own client may do besides.
+  friend class tarnwick::SocketAccess;
   friend class SSLSocket;
   struct HiddenBuffer {};
   TARNWICK_LOCAL explicit TWSocket(HiddenBuffer hidden);

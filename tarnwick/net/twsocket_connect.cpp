@@ -18,6 +18,8 @@
 #include "tarnwick/platform/owned.h"
 #include "tarnwick/utils/utils.h"
 
+using namespace tarnwick;
+
 namespace {
 
 struct AddressListDeleter {

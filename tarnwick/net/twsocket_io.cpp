@@ -10,6 +10,8 @@
 #include "tarnwick/platform/fd_set.h"
 #include "tarnwick/utils/utils.h"
 
+using namespace tarnwick;
+
 namespace {
 
 // Results: those of select; -1 with ENOMEM when there was no memory for the sets.

@@ -4,6 +4,8 @@
 
 #include <pthread.h>
 
+namespace tarnwick {
+
 // While one exists, the calling thread is not cancelled; a cancel that comes meanwhile acts at the
 // next cancellation point after it. It belongs around
 // - calls that acquire or release something: glibc before 2.41 may cancel a thread between the
@@ -20,5 +22,7 @@ class NoCancel {
  private:
   int m_before;
 };
+
+}  // namespace tarnwick
 
 #endif  // TARNWICK_PLATFORM_CANCEL_H_

@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <cstdlib>
 
+namespace tarnwick {
+
 // Of the fd_set only the words are set that select looks at.
 FdSet::FdSet(int fd)
     : m_fd(fd),
@@ -16,3 +18,5 @@ FdSet::FdSet(int fd)
   m_large.reset(static_cast<fd_mask*>(std::calloc(m_word + 1, sizeof(fd_mask))));
   m_words = m_large.get();
 }
+
+}  // namespace tarnwick

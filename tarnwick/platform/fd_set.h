@@ -6,6 +6,8 @@
 
 #include "tarnwick/platform/owned.h"
 
+namespace tarnwick {
+
 // fd_set ends at descriptor 1,023, and a daemon with many cameras has more. Small descriptors use
 // the fd_set inside the object, so that a wait allocates nothing.
 class FdSet {
@@ -33,5 +35,7 @@ class FdSet {
   OwnedMemory<fd_mask> m_large;
   fd_mask* m_words;
 };
+
+}  // namespace tarnwick
 
 #endif  // TARNWICK_PLATFORM_FD_SET_H_

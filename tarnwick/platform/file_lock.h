@@ -6,6 +6,8 @@
 
 #include "tarnwick/platform/owned.h"
 
+namespace tarnwick {
+
 class FileLock {
  public:
   // Waits for the lock. A signal handler that runs meanwhile does not end the wait.
@@ -32,5 +34,7 @@ class FileLock {
   int m_fd;
   bool m_held;
 };
+
+}  // namespace tarnwick
 
 #endif  // TARNWICK_PLATFORM_FILE_LOCK_H_

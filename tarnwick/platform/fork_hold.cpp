@@ -13,6 +13,8 @@
 #include "tarnwick/platform/cancel.h"
 #include "tarnwick/platform/owned.h"
 
+namespace tarnwick {
+
 namespace {
 
 constexpr int kKinds = 2;
@@ -224,3 +226,5 @@ bool UninheritedFile::Flush() {
   __fpurge(m_stream);
   return false;
 }
+
+}  // namespace tarnwick

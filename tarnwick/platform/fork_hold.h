@@ -6,6 +6,8 @@
 
 #include <cstdio>
 
+namespace tarnwick {
+
 // While one exists, fork() waits in every other thread, for 100 milliseconds at most: a disk or a
 // system log that hangs must not stop a process that forks. Holds do not wait for each other. A
 // thread may fork in its own hold, as a signal handler does.
@@ -68,5 +70,7 @@ class UninheritedFile {
   UninheritedFile* m_next = nullptr;
   UninheritedFile** m_link = nullptr;  // what points to this object
 };
+
+}  // namespace tarnwick
 
 #endif  // TARNWICK_PLATFORM_FORK_HOLD_H_

@@ -11,6 +11,8 @@
 
 #include "tarnwick/platform/cancel.h"
 
+namespace tarnwick {
+
 // Puts errno back as it was: for code that runs between a failing call and the caller who reads
 // errno.
 class ErrnoKeeper {
@@ -62,5 +64,7 @@ struct FileCloser {
   }
 };
 using OwnedFile = std::unique_ptr<FILE, FileCloser>;
+
+}  // namespace tarnwick
 
 #endif  // TARNWICK_PLATFORM_OWNED_H_

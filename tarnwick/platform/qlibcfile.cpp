@@ -15,6 +15,8 @@
 #include "tarnwick/platform/settings_file.h"
 #include "tarnwick/platform/settings_text.h"
 
+using namespace tarnwick;
+
 namespace {
 
 // The name under which the new text is written: fixed, because writers exclude each other, and so a

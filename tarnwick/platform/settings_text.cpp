@@ -1,5 +1,7 @@
 #include "tarnwick/platform/settings_text.h"
 
+namespace tarnwick {
+
 namespace {
 
 std::string_view Strip(std::string_view text) {
@@ -74,3 +76,5 @@ std::string ReplaceSettingsLine(std::string_view text, std::string_view key,
   result.append(text.substr(old.end));
   return result;
 }
+
+}  // namespace tarnwick

@@ -5,6 +5,8 @@
 #include <string>
 #include <string_view>
 
+namespace tarnwick {
+
 // Where a key's line stands in a text.
 struct SettingsLine {
   bool found = false;
@@ -25,5 +27,7 @@ bool FormatSettingsLine(std::string_view format, std::string_view key, std::stri
 // `text` with `line` in the place of the key's first line, or at its end when the key has none.
 // REQUIRES: `line` is not empty.
 std::string ReplaceSettingsLine(std::string_view text, std::string_view key, std::string_view line);
+
+}  // namespace tarnwick
 
 #endif  // TARNWICK_PLATFORM_SETTINGS_TEXT_H_

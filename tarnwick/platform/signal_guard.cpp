@@ -6,6 +6,8 @@
 
 #include "tarnwick/platform/owned.h"
 
+namespace tarnwick {
+
 SignalGuard::SignalGuard(int signal) : m_signal(signal), m_pendingBefore(false) {
   const ErrnoKeeper keeper;
   sigemptyset(&m_set);
@@ -33,3 +35,5 @@ bool SignalGuard::IsPending() const {
   sigset_t pending;
   return sigpending(&pending) == 0 && sigismember(&pending, m_signal) == 1;
 }
+
+}  // namespace tarnwick

@@ -4,6 +4,8 @@
 
 #include <csignal>
 
+namespace tarnwick {
+
 // SIGPIPE and SIGXFSZ are raised in the thread that writes. The guard blocks one of them there, and
 // takes it back when a write has raised it; the disposition of the process is not touched, and the
 // thread's mask is as before afterwards. A signal that was pending before stays pending. errno is
@@ -26,5 +28,7 @@ class SignalGuard {
   sigset_t m_before;
   bool m_pendingBefore;
 };
+
+}  // namespace tarnwick
 
 #endif  // TARNWICK_PLATFORM_SIGNAL_GUARD_H_

@@ -4,9 +4,13 @@
 
 #include "tarnwick/platform/signal_guard.h"
 
+namespace tarnwick {
+
 class SigpipeGuard : public SignalGuard {
  public:
   SigpipeGuard() : SignalGuard(SIGPIPE) {}
 };
+
+}  // namespace tarnwick
 
 #endif  // TARNWICK_PLATFORM_SIGPIPE_GUARD_H_

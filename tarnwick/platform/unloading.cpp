@@ -2,6 +2,8 @@
 
 #include <dlfcn.h>
 
+namespace tarnwick {
+
 namespace {
 
 // The library came with the program, which is never unloaded.
@@ -37,3 +39,5 @@ struct EndOfProcess {
 bool IsBeingUnloaded() {
   return !g_stays && !g_is_ending;
 }
+
+}  // namespace tarnwick

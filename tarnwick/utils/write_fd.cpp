@@ -8,6 +8,8 @@
 #include "tarnwick/platform/sigpipe_guard.h"
 #include "tarnwick/utils/utils.h"
 
+using namespace tarnwick;
+
 namespace {
 
 constexpr int kRetryPeriodUs = 10000;

@@ -7,6 +7,8 @@
 #include "tarnwick/platform/owned.h"
 #include "tests/hostile/hostile_util.h"
 
+using namespace tarnwick;
+
 using namespace std::string_literals;
 
 namespace {

@@ -8,6 +8,8 @@
 #include "tarnwick/platform/owned.h"
 #include "tests/hostile/cut_runs.h"
 
+using namespace tarnwick;
+
 namespace {
 
 Outcome CurlGet(ClientProbe& client) {

@@ -6,6 +6,8 @@
 #include "tests/hostile/hostile_util.h"
 #include "tests/hostile/peak_memory.h"
 
+using namespace tarnwick;
+
 using namespace std::string_literals;
 
 namespace {

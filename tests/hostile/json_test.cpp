@@ -11,6 +11,8 @@
 #include "tarnwick/http/json_reply.h"
 #include "tests/hostile/hostile_util.h"
 
+using namespace tarnwick;
+
 namespace {
 
 using ::testing::ElementsAre;

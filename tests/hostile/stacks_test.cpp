@@ -28,6 +28,8 @@
 #include "tests/hostile/hostile_util.h"
 #include "tests/support/stack_use.h"
 
+using namespace tarnwick;
+
 namespace {
 
 // Sanitizers multiply what a function needs.

@@ -5,6 +5,8 @@
 
 #include <string>
 
+using namespace tarnwick;
+
 using namespace std::string_literals;
 
 TEST(ParseChunkSize, AnExtensionDoesNotCount) {

@@ -15,6 +15,8 @@
 
 #include "tests/support/faults.h"
 
+using namespace tarnwick;
+
 using namespace std::string_literals;
 
 namespace {

@@ -12,6 +12,8 @@
 #include "tarnwick/http/head_parser.h"
 #include "tests/http/http_test_util.h"
 
+using namespace tarnwick;
+
 namespace {
 
 // Delivers a text in pieces, and notes what is asked of it.

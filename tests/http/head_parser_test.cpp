@@ -6,6 +6,8 @@
 #include <string>
 #include <vector>
 
+using namespace tarnwick;
+
 using namespace std::string_literals;
 
 namespace {

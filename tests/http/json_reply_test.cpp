@@ -14,6 +14,8 @@
 #include "tests/support/log_capture.h"
 #include "tests/support/process.h"
 
+using namespace tarnwick;
+
 namespace {
 
 using ::testing::AllOf;

@@ -6,6 +6,8 @@
 #include "tests/http/http_test_util.h"
 #include "tests/support/faults.h"
 
+using namespace tarnwick;
+
 using namespace std::string_literals;
 
 namespace {

@@ -10,6 +10,8 @@
 #include "tests/http/http_test_util.h"
 #include "tests/support/tls_scripted_peer.h"
 
+using namespace tarnwick;
+
 namespace {
 
 using ::testing::IsEmpty;

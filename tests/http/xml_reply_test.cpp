@@ -14,6 +14,8 @@
 #include "tests/http/xml_test_util.h"
 #include "tests/support/standard_error.h"
 
+using namespace tarnwick;
+
 namespace {
 
 constexpr char kText[] = "<r><a n=\"one\">text</a><!-- c --><b><c>more</c></b></r>";

@@ -19,6 +19,8 @@
 #include "tests/http/xml_test_util.h"
 #include "tests/support/standard_error.h"
 
+using namespace tarnwick;
+
 using namespace std::string_literals;
 
 namespace {

@@ -15,6 +15,8 @@
 
 #include "tarnwick/log/log_names.h"
 
+using namespace tarnwick;
+
 namespace {
 
 std::atomic<int> allocations_left{1 << 30};

@@ -12,6 +12,8 @@
 #include "tarnwick/log/twdebuglog.h"
 #include "tests/support/process.h"
 
+using namespace tarnwick;
+
 namespace {
 
 LOG_CATEG Categ(int value) {

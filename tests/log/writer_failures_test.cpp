@@ -118,7 +118,7 @@ TEST_F(WriterFailure, WithoutTheLockTheLineIsLostInSilence) {
 TEST_F(WriterFailure, WriteErrorsAreIgnored) {
   DescriptorGuard descriptors;
   Faults faults;
-  faults.FailFrom(Call::kWrite, 1, ENOSPC);
+  faults.FailFrom(Call::kAppend, 1);
   Write();
   EXPECT_THAT(syslog_.Take(), IsEmpty());
   EXPECT_EQ(ReadFile(kMainLog), "");
@@ -126,7 +126,7 @@ TEST_F(WriterFailure, WriteErrorsAreIgnored) {
 
 TEST_F(WriterFailure, AShortWriteIsGoneOnWith) {
   Faults faults;
-  faults.Limit(Call::kWrite, 7);
+  faults.Limit(Call::kAppend, 7);
   Write();
   EXPECT_THAT(ReadFile(kMainLog), EndsWith("message 1\n"));
   EXPECT_THAT(ParseLog(ReadFile(kMainLog)), SizeIs(1));
@@ -164,7 +164,7 @@ TEST_F(WriterFailure, AClockThatCannotBeReadStandsAtItsStart) {
 
 TEST_F(WriterFailure, ErrnoStaysForAnUndefinedTypeAndAFullDisk) {
   Faults faults;
-  faults.FailFrom(Call::kWrite, 1, ENOSPC);
+  faults.FailFrom(Call::kAppend, 1);
   errno = ETIMEDOUT;
   Write();
   EXPECT_EQ(errno, ETIMEDOUT);

@@ -24,6 +24,8 @@
 #include "tests/support/process.h"
 #include "tests/support/syslog_capture.h"
 
+using namespace tarnwick;
+
 namespace {
 
 using std::chrono::milliseconds;
@@ -120,7 +122,7 @@ TEST_F(WriterFork, AChildThatEndsWritesNothingOfItsParentsLine) {
     before_write.Set();
     go_on.Wait();
   };
-  std::thread writer = WriterThatStopsAt(Call::kWrite, 1, stop, go_on);
+  std::thread writer = WriterThatStopsAt(Call::kAppend, 1, stop, go_on);
   EXPECT_TRUE(before_write.Wait());
   // A child flushes its streams when it ends.
   const ChildResult child = RunInChild([] { return 0; }, seconds(10));

@@ -22,6 +22,8 @@
 #include "tests/support/process.h"
 #include "tests/support/syslog_capture.h"
 
+using namespace tarnwick;
+
 namespace {
 
 using std::chrono::seconds;

@@ -5,6 +5,8 @@
 #include "tarnwick/net/socket_access.h"
 #include "tests/net/net_test_util.h"
 
+using namespace tarnwick;
+
 namespace {
 
 // The fields of a socket that is of no derived class.

@@ -9,6 +9,8 @@
 #include "tests/support/faults.h"
 #include "tests/support/process.h"
 
+using namespace tarnwick;
+
 namespace {
 
 TEST(FdSet, HoldsItsDescriptorWhateverTheNumber) {

@@ -12,6 +12,8 @@
 #include "tests/support/faults.h"
 #include "tests/support/files.h"
 
+using namespace tarnwick;
+
 namespace {
 
 int OpenFile(const TempDir& folder) {

@@ -23,6 +23,8 @@
 #include "tests/support/flag.h"
 #include "tests/support/process.h"
 
+using namespace tarnwick;
+
 namespace {
 
 int OpenIn(const std::string& folder) {

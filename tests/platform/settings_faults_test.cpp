@@ -19,6 +19,8 @@
 #include "tests/support/files.h"
 #include "tests/support/process.h"
 
+using namespace tarnwick;
+
 namespace {
 
 using ::testing::AnyOf;

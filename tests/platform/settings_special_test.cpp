@@ -15,6 +15,8 @@
 #include "tests/support/files.h"
 #include "tests/support/process.h"
 
+using namespace tarnwick;
+
 namespace {
 
 constexpr char kFormat[] = "%s=\"%s\"\n";

@@ -5,6 +5,8 @@
 
 #include <string>
 
+using namespace tarnwick;
+
 namespace {
 
 TEST(FindSettingsLine, GivesWhereTheLineStands) {

@@ -10,6 +10,8 @@
 
 #include "tests/support/process.h"
 
+using namespace tarnwick;
+
 namespace {
 
 bool Blocked() {

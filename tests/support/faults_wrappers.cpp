@@ -12,6 +12,7 @@
 #include <sys/shm.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
+#include <sys/syscall.h>
 #include <unistd.h>
 
 #include <cerrno>
@@ -61,6 +62,12 @@ void Clear(int nfds, fd_set* set) {
   memset(set, 0, static_cast<size_t>(words) * sizeof(long));
 }
 
+// The log alone appends. The call of fcntl by its number is not counted as one of the library's.
+Call WriteTo(int fd) {
+  const long flags = syscall(SYS_fcntl, fd, F_GETFL);
+  return flags != -1 && (flags & O_APPEND) != 0 ? Call::kAppend : Call::kWrite;
+}
+
 }  // namespace
 
 // A wrapper that only asks and passes on.
@@ -97,7 +104,7 @@ PASS(Call::kClose, int, close, (int fd), (fd))
 PASS_SIZED(Call::kRead, ssize_t, read, (int fd, void* buf, size_t len), (fd, buf, len), len)
 PASS_SIZED(Call::kRead, ssize_t, __read_chk, (int fd, void* buf, size_t len, size_t room),
            (fd, buf, len, room), len)
-PASS_SIZED(Call::kWrite, ssize_t, write, (int fd, const void* buf, size_t len), (fd, buf, len), len)
+PASS_SIZED(WriteTo(fd), ssize_t, write, (int fd, const void* buf, size_t len), (fd, buf, len), len)
 PASS(Call::kFopencookie, FILE*, fopencookie,
      (void* cookie, const char* mode, cookie_io_functions_t calls), (cookie, mode, calls))
 PASS(Call::kFopen, FILE*, fopen, (const char* path, const char* mode), (path, mode))

@@ -14,6 +14,8 @@
 #include "tests/support/log_capture.h"
 #include "tests/torture/operations.h"
 
+using namespace tarnwick;
+
 namespace {
 
 constexpr char kSettings[] = "/var/packages/Tarnwick/etc/settings.conf";

@@ -11,6 +11,8 @@
 #include "tests/support/flag.h"
 #include "tests/torture/operations.h"
 
+using namespace tarnwick;
+
 namespace {
 
 void* SetFlag(void* flag) {

@@ -13,22 +13,22 @@
 
 // The directory at `path`, made with mode 0700 when it is missing, the ones above it with the usual
 // mode. One of another user is refused.
-OwnedFd OpenPrivateFolder(const std::string& path, std::string* error);
+tarnwick::OwnedFd OpenPrivateFolder(const std::string& path, std::string* error);
 
 // Writes the file `name` of the directory with mode 0600, in the place of whatever has the name.
-bool WritePrivateFile(const OwnedFd& folder, const std::string& name, const std::string& bytes,
-                      std::string* error);
+bool WritePrivateFile(const tarnwick::OwnedFd& folder, const std::string& name,
+                      const std::string& bytes, std::string* error);
 
 // Results: false with errno.
-bool WriteAll(const OwnedFd& fd, const std::string& bytes);
+bool WriteAll(const tarnwick::OwnedFd& fd, const std::string& bytes);
 
 // A file to write to, made with `mode` when it is missing. One of another user is refused, but no
 // device. Below /dev and /proc, where no other user makes files, links are followed: shells write
 // /dev/fd/63 for a pipe to another program.
-OwnedFd OpenOwnFile(const std::string& path, int flags, mode_t mode, std::string* error);
+tarnwick::OwnedFd OpenOwnFile(const std::string& path, int flags, mode_t mode, std::string* error);
 
 // Reads the regular file `name` of the directory, of `most` bytes at most.
-bool ReadRegularFile(const OwnedFd& folder, const std::string& name, size_t most,
+bool ReadRegularFile(const tarnwick::OwnedFd& folder, const std::string& name, size_t most,
                      std::string* bytes, std::string* error);
 
 #endif  // TARNWICK_TOOLS_COMMON_PRIVATE_FILE_H_

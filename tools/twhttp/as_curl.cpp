@@ -99,7 +99,7 @@ std::string Get(const Options& options) {
   }
   command.Socket();
   return command.Finish(options.encode_query
-                            ? EncodeQueryValues(options.target.path, options.encode_keep)
+                            ? tarnwick::EncodeQueryValues(options.target.path, options.encode_keep)
                             : options.target.path);
 }
 

@@ -15,7 +15,7 @@ std::string LastChallenge(const Evidence& evidence) {
 }
 
 void AddDigest(const std::string& challenge, Causes* causes) {
-  const ChallengeMap values = ParseChallenge(challenge);
+  const tarnwick::ChallengeMap values = tarnwick::ParseChallenge(challenge);
   const std::string algorithm = Lower(values.at("algorithm"));
   if (Lower(values.at("stale")) == "true") {
     causes->push_back("the peer calls the nonce stale: it renews it faster than it is answered");
@@ -74,10 +74,10 @@ Causes AfterLoginRefused(const Evidence& evidence) {
   std::vector<std::string> nonces;
   for (const Exchange& exchange : evidence.trace.Exchanges()) {
     const std::string challenge = exchange.reply.Value("WWW-Authenticate");
-    if (!challenge.empty()) nonces.push_back(ParseChallenge(challenge).at("nonce"));
+    if (!challenge.empty()) nonces.push_back(tarnwick::ParseChallenge(challenge).at("nonce"));
   }
   Causes causes;
-  if (!ParseChallenge(LastChallenge(evidence)).at("algorithm").empty()) {
+  if (!tarnwick::ParseChallenge(LastChallenge(evidence)).at("algorithm").empty()) {
     causes.emplace_back(
         "the library quotes the algorithm in its answer, which strict peers refuse");
   }

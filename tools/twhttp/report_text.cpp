@@ -72,7 +72,7 @@ std::string ChallengeText(const Exchange& exchange) {
   if (challenge.empty()) return "";
   std::string text =
       "  challenge " + EscapeControls(challenge.substr(0, challenge.find(' '))) + "\n";
-  for (const auto& [name, value] : ParseChallenge(challenge)) {
+  for (const auto& [name, value] : tarnwick::ParseChallenge(challenge)) {
     char line[32];
     snprintf(line, sizeof(line), "    %-10s ", name.c_str());
     if (!value.empty()) text += line + EscapeControls(value) + "\n";

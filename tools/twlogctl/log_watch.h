@@ -27,7 +27,7 @@ class LogWatch {
   void Drain();
 
  private:
-  OwnedFd m_fd;
+  tarnwick::OwnedFd m_fd;
 };
 
 #endif  // TARNWICK_TOOLS_TWLOGCTL_LOG_WATCH_H_
