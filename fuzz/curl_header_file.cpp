@@ -13,7 +13,7 @@
 #include "fuzz/support/script.h"
 #include "fuzz/support/target.h"
 #include "tarnwick/http/curl_callbacks.h"
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/unique.h"
 
 using namespace tarnwick;
 

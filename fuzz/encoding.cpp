@@ -12,7 +12,7 @@
 #include "fuzz/support/script.h"
 #include "fuzz/support/target.h"
 #include "tarnwick/http/query_encoding.h"
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/unique.h"
 #include "tarnwick/utils/utils.h"
 
 using namespace tarnwick;

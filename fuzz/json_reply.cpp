@@ -1,5 +1,5 @@
 // The reply of a JSON service: the input is its text.
-#include "tarnwick/http/json_reply.h"
+#include "tarnwick/http/json_response.h"
 
 #include <json/json.h>
 #include <pthread.h>

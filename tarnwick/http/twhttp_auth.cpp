@@ -1,7 +1,7 @@
 // The Authorization lines of the client's login.
 #include "tarnwick/http/digest.h"
 #include "tarnwick/http/twhttp.h"
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/unique.h"
 #include "tarnwick/utils/utils.h"
 
 using namespace tarnwick;

@@ -4,7 +4,7 @@
 #include <cerrno>
 #include <exception>
 
-#include "tarnwick/http/json_reply.h"
+#include "tarnwick/http/json_response.h"
 #include "tarnwick/http/twhttp.h"
 #include "tarnwick/log/twdebuglog.h"
 #include "tarnwick/net/request_settings.h"

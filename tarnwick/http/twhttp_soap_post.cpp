@@ -10,9 +10,9 @@
 
 #include "tarnwick/http/challenge_words.h"
 #include "tarnwick/http/twhttp.h"
-#include "tarnwick/http/xml_reply.h"
+#include "tarnwick/http/xml_response.h"
 #include "tarnwick/log/twdebuglog.h"
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/unique.h"
 #include "tarnwick/utils/utils.h"
 
 using namespace tarnwick;

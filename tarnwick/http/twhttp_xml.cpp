@@ -12,9 +12,9 @@
 #include "tarnwick/http/curl_callbacks.h"
 #include "tarnwick/http/curl_request.h"
 #include "tarnwick/http/twhttp.h"
-#include "tarnwick/http/xml_reply.h"
+#include "tarnwick/http/xml_response.h"
 #include "tarnwick/log/twdebuglog.h"
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/unique.h"
 
 using namespace tarnwick;
 

@@ -12,7 +12,7 @@
 #include "tarnwick/log/twdebuglog.h"
 #include "tarnwick/platform/cancel.h"
 #include "tarnwick/platform/file_lock.h"
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/unique.h"
 #include "tarnwick/platform/qlibcfile.h"
 #include "tarnwick/platform/settings_file.h"
 

@@ -21,8 +21,8 @@
 
 #include "tarnwick/platform/cancel.h"
 #include "tarnwick/platform/file_lock.h"
-#include "tarnwick/platform/fork_hold.h"
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/fork_guard.h"
+#include "tarnwick/platform/unique.h"
 #include "tarnwick/platform/signal_guard.h"
 
 using namespace tarnwick;

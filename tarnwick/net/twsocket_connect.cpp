@@ -15,7 +15,7 @@
 #include "tarnwick/net/twsocket.h"
 #include "tarnwick/platform/cancel.h"
 #include "tarnwick/platform/fd_set.h"
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/unique.h"
 #include "tarnwick/utils/utils.h"
 
 using namespace tarnwick;

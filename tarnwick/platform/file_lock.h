@@ -4,7 +4,7 @@
 
 #include <sys/file.h>
 
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/unique.h"
 
 namespace tarnwick {
 

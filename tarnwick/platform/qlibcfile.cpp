@@ -11,7 +11,7 @@
 
 #include "tarnwick/platform/cancel.h"
 #include "tarnwick/platform/file_lock.h"
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/unique.h"
 #include "tarnwick/platform/settings_file.h"
 #include "tarnwick/platform/settings_text.h"
 

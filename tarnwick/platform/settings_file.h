@@ -7,7 +7,7 @@
 #include <cstddef>
 #include <string>
 
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/unique.h"
 
 namespace tarnwick {
 

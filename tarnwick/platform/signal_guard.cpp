@@ -4,7 +4,7 @@
 
 #include <ctime>
 
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/unique.h"
 
 namespace tarnwick {
 

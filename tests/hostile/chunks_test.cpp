@@ -4,7 +4,7 @@
 #include <json/value.h>
 #include <libxml/tree.h>
 
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/unique.h"
 #include "tests/hostile/hostile_util.h"
 
 using namespace tarnwick;

@@ -5,7 +5,7 @@
 #include <libxml/parser.h>
 #include <libxml/tree.h>
 
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/unique.h"
 #include "tests/hostile/cut_runs.h"
 
 using namespace tarnwick;

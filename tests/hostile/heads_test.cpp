@@ -2,7 +2,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/unique.h"
 #include "tests/hostile/hostile_util.h"
 #include "tests/hostile/peak_memory.h"
 

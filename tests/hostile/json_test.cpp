@@ -8,7 +8,7 @@
 #include <utility>
 #include <vector>
 
-#include "tarnwick/http/json_reply.h"
+#include "tarnwick/http/json_response.h"
 #include "tests/hostile/hostile_util.h"
 
 using namespace tarnwick;

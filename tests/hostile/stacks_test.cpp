@@ -21,7 +21,7 @@
 #include <string>
 #include <vector>
 
-#include "tarnwick/http/json_reply.h"
+#include "tarnwick/http/json_response.h"
 #include "tarnwick/log/twdebuglog.h"
 #include "tarnwick/net/sslsocket.h"
 #include "tarnwick/utils/utils.h"

@@ -6,7 +6,7 @@
 #include <functional>
 #include <thread>
 
-#include "tarnwick/http/json_reply.h"
+#include "tarnwick/http/json_response.h"
 #include "tarnwick/net/twrequestscope.h"
 #include "tests/http/http_test_util.h"
 #include "tests/support/tls_scripted_peer.h"

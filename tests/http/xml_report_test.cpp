@@ -15,7 +15,7 @@
 #include <thread>
 #include <vector>
 
-#include "tarnwick/http/xml_reply.h"
+#include "tarnwick/http/xml_response.h"
 #include "tests/http/xml_test_util.h"
 #include "tests/support/standard_error.h"
 

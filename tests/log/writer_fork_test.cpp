@@ -16,7 +16,7 @@
 #include <vector>
 
 #include "tarnwick/log/twdebuglog.h"
-#include "tarnwick/platform/fork_hold.h"
+#include "tarnwick/platform/fork_guard.h"
 #include "tests/support/faults.h"
 #include "tests/support/files.h"
 #include "tests/support/flag.h"

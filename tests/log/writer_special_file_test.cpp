@@ -15,7 +15,7 @@
 #include <vector>
 
 #include "tarnwick/log/twdebuglog.h"
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/unique.h"
 #include "tests/support/faults.h"
 #include "tests/support/files.h"
 #include "tests/support/log_capture.h"

@@ -8,7 +8,7 @@
 #include <cerrno>
 #include <utility>
 
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/unique.h"
 #include "tests/support/faults.h"
 #include "tests/support/files.h"
 

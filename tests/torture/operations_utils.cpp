@@ -6,7 +6,7 @@
 #include <cstring>
 
 #include "tarnwick/log/twdebuglog.h"
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/unique.h"
 #include "tarnwick/utils/utils.h"
 #include "tests/support/flag.h"
 #include "tests/torture/operations.h"

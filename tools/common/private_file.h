@@ -6,7 +6,7 @@
 
 #include <string>
 
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/unique.h"
 
 // All of these follow no link at the end of a path, and return an invalid descriptor, or false, with
 // the reason in `error`.

@@ -4,7 +4,7 @@
 #include <cstdio>
 
 #include "tarnwick/log/twdebuglog.h"
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/unique.h"
 #include "tools/twhttp/hooks.h"
 
 namespace {

@@ -12,7 +12,7 @@
 #include <map>
 #include <optional>
 
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/unique.h"
 #include "tools/twhttp/fake_peer.h"
 #include "tools/twhttp/hooks.h"
 #include "tools/twhttp/interrupt.h"

@@ -7,7 +7,7 @@
 #include <cerrno>
 #include <cstring>
 
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/unique.h"
 #include "tools/twhttp/hooks.h"
 #include "tools/twhttp/interrupt.h"
 

@@ -8,7 +8,7 @@
 #include <cstdio>
 #include <memory>
 
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/unique.h"
 #include "tools/common/json_output.h"
 #include "tools/twhttp/client.h"
 #include "tools/twhttp/content.h"

@@ -3,7 +3,7 @@
 #include <algorithm>
 #include <cctype>
 
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/unique.h"
 #include "tarnwick/utils/utils.h"
 #include "tools/twhttp/message.h"
 

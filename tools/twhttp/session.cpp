@@ -4,7 +4,7 @@
 #include <cstdio>
 #include <cstring>
 
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/unique.h"
 #include "tools/common/terminal.h"
 #include "tools/twhttp/hooks.h"
 

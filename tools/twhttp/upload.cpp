@@ -4,7 +4,7 @@
 
 #include <cstdio>
 
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/unique.h"
 
 namespace {
 

@@ -11,7 +11,7 @@
 #include <optional>
 #include <vector>
 
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/unique.h"
 #include "tools/common/amounts.h"
 #include "tools/common/shell.h"
 #include "tools/twlogctl/doctor.h"

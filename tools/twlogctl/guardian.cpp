@@ -12,7 +12,7 @@
 #include <cerrno>
 #include <csignal>
 
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/unique.h"
 
 namespace {
 

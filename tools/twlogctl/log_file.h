@@ -7,7 +7,7 @@
 #include <string>
 #include <utility>
 
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/unique.h"
 
 // Reads what writers append, without their lock: whoever looks at a log must not hold up the
 // daemons. A truncation shows by the file's length, or by other bytes at the places that were read

@@ -8,7 +8,7 @@
 #include <cerrno>
 #include <vector>
 
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/unique.h"
 #include "tools/twlogctl/log_messages.h"
 #include "tools/twlogctl/log_paths.h"
 

@@ -4,7 +4,7 @@
 
 #include <string>
 
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/unique.h"
 
 // Events are hints: whoever was woken looks at the files themselves, and looks at them now and then
 // without an event too, because network file systems give none and queues overflow.

@@ -8,7 +8,7 @@
 #include <optional>
 
 #include "tarnwick/log/twdebuglog.h"
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/unique.h"
 #include "tools/common/terminal.h"
 
 namespace {

@@ -5,7 +5,7 @@
 #include <csignal>
 #include <string>
 
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/unique.h"
 #include "tools/twlogctl/top_model.h"
 
 // Signals that end the program, and the one of a new size, as bytes to read: the terminal must be

@@ -12,7 +12,7 @@
 #include <sstream>
 #include <thread>
 
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/unique.h"
 #include "tools/common/json_output.h"
 #include "tools/twlogctl/commands.h"
 #include "tools/twlogctl/log_paths.h"

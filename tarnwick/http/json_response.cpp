@@ -1,4 +1,4 @@
-#include "tarnwick/http/json_reply.h"
+#include "tarnwick/http/json_response.h"
 
 #include <json/reader.h>
 #include <pthread.h>

@@ -1,5 +1,5 @@
 // What a forked child does not inherit.
-#include "tarnwick/platform/fork_hold.h"
+#include "tarnwick/platform/fork_guard.h"
 
 #include <fcntl.h>
 #include <gtest/gtest.h>
@@ -17,7 +17,7 @@
 #include <thread>
 #include <vector>
 
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/unique.h"
 #include "tests/support/faults.h"
 #include "tests/support/files.h"
 #include "tests/support/flag.h"

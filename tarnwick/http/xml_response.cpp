@@ -1,4 +1,4 @@
-#include "tarnwick/http/xml_reply.h"
+#include "tarnwick/http/xml_response.h"
 
 #include <libxml/globals.h>
 #include <libxml/parser.h>

@@ -1,4 +1,4 @@
-#include "tarnwick/platform/fork_hold.h"
+#include "tarnwick/platform/fork_guard.h"
 
 #include <fcntl.h>
 #include <pthread.h>
@@ -11,7 +11,7 @@
 #include <ctime>
 
 #include "tarnwick/platform/cancel.h"
-#include "tarnwick/platform/owned.h"
+#include "tarnwick/platform/unique.h"
 
 namespace tarnwick {
 

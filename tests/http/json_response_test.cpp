@@ -1,5 +1,5 @@
 // The JSON step of the one-call functions.
-#include "tarnwick/http/json_reply.h"
+#include "tarnwick/http/json_response.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>

@@ -1,6 +1,6 @@
 // Small move-only owners: what a function acquires is released on every path out of it.
-#ifndef TARNWICK_PLATFORM_OWNED_H_
-#define TARNWICK_PLATFORM_OWNED_H_
+#ifndef TARNWICK_PLATFORM_UNIQUE_H_
+#define TARNWICK_PLATFORM_UNIQUE_H_
 
 #include <unistd.h>
 
@@ -67,4 +67,4 @@ using OwnedFile = std::unique_ptr<FILE, FileCloser>;
 
 }  // namespace tarnwick
 
-#endif  // TARNWICK_PLATFORM_OWNED_H_
+#endif  // TARNWICK_PLATFORM_UNIQUE_H_

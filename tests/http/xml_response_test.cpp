@@ -1,5 +1,5 @@
 // The parse of a device's XML, with each allocation of the parser failing in turn.
-#include "tarnwick/http/xml_reply.h"
+#include "tarnwick/http/xml_response.h"
 
 #include <gtest/gtest.h>
 #include <libxml/parser.h>

@@ -1,6 +1,6 @@
 // The JSON step of the one-call functions.
-#ifndef TARNWICK_HTTP_JSON_REPLY_H_
-#define TARNWICK_HTTP_JSON_REPLY_H_
+#ifndef TARNWICK_HTTP_JSON_RESPONSE_H_
+#define TARNWICK_HTTP_JSON_RESPONSE_H_
 
 #include <json/value.h>
 
@@ -22,4 +22,4 @@ int JsonDepth(const std::string& text);
 
 }  // namespace tarnwick
 
-#endif  // TARNWICK_HTTP_JSON_REPLY_H_
+#endif  // TARNWICK_HTTP_JSON_RESPONSE_H_

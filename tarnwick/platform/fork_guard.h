@@ -1,6 +1,6 @@
 // What a forked child must not inherit half done: locks of the C library and open descriptors.
-#ifndef TARNWICK_PLATFORM_FORK_HOLD_H_
-#define TARNWICK_PLATFORM_FORK_HOLD_H_
+#ifndef TARNWICK_PLATFORM_FORK_GUARD_H_
+#define TARNWICK_PLATFORM_FORK_GUARD_H_
 
 #include <sys/types.h>
 
@@ -73,4 +73,4 @@ class UninheritedFile {
 
 }  // namespace tarnwick
 
-#endif  // TARNWICK_PLATFORM_FORK_HOLD_H_
+#endif  // TARNWICK_PLATFORM_FORK_GUARD_H_

@@ -1,6 +1,6 @@
 // Parsing a device's XML.
-#ifndef TARNWICK_HTTP_XML_REPLY_H_
-#define TARNWICK_HTTP_XML_REPLY_H_
+#ifndef TARNWICK_HTTP_XML_RESPONSE_H_
+#define TARNWICK_HTTP_XML_RESPONSE_H_
 
 #include <libxml/tree.h>
 
@@ -14,4 +14,4 @@ xmlDoc* ParseXml(const char* text, int size);
 
 }  // namespace tarnwick
 
-#endif  // TARNWICK_HTTP_XML_REPLY_H_
+#endif  // TARNWICK_HTTP_XML_RESPONSE_H_
