@@ -45,15 +45,16 @@ std::string ReadBody(TWHttpClient* client) {
 }
 
 std::string Get(const Request& request) {
-  Json::Value reply;
-  const int result = SendHttpGet(request.host, request.port, request.path, reply, kTimeout, false);
-  return "SendHttpGet " + std::to_string(result) + " " + Compact(reply);
+  Json::Value response;
+  const int result =
+      SendHttpGet(request.host, request.port, request.path, response, kTimeout, false);
+  return "SendHttpGet " + std::to_string(result) + " " + Compact(response);
 }
 
 std::string HttpsGet(const Request& request) {
-  Json::Value reply;
-  const int result = SendHttpsGet(request.host, request.port, request.path, reply, kTimeout);
-  return "SendHttpsGet " + std::to_string(result) + " " + Compact(reply);
+  Json::Value response;
+  const int result = SendHttpsGet(request.host, request.port, request.path, response, kTimeout);
+  return "SendHttpsGet " + std::to_string(result) + " " + Compact(response);
 }
 
 std::string Login(const Request& request) {

@@ -1,5 +1,5 @@
-// Downloads into a file, whatever the size: SendRequestByCurl with a response file. The file gets the
-// headers, an empty line and the body.
+// Downloads into a file, whatever the size: SendRequestByCurl with a response file. The file gets
+// the headers, an empty line and the body.
 //
 //   op_download HOST PORT PATH FILE
 #include <cstdio>

@@ -1,4 +1,5 @@
-// Posts a form with a session's cookie and prints the answer: SendRequestBySocketPost, then ReadBody.
+// Posts a form with a session's cookie and prints the answer: SendRequestBySocketPost, then
+// ReadBody.
 //
 //   op_form_post HOST PORT PATH FORM COOKIE
 #include <cstdio>

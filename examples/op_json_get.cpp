@@ -15,9 +15,9 @@ namespace {
 const char* Reason(int result) {
   switch (result) {
     case -1:
-      return "no reply";
+      return "no response";
     default:
-      return "the service did not succeed, or its reply is no JSON";
+      return "the service did not succeed, or its response is no JSON";
   }
 }
 
@@ -28,16 +28,17 @@ int main(int argc, char** argv) {
     std::fprintf(stderr, "usage: op_json_get HOST PORT PATH\n");
     return 2;
   }
-  Json::Value reply;
+  Json::Value response;
   const int timeout = 5;  // seconds, for connecting and for each wait
   const bool encodeQuery = true;
-  const int result = SendHttpGet(argv[1], std::atoi(argv[2]), argv[3], reply, timeout, encodeQuery);
+  const int result =
+      SendHttpGet(argv[1], std::atoi(argv[2]), argv[3], response, timeout, encodeQuery);
   if (result != 0) {
     std::fprintf(stderr, "%s\n", Reason(result));
     return 1;
   }
   Json::StreamWriterBuilder builder;
   builder["indentation"] = "";
-  std::puts(Json::writeString(builder, reply).c_str());
+  std::puts(Json::writeString(builder, response).c_str());
   return 0;
 }

@@ -1,5 +1,5 @@
-// Two requests over one connection: the second is written by hand, and GetResp reads its whole reply,
-// the head included.
+// Two requests over one connection: the second is written by hand, and GetResp reads its whole
+// response, the head included.
 //
 //   op_second_request HOST PORT PATH SECOND_PATH
 #include <algorithm>
@@ -11,7 +11,7 @@
 
 namespace {
 
-// Reads a body of the announced length, so that the next reply comes next.
+// Reads a body of the announced length, so that the next response comes next.
 bool SkipBody(TWHttpClient* client) {
   std::string length;
   if (client->GetHttpContent(HTTP_CONTENT_LENGTH, length) != HTTP_RET_OK) return false;
@@ -34,7 +34,7 @@ int main(int argc, char** argv) {
   TWHttpClient client(argv[1], std::atoi(argv[2]), argv[3], "", "", 5, false, true, false, false,
                       HTTP_VERSION_1_1, "");
   if (client.SendRequestByGet() != HTTP_RET_OK || !SkipBody(&client)) {
-    std::fprintf(stderr, "no first reply\n");
+    std::fprintf(stderr, "no first response\n");
     return 1;
   }
   // A body that is not chunked ends with the connection, so the server is asked to close it.

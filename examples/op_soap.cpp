@@ -1,4 +1,4 @@
-// Posts a SOAP envelope and prints the reply: SendReqBySocketPost.
+// Posts a SOAP envelope and prints the response: SendReqBySocketPost.
 //
 //   op_soap HOST PORT PATH
 #include <cstdio>
@@ -26,15 +26,15 @@ int main(int argc, char** argv) {
   TWHttpClient client(argv[1], std::atoi(argv[2]), argv[3], "", "", kTimeout, false, true, false,
                       false, HTTP_VERSION_1_1, "");
 
-  std::string reply;
-  if (client.SendReqBySocketPost(kEnvelope, reply) != HTTP_RET_OK) {
-    // Also when the reply did not announce its length: without one this operation reads nothing.
-    std::fprintf(stderr, "no reply\n");
+  std::string response;
+  if (client.SendReqBySocketPost(kEnvelope, response) != HTTP_RET_OK) {
+    // Also when the response did not announce its length: without one this operation reads nothing.
+    std::fprintf(stderr, "no response\n");
     return 1;
   }
-  std::fwrite(reply.data(), 1, reply.size(), stdout);
+  std::fwrite(response.data(), 1, response.size(), stdout);
 
-  // A fault comes with a reply, too.
+  // A fault comes with a response, too.
   int status = 0;
   if (client.CheckResponse(status) == HTTP_RET_OK) return 0;
   std::fprintf(stderr, "status %d\n", status);

@@ -26,20 +26,20 @@ int main(int argc, char** argv) {
   TWHttpClient client(argv[1], std::atoi(argv[2]), argv[3], argv[4], argv[5], kTimeout, false, true,
                       false, false, HTTP_VERSION_1_1, "");
 
-  // Unlike the request without a login, this one gives the outcome of the reply.
-  std::string reply;
-  switch (client.SendAuthReqBySocketPost(kEnvelope, reply)) {
+  // Unlike the request without a login, this one gives the outcome of the response.
+  std::string response;
+  switch (client.SendAuthReqBySocketPost(kEnvelope, response)) {
     case HTTP_RET_OK:
-      std::fwrite(reply.data(), 1, reply.size(), stdout);
+      std::fwrite(response.data(), 1, response.size(), stdout);
       return 0;
     case HTTP_RET_UNAUTHORIZED:
       std::fprintf(stderr, "user or password is wrong\n");
       return 1;
     case HTTP_RET_IO_ERROR:
-      std::fprintf(stderr, "no reply\n");
+      std::fprintf(stderr, "no response\n");
       return 1;
     default:
-      std::fprintf(stderr, "a fault: %s\n", reply.c_str());
+      std::fprintf(stderr, "a fault: %s\n", response.c_str());
       return 1;
   }
 }

@@ -1,4 +1,4 @@
-// Posts a SOAP envelope and looks into the reply: SendReqByXMLSocketPost.
+// Posts a SOAP envelope and looks into the response: SendReqByXMLSocketPost.
 //
 //   op_soap_xml HOST PORT PATH
 #include <libxml/tree.h>
@@ -32,15 +32,15 @@ int main(int argc, char** argv) {
   TWHttpClient client(argv[1], std::atoi(argv[2]), argv[3], "", "", kTimeout, false, true, false,
                       false, HTTP_VERSION_1_1, "");
 
-  xmlDoc* reply = nullptr;
-  if (client.SendReqByXMLSocketPost(kEnvelope, reply) != HTTP_RET_OK) {
-    std::fprintf(stderr, "no reply\n");
+  xmlDoc* response = nullptr;
+  if (client.SendReqByXMLSocketPost(kEnvelope, response) != HTTP_RET_OK) {
+    std::fprintf(stderr, "no response\n");
     return 1;
   }
-  const std::unique_ptr<xmlDoc, DocDeleter> owner(reply);
-  const xmlNode* root = xmlDocGetRootElement(reply);
+  const std::unique_ptr<xmlDoc, DocDeleter> owner(response);
+  const xmlNode* root = xmlDocGetRootElement(response);
   if (root == nullptr) {
-    std::fprintf(stderr, "the reply is no XML\n");
+    std::fprintf(stderr, "the response is no XML\n");
     return 1;
   }
   std::printf("root: %s\n", reinterpret_cast<const char*>(root->name));

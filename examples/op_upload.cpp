@@ -1,5 +1,5 @@
-// Streams a file to a device that receives it as a multipart upload: OpenRawDataUpload, WriteData for
-// as long as there is something to send, and GetResp for the answer.
+// Streams a file to a device that receives it as a multipart upload: OpenRawDataUpload, WriteData
+// for as long as there is something to send, and GetResp for the answer.
 //
 //   op_upload HOST PORT PATH FILE
 #include <cstdio>

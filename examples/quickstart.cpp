@@ -15,14 +15,14 @@ int main(int argc, char** argv) {
   }
   const char* host = argv[1];
 
-  Json::Value reply;
-  const int result = SendHttpGet(host, std::atoi(argv[2]), argv[3], reply, 5, false);
+  Json::Value response;
+  const int result = SendHttpGet(host, std::atoi(argv[2]), argv[3], response, 5, false);
   if (result != 0) {
     TW_LOG(LOG_CATEG_CAMERA, LOG_LEVEL_WARN, "%s gives no answer: %d\n", host, result);
     return 1;
   }
 
-  const std::string text = Json::writeString(Json::StreamWriterBuilder(), reply["camera"]);
+  const std::string text = Json::writeString(Json::StreamWriterBuilder(), response["camera"]);
   TW_LOG(LOG_CATEG_CAMERA, LOG_LEVEL_NOTICE, "%s is camera %s\n", host, text.c_str());
   return 0;
 }

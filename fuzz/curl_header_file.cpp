@@ -43,7 +43,7 @@ class BoundedFile {
 
   const size_t room_;
   std::string bytes_;
-  OwnedFile file_;
+  UniqueFile file_;
 };
 
 constexpr size_t kEnoughRoom = 1 << 20;
@@ -144,7 +144,7 @@ class Transfer {
 void CheckReading(const std::string& message, const Settings& settings) {
   if (message.empty()) return;
   std::string copy = message;
-  const OwnedFile file(fmemopen(copy.data(), copy.size(), "r"));
+  const UniqueFile file(fmemopen(copy.data(), copy.size(), "r"));
   Expect("the message opens", file != nullptr);
   std::string read;
   for (size_t n = 0;; ++n) {

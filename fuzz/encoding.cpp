@@ -1,5 +1,5 @@
-// The encodings and text helpers. Line 1: the characters to keep, to trim and (its first) to remove;
-// the rest is the text. A text that is a number is a count of microseconds as well.
+// The encodings and text helpers. Line 1: the characters to keep, to trim and (its first) to
+// remove; the rest is the text. A text that is a number is a count of microseconds as well.
 #include <climits>
 #include <cstdint>
 #include <cstdlib>
@@ -39,7 +39,7 @@ void CheckQueryEncoding(const std::string& text, const std::string& keep) {
 }
 
 void CheckBase64(const std::string& text) {
-  const OwnedMemory<char> encoded(Base64Encode(text.c_str()));
+  const UniqueMalloc<char> encoded(Base64Encode(text.c_str()));
   Expect("Base64Encode has memory", encoded != nullptr);
   ExpectSame("Base64Encode", encoded.get(), oracle::Base64(UpToZero(text)));
   ExpectSame("Base64Encode and back", oracle::Base64Decoded(encoded.get()), UpToZero(text));

@@ -121,8 +121,8 @@ class Worker {
   const std::function<void()>* work_ = nullptr;
 };
 
-// The library looks at the stack for text of more levels than this. Of the main thread it would have
-// to read a file to learn its stack, so that deep text is left to other threads.
+// The library looks at the stack for text of more levels than this. Of the main thread it would
+// have to read a file to learn its stack, so that deep text is left to other threads.
 constexpr int kDeep = 12;
 constexpr size_t kUsualStack = size_t{8} << 20;
 constexpr size_t kSmallStack = size_t{160} << 10;  // with room for what the sanitizers add

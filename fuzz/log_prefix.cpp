@@ -1,5 +1,5 @@
-// A line of the log. Line 1: words and numbers; line 2: seconds and microseconds since 1970; lines 3
-// to 6: category, level, source file and function; the rest is the message.
+// A line of the log. Line 1: words and numbers; line 2: seconds and microseconds since 1970; lines
+// 3 to 6: category, level, source file and function; the rest is the message.
 //
 // Words of line 1: "thread" logs from a thread; "nocategory" and "nolevel" pass none; "scale" wants
 // milliseconds; "notification" and "undefined" choose another file; "mixed" passes a format with

@@ -1,8 +1,8 @@
 // The text of a settings file. Line 1: words and numbers; line 2: a key; line 3: a value; line 4: a
 // format, in which \n stands for a line feed; the rest is the file.
 //
-// Words of line 1: "list" splits the value at the characters of the key; "levels" loads the record of
-// levels from the file; "file" sets the key in a file as well. Its first number is the size of a
+// Words of line 1: "list" splits the value at the characters of the key; "levels" loads the record
+// of levels from the file; "file" sets the key in a file as well. Its first number is the size of a
 // reader's buffer.
 #include "tarnwick/platform/settings_text.h"
 

@@ -1,6 +1,6 @@
 // The library's version: what a program was compiled with, and what it runs with.
 //
-//   if (TWVersionNumber() < TARNWICK_VERSION_NUMBER) puts("an older library than I was built with");
+//   if (TWVersionNumber() < TARNWICK_VERSION_NUMBER) puts("older than what I was built with");
 #ifndef TARNWICK_VERSION_H_
 #define TARNWICK_VERSION_H_
 

@@ -7,8 +7,8 @@
 
 #include <string>
 
-// From now on a document that makes libxml2 look for anything outside itself aborts the program, and
-// its complaints about documents are not printed, but collected.
+// From now on a document that makes libxml2 look for anything outside itself aborts the program,
+// and its complaints about documents are not printed, but collected.
 void WatchXml();
 
 // The complaints since the last call.

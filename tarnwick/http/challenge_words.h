@@ -12,8 +12,8 @@ inline bool CharEqualsIgnoreCase(char a, char b) {
   return std::tolower(static_cast<unsigned char>(a)) == std::tolower(static_cast<unsigned char>(b));
 }
 
-// True when `word` stands anywhere in `text`, ignoring case. An empty text holds nothing, not even
-// an empty word.
+// True when `word` occurs anywhere in `text`, ignoring case. An empty text contains nothing, not
+// even an empty word.
 inline bool ContainsIgnoreCase(const std::string& text, const std::string& word) {
   return std::search(text.begin(), text.end(), word.begin(), word.end(), CharEqualsIgnoreCase) !=
          text.end();

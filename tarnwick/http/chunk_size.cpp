@@ -9,7 +9,7 @@ namespace {
 // How far the end of a size line is looked for. It must stay below the lines that are cut.
 constexpr size_t kLongestLine = 256;
 
-// The digit's value, or -1. Not the C library's functions: the locale must not count here.
+// The digit's value, or -1. Not by the C library's functions, which depend on the locale.
 int HexValue(char c) {
   if (c >= '0' && c <= '9') return c - '0';
   if (c >= 'a' && c <= 'f') return c - 'a' + 10;
@@ -29,7 +29,7 @@ uint32_t ParseChunkSize(std::string_view line) {
   return size;
 }
 
-std::string_view WholeChunk(std::string_view bytes) {
+std::string_view FirstCompleteChunk(std::string_view bytes) {
   const size_t limit = std::min(bytes.size(), kLongestLine);
   size_t at = 0;
   while (at < limit && bytes[at] != '\r' && bytes[at] != '\n') ++at;

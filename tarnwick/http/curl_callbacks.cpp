@@ -12,7 +12,7 @@ namespace tarnwick {
 
 namespace {
 
-// Memory for the buffer and `more` bytes behind it, or null. What an earlier failure has lost reads
+// Memory for the buffer and `more` bytes after it, or null. What an earlier failure has lost reads
 // as zero bytes, so that no unset byte is ever parsed.
 char* Grow(const CurlMemBuffer& buffer, size_t more) {
   if (more >= UINT_MAX - buffer.size) return nullptr;
@@ -23,7 +23,7 @@ char* Grow(const CurlMemBuffer& buffer, size_t more) {
   return fresh;
 }
 
-bool BelongsIntoFile(std::string_view line) {
+bool ShouldWriteHeader(std::string_view line) {
   if (line == "\r\n") return true;
   return line.find(':') != std::string_view::npos &&
          line.find("Transfer-Encoding:") == std::string_view::npos;
@@ -67,7 +67,7 @@ size_t CurlBufferWrite(char* buffer, size_t size, size_t count, void* memBuffer)
 }
 
 size_t CurlHeaderToFile(char* buffer, size_t size, size_t count, void* file) {
-  if (!BelongsIntoFile(std::string_view(buffer, size * count))) return size * count;
+  if (!ShouldWriteHeader(std::string_view(buffer, size * count))) return size * count;
   const size_t written = std::fwrite(buffer, size, count, static_cast<FILE*>(file));
   std::fflush(static_cast<FILE*>(file));
   return written;

@@ -10,7 +10,7 @@ namespace tarnwick {
 // A growing buffer. The client hands two of its own fields, laid out in the same way, to
 // CurlBufferWrite.
 struct CurlMemBuffer {
-  char* data;         // from malloc, with a zero byte behind the last one; null while empty
+  char* data;         // from malloc, with a zero byte after the last one; null while empty
   unsigned int size;  // bytes, without that zero byte
 };
 
@@ -28,7 +28,7 @@ size_t CurlFileRead(char* buffer, size_t size, size_t count, void* file);
 // on, and the buffer is then empty (null) with its old size.
 size_t CurlBufferWrite(char* buffer, size_t size, size_t count, void* memBuffer);
 
-// A header callback: writes the header lines and the empty line behind them to a FILE*, without the
+// A header callback: writes the header lines and the empty line after them to a FILE*, without the
 // status line and without Transfer-Encoding, because libcurl has decoded the body. A line is left
 // out by its letters: a status line that holds a colon is written, and so is "transfer-encoding:".
 size_t CurlHeaderToFile(char* buffer, size_t size, size_t count, void* file);

@@ -30,7 +30,7 @@ CurlRequest::~CurlRequest() {
   if (m_curl != nullptr) {
     SigpipeGuard guard;
     curl_easy_cleanup(m_curl);  // says goodbye to a TLS peer, who may be gone
-    guard.TakeBack();
+    guard.DiscardPending();
   }
   curl_slist_free_all(m_headers);
 }
@@ -42,7 +42,7 @@ bool CurlRequest::AddHeader(const std::string& line) {
 }
 
 // libcurl would else ignore SIGPIPE for the whole process while it works, and requests of several
-// threads could leave that behind. And it would keep the TLS session for a next request of the
+// threads could leave that for good. And it would keep the TLS session for a next request of the
 // handle, which there is never: version 7.88 frees a name twice when memory runs out in doing so.
 CURLcode CurlRequest::SetOwnOptions() {
   CURLcode code = Set(CURLOPT_NOSIGNAL, 1L);
@@ -55,7 +55,7 @@ CURLcode CurlRequest::Perform() {
   if (code == CURLE_OK) {
     SigpipeGuard guard;
     code = curl_easy_perform(m_curl);
-    guard.TakeBack();
+    guard.DiscardPending();
   }
   Accept(code, "Failed to make http connection", "");
   return code;

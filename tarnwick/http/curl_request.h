@@ -51,7 +51,7 @@ class CurlRequest {
   // process and the mask of the thread stay as they are.
   CURLcode Perform();
 
-  // The status of the reply was from 200 to 299; any other is logged.
+  // The status of the response was from 200 to 299; any other is logged.
   bool StatusIsSuccess();
 
  private:

@@ -20,35 +20,35 @@ namespace {
 
 constexpr char kAuthInt[] = "auth-int";
 
-void Feed(MD5_CTX* context, std::initializer_list<std::string_view> texts) {
+void Update(MD5_CTX* context, std::initializer_list<std::string_view> texts) {
   for (const std::string_view text : texts) MD5_Update(context, text.data(), text.size());
 }
 
-std::string Finish(MD5_CTX* context) {
+std::string Final(MD5_CTX* context) {
   unsigned char digest[MD5_DIGEST_LENGTH];
   MD5_Final(digest, context);
   return Md5ToHex(digest);
 }
 
-std::string HexOfMd5(std::initializer_list<std::string_view> texts) {
+std::string Md5Hex(std::initializer_list<std::string_view> texts) {
   MD5_CTX context;
   MD5_Init(&context);
-  Feed(&context, texts);
-  return Finish(&context);
+  Update(&context, texts);
+  return Final(&context);
 }
 
 // For "auth-int" the digest of method and uri goes back into its own context, which continues after
 // its final step; the body is ignored. RFC 2617, 3.2.2.3, digests the body. Kept as it is: callers
 // may depend on it; pinned by DigestResponse.AuthIntFeedsTheDigestOfItsStartAndNeverTheBody.
-std::string A2Digest(const DIGEST_ACCESS_AUTH& login, const std::string& method) {
+std::string A2Digest(const DIGEST_ACCESS_AUTH& auth, const std::string& method) {
   MD5_CTX a2;
   MD5_Init(&a2);
-  Feed(&a2, {method, ":", login.uri});
-  if (login.qop == kAuthInt) {
-    const std::string unfinished = Finish(&a2);
-    Feed(&a2, {":", unfinished});
+  Update(&a2, {method, ":", auth.uri});
+  if (auth.qop == kAuthInt) {
+    const std::string unfinished = Final(&a2);
+    Update(&a2, {":", unfinished});
   }
-  return Finish(&a2);
+  return Final(&a2);
 }
 
 // `text` without `ch` at its ends.
@@ -58,8 +58,8 @@ std::string_view Trim(std::string_view text, char ch) {
 }
 
 // Deliberately simple: the name is found wherever it first occurs, also inside another word, and a
-// quoted value is cut at its first comma, so that a list of qops gives its first. Kept as it is:
-// callers may depend on it; pinned by the tests of ParseChallenge.
+// quoted value is cut at its first comma, so that the first of a list of qops is taken. Kept as it
+// is: callers may depend on it; pinned by the tests of ParseChallenge.
 std::string_view FindParameter(std::string_view challenge, std::string_view name) {
   const size_t found = challenge.find(name);
   if (found == std::string_view::npos) return {};
@@ -87,30 +87,29 @@ std::string MakeClientNonce() {
   return Md5ToHex(bytes);
 }
 
-std::string DigestResponse(const DIGEST_ACCESS_AUTH& login, const std::string& password,
+std::string DigestResponse(const DIGEST_ACCESS_AUTH& auth, const std::string& password,
                            const std::string& method) {
   // The algorithm is ignored: an MD5-sess challenge is answered as plain MD5.
-  const std::string ha1 = HexOfMd5({login.username, ":", login.realm, ":", password});
-  const std::string ha2 = A2Digest(login, method);
-  if (login.qop != "auth" && login.qop != kAuthInt) {
-    return HexOfMd5({ha1, ":", login.nonce, ":", ha2});
+  const std::string ha1 = Md5Hex({auth.username, ":", auth.realm, ":", password});
+  const std::string ha2 = A2Digest(auth, method);
+  if (auth.qop != "auth" && auth.qop != kAuthInt) {
+    return Md5Hex({ha1, ":", auth.nonce, ":", ha2});
   }
-  return HexOfMd5(
-      {ha1, ":", login.nonce, ":", login.nc, ":", login.cnonce, ":", login.qop, ":", ha2});
+  return Md5Hex({ha1, ":", auth.nonce, ":", auth.nc, ":", auth.cnonce, ":", auth.qop, ":", ha2});
 }
 
 // Any qop is announced, also one that the response was computed without. qop is not quoted, as RFC
 // 2617, 3.2.2, has it, and the algorithm is, as it has it not. Kept as it is: callers may depend on
 // it; pinned by GenDigestAccessAuth.ThePartsStandInTheirOrder.
-std::string DigestLine(const DIGEST_ACCESS_AUTH& login) {
-  std::string line = "Authorization: Digest username=\"" + login.username + "\", realm=\"" +
-                     login.realm + "\", nonce=\"" + login.nonce + "\", uri=\"" + login.uri +
-                     "\", response=\"" + login.response + "\"";
-  if (!login.qop.empty()) {
-    line += ", qop=" + login.qop + ", nc=" + login.nc + ", cnonce=\"" + login.cnonce + "\"";
+std::string DigestLine(const DIGEST_ACCESS_AUTH& auth) {
+  std::string line = "Authorization: Digest username=\"" + auth.username + "\", realm=\"" +
+                     auth.realm + "\", nonce=\"" + auth.nonce + "\", uri=\"" + auth.uri +
+                     "\", response=\"" + auth.response + "\"";
+  if (!auth.qop.empty()) {
+    line += ", qop=" + auth.qop + ", nc=" + auth.nc + ", cnonce=\"" + auth.cnonce + "\"";
   }
-  if (!login.algorithm.empty()) line += ", algorithm=\"" + login.algorithm + "\"";
-  if (!login.opaque.empty()) line += ", opaque=\"" + login.opaque + "\"";
+  if (!auth.algorithm.empty()) line += ", algorithm=\"" + auth.algorithm + "\"";
+  if (!auth.opaque.empty()) line += ", opaque=\"" + auth.opaque + "\"";
   return line;
 }
 

@@ -1,4 +1,5 @@
-// The Digest login after RFC 2617, section 3; docs/deliberate.md has what differs. Pure functions.
+// The Digest credentials of RFC 2617, section 3; docs/deliberate.md has what differs. Pure
+// functions.
 #ifndef TARNWICK_HTTP_DIGEST_H_
 #define TARNWICK_HTTP_DIGEST_H_
 
@@ -7,7 +8,7 @@
 
 namespace tarnwick {
 
-// The values of one Digest login.
+// The values of one Digest Authorization header field.
 struct DIGEST_ACCESS_AUTH {
   std::string username;
   std::string realm;
@@ -30,12 +31,12 @@ ChallengeMap ParseChallenge(const std::string& challenge);
 // 16 random bytes in hex, from the process id and the time.
 std::string MakeClientNonce();
 
-// The request digest. REQUIRES: every field of `login` but the response is filled.
-std::string DigestResponse(const DIGEST_ACCESS_AUTH& login, const std::string& password,
+// The request digest. REQUIRES: every field of `auth` but the response is filled.
+std::string DigestResponse(const DIGEST_ACCESS_AUTH& auth, const std::string& password,
                            const std::string& method);
 
-// The header line, without a line end.
-std::string DigestLine(const DIGEST_ACCESS_AUTH& login);
+// The header line, without its CRLF.
+std::string DigestLine(const DIGEST_ACCESS_AUTH& auth);
 
 }  // namespace tarnwick
 

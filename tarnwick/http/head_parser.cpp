@@ -13,8 +13,8 @@ namespace {
 
 constexpr char kNameEnds[] = " :;=";
 
-// Takes the next word off the front of `rest`, and the one delimiter behind it.
-std::string_view TakeToken(std::string_view* rest, const char* delimiters) {
+// Removes the next word from the front of `rest`, and the one delimiter after it.
+std::string_view NextToken(std::string_view* rest, const char* delimiters) {
   const size_t begin = std::min(rest->find_first_not_of(delimiters), rest->size());
   const size_t end = std::min(rest->find_first_of(delimiters, begin), rest->size());
   const std::string_view token = rest->substr(begin, end - begin);
@@ -23,12 +23,12 @@ std::string_view TakeToken(std::string_view* rest, const char* delimiters) {
 }
 
 // A status that does not fit stays out of every range, on every word size.
-int LeadingNumber(std::string_view text) {
+int ParseStatus(std::string_view text) {
   const long value = std::strtol(std::string(text).c_str(), nullptr, 10);
   return static_cast<int>(std::clamp<long>(value, INT_MIN, INT_MAX));
 }
 
-// Names that are not it mostly have another letter where `known` ends: no call for those.
+// The last letter is compared first: that rejects most other names without a call of strncasecmp.
 bool BeginsWith(std::string_view text, std::string_view known) {
   const size_t last = known.size() - 1;
   return text.size() > last && (text[last] | 0x20) == (known[last] | 0x20) &&
@@ -40,7 +40,8 @@ struct KnownName {
   Header header;
 };
 
-// `text` begins with the name. Most names end the search at their first letter.
+// REQUIRES: `text` starts at the name and is not empty. Most names are rejected by their first
+// letter.
 KnownName FindKnown(std::string_view text) {
   constexpr KnownName kKnown[] = {
       {"content-type", Header::kContentType},      {"content-length", Header::kContentLength},
@@ -58,13 +59,13 @@ KnownName FindKnown(std::string_view text) {
 }  // namespace
 
 StatusLine ParseStatusLine(std::string_view line, int* status) {
-  const std::string_view version = TakeToken(&line, " ");
+  const std::string_view version = NextToken(&line, " ");
   if (version.empty()) return StatusLine::kIncomplete;
   const std::string_view protocol = version.substr(0, 8);
   if (protocol != "HTTP/1.0" && protocol != "HTTP/1.1") return StatusLine::kNotHttp;
-  const std::string_view number = TakeToken(&line, " ");
+  const std::string_view number = NextToken(&line, " ");
   if (number.empty()) return StatusLine::kIncomplete;
-  *status = LeadingNumber(number);
+  *status = ParseStatus(number);
   return StatusLine::kParsed;
 }
 
@@ -88,7 +89,7 @@ std::string_view TrimSpaces(std::string_view text) {
   return text.substr(first, text.find_last_not_of(' ') + 1 - first);
 }
 
-std::string_view CookieOf(std::string_view value) {
+std::string_view ParseCookie(std::string_view value) {
   const size_t semicolon = value.find(';');
   if (semicolon == std::string_view::npos) return {};
   return TrimSpaces(value.substr(0, semicolon + 1));

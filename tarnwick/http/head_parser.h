@@ -30,7 +30,7 @@ enum class Header {
 struct HeaderLine {
   bool hasName = false;
   Header header = Header::kOther;
-  // Of a known header, whatever follows the one character behind the name; may be empty.
+  // Of a known header, whatever follows the one character after the name; may be empty.
   std::string_view value;
 };
 
@@ -43,7 +43,7 @@ std::string_view TrimSpaces(std::string_view text);
 
 // The cookie of a Set-Cookie value: up to its first ";", which stays, without spaces at the ends.
 // Without a ";" there is no cookie.
-std::string_view CookieOf(std::string_view value);
+std::string_view ParseCookie(std::string_view value);
 
 }  // namespace tarnwick
 

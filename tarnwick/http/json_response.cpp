@@ -14,7 +14,7 @@ namespace tarnwick {
 
 namespace {
 
-// A reply of so few levels is parsed without a look at the stack.
+// A response of so few levels is parsed without a look at the stack.
 constexpr int kShallowDepth = 16;
 
 // What the parser uses for a level of nesting, measured at 512 bytes on amd64, and what it needs
@@ -40,7 +40,7 @@ size_t StackLeft() {
   return here >= end && here - end < size ? here - end : kUnknownStack;
 }
 
-// How often `c` stands in `text`, counted up to `limit`.
+// How often `c` occurs in `text`, counted up to `limit`.
 int CountUpTo(int limit, const std::string& text, char c) {
   int count = 0;
   for (size_t at = text.find(c); at != std::string::npos && count < limit;
@@ -51,7 +51,8 @@ int CountUpTo(int limit, const std::string& text, char c) {
 }
 
 bool FitsStack(const std::string& text) {
-  // Most replies have fewer brackets than that, in texts or not, and to count them is quicker.
+  // Most responses have fewer brackets than that, inside strings or not, and counting them is
+  // quicker.
   const int objects = CountUpTo(kShallowDepth + 1, text, '{');
   if (objects + CountUpTo(kShallowDepth + 1, text, '[') <= kShallowDepth) return true;
   const int depth = JsonDepth(text);
@@ -60,7 +61,7 @@ bool FitsStack(const std::string& text) {
          static_cast<size_t>(depth) + kStackReserve / kStackPerLevel;
 }
 
-// The position behind the string, or the comment, that begins at `begin`.
+// The position after the string, or the comment, that begins at `begin`.
 size_t SkipString(const std::string& text, size_t begin) {
   size_t i = begin + 1;
   while (i < text.size() && text[i] != '"') i += text[i] == '\\' ? 2 : 1;

@@ -8,12 +8,12 @@
 
 namespace tarnwick {
 
-// Parses a JSON service's reply into `value`.
+// Parses a JSON service's response into `value`.
 //
 // Results: 0 when the member "success" of the object is true (for a number: not 0), and for an
 //   empty text, which leaves `value` as it was; -1 when the text cannot be parsed, which is logged;
 //   -2 when "success" is missing, not true, or of another kind.
-// Text that is nested more deeply than the parser or the stack allow counts as not parsable. On a
+// Text that is nested more deeply than the parser or the stack allow is not parsed. On a
 // stack that is not the thread's own 64 KiB are assumed to be left.
 int JsonParse(const std::string& text, Json::Value& value);
 

@@ -6,7 +6,7 @@
 
 namespace tarnwick {
 
-// `path` with the values of its query percent-encoded, except the characters of `keep`. What stands
+// `path` with the values of its query percent-encoded, except the characters of `keep`. What is
 // before the "?", the names, the separators and parts without "=" stay as they are.
 //
 // A zero byte in a value is encoded like any other byte. Nothing follows the first part that has no

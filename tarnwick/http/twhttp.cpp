@@ -79,7 +79,7 @@ void TWHttpClient::InitSocket(int timeout, bool bufferedRead) {
   m_pSocket->SetSocketInfo(m_strHost, m_port, timeout, bufferedRead);
 }
 
-bool TWHttpClient::ConnectAnew() {
+bool TWHttpClient::Reconnect() {
   return m_pSocket != nullptr && m_pSocket->Connect() == 0;
 }
 

@@ -3,8 +3,8 @@
 //
 // A JSON service, in one call:
 //
-//   Json::Value reply;
-//   int result = SendHttpGet(host, port, "api/info?full=1", reply, 5, false);  // 0: success
+//   Json::Value response;
+//   int result = SendHttpGet(host, port, "api/info?full=1", response, 5, false);  // 0: success
 //
 // A device that asks for a login:
 //
@@ -54,7 +54,7 @@ enum HTTP_VERSION : int {
   HTTP_VERSION_1_1 = 2,  // HTTP/1.1
 };
 
-// The request method. Every value but 0 counts as POST.
+// The request method. Every value but 0 is taken for POST.
 enum TW_HTTP_METHOD : int {
   HTTP_METHOD_GET = 0,   // GET
   HTTP_METHOD_POST = 1,  // POST
@@ -67,7 +67,7 @@ enum {
   HTTP_RET_BAD_KEY = 2,       // no value of HTTP_MAP_KEY
   HTTP_RET_IO_ERROR = 3,      // connecting, writing or reading failed, or the status line is cut
   HTTP_RET_UNAUTHORIZED = 4,  // status 401
-  HTTP_RET_BAD_RESPONSE = 5,  // no HTTP/1.0 or HTTP/1.1 reply, or a status not listed here
+  HTTP_RET_BAD_RESPONSE = 5,  // no HTTP/1.0 or HTTP/1.1 response, or a status not listed here
   HTTP_RET_NO_CONTENT = 6,    // the response has no such header
   HTTP_RET_REDIRECT = 7,      // status 302
   HTTP_RET_URI_TOO_LONG = 8,  // status 414
@@ -77,15 +77,15 @@ enum {
 // One client for one server, path and login.
 //
 // The socket operations connect anew for each request. Authorization, cookie and other texts go
-// onto the wire as they are: it is for the caller to keep line ends out of them.
+// onto the wire as they are: the caller must keep CR and LF out of them.
 // When memory runs out, a request operation returns its failure; constructors, functions that take
 // or return a string by value, GetCookie and GetHttpContent throw std::bad_alloc.
-// Blocks: each operation over the socket for the name look-up, which has no limit, then for the
+// Blocks: each operation over the socket for the name resolution, which has no limit, then for the
 // client's time-out at each wait for the peer, of which a slow one may need many; a write, and the
 // TLS handshake, have no limit. docs/longest-call.md tells the sums.
 // Threads: one thread uses an object at a time; separate objects may run in separate threads.
 // Cancellation: a thread may be cancelled (pthread_cancel, the deferred kind) in any operation, of
-//   the one-call functions too. It ends at a wait for the peer, or after a name look-up, a TLS
+//   the one-call functions too. It ends at a wait for the peer, or after a name resolution, a TLS
 //   handshake or a transfer through libcurl, which are not left in the middle. The client may then
 //   be destroyed, or used for another request.
 class TARNWICK_API TWHttpClient {
@@ -136,7 +136,7 @@ class TARNWICK_API TWHttpClient {
   // flush that fails makes the request fail, what failed with the stream before does not.
   void SetCurlRespFile(FILE* file);
 
-  // Sets the cookie to send, as it stands. A response's head replaces it: with its last Set-Cookie,
+  // Sets the cookie to send, as it is. A response's head replaces it: with its last Set-Cookie,
   // or with nothing, so that the second request of a login has the one that the 401 brought.
   // Results: 0.
   int SetCookie(std::string cookie);
@@ -180,17 +180,17 @@ class TARNWICK_API TWHttpClient {
   // more with that login. Of several WWW-Authenticate lines the last one is the challenge, so a
   // server that offers Digest and then Basic gets Basic. `arg` is not used. Any other method:
   // SendRequestByPost(arg).
-  // Results: those of the last request made. What the server answered is CheckResponse's to tell: a
+  // Results: those of the last request made. CheckResponse tells what the server responded: a
   //   second 401 comes back as HTTP_RET_OK here and HTTP_RET_UNAUTHORIZED there.
   int SendRequest(TW_HTTP_METHOD method, std::string arg);
 
   // Sends one GET over the client's socket and reads the head of the response; the body is left on
   // the connection for ReadBody or ReadData. A request of over 2,047 bytes is cut there. In
-  // HTTP/1.0 it names no host: a server with several sites may answer for another one. In HTTP/1.1
+  // HTTP/1.0 it names no host: a server with several sites may respond for another one. In HTTP/1.1
   // it does not ask the server to close, and a body that is not chunked may then end by a time-out
   // only.
   //
-  // Results: HTTP_RET_OK when the request was written, whatever the server answered;
+  // Results: HTTP_RET_OK when the request was written, whatever the server responded;
   //   HTTP_RET_IO_ERROR when connecting or writing failed, with the last response's results as they
   //   were.
   int SendRequestByGet();
@@ -210,9 +210,9 @@ class TARNWICK_API TWHttpClient {
 
   // Posts through libcurl over plain HTTP, logging in by Basic or Digest as the server asks.
   //
-  // The path is split at its first character out of `separators`: what stands before it is the
-  // URL's path, what follows is the body; without such a character the body is empty. The reply's
-  // body is thrown away.
+  // The path is split at its first character out of `separators`: what precedes it is the
+  // URL's path, what follows is the body; without such a character the body is empty. The
+  // response's body is thrown away.
   // Results: HTTP_RET_OK after a status from 200 to 299; HTTP_RET_IO_ERROR after anything else.
   // Blocks without a limit.
   int SendRequestByPost(std::string separators);
@@ -222,36 +222,38 @@ class TARNWICK_API TWHttpClient {
   // asks the server to close by "Connection: close;", which many servers ignore: ReadBody then
   // fails after three waits, with the whole body. Choose HTTP_VERSION_1_0 where the body is read.
   //
-  // Results: HTTP_RET_OK when the whole request was written, whatever the server answered;
+  // Results: HTTP_RET_OK when the whole request was written, whatever the server responded;
   //   HTTP_RET_IO_ERROR when connecting or writing failed.
   int SendRequestBySocketPost(std::string content);
 
-  // Posts a SOAP envelope over the client's socket and reads the reply's body, of the length that
-  // the reply announces, up to its first zero byte.
+  // Posts a SOAP envelope over the client's socket and reads the response's body, of the length
+  // that the response announces, up to its first zero byte.
   //
-  // Results: HTTP_RET_OK with the body in `reply`, whatever the status: CheckResponse tells it. A
-  //   read that ends early counts, and `reply` holds what came. HTTP_RET_IO_ERROR, with `reply` as
-  //   it was, for an empty `body`, when connecting, writing or reading failed, and for a response
-  //   without a usable Content-Length, in chunks for example; CheckResponse tells its status.
+  // Results: HTTP_RET_OK with the body in `response`, whatever the status: CheckResponse tells it.
+  //   A read that ends early is a success, and `response` holds what came. HTTP_RET_IO_ERROR, with
+  //   `response` as it was, for an empty `body`, when connecting, writing or reading failed, and
+  //   for a response without a usable Content-Length, in chunks for example; CheckResponse tells
+  //   its status.
   // Memory grows with what arrives: over 1 MiB, an announced length alone does not take any.
-  int SendReqBySocketPost(const std::string& body, std::string& reply);
+  int SendReqBySocketPost(const std::string& body, std::string& response);
 
   // As SendReqBySocketPost; when the response is a 401 whose challenge names Digest or else Basic,
   // the request is sent once more with that login. The challenge is that of SendRequest.
   //
   // Results: the outcome of the last response, as CheckResponse gives it, so HTTP_RET_OK only after
-  //   a status from 200 to 299; HTTP_RET_IO_ERROR when the last exchange failed. `reply` may then
-  //   hold the body of the first.
-  int SendAuthReqBySocketPost(const std::string& body, std::string& reply);
+  //   a status from 200 to 299; HTTP_RET_IO_ERROR when the last exchange failed. `response` may
+  //   then hold the body of the first.
+  int SendAuthReqBySocketPost(const std::string& body, std::string& response);
 
-  // As SendReqBySocketPost, with the reply parsed as XML after all its line ends have been removed.
+  // As SendReqBySocketPost, with the response parsed as XML after all its CR and LF have been
+  // removed.
   //
   // Results: those of SendReqBySocketPost. After HTTP_RET_OK `doc` is a new document, which the
-  //   caller frees with xmlFreeDoc, or null when the reply is not well-formed; what `doc` pointed
-  //   to before is not freed. After a failure `doc` stays.
+  //   caller frees with xmlFreeDoc, or null when the response is not well-formed; what `doc`
+  //   pointed to before is not freed. After a failure `doc` stays.
   int SendReqByXMLSocketPost(std::string body, xmlDoc*& doc);
 
-  // Reads the body behind a head that has been read: after SendRequestByGet, SendRequest with
+  // Reads the body after a head that has been read: after SendRequestByGet, SendRequest with
   // HTTP_METHOD_GET and SendRequestBySocketPost, which have read the head themselves.
   //
   // A Transfer-Encoding of exactly "chunked" is decoded, also one that an earlier response of this
@@ -277,13 +279,13 @@ class TARNWICK_API TWHttpClient {
   // The caller then writes the body with WriteData, with lines of the boundary
   // -----------QUENMULTIPART_BOUNDARY----------- and ends it by destroying the client. No login is
   // sent. Strict servers refuse the head for its "Cache-Control :no-cache" or its length. GetResp
-  // has a response only of a server that answers before 128 GiB have come, and then closes.
+  // has a response only of a server that responds before 128 GiB have come, and then closes.
   // Results: HTTP_RET_OK; HTTP_RET_IO_ERROR when connecting or writing failed.
   int OpenRawDataUpload();
 
   // XML REST requests through libcurl over plain HTTP, with the body, where there is one, from
   // `doc`, which stays the caller's. A GET logs in by Basic or Digest as the server asks, the
-  // others by Basic. The answer's body is added to what earlier requests have collected, for
+  // others by Basic. The response's body is added to what earlier requests have collected, for
   // GetResponseXML.
   //
   // Arguments: `timeout` limits the whole transfer, in seconds, as in SendRequestByCurl; the others
@@ -305,12 +307,12 @@ class TARNWICK_API TWHttpClient {
   // standard error, nothing is written; stderr given to xmlSetGenericErrorFunc is no handler.
   bool GetResponseXML(xmlDoc*& doc);
 
-  // Reads and parses the head of a reply, after a request has been written.
+  // Reads and parses the head of a response, after a request has been written.
   // Results: the codes of the status, HTTP_RET_OK to HTTP_RET_URI_TOO_LONG; HTTP_RET_NOT_READY
   //   without a request written, or after a header line without a name, or one of the names that
   //   are kept without a value; HTTP_RET_IO_ERROR
   //   after a failed read or half a status line; HTTP_RET_BAD_RESPONSE when it is no HTTP/1.0 or
-  //   HTTP/1.1 reply. The result is not kept: CheckResponse does not tell it.
+  //   HTTP/1.1 response. The result is not kept: CheckResponse does not tell it.
   int CheckHttpResponse();
 
   // Reads and parses the header lines, 30 at most; what follows stays unread, in front of the body:
@@ -320,14 +322,14 @@ class TARNWICK_API TWHttpClient {
   //   a failure stays.
   int CheckContentType();
 
-  // The Authorization header lines for the client's login, without a line end: Basic, and Digest
-  // (after RFC 2617) in answer to the last response's challenge. `body` is accepted and ignored,
+  // The Authorization header lines for the client's credentials, without the CRLF: Basic, and
+  // Digest (after RFC 2617) for the last response's challenge. `body` is accepted and ignored,
   // even for qop "auth-int". GenBasicAccessAuth throws std::logic_error when memory for the
   // encoding runs out.
   std::string GenBasicAccessAuth();
   std::string GenDigestAccessAuth(std::string method, std::string body);
 
-  // The body that SendRequestByCurl collected from its last reply, also from one that failed.
+  // The body that SendRequestByCurl collected from its last response, also from one that failed.
   std::string GetCurlText() const;
 
  protected:
@@ -356,27 +358,27 @@ class TARNWICK_API TWHttpClient {
   FILE* m_pCurlRespFile;  // not owned
 
  private:
-  TARNWICK_LOCAL bool ConnectAnew();
-  TARNWICK_LOCAL bool KeepHeader(const char* line);
+  TARNWICK_LOCAL bool Reconnect();
+  TARNWICK_LOCAL bool StoreHeader(const char* line);
   TARNWICK_LOCAL std::string BuildGetRequest();
   TARNWICK_LOCAL std::string BuildFormPost(const std::string& content) const;
   TARNWICK_LOCAL std::string BuildSoapPost(const std::string& body);
   TARNWICK_LOCAL int WriteSoapPost(const std::string& request);
-  TARNWICK_LOCAL int ReadSoapReply(int length, std::string* reply);
+  TARNWICK_LOCAL int ReadSoapResponse(int length, std::string* response);
   TARNWICK_LOCAL std::string BuildUploadHead() const;
   TARNWICK_LOCAL int ReadBodyFor(const char* operation, std::string* body);
   TARNWICK_LOCAL bool ReadChunks(std::string* body);
   TARNWICK_LOCAL bool ReadChunk(uint32_t size, std::string* body);
-  TARNWICK_LOCAL int AppendPiece(int len, std::string* body);
-  TARNWICK_LOCAL void DropChunkEnd();
-  TARNWICK_LOCAL bool ReadToEnd(std::string* body);
+  TARNWICK_LOCAL int AppendRead(int len, std::string* body);
+  TARNWICK_LOCAL void SkipChunkCrlf();
+  TARNWICK_LOCAL bool ReadUntilClose(std::string* body);
 
   TARNWICK_LOCAL bool SetCurlOutput(tarnwick::CurlRequest* curl);
   TARNWICK_LOCAL bool SetCurlRequest(tarnwick::CurlRequest* curl, TW_HTTP_METHOD method,
                                      int timeout);
   TARNWICK_LOCAL bool SetCurlHeaders(tarnwick::CurlRequest* curl, TW_HTTP_METHOD method);
   TARNWICK_LOCAL std::string PlainHostUrl() const;
-  TARNWICK_LOCAL bool SetCurlLogin(tarnwick::CurlRequest* curl);
+  TARNWICK_LOCAL bool SetCurlCredentials(tarnwick::CurlRequest* curl);
   TARNWICK_LOCAL bool SetCurlVersion(tarnwick::CurlRequest* curl);
   TARNWICK_LOCAL int PerformByCurl(tarnwick::CurlRequest* curl);
   TARNWICK_LOCAL bool SetXmlUrl(tarnwick::CurlRequest* curl);
@@ -392,9 +394,9 @@ class TARNWICK_API TWHttpClient {
 //
 // Arguments: `timeout` in seconds for connecting and each wait; `encodeQuery` percent-encodes the
 //   values of the query; without it, line feeds are removed from the path instead.
-// Results: 0 when the reply is JSON whose member "success" is true; -1 when the request, the
+// Results: 0 when the response is JSON whose member "success" is true; -1 when the request, the
 //   status, a read or an empty body made it fail; -2 when the body is no JSON, or "success" is
-//   missing or not true, and `result` may then hold a part of the reply.
+//   missing or not true, and `result` may then hold a part of the response.
 // Here and in SendHttpsGet a body that is nested more deeply than the thread's stack has room for
 // is no JSON; a stack that is not the thread's own, a fiber's, is taken for one with room for 77
 // levels.
@@ -404,12 +406,12 @@ class TARNWICK_API TWHttpClient {
 TARNWICK_API int SendHttpGet(const std::string& host, int port, std::string path,
                              Json::Value& result, int timeout, bool encodeQuery);
 
-// Posts a form with a cookie; the answer's body is not read.
+// Posts a form with a cookie; the response's body is not read.
 //
 // Arguments: `body` is encoded already; an empty `cookie` is left out, with a line in the log;
 //   `timeout` in seconds for connecting and each wait.
-// Results: 0 when the request was sent, whatever the server answered; -1 when it was not.
-// Blocks: as the client's socket requests, until the reply's head is there.
+// Results: 0 when the request was sent, whatever the server responded; -1 when it was not.
+// Blocks: as the client's socket requests, until the response's head is there.
 TARNWICK_API int SendHttpPost(const std::string& host, int port, const std::string& path,
                               const std::string& body, const std::string& cookie, int timeout);
 
@@ -420,7 +422,7 @@ TARNWICK_API int SendHttpPost(const std::string& host, int port, const std::stri
 // Blocks: for that long.
 // Results: 0; -1 when the transfer failed or the status is not from 200 to 299; -2 when the
 //   certificate could not be verified; -3 when the body is no JSON, or "success" is missing or not
-//   true. An empty body counts as success and leaves `result` as it was.
+//   true. An empty body is a success and leaves `result` as it was.
 TARNWICK_API int SendHttpsGet(const std::string& host, int port, const std::string& path,
                               Json::Value& result, int timeout);
 

@@ -1,4 +1,4 @@
-// The Authorization lines of the client's login.
+// The Authorization lines of the client's auth.
 #include "tarnwick/http/digest.h"
 #include "tarnwick/http/twhttp.h"
 #include "tarnwick/platform/unique.h"
@@ -7,22 +7,22 @@
 using namespace tarnwick;
 
 std::string TWHttpClient::GenBasicAccessAuth() {
-  const OwnedMemory<char> encoded(Base64Encode((m_strUser + ":" + m_strPassword).c_str()));
+  const UniqueMalloc<char> encoded(Base64Encode((m_strUser + ":" + m_strPassword).c_str()));
   return "Authorization: Basic " + std::string(encoded.get());  // throws when there is no encoding
 }
 
 std::string TWHttpClient::GenDigestAccessAuth(std::string method, std::string /*body*/) {
   const ChallengeMap challenge = ParseChallenge(m_strAuthenticate);
-  DIGEST_ACCESS_AUTH login;
-  login.username = m_strUser;
-  login.realm = challenge.at("realm");
-  login.nonce = challenge.at("nonce");
-  login.uri = "/" + m_strPath;
-  login.qop = challenge.at("qop");
-  login.nc = "00000001";
-  login.cnonce = MakeClientNonce();
-  login.algorithm = challenge.at("algorithm");
-  login.opaque = challenge.at("opaque");
-  login.response = DigestResponse(login, m_strPassword, method);
-  return DigestLine(login);
+  DIGEST_ACCESS_AUTH auth;
+  auth.username = m_strUser;
+  auth.realm = challenge.at("realm");
+  auth.nonce = challenge.at("nonce");
+  auth.uri = "/" + m_strPath;
+  auth.qop = challenge.at("qop");
+  auth.nc = "00000001";
+  auth.cnonce = MakeClientNonce();
+  auth.algorithm = challenge.at("algorithm");
+  auth.opaque = challenge.at("opaque");
+  auth.response = DigestResponse(auth, m_strPassword, method);
+  return DigestLine(auth);
 }

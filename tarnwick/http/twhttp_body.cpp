@@ -22,15 +22,15 @@ namespace {
 constexpr int kPieceSize = 8192;
 constexpr char kErrorText[] = "{\"error\":true}";
 
-// Between these sizes a body grows to four times its length, where a string would double: it moves
-// half as often, and a move costs a page fault a page. Pages that are only reserved cost nothing,
-// so memory still grows with what arrives; of larger ones an appliance has no room to spare.
-constexpr size_t kGrowsFaster = size_t{64} << 10;
-constexpr size_t kGrowsFasterUpTo = size_t{32} << 20;
+// Between these sizes a body grows to four times its length, where a string would double: that
+// halves the number of reallocations, each of which costs a page fault per page. Pages that are
+// only reserved cost nothing, so memory still grows with what arrives.
+constexpr size_t kQuadrupleFrom = size_t{64} << 10;
+constexpr size_t kQuadrupleUntil = size_t{32} << 20;
 
 // From this size on large pages are asked for. Smaller bodies mostly lie where earlier ones lay,
 // and cost no page fault.
-constexpr size_t kWorthLargePages = size_t{16} << 20;
+constexpr size_t kHugePageMinimum = size_t{16} << 20;
 constexpr size_t kLargePage = size_t{2} << 20;
 
 // A large body costs more for its page faults than for its bytes, and large pages spare nearly all
@@ -39,16 +39,16 @@ constexpr size_t kLargePage = size_t{2} << 20;
 void AskForLargePages(std::string* body) {
   void* begin = &(*body)[0];
   size_t size = body->capacity();
-  if (size < kWorthLargePages || std::align(kLargePage, 1, begin, size) == nullptr) return;
+  if (size < kHugePageMinimum || std::align(kLargePage, 1, begin, size) == nullptr) return;
   madvise(begin, size, MADV_HUGEPAGE);
 }
 
 // Makes room for `more` bytes, and in a large body for what will follow them.
 void MakeRoom(size_t more, std::string* body) try {
   const size_t size = body->size() + more;
-  if (size <= body->capacity() || size < kGrowsFaster) return;
+  if (size <= body->capacity() || size < kQuadrupleFrom) return;
   std::string larger;
-  larger.reserve(size <= kGrowsFasterUpTo ? 4 * size : 2 * size);
+  larger.reserve(size <= kQuadrupleUntil ? 4 * size : 2 * size);
   AskForLargePages(&larger);
   larger.append(*body);
   body->swap(larger);
@@ -66,7 +66,7 @@ void AppendBufferedChunks(TWSocket* socket, std::string* body) {
   std::string_view buffered = SocketAccess::Buffered(socket);
   MakeRoom(buffered.size(), body);
   for (;;) {
-    const std::string_view data = WholeChunk(buffered);
+    const std::string_view data = FirstCompleteChunk(buffered);
     if (data.empty()) return;
     const size_t size = static_cast<size_t>(data.data() - buffered.data()) + data.size() + 2;
     SocketAccess::Take(socket, size);
@@ -101,7 +101,7 @@ int TWHttpClient::ReadBody(std::string& body) try {
 int TWHttpClient::ReadBodyFor(const char* operation, std::string* body) {
   // Only the exact word: a server that writes it otherwise gets its chunk lines handed through.
   const bool chunked = m_strTransferEncoding == "chunked";
-  const bool complete = m_connState == 2 && (chunked ? ReadChunks(body) : ReadToEnd(body));
+  const bool complete = m_connState == 2 && (chunked ? ReadChunks(body) : ReadUntilClose(body));
   if (!complete) {
     TW_LOG_AS(operation, LOG_CATEG_HTTP, LOG_LEVEL_DEBUG, "Read data error\n");
     return HTTP_RET_IO_ERROR;
@@ -111,7 +111,7 @@ int TWHttpClient::ReadBodyFor(const char* operation, std::string* body) {
   return HTTP_RET_OK;
 }
 
-// A size line that cannot be read counts as the last chunk, and trailers stay unread.
+// A size line that cannot be read is taken for the last chunk, and trailers stay unread.
 bool TWHttpClient::ReadChunks(std::string* body) {
   for (;;) {
     AppendBufferedChunks(m_pSocket, body);
@@ -120,13 +120,13 @@ bool TWHttpClient::ReadChunks(std::string* body) {
     const uint32_t size = length < 1 ? 0 : ParseChunkSize({line, static_cast<size_t>(length)});
     if (size == 0) return true;
     if (!ReadChunk(size, body)) return false;
-    DropChunkEnd();
+    SkipChunkCrlf();
   }
 }
 
 bool TWHttpClient::ReadChunk(uint32_t size, std::string* body) {
   while (size > 0) {
-    const int count = AppendPiece(static_cast<int>(std::min<uint32_t>(size, kPieceSize)), body);
+    const int count = AppendRead(static_cast<int>(std::min<uint32_t>(size, kPieceSize)), body);
     if (count < 0) return false;
     size -= static_cast<uint32_t>(count);
     if (m_pSocket->IsEOF()) return true;
@@ -135,7 +135,7 @@ bool TWHttpClient::ReadChunk(uint32_t size, std::string* body) {
 }
 
 // As ReadData, with what came added to the body. REQUIRES: len <= kPieceSize, and the head is read.
-int TWHttpClient::AppendPiece(int len, std::string* body) {
+int TWHttpClient::AppendRead(int len, std::string* body) {
   const auto size = static_cast<size_t>(len);
   const std::string_view buffered = SocketAccess::Buffered(m_pSocket);
   if (buffered.size() >= size) {
@@ -152,16 +152,16 @@ int TWHttpClient::AppendPiece(int len, std::string* body) {
 // The two bytes after a chunk, whatever they are. Direct reading delivers what has arrived, so one
 // may be missing; through the buffer one is missing where the stream ends or a read failed, and
 // another read would wait once more.
-void TWHttpClient::DropChunkEnd() {
+void TWHttpClient::SkipChunkCrlf() {
   char ending[2];
   const int count = ReadData(ending, 2);
   if (count == 1 && !SocketAccess::IsBuffered(m_pSocket)) ReadData(ending, 1);
 }
 
-// The announced length does not count: the body ends where the server closes.
-bool TWHttpClient::ReadToEnd(std::string* body) {
+// The announced length is ignored: the body ends where the server closes.
+bool TWHttpClient::ReadUntilClose(std::string* body) {
   for (;;) {
-    const int count = AppendPiece(kPieceSize, body);
+    const int count = AppendRead(kPieceSize, body);
     if (count <= 0) return count == 0;
   }
 }

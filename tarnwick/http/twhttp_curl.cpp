@@ -18,7 +18,7 @@ constexpr char kSendRequestByCurl[] = "SendRequestByCurl";
 
 // libcurl before 7.62 has this name for another code.
 constexpr CURLcode kCertificateNotVerified = CURLE_PEER_FAILED_VERIFICATION;
-static_assert(kCertificateNotVerified == 60, "HTTP_RET_CERT_ERROR stands for this code");
+static_assert(kCertificateNotVerified == 60, "HTTP_RET_CERT_ERROR is told by this code");
 
 // Results: true for CURLE_OK; any other code is logged.
 bool Accept(CURLcode code, const char* func = kSendRequestByCurl) {
@@ -67,8 +67,8 @@ class FileWrites {
  public:
   explicit FileWrites(FILE* file) : m_file(file), m_failedBefore(file != nullptr && ferror(file)) {}
 
-  // A flush of the header lines that failed shows in the error flag alone, and glibc has dropped the
-  // bytes. A flag of before the transfer is the caller's: it tells nothing, and stays.
+  // A flush of the header lines that failed shows in the error flag alone, and glibc has dropped
+  // the bytes. A flag of before the transfer is the caller's: it tells nothing, and stays.
   bool Finish() const {
     if (m_file == nullptr) return true;
     if (fflush(m_file) == 0 && (m_failedBefore || ferror(m_file) == 0)) return true;

@@ -16,7 +16,7 @@ int TWHttpClient::SendRequestByPost(std::string separators) try {
   const size_t separator = std::min(m_strPath.find_first_of(separators), m_strPath.size());
   const std::string body = m_strPath.substr(std::min(separator + 1, m_strPath.size()));
   const std::string url = PlainHostUrl() + m_strPath.substr(0, separator);
-  if (!SetCurlLogin(&curl) || !SetCurlVersion(&curl)) return m_result;
+  if (!SetCurlCredentials(&curl) || !SetCurlVersion(&curl)) return m_result;
   if (!curl.Set(CURLOPT_URL, url.c_str(), "Failed to set url=", url.c_str()) ||
       !curl.Set(CURLOPT_POSTFIELDS, body.c_str(), "Failed to set POST field") ||
       !curl.Set(CURLOPT_HTTPAUTH, CURLAUTH_BASIC | CURLAUTH_DIGEST, "Failed to set auth") ||
@@ -34,9 +34,9 @@ std::string TWHttpClient::PlainHostUrl() const {
   return "http://" + m_strHost + ":" + IntToString(m_port) + "/";
 }
 
-// The password stands in the log. Kept as it is: callers may depend on the messages; pinned by
+// The password is in the log. Kept as it is: callers may depend on the messages; pinned by
 // SendRequestByPost.EachRefusedOptionHasItsLineAndEndsTheRequest.
-bool TWHttpClient::SetCurlLogin(CurlRequest* curl) {
+bool TWHttpClient::SetCurlCredentials(CurlRequest* curl) {
   return curl->Set(CURLOPT_USERNAME, m_strUser.c_str(), "Failed to set Usr=", m_strUser.c_str()) &&
          curl->Set(CURLOPT_PASSWORD, m_strPassword.c_str(),
                    "Failed to set Pwd=", m_strPassword.c_str());

@@ -10,7 +10,7 @@
 #include "tarnwick/utils/utils.h"
 
 int TWHttpClient::SendRequestBySocketPost(std::string content) try {
-  if (!ConnectAnew()) {
+  if (!Reconnect()) {
     TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_INFO,
            "Connection failed. host [%s:%d], path [%s], content [%s].\n", m_strHost.c_str(), m_port,
            m_strPath.c_str(), content.c_str());

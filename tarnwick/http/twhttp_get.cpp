@@ -18,12 +18,12 @@ namespace {
 constexpr size_t kMaxRequest = 2047;
 
 // At least what a GET has besides the client's texts.
-constexpr size_t kRestOfRequest = 80;
+constexpr size_t kFixedOverhead = 80;
 
 }  // namespace
 
 int TWHttpClient::SendRequestByGet() try {
-  if (!ConnectAnew()) {
+  if (!Reconnect()) {
     TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_DEBUG, "Connection failed!\n");
     return HTTP_RET_IO_ERROR;
   }
@@ -44,12 +44,12 @@ int TWHttpClient::SendRequestByGet() try {
 std::string TWHttpClient::BuildGetRequest() {
   const std::string path =
       m_bEncodeQuery ? EncodeQueryValues(m_strPath, m_strEncodeKeep) : m_strPath;
-  // Without a preference the GET speaks HTTP/1.0: a server may not answer that in chunks, and
+  // Without a preference the GET speaks HTTP/1.0: a server may not respond to that in chunks, and
   // closes after the body (RFC 7230, 3.3.1 and 6.3).
   const bool http11 = m_httpVersion == HTTP_VERSION_1_1;
   std::string request;
   request.reserve(path.size() + m_strCookie.size() + m_strAuthorization.size() + m_strHost.size() +
-                  kRestOfRequest);
+                  kFixedOverhead);
   request.append("GET /").append(path).append(http11 ? " HTTP/1.1\r\n" : " HTTP/1.0\r\n");
   request.append("User-Agent: Quenrith Tarnwick\r\n");
   if (!m_strCookie.empty()) request.append("Cookie: ").append(m_strCookie).append("\r\n");

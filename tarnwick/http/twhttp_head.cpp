@@ -15,7 +15,7 @@ namespace {
 constexpr int kLineSize = 2048;
 constexpr int kMaxHeaderLines = 30;
 
-int ResultOf(int status) {
+int ResultFromStatus(int status) {
   if (status >= 200 && status <= 299) return HTTP_RET_OK;
   if (status == 401) return HTTP_RET_UNAUTHORIZED;
   if (status == 414) return HTTP_RET_URI_TOO_LONG;
@@ -34,7 +34,7 @@ int TWHttpClient::CheckHttpResponse() try {
   if (parsed == StatusLine::kIncomplete) return HTTP_RET_IO_ERROR;
   if (parsed == StatusLine::kNotHttp) return HTTP_RET_BAD_RESPONSE;
   const int result = CheckContentType();
-  return result != HTTP_RET_OK ? result : ResultOf(m_statusCode);
+  return result != HTTP_RET_OK ? result : ResultFromStatus(m_statusCode);
 } catch (const std::exception&) {  // memory ran out
   return HTTP_RET_IO_ERROR;
 }
@@ -55,7 +55,7 @@ int TWHttpClient::CheckContentType() try {
     }
     if (length == 0) break;
     TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_DEBUG3, "%s\n", tarnwick::PeerText(line).Get());
-    if (!KeepHeader(line)) return HTTP_RET_NOT_READY;
+    if (!StoreHeader(line)) return HTTP_RET_NOT_READY;
   }
   // Lines beyond the last allowed one are left in front of the body.
   m_connState = 2;
@@ -64,8 +64,8 @@ int TWHttpClient::CheckContentType() try {
   return HTTP_RET_IO_ERROR;
 }
 
-// Results: false for a line without a name, and for a known name without anything behind it.
-bool TWHttpClient::KeepHeader(const char* line) {
+// Results: false for a line without a name, and for a known name without anything after it.
+bool TWHttpClient::StoreHeader(const char* line) {
   const HeaderLine parsed = ParseHeaderLine(line);
   if (!parsed.hasName) return false;
   if (parsed.header != Header::kOther && parsed.value.empty()) return false;
@@ -80,7 +80,7 @@ bool TWHttpClient::KeepHeader(const char* line) {
       m_mapContent.try_emplace(HTTP_CONTENT_RANGE, TrimSpaces(parsed.value));
       break;
     case Header::kSetCookie:
-      m_strCookie = CookieOf(parsed.value);
+      m_strCookie = ParseCookie(parsed.value);
       break;
     case Header::kAuthenticate:
       m_strAuthenticate = parsed.value;

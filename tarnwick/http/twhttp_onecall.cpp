@@ -97,7 +97,7 @@ int GetJsonOverTls(const std::string& host, int port, const std::string& path, J
 
 // Memory that runs out fails the call like anything else: no exception reaches a caller.
 template <typename Operation>
-int WithoutExceptions(Operation operation) {
+int CatchAll(Operation operation) {
   try {
     return operation();
   } catch (const std::exception&) {
@@ -109,15 +109,15 @@ int WithoutExceptions(Operation operation) {
 
 int SendHttpGet(const std::string& host, int port, std::string path, Json::Value& result,
                 int timeout, bool encodeQuery) {
-  return WithoutExceptions([&] { return GetJson(host, port, path, result, timeout, encodeQuery); });
+  return CatchAll([&] { return GetJson(host, port, path, result, timeout, encodeQuery); });
 }
 
 int SendHttpPost(const std::string& host, int port, const std::string& path,
                  const std::string& body, const std::string& cookie, int timeout) {
-  return WithoutExceptions([&] { return PostForm(host, port, path, body, cookie, timeout); });
+  return CatchAll([&] { return PostForm(host, port, path, body, cookie, timeout); });
 }
 
 int SendHttpsGet(const std::string& host, int port, const std::string& path, Json::Value& result,
                  int timeout) {
-  return WithoutExceptions([&] { return GetJsonOverTls(host, port, path, result, timeout); });
+  return CatchAll([&] { return GetJsonOverTls(host, port, path, result, timeout); });
 }

@@ -1,4 +1,4 @@
-// SOAP POSTs over the client's socket: plain, with a login, and with the reply as XML.
+// SOAP POSTs over the client's socket: plain, with credentials, and with the response as XML.
 #define TW_LOG_SOURCE "twhttp"
 
 #include <algorithm>
@@ -21,9 +21,9 @@ namespace {
 
 constexpr char kSendReqBySocketPost[] = "SendReqBySocketPost";
 
-// A reply up to this size is read with one call into one buffer. For a larger one memory grows with
-// what arrives: a peer may announce any length.
-constexpr int kFirstPiece = 1 << 20;
+// A response up to this size is read with one call into one buffer. For a larger one memory grows
+// with what arrives: a peer may announce any length.
+constexpr int kInitialCapacity = 1 << 20;
 
 int OutOfMemory(int64_t bytes) {
   TW_LOG_AS(kSendReqBySocketPost, LOG_CATEG_HTTP, LOG_LEVEL_ERROR,
@@ -37,8 +37,8 @@ int ToLength(const std::string& text) {
   return length > 0 && length < INT_MAX ? static_cast<int>(length) : 0;
 }
 
-// The bytes of a reply while they arrive, with room for a zero byte behind them.
-class ReplyBuffer {
+// The bytes of a response while they arrive, with room for a zero byte after them.
+class ResponseBuffer {
  public:
   // Makes room for `size` bytes in all. Results: false when memory ran out; the bytes stay.
   bool Reserve(int size) {
@@ -61,18 +61,18 @@ class ReplyBuffer {
   }
 
  private:
-  OwnedMemory<char> m_bytes;
+  UniqueMalloc<char> m_bytes;
   int m_length = 0;
 };
 
 }  // namespace
 
-int TWHttpClient::SendReqBySocketPost(const std::string& body, std::string& reply) try {
+int TWHttpClient::SendReqBySocketPost(const std::string& body, std::string& response) try {
   if (body.empty()) {
     TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_DEBUG, "Empty msg.\n");
     return HTTP_RET_IO_ERROR;
   }
-  if (!ConnectAnew()) {
+  if (!Reconnect()) {
     TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_DEBUG, "Connection failed!\n\n");
     return HTTP_RET_IO_ERROR;
   }
@@ -81,7 +81,7 @@ int TWHttpClient::SendReqBySocketPost(const std::string& body, std::string& repl
   m_result = CheckHttpResponse();
   std::string length;
   GetHttpContent(HTTP_CONTENT_LENGTH, length);
-  return ReadSoapReply(ToLength(length), &reply);
+  return ReadSoapResponse(ToLength(length), &response);
 } catch (const std::exception&) {  // memory ran out
   return HTTP_RET_IO_ERROR;
 }
@@ -102,7 +102,7 @@ std::string TWHttpClient::BuildSoapPost(const std::string& body) {
 int TWHttpClient::WriteSoapPost(const std::string& request) {
   const size_t size = request.size();
   if (size >= INT_MAX) return OutOfMemory(INT_MAX);
-  const OwnedMemory<char> text(static_cast<char*>(std::malloc(size + 1)));
+  const UniqueMalloc<char> text(static_cast<char*>(std::malloc(size + 1)));
   if (!text) return OutOfMemory(static_cast<int64_t>(size) + 1);
   // The request is text: what follows a zero byte is sent as zero bytes.
   std::strncpy(text.get(), request.c_str(), size + 1);
@@ -111,11 +111,11 @@ int TWHttpClient::WriteSoapPost(const std::string& request) {
   return HTTP_RET_IO_ERROR;
 }
 
-// Reads the `length` bytes of a reply, or what comes of them: a read that delivers less ends it.
-int TWHttpClient::ReadSoapReply(int length, std::string* reply) {
+// Reads the `length` bytes of a response, or what comes of them: a read that delivers less ends it.
+int TWHttpClient::ReadSoapResponse(int length, std::string* response) {
   if (length == 0) return HTTP_RET_IO_ERROR;
-  ReplyBuffer buffer;
-  for (int room = std::min(length, kFirstPiece); buffer.Length() < length;
+  ResponseBuffer buffer;
+  for (int room = std::min(length, kInitialCapacity); buffer.Length() < length;
        room = std::min(length - buffer.Length(), buffer.Length())) {
     if (!buffer.Reserve(buffer.Length() + room)) return OutOfMemory(int64_t{length} + 1);
     const int count = m_pSocket->ReadData(buffer.End(), room);
@@ -126,20 +126,20 @@ int TWHttpClient::ReadSoapReply(int length, std::string* reply) {
     TW_LOG_AS(kSendReqBySocketPost, LOG_CATEG_HTTP, LOG_LEVEL_DEBUG, "Read data faild.\n");
     return HTTP_RET_IO_ERROR;
   }
-  *reply = buffer.Text();
+  *response = buffer.Text();
   return HTTP_RET_OK;
 }
 
-int TWHttpClient::SendAuthReqBySocketPost(const std::string& body, std::string& reply) try {
-  int result = SendReqBySocketPost(body, reply);
+int TWHttpClient::SendAuthReqBySocketPost(const std::string& body, std::string& response) try {
+  int result = SendReqBySocketPost(body, response);
   // Asked of the last response, not of the result: a 401 without a body has failed above.
   if (m_result == HTTP_RET_UNAUTHORIZED) {
     if (ContainsIgnoreCase(m_strAuthenticate, "digest")) {
       m_strAuthorization = GenDigestAccessAuth("POST", "");
-      result = SendReqBySocketPost(body, reply);
+      result = SendReqBySocketPost(body, response);
     } else if (ContainsIgnoreCase(m_strAuthenticate, "basic")) {
       m_strAuthorization = GenBasicAccessAuth();
-      result = SendReqBySocketPost(body, reply);
+      result = SendReqBySocketPost(body, response);
     }
   }
   if (result != HTTP_RET_OK) return result;
@@ -150,14 +150,14 @@ int TWHttpClient::SendAuthReqBySocketPost(const std::string& body, std::string& 
 }
 
 int TWHttpClient::SendReqByXMLSocketPost(std::string body, xmlDoc*& doc) try {
-  std::string reply;
-  const int result = SendReqBySocketPost(body, reply);
+  std::string response;
+  const int result = SendReqBySocketPost(body, response);
   if (result != HTTP_RET_OK) return result;
-  // All line ends go, those inside values too. Kept as it is: callers may depend on it; pinned by
-  // SendReqByXMLSocketPost.CarriageReturnsAndLineFeedsAreRemovedEverywhere.
-  RemoveChar(reply, '\r');
-  RemoveChar(reply, '\n');
-  doc = ParseXml(reply.data(), static_cast<int>(reply.size()));
+  // All CR and LF are removed, those inside values too. Kept as it is: callers may depend on it;
+  // pinned by SendReqByXMLSocketPost.CarriageReturnsAndLineFeedsAreRemovedEverywhere.
+  RemoveChar(response, '\r');
+  RemoveChar(response, '\n');
+  doc = ParseXml(response.data(), static_cast<int>(response.size()));
   return result;
 } catch (const std::exception&) {  // memory ran out
   return HTTP_RET_IO_ERROR;

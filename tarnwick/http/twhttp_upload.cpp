@@ -9,13 +9,13 @@
 
 namespace {
 
-// 128 GiB, more than a caller writes: a server that counts never takes the stream for finished.
-constexpr int64_t kEndless = int64_t{1} << 37;
+// 128 GiB. Kept as it is: callers may depend on it; pinned by the tests of OpenRawDataUpload.
+constexpr int64_t kUploadLength = int64_t{1} << 37;
 
 }  // namespace
 
 int TWHttpClient::OpenRawDataUpload() try {
-  if (!ConnectAnew()) {
+  if (!Reconnect()) {
     TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_ERROR, "Connection failed!\n");
     return HTTP_RET_IO_ERROR;
   }
@@ -38,7 +38,7 @@ std::string TWHttpClient::BuildUploadHead() const {
   head +=
       "Content-Type: multipart/form-data; "
       "boundary=-----------QUENMULTIPART_BOUNDARY-----------\r\n";
-  head.append("Content-Length: ").append(IntToString(kEndless)).append("\r\n");
+  head.append("Content-Length: ").append(IntToString(kUploadLength)).append("\r\n");
   // RFC 7230, 3.2.4, forbids a blank in front of the colon. Kept as it is: callers may depend on
   // it; pinned by OpenRawDataUpload.WithAnEmptyCookieTheHeadHasNoCookieLine.
   head += "Cache-Control :no-cache\r\n";

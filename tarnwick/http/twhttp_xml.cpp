@@ -1,4 +1,4 @@
-// XML REST requests through libcurl, and their replies.
+// XML REST requests through libcurl, and their responses.
 #define TW_LOG_SOURCE "twhttp"
 
 #include <fcntl.h>
@@ -39,8 +39,8 @@ bool SerialiseXml(xmlDoc* doc, char (&body)[kMaxPostBody]) {
   return true;
 }
 
-OwnedFile OpenTemporaryFile() {
-  OwnedFile file(tmpfile());
+UniqueFile OpenTemporaryFile() {
+  UniqueFile file(tmpfile());
   if (file) fcntl(fileno(file.get()), F_SETFD, FD_CLOEXEC);
   return file;
 }
@@ -54,7 +54,7 @@ int TWHttpClient::SendReqByXMLGet(int timeout) try {
   if (!curl.Valid()) return HTTP_RET_IO_ERROR;
   m_result = HTTP_RET_IO_ERROR;
   if (!curl.Set(CURLOPT_TIMEOUT, static_cast<long>(timeout), "Failed to set timeout") ||
-      !SetCurlLogin(&curl) || !SetXmlUrl(&curl) ||
+      !SetCurlCredentials(&curl) || !SetXmlUrl(&curl) ||
       !curl.Set(CURLOPT_HTTPAUTH, CURLAUTH_BASIC | CURLAUTH_DIGEST, "Failed to set auth") ||
       !SetXmlWriter(&curl) || !SetXmlOutput(&curl, kSetFile)) {
     return m_result;
@@ -73,7 +73,7 @@ int TWHttpClient::SendReqByXMLPost(xmlDoc*& doc) try {
   CurlRequest curl(__func__);
   if (!curl.Valid()) return HTTP_RET_IO_ERROR;
   m_result = HTTP_RET_IO_ERROR;
-  if (!SetCurlLogin(&curl) || !SetXmlUrl(&curl) || !SetXmlHeaders(&curl, false) ||
+  if (!SetCurlCredentials(&curl) || !SetXmlUrl(&curl) || !SetXmlHeaders(&curl, false) ||
       !curl.Set(CURLOPT_POSTFIELDS, body, "Failed to set POST field") || !SetXmlWriter(&curl) ||
       !SetXmlOutput(&curl, kSetFile)) {
     return m_result;
@@ -87,7 +87,7 @@ int TWHttpClient::SendReqByXMLPut(xmlDoc*& doc) try {
   CurlRequest curl(__func__);
   if (!curl.Valid()) return HTTP_RET_IO_ERROR;
   m_result = HTTP_RET_IO_ERROR;
-  if (!SetCurlLogin(&curl) || !SetXmlUrl(&curl) || !SetXmlHeaders(&curl, true) ||
+  if (!SetCurlCredentials(&curl) || !SetXmlUrl(&curl) || !SetXmlHeaders(&curl, true) ||
       !curl.Set(CURLOPT_READFUNCTION, CurlFileRead, "Failed to set READFUNCTION") ||
       !SetXmlWriter(&curl) || !SetCurlPut(&curl)) {
     return m_result;
@@ -96,7 +96,7 @@ int TWHttpClient::SendReqByXMLPut(xmlDoc*& doc) try {
     TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_DEBUG, "Empty XML document\n");
     return m_result;
   }
-  const OwnedFile file = OpenTemporaryFile();
+  const UniqueFile file = OpenTemporaryFile();
   if (!file) {
     TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_DEBUG, "Failed to fopen temp file\n");
     return m_result;
@@ -128,7 +128,7 @@ int TWHttpClient::SendReqByXMLDelete() try {
   CurlRequest curl(__func__);
   if (!curl.Valid()) return HTTP_RET_IO_ERROR;
   m_result = HTTP_RET_IO_ERROR;
-  if (!SetCurlLogin(&curl) || !SetXmlUrl(&curl) ||
+  if (!SetCurlCredentials(&curl) || !SetXmlUrl(&curl) ||
       !curl.Set(CURLOPT_CUSTOMREQUEST, "DELETE", "Failed to setopt") || !SetXmlWriter(&curl) ||
       !SetXmlOutput(&curl, "Failed to set WRITEDATA")) {
     return m_result;
@@ -139,7 +139,7 @@ int TWHttpClient::SendReqByXMLDelete() try {
 }
 
 bool TWHttpClient::GetResponseXML(xmlDoc*& doc) {
-  const OwnedMemory<char> text(m_pRespBuf);
+  const UniqueMalloc<char> text(m_pRespBuf);
   if (!text) {
     TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_DEBUG, "Empty xml response\n");
     return false;
@@ -185,7 +185,7 @@ bool TWHttpClient::SetXmlWriter(CurlRequest* curl) {
 }
 
 // The response's body goes after what an earlier request has left; pinned by
-// GetResponseXML.TwoGetsInARowLeaveBothBodiesWhichTogetherAreNoDocument. The two fields stand side
+// GetResponseXML.TwoGetsInARowLeaveBothBodiesWhichTogetherAreNoDocument. The two fields are side
 // by side as a CurlMemBuffer does.
 bool TWHttpClient::SetXmlOutput(CurlRequest* curl, const char* message) {
   return curl->Set(CURLOPT_WRITEDATA, reinterpret_cast<CurlMemBuffer*>(&m_pRespBuf), message);

@@ -108,7 +108,7 @@ void Report(const xmlParserCtxt& parser, const xmlError& error) {
 
 // After these errors the parser goes on for ever when it is inside a parameter entity: it takes no
 // further byte, and waits for the entity's end. A document of 500 bytes is enough for that.
-bool NeverEnds(const xmlParserCtxt& parser, int code) {
+bool IsEndlessLoop(const xmlParserCtxt& parser, int code) {
   return parser.inputNr > 1 && (code == XML_ERR_ENTITY_LOOP || code == XML_ERR_NO_MEMORY);
 }
 
@@ -120,7 +120,7 @@ void HandleError(void* context, xmlError* error) {
   } else {
     Report(*parser, *error);
   }
-  if (!NeverEnds(*parser, error->code)) return;
+  if (!IsEndlessLoop(*parser, error->code)) return;
   const int code = parser->errNo;
   xmlStopParser(parser);
   parser->errNo = code;

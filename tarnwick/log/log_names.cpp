@@ -86,34 +86,34 @@ namespace tarnwick {
 
 // Of several first callers each builds a map, and the first to finish gives it to all.
 template <typename T>
-const TWEnum2StrMap<T>& NamesOf() {
+const TWEnum2StrMap<T>& NameMap() {
   const TWEnum2StrMap<T>* names = g_names<T>.load(std::memory_order_acquire);
   if (names != nullptr) return *names;
   auto built = std::make_unique<const TWEnum2StrMap<T>>();
   if (!g_names<T>.compare_exchange_strong(names, built.get())) return *names;
   return *built.release();
 }
-template const TWEnum2StrMap<LOG_CATEG>& NamesOf<LOG_CATEG>();
-template const TWEnum2StrMap<LOG_LEVEL>& NamesOf<LOG_LEVEL>();
+template const TWEnum2StrMap<LOG_CATEG>& NameMap<LOG_CATEG>();
+template const TWEnum2StrMap<LOG_LEVEL>& NameMap<LOG_LEVEL>();
 
 template <typename T>
-const char* NameIn(const std::map<T, const char*>& names, T value) {
+const char* FindName(const std::map<T, const char*>& names, T value) {
   const auto found = names.find(value);
   return found == names.end() ? "unknown" : found->second;
 }
-template const char* NameIn(const std::map<LOG_CATEG, const char*>& names, LOG_CATEG value);
-template const char* NameIn(const std::map<LOG_LEVEL, const char*>& names, LOG_LEVEL value);
+template const char* FindName(const std::map<LOG_CATEG, const char*>& names, LOG_CATEG value);
+template const char* FindName(const std::map<LOG_LEVEL, const char*>& names, LOG_LEVEL value);
 
 }  // namespace tarnwick
 
 template <>
 const char* Enum2String<LOG_CATEG>(LOG_CATEG value) {
-  return NameIn(NamesOf<LOG_CATEG>(), value);
+  return FindName(NameMap<LOG_CATEG>(), value);
 }
 
 template <>
 const char* Enum2String<LOG_LEVEL>(LOG_LEVEL value) {
-  return NameIn(NamesOf<LOG_LEVEL>(), value);
+  return FindName(NameMap<LOG_LEVEL>(), value);
 }
 
 const char* TWLogName(LOG_CATEG value) noexcept {

@@ -1,4 +1,4 @@
-// The look-up behind Enum2String.
+// The look-up of Enum2String.
 #ifndef TARNWICK_LOG_LOG_NAMES_H_
 #define TARNWICK_LOG_LOG_NAMES_H_
 
@@ -10,11 +10,11 @@ namespace tarnwick {
 
 // The one map of the process for LOG_CATEG or LOG_LEVEL, built by the first call and never changed.
 template <typename T>
-const TWEnum2StrMap<T>& NamesOf();
+const TWEnum2StrMap<T>& NameMap();
 
 // The name of `value`, or "unknown".
 template <typename T>
-const char* NameIn(const std::map<T, const char*>& names, T value);
+const char* FindName(const std::map<T, const char*>& names, T value);
 
 }  // namespace tarnwick
 

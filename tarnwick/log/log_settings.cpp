@@ -12,9 +12,9 @@
 #include "tarnwick/log/twdebuglog.h"
 #include "tarnwick/platform/cancel.h"
 #include "tarnwick/platform/file_lock.h"
-#include "tarnwick/platform/unique.h"
 #include "tarnwick/platform/qlibcfile.h"
 #include "tarnwick/platform/settings_file.h"
+#include "tarnwick/platform/unique.h"
 
 using namespace tarnwick;
 
@@ -38,7 +38,7 @@ namespace tarnwick {
 std::vector<int> SplitToIntList(const std::string& text, const std::string& delimiters) {
   std::vector<int> list;
   if (text.empty() || delimiters.empty()) return list;
-  const OwnedMemory<char> copy(strdup(text.c_str()));
+  const UniqueMalloc<char> copy(strdup(text.c_str()));
   if (!copy) return list;
   char* rest = nullptr;
   for (char* token = strtok_r(copy.get(), delimiters.c_str(), &rest); token != nullptr;
@@ -57,7 +57,7 @@ int WriteSettingValue(const char* path, const char* key, const char* value,
   std::string file;
   struct stat attributes;
   if (!FollowSettingsLinks(path, &file)) return -1;
-  const OwnedFd fd(OpenSettings(file.c_str(), O_CREAT | O_NOFOLLOW, 0644, &attributes));
+  const UniqueFd fd(OpenSettings(file.c_str(), O_CREAT | O_NOFOLLOW, 0644, &attributes));
   if (!fd.Valid()) return -1;
   const FileLock lock(fd.Get());
   if (!lock.Held()) return -1;

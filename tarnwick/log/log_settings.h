@@ -8,7 +8,7 @@
 namespace tarnwick {
 
 // The signed decimal integers of `text` between any of the characters `delimiters`. Empty fields
-// are skipped; a field that is no number counts as 0, and what follows a number is ignored.
+// are skipped; a field that is no number is 0, and what follows a number is ignored.
 std::vector<int> SplitToIntList(const std::string& text, const std::string& delimiters);
 
 // The platform's reading function. Results: more than 0 when the key was found with a value.

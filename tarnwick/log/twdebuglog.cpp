@@ -22,8 +22,8 @@
 #include "tarnwick/platform/cancel.h"
 #include "tarnwick/platform/file_lock.h"
 #include "tarnwick/platform/fork_guard.h"
-#include "tarnwick/platform/unique.h"
 #include "tarnwick/platform/signal_guard.h"
+#include "tarnwick/platform/unique.h"
 
 using namespace tarnwick;
 
@@ -36,7 +36,7 @@ constexpr size_t kTagsLength = 127;
 // stream an allocation.
 constexpr size_t kStreamSize = 4096;
 
-const char* PathOf(LOG_TYPE type) {
+const char* LogPath(LOG_TYPE type) {
   switch (type) {
     case LOG_TYPE_MAIN:
       return "/var/log/tarnwick/tarnwick.log";
@@ -68,9 +68,9 @@ class Head {
     Add(std::string_view(at, static_cast<size_t>(end - at)));
   }
 
-  // Adds all of a text of any length: what does not fit goes to the stream, behind the rest.
+  // Adds all of a text of any length: what does not fit goes to the stream, after the rest.
   void AddWhole(std::string_view text, FILE* stream) {
-    if (text.size() + kSpare <= kSize - m_length) {
+    if (text.size() + kReserve <= kSize - m_length) {
       Add(text);
       return;
     }
@@ -87,7 +87,7 @@ class Head {
 
  private:
   static constexpr size_t kSize = 512;
-  static constexpr size_t kSpare = 32;  // for the line's number and the marks around it
+  static constexpr size_t kReserve = 32;  // for the line's number and the marks around it
   char m_text[kSize];
   size_t m_length;
 };
@@ -117,8 +117,8 @@ void AddTags(const char* categ, const char* level, Head* head) {
 
 // The C library has a lock for the time zone.
 bool ToLocalTime(time_t seconds, struct tm* local) {
-  if (ForkHold::LocksAreLost()) return false;
-  const ForkHold hold(ForkHold::kLibraryLock);
+  if (ForkGuard::LocksAreLost()) return false;
+  const ForkGuard hold(ForkGuard::kLibraryLock);
   return localtime_r(&seconds, local) != nullptr;
 }
 
@@ -188,8 +188,8 @@ bool HasFileSizeLimit() {
 // To the system log, which has a lock too; the line number is that of the failure.
 void ReportFailure(const char* call, int line) {
   const int error = errno;
-  if (ForkHold::LocksAreLost()) return;
-  const ForkHold hold(ForkHold::kLibraryLock);
+  if (ForkGuard::LocksAreLost()) return;
+  const ForkGuard hold(ForkGuard::kLibraryLock);
   syslog(LOG_ERR, "twdebuglog:%d:TWPrintf(): %s twlog file failed with errno [%d].", line, call,
          error);
 }
@@ -203,10 +203,10 @@ std::string GetFileBaseName(std::string path) {
 void TWPrintf(LOG_TYPE type, const char* categ, const char* level, const char* file, int line,
               const char* func, const char* format, ...) {
   // Callers read errno after they have logged.
-  const ErrnoKeeper keeper;
+  const ErrnoSaver keeper;
   const NoCancel no_cancel;
   char buffer[kStreamSize];
-  UninheritedFile log(PathOf(type), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, 0666);
+  ForkClosedFile log(LogPath(type), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, 0666);
   if (!log.Valid()) {
     ReportFailure("open", __LINE__);
     return;
@@ -229,5 +229,5 @@ void TWPrintf(LOG_TYPE type, const char* categ, const char* level, const char* f
   va_start(arguments, format);
   if (format != nullptr) vfprintf(log.Stream(), format, arguments);
   va_end(arguments);
-  if (!log.Flush() && sizeLimit) sizeLimit->TakeBack();
+  if (!log.Flush() && sizeLimit) sizeLimit->DiscardPending();
 }

@@ -174,7 +174,7 @@ class TARNWICK_API TWDbgLogCfg {
   // /var/packages/Tarnwick/etc/settings.conf into this record.
   //
   // A shorter list changes the first levels only; numbers after the 74th are ignored; text that is
-  // not a number counts as 0. The flag is set by "yes" exactly, and cleared by any other value.
+  // not a number is 0. The flag is set by "yes" exactly, and cleared by any other value.
   // Results: 0; -1 when one of the keys is missing or empty, the file unreadable or memory
   //   short. What is missing stays as it is in the record; the levels are loaded even when the
   //   flag's key is missing.
@@ -241,8 +241,8 @@ TARNWICK_API void FreeDbgCfg();
 //   then "file:line:function(): " and the message. Milliseconds are printed when the shared record
 //   says so.
 // Failures: a file that cannot be opened, one that is not regular (errno ENXIO: a FIFO or a device
-//   is neither waited for nor written), a stream that cannot be made for it, and an undefined `type`
-//   (errno EFAULT), are reported to the system log; a lock that cannot be had drops the line
+//   is neither waited for nor written), a stream that cannot be made for it, and an undefined
+//   `type` (errno EFAULT), are reported to the system log; a lock that cannot be had drops the line
 //   silently. A full disk and the process's limit on file sizes cut the line or lose it; no SIGXFSZ
 //   comes of it. errno is kept.
 // Threads: any thread of any process; lines never mix, because each is written under an exclusive

@@ -14,8 +14,8 @@ struct RequestSettings {
 // Those of the thread's innermost scope; null without one.
 const RequestSettings* CurrentRequestSettings();
 
-// A text of a peer as a log line shows it: as it is up to its first zero byte, or escaped in a scope
-// that says so.
+// A text of a peer as a log line shows it: as it is up to its first zero byte, or escaped in a
+// scope that says so.
 //
 //   TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_DEBUG3, "%s\n", PeerText(line).Get());
 class PeerText {

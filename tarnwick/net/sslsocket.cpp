@@ -82,7 +82,7 @@ int SSLSocket::Handshake() {
   const NoCancel no_cancel;
   SigpipeGuard guard;
   const int result = SSL_connect(m_pSSL);
-  if (result != 1) guard.TakeBack();
+  if (result != 1) guard.DiscardPending();
   return result;
 }
 
@@ -91,7 +91,7 @@ void SSLSocket::Disconnect() {
     ERR_clear_error();
     const NoCancel no_cancel;
     SigpipeGuard guard;
-    if (SSL_shutdown(m_pSSL) < 0) guard.TakeBack();
+    if (SSL_shutdown(m_pSSL) < 0) guard.DiscardPending();
     SSL_clear(m_pSSL);
   }
   TWSocket::Disconnect();

@@ -29,12 +29,12 @@ class TARNWICK_API SSLSocket : public TWSocket {
   // Blocks as TWSocket::Connect, and then for the handshake, which has no limit.
   int Connect() override;
 
-  // Sends the close notice on a connection that still counts as connected, does not wait for the
+  // Sends the close notice on a connection that is still taken for connected, does not wait for the
   // peer's, and closes the descriptor.
   void Disconnect() override;
 
   // As TWSocket::DoSelect, but 0 at once for SELECT_READ while decrypted bytes are waiting; so
-  // HasDataToRead answers false just then, and ReadData returns them without a wait. After the
+  // HasDataToRead returns false just then, and ReadData returns them without a wait. After the
   // peer's close notice ReadData does not wait, but DoSelect and HasDataToRead do, as on TCP.
   int DoSelect(SELECT_TYPE type) override;
 
@@ -42,7 +42,7 @@ class TARNWICK_API SSLSocket : public TWSocket {
   // Results: the bytes read; 0 when the peer closed, with or without a close notice, and when it
   //   ended the connection by a fatal alert (logged); -1 on an error (logged), when errno is 0 or
   //   the failing system call's, and without a connection, when errno stays.
-  // Blocks for `timeout` seconds whenever more of a record is missing; behind DoSelect, which has
+  // Blocks for `timeout` seconds whenever more of a record is missing; after DoSelect, which has
   // waited as long, a silent peer costs a read twice the time-out.
   int _Read(void* buf, unsigned int len) override;
 

@@ -26,7 +26,7 @@ struct TlsResult {
 };
 
 template <typename Operation>
-TlsResult RunTls(SSL* ssl, Operation operation) {
+TlsResult CallSsl(SSL* ssl, Operation operation) {
   ERR_clear_error();
   if (ssl == nullptr) return {-1, SSL_ERROR_SSL};
   const NoCancel no_cancel;
@@ -34,11 +34,11 @@ TlsResult RunTls(SSL* ssl, Operation operation) {
   errno = 0;
   const int count = operation(ssl);
   const int error = SSL_get_error(ssl, count);
-  if (count <= 0) guard.TakeBack();
+  if (count <= 0) guard.DiscardPending();
   return {count, error};
 }
 
-bool WantsToWait(int error) {
+bool WouldBlock(int error) {
   return error == SSL_ERROR_WANT_READ || error == SSL_ERROR_WANT_WRITE;
 }
 
@@ -58,17 +58,17 @@ int SSLSocket::DoSelect(SELECT_TYPE type) {
 
 int SSLSocket::_Read(void* buf, unsigned int len) {
   for (;;) {
-    // Behind a disconnect OpenSSL's object still holds the number of a descriptor that is gone.
-    const TlsResult result = RunTls(m_sockFd < 0 ? nullptr : m_pSSL, [&](SSL* ssl) {
+    // After a disconnect OpenSSL's object still holds the number of a descriptor that is gone.
+    const TlsResult result = CallSsl(m_sockFd < 0 ? nullptr : m_pSSL, [&](SSL* ssl) {
       return SSL_read(ssl, buf, static_cast<int>(len));
     });
     m_bStreamEnded = m_pSSL != nullptr && (SSL_get_shutdown(m_pSSL) & SSL_RECEIVED_SHUTDOWN) != 0;
-    if (WantsToWait(result.error)) {
+    if (WouldBlock(result.error)) {
       // A loop, because a record that comes byte by byte takes thousands of rounds.
       if (DoSelect(SELECT_READ) > 0) continue;
       TW_LOG(LOG_CATEG_SOCKET, LOG_LEVEL_ERROR, "Select read op error.\n");
     } else if (result.count < 0 || (result.count == 0 && ERR_peek_error() != 0)) {
-      // A peer's fatal alert gives 0 with a reason, and ends the stream.
+      // For a peer's fatal alert SSL_read returns 0 with a reason, and ends the stream.
       TW_LOG(LOG_CATEG_SOCKET, LOG_LEVEL_ERROR, "Read error [%d] [%s].\n", result.error,
              ErrorText().text);
     }
@@ -86,10 +86,10 @@ int SSLSocket::_Write(const void* buf, unsigned int len) {
     }
     const int piece = static_cast<int>(std::min(len - written, kMaxPiece));
     const TlsResult result =
-        RunTls(m_pSSL, [&](SSL* ssl) { return SSL_write(ssl, bytes + written, piece); });
+        CallSsl(m_pSSL, [&](SSL* ssl) { return SSL_write(ssl, bytes + written, piece); });
     if (result.error == SSL_ERROR_NONE) {
       written += static_cast<unsigned int>(result.count);
-    } else if (!WantsToWait(result.error)) {
+    } else if (!WouldBlock(result.error)) {
       TW_LOG(LOG_CATEG_SOCKET, LOG_LEVEL_ERROR, "Write error [%d] [%s].\n", result.error,
              ErrorText().text);
       return -1;

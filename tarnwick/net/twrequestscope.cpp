@@ -37,7 +37,7 @@ TWRequestScope::TWRequestScope() noexcept : m_settings(new (std::nothrow) Reques
   t_settings = m_settings;
 }
 
-// Wherever it stands in the thread's list: scopes on the heap may go in any order.
+// Wherever it is in the thread's list: scopes on the heap may go in any order.
 TWRequestScope::~TWRequestScope() {
   for (RequestSettings** at = &t_settings; *at != nullptr; at = &(*at)->outer) {
     if (*at != m_settings) continue;

@@ -3,7 +3,7 @@
 //   {
 //     TWRequestScope scope;
 //     scope.SetEscapedLog(true);
-//     SendHttpGet(host, 80, "/info.json", reply, 5, false);  // what the device sends cannot forge
+//     SendHttpGet(host, 80, "/info.json", response, 5, false);  // what the device sends cannot forge
 //   }                                                        // a line of the log
 //
 // Without a scope every call does what it always did.
@@ -40,10 +40,10 @@ class TARNWICK_API TWRequestScope {
   // header lines at debug3. Each line then ends where it seems to end, and a terminal that shows it
   // gets no commands.
   //
-  // \xHH (upper case) stands for each byte of a control character (U+0000 to U+001F, U+007F to
+  // \xHH (upper case) represents each byte of a control character (U+0000 to U+001F, U+007F to
   // U+009F), of the separators U+2028 and U+2029, of a character that turns the direction of text
   // (U+061C, U+200E, U+200F, U+202A to U+202E, U+2066 to U+2069), and for each byte that is not
-  // valid UTF-8; \\ stands for a backslash. Other bytes stay, and what the calls return is never
+  // valid UTF-8; \\ represents a backslash. Other bytes stay, and what the calls return is never
   // escaped. Where there is no memory for the escaped text the line has "(no memory)" for it.
   void SetEscapedLog(bool on);
 

@@ -25,8 +25,8 @@ class SocketAccess;
 // from it may be compiled with -fno-rtti and -fno-exceptions.
 // Threads: one thread uses an object at a time.
 // Cancellation: a thread may be cancelled (pthread_cancel, the deferred kind) in any operation. It
-//   ends at a wait for the peer, or after a name look-up or a call of OpenSSL, which are not left in
-//   the middle. The object may then be destroyed, disconnected or connected again.
+//   ends at a wait for the peer, or after a name resolution or a call of OpenSSL, which are not
+//   left in the middle. The object may then be destroyed, disconnected or connected again.
 class TARNWICK_API TWSocket {
  public:
   // What a wait is for.
@@ -53,8 +53,8 @@ class TARNWICK_API TWSocket {
   //
   // Results: 0; negative on failure, when IsConnected() is false and the descriptor may still be
   //   open until the next Disconnect. After a connect time-out errno is ETIMEDOUT.
-  // Blocks for the name look-up, which has no limit here, and then for `timeout` seconds at most. A
-  //   `timeout` of 0 connects only where the connection completes at once.
+  // Blocks for the name resolution, which has no limit here, and then for `timeout` seconds at
+  //   most. A `timeout` of 0 connects only where the connection completes at once.
   virtual int Connect();
 
   // Makes the descriptor non-blocking when the time-out is zero or positive, blocking when it is
@@ -129,7 +129,7 @@ class TARNWICK_API TWSocket {
   // A line feed, the end of the stream, or a carriage return and whatever byte follows it end the
   // line; the ending is not stored. A longer line is cut: its bufLen-th character is lost, and the
   // next read begins after that.
-  // Results: the length stored; -1 when a read failed, when the stream ended behind a carriage
+  // Results: the length stored; -1 when a read failed, when the stream ended after a carriage
   //   return, and when `buf` is null or `bufLen` not positive; `buf` is then not terminated.
   // Blocks as a read of one byte does, for each byte that is missing.
   int ReadToLineEnd(char* buf, int bufLen);
@@ -137,12 +137,12 @@ class TARNWICK_API TWSocket {
   // Pushes `len` bytes back: the next reads return them before what is buffered already.
   //
   // Results: 0; -1, with the buffer untouched, when `data` is null, `len` is negative, or `len` and
-  //   the unread bytes exceed 65,536. Behind a read there is room for 1,024 bytes, until some are
+  //   the unread bytes exceed 65,536. After a read there is room for 1,024 bytes, until some are
   //   pushed back. In direct mode nothing happens and the result is 0.
   int RestoreData(char* data, int len);
 
   // True when the descriptor becomes readable, or has an exceptional condition, within `timeout`
-  // seconds. What is in the read-ahead buffer is ignored; a negative `timeout` answers false at
+  // seconds. What is in the read-ahead buffer is ignored; a negative `timeout` returns false at
   // once.
   bool HasDataToRead(int timeout);
 
@@ -182,13 +182,13 @@ class TARNWICK_API TWSocket {
 
   TARNWICK_LOCAL int ReadDirect(char* buf, int len);
   TARNWICK_LOCAL int ReadBuffered(char* buf, int len);
-  TARNWICK_LOCAL int TakeBuffered(char* buf, int len);
-  TARNWICK_LOCAL int TakeLineStart(char* buf, int room);
-  TARNWICK_LOCAL bool TakeLineEnd();
-  TARNWICK_LOCAL bool ReadStraight(char* buf, int len, int* done);
-  TARNWICK_LOCAL bool MayRetry(int retries);
+  TARNWICK_LOCAL int ConsumeBuffered(char* buf, int len);
+  TARNWICK_LOCAL int ConsumeLineBody(char* buf, int room);
+  TARNWICK_LOCAL bool ConsumeLineEnding();
+  TARNWICK_LOCAL bool ReadUnbuffered(char* buf, int len, int* done);
+  TARNWICK_LOCAL bool ShouldRetryRead(int retries);
   TARNWICK_LOCAL bool WaitReadable();
-  TARNWICK_LOCAL void MeetEndOfFile();
+  TARNWICK_LOCAL void OnEndOfStream();
   TARNWICK_LOCAL void LogFailedRead();
 };
 

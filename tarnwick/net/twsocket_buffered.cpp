@@ -13,14 +13,14 @@ namespace {
 // The log names the operation that callers know.
 constexpr char kReadData[] = "ReadData";
 
-// What is left free behind a read-ahead is there for push-back.
-constexpr int kPushBackRoom = 1024;
+// What is left free after a read-ahead, so that RestoreData can push back.
+constexpr int kPushbackReserve = 1024;
 
 // A request of this size goes straight to the caller's memory, which saves a copy.
-constexpr int kStraightSize = 1024;
+constexpr int kBypassThreshold = 1024;
 
-// How far a line is looked at in one go. More would go over the same bytes again and again where
-// the lines are short and all end in the same of the two characters.
+// How far one search for the end of a line goes. Larger searches scan the same bytes again where
+// lines are short.
 constexpr int kScanSize = 256;
 
 // How often a small read that delivered nothing is tried again.
@@ -37,7 +37,7 @@ int TWSocket::ReadData(char* buf, int len) {
 int TWSocket::ReadDirect(char* buf, int len) {
   if (!WaitReadable()) return -1;
   const int count = _Read(buf, static_cast<unsigned int>(len));
-  if (count == 0) MeetEndOfFile();
+  if (count == 0) OnEndOfStream();
   return count;
 }
 
@@ -45,30 +45,30 @@ int TWSocket::ReadBuffered(char* buf, int len) {
   if (len == 0) return 0;
   int done = 0;
   for (int retries = 0; m_readLen < len - done;) {
-    done += TakeBuffered(buf + done, m_readLen);
+    done += ConsumeBuffered(buf + done, m_readLen);
     m_readPos = 0;
-    if (!ReadStraight(buf, len, &done)) return -1;
+    if (!ReadUnbuffered(buf, len, &done)) return -1;
     if (done == len) return len;
     if (!WaitReadable()) return -1;
-    const int count = _Read(m_readBuf, kReadBufSize - kPushBackRoom);
+    const int count = _Read(m_readBuf, kReadBufSize - kPushbackReserve);
     if (count > 0) {
       m_readLen = count;
     } else if (count == 0) {
-      MeetEndOfFile();
+      OnEndOfStream();
       return done;
     } else if (done > 0) {
       LogFailedRead();
       return done;
-    } else if (!MayRetry(retries++)) {
+    } else if (!ShouldRetryRead(retries++)) {
       return -1;
     }
   }
-  TakeBuffered(buf + done, len - done);
+  ConsumeBuffered(buf + done, len - done);
   return len;
 }
 
 // Moves `len` buffered bytes to the caller. REQUIRES: len <= m_readLen.
-int TWSocket::TakeBuffered(char* buf, int len) {
+int TWSocket::ConsumeBuffered(char* buf, int len) {
   std::memcpy(buf, m_readBuf + m_readPos, static_cast<size_t>(len));
   m_readPos += len;
   m_readLen -= len;
@@ -77,7 +77,7 @@ int TWSocket::TakeBuffered(char* buf, int len) {
 
 // Moves bytes of a line to the caller, at most `room`, of which none ends it. It may stop early:
 // what comes next is read byte by byte, with all that such a read does at the end of the buffer.
-int TWSocket::TakeLineStart(char* buf, int room) {
+int TWSocket::ConsumeLineBody(char* buf, int room) {
   const size_t size = static_cast<size_t>(std::max(std::min({m_readLen, room, kScanSize}), 0));
   const char* const begin = m_readBuf + m_readPos;
   const void* end = std::memchr(begin, '\n', size);
@@ -85,11 +85,11 @@ int TWSocket::TakeLineStart(char* buf, int room) {
       end != nullptr ? static_cast<size_t>(static_cast<const char*>(end) - begin) : size;
   end = std::memchr(begin, '\r', length);
   if (end != nullptr) length = static_cast<size_t>(static_cast<const char*>(end) - begin);
-  return TakeBuffered(buf, static_cast<int>(length));
+  return ConsumeBuffered(buf, static_cast<int>(length));
 }
 
-// Takes the end of a line, as two reads of a byte would, when these two are buffered.
-bool TWSocket::TakeLineEnd() {
+// Consumes the end of a line, as two reads of one byte would, when both are buffered.
+bool TWSocket::ConsumeLineEnding() {
   if (m_readLen < 2) return false;
   const char first = m_readBuf[m_readPos];
   if (first != '\r' && first != '\n') return false;
@@ -102,12 +102,12 @@ bool TWSocket::TakeLineEnd() {
 
 // Reads into the caller's memory while much is missing. After an error or the end of the stream the
 // read-ahead has the last word, unless nothing was delivered at all: then the call has failed.
-bool TWSocket::ReadStraight(char* buf, int len, int* done) {
-  while (len - *done >= kStraightSize) {
+bool TWSocket::ReadUnbuffered(char* buf, int len, int* done) {
+  while (len - *done >= kBypassThreshold) {
     if (!WaitReadable()) return false;
     const int count = _Read(buf + *done, static_cast<unsigned int>(len - *done));
     if (count == 0) {
-      MeetEndOfFile();
+      OnEndOfStream();
       return true;
     }
     if (count < 0) {
@@ -122,7 +122,7 @@ bool TWSocket::ReadStraight(char* buf, int len, int* done) {
 }
 
 // After a read-ahead that failed with nothing delivered.
-bool TWSocket::MayRetry(int retries) {
+bool TWSocket::ShouldRetryRead(int retries) {
   if ((errno == EAGAIN || errno == EINTR) && retries < kMaxRetries) return true;
   TW_LOG_AS(kReadData, LOG_CATEG_SOCKET, LOG_LEVEL_INFO,
             "Read socket [%d] failed with errno [%d], retry [%d].\n", m_sockFd, errno, retries);
@@ -142,7 +142,7 @@ bool TWSocket::WaitReadable() {
   return false;
 }
 
-void TWSocket::MeetEndOfFile() {
+void TWSocket::OnEndOfStream() {
   m_bEOF = true;
   TW_LOG_AS(kReadData, LOG_CATEG_SOCKET, LOG_LEVEL_INFO, "Reach end of file!\n");
 }

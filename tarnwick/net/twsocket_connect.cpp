@@ -1,4 +1,4 @@
-// Connecting: look-up, source address, and the connect with and without a time-out.
+// Connecting: name resolution, source address, and the connect with and without a time-out.
 #define TW_LOG_SOURCE "twsocket"
 
 #include <fcntl.h>
@@ -24,14 +24,14 @@ namespace {
 
 struct AddressListDeleter {
   void operator()(struct addrinfo* list) const {
-    const ErrnoKeeper keeper;  // callers find the connect's errno
+    const ErrnoSaver keeper;  // callers find the connect's errno
     freeaddrinfo(list);
   }
 };
 using AddressList = std::unique_ptr<struct addrinfo, AddressListDeleter>;
 
-// Results: false when the look-up failed. A look-up that succeeds may still give no address.
-bool LookUp(const std::string& host, int port, AddressList* addresses) {
+// Results: false when the name resolution failed. One that succeeds may still find no address.
+bool Resolve(const std::string& host, int port, AddressList* addresses) {
   struct addrinfo hints = {};
   hints.ai_family = AF_INET;
   hints.ai_socktype = SOCK_STREAM;
@@ -42,9 +42,17 @@ bool LookUp(const std::string& host, int port, AddressList* addresses) {
   return true;
 }
 
-// Why a connect with a time-out did not succeed, with the error number behind it.
+// Why a connect with a time-out did not succeed, with its errno.
 struct ConnectOutcome {
-  enum Kind { kConnected, kRefusedAtOnce, kTimedOut, kSelectFailed, kNotReady, kNoStatus, kFailed };
+  enum Kind {
+    kConnected,
+    kFailedImmediately,
+    kTimedOut,
+    kSelectFailed,
+    kNotReady,
+    kNoStatus,
+    kFailed
+  };
   Kind kind;
   int error;
 };
@@ -68,7 +76,7 @@ ConnectOutcome WaitForConnect(int fd, int timeout) {
   return {ConnectOutcome::kConnected, 0};
 }
 
-ConnectOutcome PendingError(int fd) {
+ConnectOutcome GetSocketError(int fd) {
   int error = 0;
   socklen_t size = sizeof(error);
   if (getsockopt(fd, SOL_SOCKET, SO_ERROR, &error, &size) != 0) {
@@ -79,9 +87,9 @@ ConnectOutcome PendingError(int fd) {
 
 ConnectOutcome ConnectNonBlocking(int fd, const struct addrinfo& address, int timeout) {
   if (connect(fd, address.ai_addr, address.ai_addrlen) == 0) return {ConnectOutcome::kConnected, 0};
-  if (errno != EINPROGRESS) return {ConnectOutcome::kRefusedAtOnce, errno};
+  if (errno != EINPROGRESS) return {ConnectOutcome::kFailedImmediately, errno};
   const ConnectOutcome outcome = WaitForConnect(fd, timeout);
-  return outcome.kind == ConnectOutcome::kConnected ? PendingError(fd) : outcome;
+  return outcome.kind == ConnectOutcome::kConnected ? GetSocketError(fd) : outcome;
 }
 
 }  // namespace
@@ -112,7 +120,7 @@ bool TWSocket::ConnectWithTimeout(const struct addrinfo* address) {
   switch (outcome.kind) {
     case ConnectOutcome::kConnected:
       break;
-    case ConnectOutcome::kRefusedAtOnce:
+    case ConnectOutcome::kFailedImmediately:
       // Says the opposite of what happened. Messages are never reworded; pinned by
       // ConnectEdges.AConnectionThatIsRefusedAtOnceIsLoggedAsConnected.
       TW_LOG(LOG_CATEG_SOCKET, LOG_LEVEL_INFO, "Socket connected.\n");
@@ -153,7 +161,7 @@ int TWSocket::ConnectSocket() {
     TW_LOG(LOG_CATEG_SOCKET, LOG_LEVEL_INFO, "Failed to bind src ip, ignore it.\n");
   }
   AddressList addresses;
-  if (!LookUp(m_strHost, m_port, &addresses)) {
+  if (!Resolve(m_strHost, m_port, &addresses)) {
     TW_LOG(LOG_CATEG_SOCKET, LOG_LEVEL_INFO, "Scoket getaddrinfo incomplete.\n");
     return -1;
   }

@@ -82,8 +82,8 @@ int TWSocket::ReadToLineEnd(char* buf, int bufLen) {
   int length = 0;
   for (;;) {
     if (m_bBuffered) {
-      length += TakeLineStart(buf + length, bufLen - 1 - length);
-      if (TakeLineEnd()) break;
+      length += ConsumeLineBody(buf + length, bufLen - 1 - length);
+      if (ConsumeLineEnding()) break;
     }
     char byte;
     const int count = ReadData(&byte, 1);

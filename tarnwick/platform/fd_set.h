@@ -29,10 +29,10 @@ class FdSet {
 
  private:
   int m_fd;
-  size_t m_word;  // where the descriptor stands, and its bit there
+  size_t m_word;  // where the descriptor is, and its bit there
   fd_mask m_bit;
   fd_set m_small;
-  OwnedMemory<fd_mask> m_large;
+  UniqueMalloc<fd_mask> m_large;
   fd_mask* m_words;
 };
 

@@ -19,7 +19,7 @@ class FileLock {
   bool Held() const { return m_held; }
 
   void Unlock() {
-    const ErrnoKeeper keeper;
+    const ErrnoSaver keeper;
     if (m_held) flock(m_fd, LOCK_UN);
     m_held = false;
   }

@@ -37,7 +37,7 @@ thread_local int t_forks = 0;
 
 // The files that are open now, and the mutex around a change of the list. It is held for a few
 // instructions; a signal handler that forks in one of them finds a list that can be read.
-UninheritedFile* g_files = nullptr;
+ForkClosedFile* g_files = nullptr;
 pthread_mutex_t g_list = PTHREAD_MUTEX_INITIALIZER;
 thread_local bool t_has_list = false;
 
@@ -58,7 +58,7 @@ void WaitForOtherHolds() {
   const struct timespec pause = {0, kPauseNs};
   struct timespec start;
   clock_gettime(CLOCK_MONOTONIC, &start);
-  while (!(IsAlone(ForkHold::kDescriptor) && IsAlone(ForkHold::kLibraryLock)) &&
+  while (!(IsAlone(ForkGuard::kDescriptor) && IsAlone(ForkGuard::kLibraryLock)) &&
          NanosecondsSince(start) < kLongestWaitNs) {
     nanosleep(&pause, nullptr);
   }
@@ -76,7 +76,7 @@ void UnlockList() {
 
 void PrepareFork() {
   if (t_forks++ > 0) return;
-  const ErrnoKeeper keeper;
+  const ErrnoSaver keeper;
   ++g_forks;
   pthread_mutex_lock(&g_fork);
   WaitForOtherHolds();
@@ -97,9 +97,9 @@ void EndFork() {
 }  // namespace
 
 // The threads that opened them do not exist in the child. Closing leaves their locks to the parent.
-void CloseInheritedFiles() {
-  const ErrnoKeeper keeper;
-  for (const UninheritedFile* file = g_files; file != nullptr; file = file->m_next) {
+void CloseFilesInChild() {
+  const ErrnoSaver keeper;
+  for (const ForkClosedFile* file = g_files; file != nullptr; file = file->m_next) {
     if (file->m_stream != nullptr) __fpurge(file->m_stream);
     close(file->m_fd);
   }
@@ -110,8 +110,8 @@ namespace {
 
 // A hold of this thread itself goes on, in a signal handler's child too, and so does its lock.
 void StartChild() {
-  CloseInheritedFiles();
-  if (g_holds[ForkHold::kLibraryLock] != 0) g_locks_are_lost = true;
+  CloseFilesInChild();
+  if (g_holds[ForkGuard::kLibraryLock] != 0) g_locks_are_lost = true;
   for (int kind = 0; kind < kKinds; ++kind) g_holds[kind] = t_holds[kind];
   g_forks = 1;
   EndFork();
@@ -123,8 +123,8 @@ __attribute__((constructor)) void RegisterForkHandlers() {
 
 // A hold inside another one must not wait: the fork waits for the outer one.
 bool MayWait() {
-  return t_forks == 0 && t_holds[ForkHold::kDescriptor] == 0 &&
-         t_holds[ForkHold::kLibraryLock] == 0;
+  return t_forks == 0 && t_holds[ForkGuard::kDescriptor] == 0 &&
+         t_holds[ForkGuard::kLibraryLock] == 0;
 }
 
 bool IsRegular(int fd) {
@@ -140,13 +140,13 @@ int OpenRegular(const char* path, int flags, mode_t mode) {
   flags |= O_NOCTTY;
   int opened = open(path, flags | O_NONBLOCK, mode);
   if (opened < 0 && errno == EWOULDBLOCK) opened = open(path, flags, mode);
-  OwnedFd fd(opened);
+  UniqueFd fd(opened);
   return fd.Valid() && IsRegular(fd.Get()) ? fd.Release() : -1;
 }
 
-// What stdio calls for a stream of an UninheritedFile. A result of 0 tells it of a failure.
+// What stdio calls for a stream of an ForkClosedFile. A result of 0 tells it of a failure.
 ssize_t WriteToFile(void* file, const char* data, size_t size) {
-  const int fd = static_cast<UninheritedFile*>(file)->Get();
+  const int fd = static_cast<ForkClosedFile*>(file)->Get();
   size_t written = 0;
   while (written < size) {
     const ssize_t count = write(fd, data + written, size - written);
@@ -158,7 +158,7 @@ ssize_t WriteToFile(void* file, const char* data, size_t size) {
 
 }  // namespace
 
-ForkHold::ForkHold(Kind kind) : m_kind(kind) {
+ForkGuard::ForkGuard(Kind kind) : m_kind(kind) {
   ++g_holds[kind];
   while (g_forks != 0 && MayWait()) {
     --g_holds[kind];
@@ -169,35 +169,35 @@ ForkHold::ForkHold(Kind kind) : m_kind(kind) {
   ++t_holds[kind];
 }
 
-ForkHold::~ForkHold() {
+ForkGuard::~ForkGuard() {
   --t_holds[m_kind];
   --g_holds[m_kind];
 }
 
-bool ForkHold::LocksAreLost() {
+bool ForkGuard::LocksAreLost() {
   return g_locks_are_lost;
 }
 
-UninheritedFile::UninheritedFile(const char* path, int flags, mode_t mode) : m_fd(-1) {
+ForkClosedFile::ForkClosedFile(const char* path, int flags, mode_t mode) : m_fd(-1) {
   if (path == nullptr) {
     errno = EFAULT;  // what open gives for a path that is none
     return;
   }
-  const ForkHold hold(ForkHold::kDescriptor);
+  const ForkGuard hold(ForkGuard::kDescriptor);
   m_fd = OpenRegular(path, flags, mode);
   if (Valid()) Register();
 }
 
-UninheritedFile::~UninheritedFile() {
+ForkClosedFile::~ForkClosedFile() {
   if (!Valid()) return;
-  const ErrnoKeeper keeper;
-  const ForkHold hold(ForkHold::kDescriptor);
+  const ErrnoSaver keeper;
+  const ForkGuard hold(ForkGuard::kDescriptor);
   Unregister();
   if (m_stream != nullptr) fclose(m_stream);
   close(m_fd);
 }
 
-void UninheritedFile::Register() {
+void ForkClosedFile::Register() {
   LockList();
   m_next = g_files;
   m_link = &g_files;
@@ -206,7 +206,7 @@ void UninheritedFile::Register() {
   UnlockList();
 }
 
-void UninheritedFile::Unregister() {
+void ForkClosedFile::Unregister() {
   LockList();
   *m_link = m_next;
   if (m_next != nullptr) m_next->m_link = m_link;
@@ -215,13 +215,13 @@ void UninheritedFile::Unregister() {
 
 // fdopen asks the kernel for the flags of the descriptor, which are known here: the call goes into
 // the look at the file's type instead.
-bool UninheritedFile::MakeStream(char* buffer, size_t size) {
+bool ForkClosedFile::MakeStream(char* buffer, size_t size) {
   m_stream = fopencookie(this, "a", {nullptr, WriteToFile, nullptr, nullptr});
   if (m_stream != nullptr) setvbuf(m_stream, buffer, _IOFBF, size);
   return m_stream != nullptr;
 }
 
-bool UninheritedFile::Flush() {
+bool ForkClosedFile::Flush() {
   if (fflush(m_stream) == 0 && ferror(m_stream) == 0) return true;
   __fpurge(m_stream);
   return false;

@@ -11,9 +11,9 @@
 
 #include "tarnwick/platform/cancel.h"
 #include "tarnwick/platform/file_lock.h"
-#include "tarnwick/platform/unique.h"
 #include "tarnwick/platform/settings_file.h"
 #include "tarnwick/platform/settings_text.h"
+#include "tarnwick/platform/unique.h"
 
 using namespace tarnwick;
 
@@ -35,23 +35,24 @@ bool WriteAll(int fd, std::string_view text) {
   return true;
 }
 
-// What stands at the path now.
+// What is at the path now.
 struct OldFile {
   bool exists = false;
   struct stat attributes = {};
   std::string text;
 };
 
-// REQUIRES: the folder's lock. Links were followed before; one that took the file's place is not.
+// REQUIRES: the directory's lock. Links were followed before; one that took the file's place is
+// not.
 bool ReadOldFile(const std::string& path, OldFile* old) {
-  const OwnedFd fd(tarnwick::OpenSettings(path.c_str(), O_NOFOLLOW, 0, &old->attributes));
+  const UniqueFd fd(tarnwick::OpenSettings(path.c_str(), O_NOFOLLOW, 0, &old->attributes));
   if (!fd.Valid()) return errno == ENOENT;
   old->exists = true;
   return tarnwick::ReadSettings(fd.Get(), &old->text);
 }
 
 // Owner first: changing it clears mode bits.
-bool KeepAttributes(int fd, const OldFile& old) {
+bool CopyAttributes(int fd, const OldFile& old) {
   if (!old.exists) return true;
   return fchown(fd, old.attributes.st_uid, old.attributes.st_gid) == 0 &&
          fchmod(fd, old.attributes.st_mode & 07777) == 0;
@@ -65,17 +66,17 @@ mode_t FirstMode(const OldFile& old) {
 
 bool WriteNewFile(const std::string& path, const OldFile& old, std::string_view text) {
   constexpr int kNew = O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC;
-  const OwnedFd fd(open(path.c_str(), kNew, FirstMode(old)));
-  return fd.Valid() && KeepAttributes(fd.Get(), old) && WriteAll(fd.Get(), text) &&
+  const UniqueFd fd(open(path.c_str(), kNew, FirstMode(old)));
+  return fd.Valid() && CopyAttributes(fd.Get(), old) && WriteAll(fd.Get(), text) &&
          fsync(fd.Get()) == 0;
 }
 
-// REQUIRES: the folder's lock.
+// REQUIRES: the directory's lock.
 bool ReplaceFile(const std::string& path, const OldFile& old, std::string_view text) {
   const std::string newPath = path + kNewSuffix;
   unlink(newPath.c_str());
   if (WriteNewFile(newPath, old, text) && rename(newPath.c_str(), path.c_str()) == 0) return true;
-  const ErrnoKeeper keeper;
+  const ErrnoSaver keeper;
   unlink(newPath.c_str());
   return false;
 }
@@ -88,7 +89,7 @@ struct Rewrite {
   std::string_view line;
 };
 
-// REQUIRES: the folder's lock.
+// REQUIRES: the directory's lock.
 bool ReplaceKey(const Rewrite& rewrite) {
   OldFile old;
   if (!ReadOldFile(rewrite.path, &old)) return false;
@@ -99,16 +100,16 @@ bool ReplaceKey(const Rewrite& rewrite) {
   return false;
 }
 
-// Replaces the key's line under the lock of the file's folder. The file itself cannot carry the
+// Replaces the key's line under the lock of the file's directory. The file itself cannot carry the
 // lock: callers hold its flock already, and it is another file after each rewrite.
 bool RewriteKey(const Rewrite& rewrite) {
-  const std::string path = tarnwick::FolderOf(rewrite.path);
-  const OwnedFd folder(open(path.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
-  if (!folder.Valid()) return false;
-  const FileLock lock(folder.Get());
+  const std::string path = tarnwick::Dirname(rewrite.path);
+  const UniqueFd directory(open(path.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+  if (!directory.Valid()) return false;
+  const FileLock lock(directory.Get());
   if (!lock.Held() || !ReplaceKey(rewrite)) return false;
   // The new text is in place; only a crash of the machine could still undo the renaming.
-  fsync(folder.Get());
+  fsync(directory.Get());
   return true;
 }
 
@@ -117,7 +118,7 @@ bool IsKey(const char* key) {
   return key != nullptr && key[0] != '\0' && strpbrk(key, "=# \t\r\n") == nullptr;
 }
 
-int RefuseFor(int error) {
+int FailWith(int error) {
   errno = error;
   return -1;
 }
@@ -128,10 +129,10 @@ __attribute__((weak)) int QLIBCFileGetKeyValue(const char* path, const char* key
                                                int size, int /*flags*/) try {
   const NoCancel no_cancel;
   if (path == nullptr || key == nullptr || key[0] == '\0' || value == nullptr || size < 1) {
-    return RefuseFor(EINVAL);
+    return FailWith(EINVAL);
   }
   struct stat attributes;
-  const OwnedFd fd(tarnwick::OpenSettings(path, 0, 0, &attributes));
+  const UniqueFd fd(tarnwick::OpenSettings(path, 0, 0, &attributes));
   std::string text;
   if (!fd.Valid() || !tarnwick::ReadSettings(fd.Get(), &text)) return -1;
   const SettingsLine line = IsKey(key) ? FindSettingsLine(text, key) : SettingsLine();
@@ -139,22 +140,22 @@ __attribute__((weak)) int QLIBCFileGetKeyValue(const char* path, const char* key
   value[stored] = '\0';
   return line.value.size() > INT_MAX ? INT_MAX : static_cast<int>(line.value.size());
 } catch (const std::exception&) {
-  return RefuseFor(ENOMEM);
+  return FailWith(ENOMEM);
 }
 
 __attribute__((weak)) int QLIBCFileSetKeyValue(const char* path, const char* key, const char* value,
                                                const char* format) try {
   const NoCancel no_cancel;
   if (path == nullptr || !IsKey(key) || value == nullptr || format == nullptr)
-    return RefuseFor(EINVAL);
+    return FailWith(EINVAL);
   std::string line;
   if (strchr(value, '\n') != nullptr || !FormatSettingsLine(format, key, value, &line)) {
-    return RefuseFor(EINVAL);
+    return FailWith(EINVAL);
   }
   std::string file;
   if (!tarnwick::FollowSettingsLinks(path, &file)) return -1;
   // A link to nowhere stays one.
   return RewriteKey({file, file == path, key, line}) ? 0 : -1;
 } catch (const std::exception&) {
-  return RefuseFor(ENOMEM);
+  return FailWith(ENOMEM);
 }

@@ -2,12 +2,12 @@
 //
 // The file holds one `key="value"` pair a line. Blanks around the key and a value without quotes
 // are accepted when reading; lines that start with "#" and lines of any other shape are left alone.
-// When a key stands on several lines, the first one is meant. It is a regular file of at most 1 MiB:
+// When a key is on several lines, the first one is meant. It is a regular file of at most 1 MiB:
 // a directory, a FIFO or a device at its path is refused without a wait, unread and unwritten.
 //
-// libtarnwick brings a stand-alone version of both. They are weak symbols: a program that has
+// libtarnwick has a stand-alone version of both. They are weak symbols: a program that has
 // functions of these names in its own objects replaces them, whether it links the shared library or
-// the archive. Neither function is a cancellation point. Functions that stand in another archive
+// the archive. Neither function is a cancellation point. Functions of another archive
 // must be pulled into the program, with --whole-archive for example, because a linker does not look
 // for what it has already.
 #ifndef TARNWICK_PLATFORM_QLIBCFILE_H_
@@ -37,8 +37,8 @@ TARNWICK_API int QLIBCFileGetKeyValue(const char* path, const char* key, char* v
 // Arguments: `format` is the line to write, with two "%s" for key and value in this order and no
 //   other conversion but "%%", for example "%s=\"%s\"\n". The key is a word without blanks, "=" and
 //   "#", the value holds no line feed: the file could not be read back.
-// Results: 0 on success; -1 on failure (errno tells why; EFBIG when the old or the new text is longer
-//   than 1 MiB, ELOOP for a link that is not followed), with the file as it was.
+// Results: 0 on success; -1 on failure (errno tells why; EFBIG when the old or the new text is
+//   longer than 1 MiB, ELOOP for a link that is not followed), with the file as it was.
 // The file is replaced in one step (written beside the old one, synchronised, renamed over it), so
 //   a reader or a crash finds the old or the new text. Other keys, comments and unknown lines, the
 //   file's mode and its owner stay; when the owner cannot be kept, the call fails. The text is

@@ -16,7 +16,7 @@ bool IsTrustedOwner(uid_t owner) {
   return owner == 0 || owner == geteuid();
 }
 
-// The target of the link that `fd` stands for, and of no link that took its place meanwhile.
+// The target of the link that `fd` refers to, and of no link that took its place meanwhile.
 bool ReadLink(int fd, std::string* target) {
   char bytes[PATH_MAX];
   const ssize_t length = readlinkat(fd, "", bytes, sizeof(bytes));
@@ -27,7 +27,7 @@ bool ReadLink(int fd, std::string* target) {
 
 }  // namespace
 
-std::string FolderOf(const std::string& path) {
+std::string Dirname(const std::string& path) {
   const size_t slash = path.rfind('/');
   if (slash == std::string::npos) return ".";
   return slash == 0 ? "/" : path.substr(0, slash);
@@ -36,7 +36,7 @@ std::string FolderOf(const std::string& path) {
 bool FollowSettingsLinks(const char* path, std::string* file) {
   *file = path;
   for (int links = 0; links <= kMostLinks; ++links) {
-    const OwnedFd fd(open(file->c_str(), O_PATH | O_NOFOLLOW | O_CLOEXEC));
+    const UniqueFd fd(open(file->c_str(), O_PATH | O_NOFOLLOW | O_CLOEXEC));
     if (!fd.Valid()) return errno == ENOENT;
     struct stat attributes;
     if (fstat(fd.Get(), &attributes) != 0) return false;
@@ -44,18 +44,18 @@ bool FollowSettingsLinks(const char* path, std::string* file) {
     if (!IsTrustedOwner(attributes.st_uid)) break;
     std::string target;
     if (!ReadLink(fd.Get(), &target)) return false;
-    *file = target.front() == '/' ? target : FolderOf(*file) + "/" + target;
+    *file = target.front() == '/' ? target : Dirname(*file) + "/" + target;
   }
   errno = ELOOP;
   return false;
 }
 
-OwnedFd OpenSettings(const char* path, int flags, mode_t mode, struct stat* attributes) {
-  OwnedFd fd(open(path, flags | O_RDONLY | O_NONBLOCK | O_NOCTTY | O_CLOEXEC, mode));
-  if (!fd.Valid() || fstat(fd.Get(), attributes) != 0) return OwnedFd(-1);
+UniqueFd OpenSettings(const char* path, int flags, mode_t mode, struct stat* attributes) {
+  UniqueFd fd(open(path, flags | O_RDONLY | O_NONBLOCK | O_NOCTTY | O_CLOEXEC, mode));
+  if (!fd.Valid() || fstat(fd.Get(), attributes) != 0) return UniqueFd(-1);
   if (S_ISREG(attributes->st_mode)) return fd;
   errno = S_ISDIR(attributes->st_mode) ? EISDIR : EINVAL;
-  return OwnedFd(-1);
+  return UniqueFd(-1);
 }
 
 bool ReadSettings(int fd, std::string* text) {

@@ -15,13 +15,13 @@ namespace tarnwick {
 inline constexpr size_t kMostSettings = size_t{1} << 20;
 
 // The directory that holds the file at `path`.
-std::string FolderOf(const std::string& path);
+std::string Dirname(const std::string& path);
 
-// Where the file stands that is to be written for `path`: a symbolic link at the path is followed,
+// The path of the file that is to be written for `path`: a symbolic link at the path is followed,
 // and those that it leads to, when it belongs to root or to the caller (effective user).
 //
 // Results: true, with `path` itself when it is no link, and with the last link's target also when
-//   nothing stands there; false with errno otherwise, ELOOP for another user's link and for more
+//   nothing is there; false with errno otherwise, ELOOP for another user's link and for more
 //   than 40.
 bool FollowSettingsLinks(const char* path, std::string* file);
 
@@ -30,7 +30,7 @@ bool FollowSettingsLinks(const char* path, std::string* file);
 //
 // Results: not valid with errno on failure, EISDIR for a directory and EINVAL for a FIFO or a
 //   device, of which nothing is read.
-OwnedFd OpenSettings(const char* path, int flags, mode_t mode, struct stat* attributes);
+UniqueFd OpenSettings(const char* path, int flags, mode_t mode, struct stat* attributes);
 
 // Reads all of a file. Results: false with errno on failure, EFBIG beyond kMostSettings.
 bool ReadSettings(int fd, std::string* text);

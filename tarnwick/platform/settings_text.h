@@ -7,7 +7,7 @@
 
 namespace tarnwick {
 
-// Where a key's line stands in a text.
+// Where a key's line is in a text.
 struct SettingsLine {
   bool found = false;
   size_t begin = 0;        // first byte of the line

@@ -9,7 +9,7 @@
 namespace tarnwick {
 
 SignalGuard::SignalGuard(int signal) : m_signal(signal), m_pendingBefore(false) {
-  const ErrnoKeeper keeper;
+  const ErrnoSaver keeper;
   sigemptyset(&m_set);
   sigaddset(&m_set, signal);
   sigemptyset(&m_before);
@@ -19,13 +19,13 @@ SignalGuard::SignalGuard(int signal) : m_signal(signal), m_pendingBefore(false) 
 }
 
 SignalGuard::~SignalGuard() {
-  const ErrnoKeeper keeper;
+  const ErrnoSaver keeper;
   pthread_sigmask(SIG_SETMASK, &m_before, nullptr);
 }
 
-void SignalGuard::TakeBack() {
+void SignalGuard::DiscardPending() {
   if (m_pendingBefore) return;
-  const ErrnoKeeper keeper;
+  const ErrnoSaver keeper;
   const struct timespec now = {0, 0};
   while (sigtimedwait(&m_set, nullptr, &now) == -1 && errno == EINTR) {
   }

@@ -18,7 +18,7 @@ class SignalGuard {
   SignalGuard& operator=(const SignalGuard&) = delete;
 
   // Call it after each failed write in the guard's scope: takes back what the write raised.
-  void TakeBack();
+  void DiscardPending();
 
  private:
   bool IsPending() const;

@@ -15,25 +15,25 @@ namespace tarnwick {
 
 // Puts errno back as it was: for code that runs between a failing call and the caller who reads
 // errno.
-class ErrnoKeeper {
+class ErrnoSaver {
  public:
-  ErrnoKeeper() : m_errno(errno) {}
-  ~ErrnoKeeper() { errno = m_errno; }
-  ErrnoKeeper(const ErrnoKeeper&) = delete;
-  ErrnoKeeper& operator=(const ErrnoKeeper&) = delete;
+  ErrnoSaver() : m_errno(errno) {}
+  ~ErrnoSaver() { errno = m_errno; }
+  ErrnoSaver(const ErrnoSaver&) = delete;
+  ErrnoSaver& operator=(const ErrnoSaver&) = delete;
 
  private:
   int m_errno;
 };
 
 // A file descriptor, closed with errno kept.
-class OwnedFd {
+class UniqueFd {
  public:
-  explicit OwnedFd(int fd) : m_fd(fd) {}
-  OwnedFd(OwnedFd&& other) noexcept : m_fd(other.Release()) {}
-  OwnedFd& operator=(OwnedFd&&) = delete;
-  ~OwnedFd() {
-    const ErrnoKeeper keeper;
+  explicit UniqueFd(int fd) : m_fd(fd) {}
+  UniqueFd(UniqueFd&& other) noexcept : m_fd(other.Release()) {}
+  UniqueFd& operator=(UniqueFd&&) = delete;
+  ~UniqueFd() {
+    const ErrnoSaver keeper;
     const NoCancel no_cancel;
     if (m_fd >= 0) close(m_fd);
   }
@@ -55,7 +55,7 @@ struct FreeDeleter {
 };
 // Memory from malloc.
 template <typename T>
-using OwnedMemory = std::unique_ptr<T, FreeDeleter>;
+using UniqueMalloc = std::unique_ptr<T, FreeDeleter>;
 
 struct FileCloser {
   void operator()(FILE* file) const {
@@ -63,7 +63,7 @@ struct FileCloser {
     std::fclose(file);
   }
 };
-using OwnedFile = std::unique_ptr<FILE, FileCloser>;
+using UniqueFile = std::unique_ptr<FILE, FileCloser>;
 
 }  // namespace tarnwick
 

@@ -13,8 +13,8 @@ bool g_stays = false;
 bool g_is_ending = false;
 
 // Among the names that the program was started with are the library's. glibc adds the names of a
-// library that is opened later after its constructors have run, if at all (2.31 to 2.41). A function
-// is asked for: of a variable the program may have a copy.
+// library that is opened later after its constructors have run, if at all (2.31 to 2.41). A
+// function is asked for: of a variable the program may have a copy.
 bool CameWithTheProgram() {
   void* const program = dlopen(nullptr, RTLD_LAZY | RTLD_NOLOAD);
   if (program == nullptr) return false;

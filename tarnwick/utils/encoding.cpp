@@ -30,10 +30,10 @@ constexpr Encoded Escape(unsigned char byte) {
 }
 
 // In every locale: letters, digits and more marks than the unreserved ones of RFC 3986, 2.3. Tabs
-// and line ends go out as blanks. Both kept as they are: callers may depend on them; pinned by the
+// and CR and LF go out as blanks. Both kept as they are: callers may depend on them; pinned by the
 // tests of UrlEncode. Beyond ASCII the locale has letters.
-struct EncodedAscii {
-  constexpr EncodedAscii() {
+struct EscapeTable {
+  constexpr EscapeTable() {
     for (int c = 0; c < 256; ++c) of[c] = Escape(static_cast<unsigned char>(c));
     for (int c = '0'; c <= 'z'; ++c) {
       if (c <= '9' || (c >= 'A' && c <= 'Z') || c >= 'a') of[c] = Plain(static_cast<char>(c));
@@ -47,15 +47,15 @@ struct EncodedAscii {
   Encoded of[256] = {};
 };
 
-constexpr EncodedAscii kUsual;
+constexpr EscapeTable kUsual;
 
-Encoded EncodedInLocale(unsigned char byte) {
+Encoded EncodeByLocale(unsigned char byte) {
   if (isalnum(byte) != 0) return Plain(static_cast<char>(byte));
   return Escape(isspace(byte) != 0 ? ' ' : byte);
 }
 
 // Fills `own` with `usual`, and with what `keep` holds but for blanks and their like.
-void KeepToo(const std::string& keep, const Encoded (&usual)[256], Encoded (*own)[256]) {
+void AddKept(const std::string& keep, const Encoded (&usual)[256], Encoded (*own)[256]) {
   std::copy(std::begin(usual), std::end(usual), *own);
   for (const char c : keep) {
     const auto byte = static_cast<unsigned char>(c);
@@ -68,10 +68,10 @@ constexpr size_t kBase64Piece = size_t{3} << 28;
 
 }  // namespace
 
-// A table, and no decision a byte, which the processor would guess wrong at every other escape.
+// A table in place of a branch per byte.
 std::string UrlEncode(std::string text, std::string keep) {
   Encoded own[256];
-  if (!keep.empty()) KeepToo(keep, kUsual.of, &own);
+  if (!keep.empty()) AddKept(keep, kUsual.of, &own);
   const Encoded* const encoded = keep.empty() ? kUsual.of : own;
   if (text.size() > text.max_size() / 3 - 1) throw std::bad_alloc();
   // A byte more than three for each, because the lengths are copied along.
@@ -81,7 +81,7 @@ std::string UrlEncode(std::string text, std::string keep) {
   for (const char c : text) {
     const Encoded* code = &encoded[static_cast<unsigned char>(c)];
     if (code->length == 0) {
-      inLocale = EncodedInLocale(static_cast<unsigned char>(c));
+      inLocale = EncodeByLocale(static_cast<unsigned char>(c));
       code = &inLocale;
     }
     std::memcpy(out, code, sizeof(*code));

@@ -7,7 +7,7 @@
 
 #include "tarnwick/utils/utils.h"
 
-// Moves what stands between two of them at once: replies of megabytes have lines of some dozen
+// Moves what is between two of them at once: responses of megabytes have lines of some dozen
 // bytes.
 void RemoveChar(std::string& text, char ch) {
   char* out = &text[0];

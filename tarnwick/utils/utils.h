@@ -1,8 +1,8 @@
 // Small helpers that the daemons share: pacing, text and encodings, whole-buffer writes, threads.
 //
 // Unless a declaration says otherwise, the functions are safe from any thread and do not log. Those
-// that return std::string throw std::bad_alloc when memory runs out. WriteFd and DelayTimer::Delay are
-// cancellation points (pthread_cancel); nothing is lost there but what is not yet written.
+// that return std::string throw std::bad_alloc when memory runs out. WriteFd and DelayTimer::Delay
+// are cancellation points (pthread_cancel); nothing is lost there but what is not yet written.
 #ifndef TARNWICK_UTILS_UTILS_H_
 #define TARNWICK_UTILS_UTILS_H_
 
@@ -61,7 +61,7 @@ class TARNWICK_API TARNWICK_HOLDS_TIME DelayTimer {
 
 // Percent-encodes `text`: ASCII letters and digits, the characters _ ~ ( ) * , - . and those of
 // `keep` stay; white space becomes %20, whichever it is, even when `keep` holds it; any other byte
-// becomes % and two upper-case hex digits. What counts as letter and as space follows the C locale
+// becomes % and two upper-case hex digits. Which bytes are letters and spaces follows the C locale
 // that the process has set.
 TARNWICK_API std::string UrlEncode(std::string text, std::string keep);
 
@@ -78,7 +78,7 @@ TARNWICK_API std::string TrimString(std::string text, const char* set);
 // Results: `dest`.
 TARNWICK_API char* StrNCopy(char* dest, const char* src, size_t size);
 
-// Encodes the zero-terminated `text` as base64 (RFC 4648, section 4; padded, no line ends).
+// Encodes the zero-terminated `text` as base64 (RFC 4648, section 4; padded, without line breaks).
 // Results: a new zero-terminated buffer, which the caller frees with `free`; null when memory runs
 //   out or `text` is null.
 TARNWICK_API char* Base64Encode(const char* text);
@@ -90,8 +90,8 @@ TARNWICK_API std::string Md5ToHex(const unsigned char* digest);
 // `value` in decimal.
 TARNWICK_API std::string IntToString(int64_t value);
 
-// The UTC time `microseconds` after the epoch as, for example, 20240305T140309.417Z. Where time_t has
-// 32 bits, the calendar starts again in 1901 behind 20380119T031407.999Z.
+// The UTC time `microseconds` after the epoch as, for example, 20240305T140309.417Z. Where time_t
+// has 32 bits, the calendar starts again in 1901 after 20380119T031407.999Z.
 TARNWICK_API std::string FormatUtcTimeStamp(int64_t microseconds);
 
 // Writes the `len` bytes at `buf` to the descriptor, which may be non-blocking.

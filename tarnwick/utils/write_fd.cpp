@@ -33,7 +33,7 @@ int WriteFd(int fd, const void* buf, int len) {
     } else if (errno == EAGAIN || errno == EINTR) {
       timer.Delay();
     } else {
-      guard.TakeBack();
+      guard.DiscardPending();
       TW_LOG(LOG_CATEG_UTILS, LOG_LEVEL_NOTICE, "Write fd[%d] error[%d]\n", fd, errno);
       return written;
     }

@@ -130,7 +130,7 @@ Outcome CurlToText(int port) {
 // The text is what the file holds.
 Outcome CurlToFile(int port) {
   ClientProbe client(port);
-  const OwnedFile file(tmpfile());
+  const UniqueFile file(tmpfile());
   client.SetCurlRespFile(file.get());
   const int result = client.SendRequestByCurl(HTTP_METHOD_GET, true, 10);
   std::string content(static_cast<size_t>(ftell(file.get())), '\0');

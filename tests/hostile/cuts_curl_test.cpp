@@ -23,7 +23,7 @@ Outcome CurlPost(ClientProbe& client) {
 }
 
 Outcome CurlToFile(ClientProbe& client) {
-  const OwnedFile file(tmpfile());
+  const UniqueFile file(tmpfile());
   client.SetCurlRespFile(file.get());
   const int result = client.SendRequestByCurl(HTTP_METHOD_GET, false, 5);
   std::string content(static_cast<size_t>(ftell(file.get())), '\0');

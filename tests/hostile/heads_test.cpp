@@ -261,7 +261,7 @@ Outcome CurlGet(int port) {
 
 Outcome CurlGetToFile(int port) {
   ClientProbe client(port);
-  const OwnedFile file(tmpfile());
+  const UniqueFile file(tmpfile());
   client.SetCurlRespFile(file.get());
   const int result = client.SendRequestByCurl(HTTP_METHOD_GET, true, 20);
   return OutcomeOf(client, result, ftell(file.get()) < (1 << 20) ? "a short file" : "a long file");

@@ -693,7 +693,8 @@ TrafficCase Ends(const std::string& name, const std::string& bytes, const Outcom
   return Serves(name, TLS1_3_VERSION, reply, expected);
 }
 
-// The ends of a connection. An end is an end, with a close notice and without, also inside a record.
+// The ends of a connection. An end is an end, with a close notice and without, also inside a
+// record.
 const std::vector<TrafficCase> kEnds = {
     Serves(
         "WithoutAWord", TLS1_3_VERSION, [](const SharedTls&) { return Script{}; }, kUnread),

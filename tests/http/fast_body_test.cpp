@@ -157,17 +157,17 @@ TEST(FastBody, OfAWholeChunkIsWhatReadsGiveOrNothing) {
     std::string bytes;
     for (size_t words = random() % 8; words > 0; --words) bytes += kWords[random() % 14];
     SCOPED_TRACE(testing::PrintToString(bytes));
-    EXPECT_EQ(WholeChunk(bytes), PlainWholeChunk(bytes));
-    if (!WholeChunk(bytes).empty()) ++whole;
+    EXPECT_EQ(FirstCompleteChunk(bytes), PlainWholeChunk(bytes));
+    if (!FirstCompleteChunk(bytes).empty()) ++whole;
   }
   EXPECT_GT(whole, 1000u);  // else nothing was compared
 }
 
 TEST(FastBody, LeavesLongSizeLinesToTheLineReader) {
   const std::string chunk = "\r\ndata\r\n";
-  EXPECT_EQ(WholeChunk("4" + std::string(254, ';') + chunk), "data");
-  EXPECT_EQ(WholeChunk("4" + std::string(255, ';') + chunk), "");
-  EXPECT_EQ(WholeChunk(std::string(255, '0') + "4" + chunk), "");
+  EXPECT_EQ(FirstCompleteChunk("4" + std::string(254, ';') + chunk), "data");
+  EXPECT_EQ(FirstCompleteChunk("4" + std::string(255, ';') + chunk), "");
+  EXPECT_EQ(FirstCompleteChunk(std::string(255, '0') + "4" + chunk), "");
 }
 
 // The mapping's flags; empty where the system does not tell.

@@ -153,18 +153,18 @@ TEST(ParseHeaderLine, AnyBytesAreTaken) {
   }
 }
 
-TEST(CookieOf, TheFirstSemicolonEndsTheCookieAndStays) {
-  EXPECT_EQ(CookieOf(" id=42; Path=/; Secure"), "id=42;");
-  EXPECT_EQ(CookieOf("id=42;"), "id=42;");
-  EXPECT_EQ(CookieOf("  ; x"), ";");
+TEST(ParseCookie, TheFirstSemicolonEndsTheCookieAndStays) {
+  EXPECT_EQ(ParseCookie(" id=42; Path=/; Secure"), "id=42;");
+  EXPECT_EQ(ParseCookie("id=42;"), "id=42;");
+  EXPECT_EQ(ParseCookie("  ; x"), ";");
 }
 
-TEST(CookieOf, SpacesAreTrimmedAndTabsAreNot) {
-  EXPECT_EQ(CookieOf("  a b ;"), "a b ;");
-  EXPECT_EQ(CookieOf("\ta;"), "\ta;");
+TEST(ParseCookie, SpacesAreTrimmedAndTabsAreNot) {
+  EXPECT_EQ(ParseCookie("  a b ;"), "a b ;");
+  EXPECT_EQ(ParseCookie("\ta;"), "\ta;");
 }
 
-TEST(CookieOf, WithoutASemicolonThereIsNoCookie) {
-  EXPECT_EQ(CookieOf(" id=42"), "");
-  EXPECT_EQ(CookieOf(""), "");
+TEST(ParseCookie, WithoutASemicolonThereIsNoCookie) {
+  EXPECT_EQ(ParseCookie(" id=42"), "");
+  EXPECT_EQ(ParseCookie(""), "");
 }

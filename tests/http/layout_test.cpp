@@ -1,6 +1,6 @@
-// Where the fields of the exported objects stand. Programs hold clients by value and derive from the
-// sockets, so a field that moved would be read at its old place. Nothing here runs first: a wrong
-// layout does not compile, on whichever architecture.
+// Where the fields of the exported objects stand. Programs hold clients by value and derive from
+// the sockets, so a field that moved would be read at its old place. Nothing here runs first: a
+// wrong layout does not compile, on whichever architecture.
 #include <gtest/gtest.h>
 
 #include <cstddef>

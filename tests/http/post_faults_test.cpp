@@ -55,8 +55,8 @@ struct OwnedDoc {
   xmlDoc* doc = nullptr;
 };
 
-// A server in a process of its own, so that its descriptors are not this one's: answers each request
-// with `reply` and waits for the client to close.
+// A server in a process of its own, so that its descriptors are not this one's: answers each
+// request with `reply` and waits for the client to close.
 class RequestServer {
  public:
   explicit RequestServer(const std::string& reply)

@@ -1,5 +1,6 @@
 // Requests through libcurl answer by their result alone. What the last response over the socket has
-// left in the client stays: daemons mix both ways on one object and read a status or a cookie later.
+// left in the client stays: daemons mix both ways on one object and read a status or a cookie
+// later.
 #include <functional>
 
 #include "tests/http/curl_test_util.h"

@@ -1,5 +1,5 @@
-// A body over a socket that reads directly has nothing of what an earlier connection had read ahead:
-// such bytes stay in the socket, and nobody looks at them in that mode.
+// A body over a socket that reads directly has nothing of what an earlier connection had read
+// ahead: such bytes stay in the socket, and nobody looks at them in that mode.
 #include "tests/http/http_test_util.h"
 #include "tests/net/net_test_util.h"
 

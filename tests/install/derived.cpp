@@ -1,5 +1,5 @@
-// A program of somebody who compiles without RTTI, without exceptions, or without both: it derives from
-// the sockets, logs, and asks a JSON service.
+// A program of somebody who compiles without RTTI, without exceptions, or without both: it derives
+// from the sockets, logs, and asks a JSON service.
 #include <cstring>
 #include <memory>
 

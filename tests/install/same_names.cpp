@@ -19,8 +19,8 @@ void Called() {
   if (!is_own_call) ++calls_by_the_library;
 }
 
-// In classes of headers alone: every program that uses one has copies of its functions, of which the
-// linker takes the first.
+// In classes of headers alone: every program that uses one has copies of its functions, of which
+// the linker takes the first.
 class FileLock {
  public:
   explicit FileLock(int) { Called(); }
@@ -34,16 +34,16 @@ class NoCancel {
   ~NoCancel() { Called(); }
 };
 
-class OwnedFd {
+class UniqueFd {
  public:
-  explicit OwnedFd(int) { Called(); }
-  ~OwnedFd() { Called(); }
+  explicit UniqueFd(int) { Called(); }
+  ~UniqueFd() { Called(); }
 };
 
-class ErrnoKeeper {
+class ErrnoSaver {
  public:
-  ErrnoKeeper() { Called(); }
-  ~ErrnoKeeper() { Called(); }
+  ErrnoSaver() { Called(); }
+  ~ErrnoSaver() { Called(); }
 };
 
 // With functions of their own object file: a second definition would be an error of the linker.
@@ -67,24 +67,24 @@ FdSet::FdSet(int) {
   Called();
 }
 
-class ForkHold {
+class ForkGuard {
  public:
   enum Kind { kDescriptor };
-  explicit ForkHold(Kind kind);
-  ~ForkHold();
+  explicit ForkGuard(Kind kind);
+  ~ForkGuard();
 };
-ForkHold::ForkHold(Kind) {
+ForkGuard::ForkGuard(Kind) {
   Called();
 }
-ForkHold::~ForkHold() {
+ForkGuard::~ForkGuard() {
   Called();
 }
 
-class UninheritedFile {
+class ForkClosedFile {
  public:
-  UninheritedFile(const char* path, int flags, unsigned mode);
+  ForkClosedFile(const char* path, int flags, unsigned mode);
 };
-UninheritedFile::UninheritedFile(const char*, int, unsigned) {
+ForkClosedFile::ForkClosedFile(const char*, int, unsigned) {
   Called();
 }
 
@@ -116,12 +116,12 @@ namespace {
 void UseOwnNames() {
   const FileLock lock(0);
   const NoCancel no_cancel;
-  const OwnedFd fd(-1);
-  const ErrnoKeeper keeper;
+  const UniqueFd fd(-1);
+  const ErrnoSaver keeper;
   const SignalGuard guard(0);
   const FdSet set(0);
-  const ForkHold hold(ForkHold::kDescriptor);
-  const UninheritedFile file("", 0, 0);
+  const ForkGuard hold(ForkGuard::kDescriptor);
+  const ForkClosedFile file("", 0, 0);
   CurlRequest request("own");
   char value[8];
   Expect(request.Perform() == 1, "the daemon's own request runs");

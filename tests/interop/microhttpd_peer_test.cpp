@@ -1,4 +1,5 @@
-// GNU libmicrohttpd: Basic, Digest with MD5 and with SHA-256, chunks, and connections that it keeps.
+// GNU libmicrohttpd: Basic, Digest with MD5 and with SHA-256, chunks, and connections that it
+// keeps.
 #include <gtest/gtest.h>
 
 #include "tests/interop/peer_case.h"

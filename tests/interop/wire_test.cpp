@@ -153,8 +153,8 @@ const std::map<std::string, std::string>& Blocks() {
   return blocks;
 }
 
-// Bytes as the document shows them: line ends in letters, each at the end of its line, and names for
-// what differs from run to run.
+// Bytes as the document shows them: line ends in letters, each at the end of its line, and names
+// for what differs from run to run.
 std::string Shown(const std::string& bytes, int port) {
   std::string text;
   for (const char c : bytes) text += c == '\r' ? "\\r" : c == '\n' ? "\\n\n" : std::string(1, c);

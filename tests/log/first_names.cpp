@@ -1,5 +1,5 @@
-// The first calls of Enum2String in a process: one that runs out of memory, then eight at once, which
-// signals interrupt while one of them builds the names.
+// The first calls of Enum2String in a process: one that runs out of memory, then eight at once,
+// which signals interrupt while one of them builds the names.
 #include <pthread.h>
 #include <signal.h>
 #include <unistd.h>
@@ -74,7 +74,7 @@ int main() {
       errno = EDOM;
       Enum2String(LOG_CATEG_HTTP);
       errno_kept += errno == EDOM;
-      map = &NamesOf<LOG_CATEG>();
+      map = &NameMap<LOG_CATEG>();
     });
   }
   may_allocate = false;
@@ -83,7 +83,7 @@ int main() {
   may_allocate = true;
   for (std::thread& thread : threads) thread.join();
   const std::set<const void*> different(maps.begin(), maps.end());
-  printf("%zu entries, %zu map, errno kept by %d\n", NamesOf<LOG_CATEG>().size(), different.size(),
+  printf("%zu entries, %zu map, errno kept by %d\n", NameMap<LOG_CATEG>().size(), different.size(),
          errno_kept.load());
   return 0;
 }

@@ -27,7 +27,7 @@ TEST(Enum2String, Level3IsNoticeAndLevelsOutsideAreUnknownWithoutBecomingEntries
   EXPECT_STREQ(Enum2String<LOG_LEVEL>(Level(3)), "notice");
   EXPECT_STREQ(Enum2String<LOG_LEVEL>(Level(8)), "unknown");
   EXPECT_STREQ(Enum2String<LOG_LEVEL>(Level(-1)), "unknown");
-  EXPECT_EQ(NamesOf<LOG_LEVEL>().size(), 8u);
+  EXPECT_EQ(NameMap<LOG_LEVEL>().size(), 8u);
 }
 
 TEST(Enum2String, Categories26And57And66AreTheLibrarysOwnAnd74IsUnknown) {
@@ -35,7 +35,7 @@ TEST(Enum2String, Categories26And57And66AreTheLibrarysOwnAnd74IsUnknown) {
   EXPECT_STREQ(Enum2String<LOG_CATEG>(Categ(57)), "socket");
   EXPECT_STREQ(Enum2String<LOG_CATEG>(Categ(66)), "utils");
   EXPECT_STREQ(Enum2String<LOG_CATEG>(Categ(74)), "unknown");
-  EXPECT_EQ(NamesOf<LOG_CATEG>().size(), 74u);
+  EXPECT_EQ(NameMap<LOG_CATEG>().size(), 74u);
 }
 
 // The program starts threads that make the process's first call together, after an attempt that ran
@@ -59,8 +59,8 @@ TEST(Enum2String, ValuesFarOutsideAreUnknown) {
     EXPECT_STREQ(Enum2String(Categ(value)), "unknown");
     EXPECT_STREQ(Enum2String(Level(value)), "unknown");
   }
-  EXPECT_EQ(NamesOf<LOG_CATEG>().size(), 74u);
-  EXPECT_EQ(NamesOf<LOG_LEVEL>().size(), 8u);
+  EXPECT_EQ(NameMap<LOG_CATEG>().size(), 74u);
+  EXPECT_EQ(NameMap<LOG_LEVEL>().size(), 8u);
 }
 
 TEST(Enum2String, ANameStaysWhereItIs) {
@@ -68,7 +68,7 @@ TEST(Enum2String, ANameStaysWhereItIs) {
 }
 
 TEST(Enum2String, AnEmptyMapGivesUnknown) {
-  EXPECT_STREQ(NameIn(std::map<LOG_LEVEL, const char*>(), Level(3)), "unknown");
+  EXPECT_STREQ(FindName(std::map<LOG_LEVEL, const char*>(), Level(3)), "unknown");
 }
 
 TEST(LogCateg, TagsAreShortLowerCaseWordsWithoutDoubles) {

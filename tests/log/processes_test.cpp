@@ -20,7 +20,8 @@ constexpr int kProcesses = 8;
 constexpr int kThreads = 2;
 constexpr int kLines = 60;
 
-// The message of one line: its writer and number, and up to 20 KB of a letter that tells the writer.
+// The message of one line: its writer and number, and up to 20 KB of a letter that tells the
+// writer.
 std::string MessageOf(int writer, int number) {
   const int length = (writer * 7919 + number * 104729) % 20000;
   return std::to_string(writer) + "/" + std::to_string(number) + " " +

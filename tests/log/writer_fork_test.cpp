@@ -133,8 +133,8 @@ TEST_F(WriterFork, AChildThatEndsWritesNothingOfItsParentsLine) {
   EXPECT_EQ(ParseLog(ReadFile(kMainLog)).size(), 1u);
 }
 
-// The C library's lock of the time zone would stay held in the child, whose own line would then have
-// no time.
+// The C library's lock of the time zone would stay held in the child, whose own line would then
+// have no time.
 TEST_F(WriterFork, AForkWaitsWhileALineReadsTheTimeZone) {
   const Flag in_line;
   const Flag forked;
@@ -216,7 +216,7 @@ TEST_F(WriterFork, AChildOfAThreadInTheSystemLogDoesNotReport) {
   const Flag stuck;
   const Flag go_on;
   std::thread holder([&] {
-    const ForkHold hold(ForkHold::kLibraryLock);  // as a report has it
+    const ForkGuard hold(ForkGuard::kLibraryLock);  // as a report has it
     stuck.Set();
     go_on.Wait();
   });

@@ -1,5 +1,5 @@
-// The beginning of a line is whole whatever the lengths of its names: of each length around those of
-// the writer's own buffers, and in each combination.
+// The beginning of a line is whole whatever the lengths of its names: of each length around those
+// of the writer's own buffers, and in each combination.
 #include <gtest/gtest.h>
 #include <unistd.h>
 

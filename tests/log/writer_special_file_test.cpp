@@ -85,7 +85,7 @@ TEST_P(SpecialLog, AFifoWithoutAReaderIsNotWaitedFor) {
 
 TEST_P(SpecialLog, AFifoWithAReaderIsNotWritten) {
   ASSERT_EQ(mkfifo(Path(), 0600), 0);
-  const OwnedFd reader(open(Path(), O_RDONLY | O_NONBLOCK | O_CLOEXEC));
+  const UniqueFd reader(open(Path(), O_RDONLY | O_NONBLOCK | O_CLOEXEC));
   ASSERT_TRUE(reader.Valid());
   ExpectRefused(ENXIO);
   char byte = 0;
@@ -94,7 +94,7 @@ TEST_P(SpecialLog, AFifoWithAReaderIsNotWritten) {
 
 TEST_P(SpecialLog, AFullFifoIsNotWaitedFor) {
   ASSERT_EQ(mkfifo(Path(), 0600), 0);
-  const OwnedFd pipe(open(Path(), O_RDWR | O_NONBLOCK | O_CLOEXEC));
+  const UniqueFd pipe(open(Path(), O_RDWR | O_NONBLOCK | O_CLOEXEC));
   const std::string page(4096, 'x');
   while (write(pipe.Get(), page.data(), page.size()) > 0) {
   }
@@ -110,7 +110,7 @@ TEST_P(SpecialLog, ASocketIsRefused) {
   sockaddr_un address = {};
   address.sun_family = AF_UNIX;
   std::string(Path()).copy(address.sun_path, sizeof(address.sun_path) - 1);
-  const OwnedFd socket_fd(socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
+  const UniqueFd socket_fd(socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
   ASSERT_EQ(bind(socket_fd.Get(), reinterpret_cast<sockaddr*>(&address), sizeof(address)), 0);
   ExpectRefused(ENXIO);
 }
@@ -149,7 +149,7 @@ class Terminals {
 
   TempDir folder_;
   bool mounted_;
-  OwnedFd leader_;
+  UniqueFd leader_;
 };
 
 // In a session of its own: the first terminal that a process of it opens without O_NOCTTY becomes
@@ -181,7 +181,7 @@ TEST_P(SpecialLog, ALinkToARegularFileIsWritten) {
 // Opens the log and leases it; then tells through `ready` and gives the lease back when the kernel
 // says that somebody wants to write.
 int HoldALease(const char* path, int ready) {
-  const OwnedFd fd(open(path, O_RDONLY | O_CLOEXEC));
+  const UniqueFd fd(open(path, O_RDONLY | O_CLOEXEC));
   sigset_t io;
   sigemptyset(&io);
   sigaddset(&io, SIGIO);
@@ -198,8 +198,8 @@ TEST_P(SpecialLog, ALeasedFileIsWaitedForAndWritten) {
   WriteInChild();
   int ready[2];
   ASSERT_EQ(pipe2(ready, O_CLOEXEC), 0);
-  const OwnedFd told(ready[0]);
-  const OwnedFd tell(ready[1]);
+  const UniqueFd told(ready[0]);
+  const UniqueFd tell(ready[1]);
   Child holder([&] { return HoldALease(Path(), tell.Get()); });
   char leased = 'n';
   ASSERT_EQ(read(told.Get(), &leased, 1), 1);

@@ -21,13 +21,13 @@ int OpenFile(const TempDir& folder) {
 }
 
 bool CanLock(const TempDir& folder) {
-  const OwnedFd other(OpenFile(folder));
+  const UniqueFd other(OpenFile(folder));
   return flock(other.Get(), LOCK_EX | LOCK_NB) == 0;
 }
 
 TEST(FileLock, ExcludesOthersUntilTheScopeEnds) {
   TempDir folder;
-  const OwnedFd fd(OpenFile(folder));
+  const UniqueFd fd(OpenFile(folder));
   {
     const FileLock lock(fd.Get());
     EXPECT_TRUE(lock.Held());
@@ -38,7 +38,7 @@ TEST(FileLock, ExcludesOthersUntilTheScopeEnds) {
 
 TEST(FileLock, AnInterruptedWaitGoesOn) {
   TempDir folder;
-  const OwnedFd fd(OpenFile(folder));
+  const UniqueFd fd(OpenFile(folder));
   Faults faults;
   faults.FailRange(Call::kFlock, 1, 3, EINTR);
   const FileLock lock(fd.Get());
@@ -48,7 +48,7 @@ TEST(FileLock, AnInterruptedWaitGoesOn) {
 
 TEST(FileLock, ALockThatCannotBeHadIsNotReleased) {
   TempDir folder;
-  const OwnedFd fd(OpenFile(folder));
+  const UniqueFd fd(OpenFile(folder));
   Faults faults;
   faults.FailNth(Call::kFlock, 1, ENOLCK);
   {
@@ -60,7 +60,7 @@ TEST(FileLock, ALockThatCannotBeHadIsNotReleased) {
 
 TEST(FileLock, ReleasingLeavesErrno) {
   TempDir folder;
-  const OwnedFd fd(OpenFile(folder));
+  const UniqueFd fd(OpenFile(folder));
   FileLock lock(fd.Get());
   Faults faults;
   faults.FailNth(Call::kFlock, 1, ENOLCK);
@@ -69,15 +69,15 @@ TEST(FileLock, ReleasingLeavesErrno) {
   EXPECT_EQ(errno, ETIMEDOUT);
 }
 
-TEST(OwnedFd, ClosesOnceAndLeavesErrno) {
+TEST(UniqueFd, ClosesOnceAndLeavesErrno) {
   TempDir folder;
   const int fd = OpenFile(folder);
   Faults faults;
   faults.FailNth(Call::kClose, 1, EIO);
   errno = ETIMEDOUT;
   {
-    OwnedFd first(fd);
-    const OwnedFd second(std::move(first));
+    UniqueFd first(fd);
+    const UniqueFd second(std::move(first));
     EXPECT_TRUE(second.Valid());
   }
   EXPECT_EQ(faults.Count(Call::kClose), 1);
@@ -85,9 +85,9 @@ TEST(OwnedFd, ClosesOnceAndLeavesErrno) {
   close(fd);  // the failed close was not a real one
 }
 
-TEST(OwnedFd, NoDescriptorIsNotClosed) {
+TEST(UniqueFd, NoDescriptorIsNotClosed) {
   Faults faults;
-  { const OwnedFd none(-1); }
+  { const UniqueFd none(-1); }
   EXPECT_EQ(faults.Count(Call::kClose), 0);
 }
 

@@ -33,14 +33,14 @@ int OpenIn(const std::string& folder) {
   return count;
 }
 
-TEST(ForkHold, AForkInAnotherThreadWaitsForItsEnd) {
+TEST(ForkGuard, AForkInAnotherThreadWaitsForItsEnd) {
   const Flag held;
   const Flag forked;
   const Flag child_ended;
   bool forked_meanwhile = false;
   std::thread holder([&] {
     {
-      const ForkHold hold(ForkHold::kDescriptor);
+      const ForkGuard hold(ForkGuard::kDescriptor);
       held.Set();
       forked_meanwhile = forked.Wait(std::chrono::milliseconds(20));
     }
@@ -55,10 +55,10 @@ TEST(ForkHold, AForkInAnotherThreadWaitsForItsEnd) {
   EXPECT_FALSE(forked_meanwhile);
 }
 
-TEST(ForkHold, AThreadMayForkInItsOwnAndTheChildMayHoldAgain) {
-  const ForkHold hold(ForkHold::kDescriptor);
+TEST(ForkGuard, AThreadMayForkInItsOwnAndTheChildMayHoldAgain) {
+  const ForkGuard hold(ForkGuard::kDescriptor);
   const ChildResult result = RunInChild([] {
-    const ForkHold again(ForkHold::kLibraryLock);
+    const ForkGuard again(ForkGuard::kLibraryLock);
     return RunInChild([] { return 0; }).code;
   });
   EXPECT_EQ(result.code, 0);
@@ -66,53 +66,53 @@ TEST(ForkHold, AThreadMayForkInItsOwnAndTheChildMayHoldAgain) {
 
 // Forks while another thread is in a hold that lasts until the child has ended. Results: the
 // child's, of which the exit code is what it sees of lost locks.
-ChildResult ForkBesideALongHold(ForkHold::Kind kind) {
+ChildResult ForkBesideALongHold(ForkGuard::Kind kind) {
   const Flag held;
   const Flag child_ended;
   std::thread holder([&] {
-    const ForkHold hold(kind);
+    const ForkGuard hold(kind);
     held.Set();
     child_ended.Wait();
   });
   EXPECT_TRUE(held.Wait());
   const ChildResult result = RunInChild([] {
-    const ForkHold hold(ForkHold::kDescriptor);
-    return RunInChild([] { return ForkHold::LocksAreLost() ? 1 : 0; }).code;
+    const ForkGuard hold(ForkGuard::kDescriptor);
+    return RunInChild([] { return ForkGuard::LocksAreLost() ? 1 : 0; }).code;
   });
   child_ended.Set();
   holder.join();
   return result;
 }
 
-TEST(ForkHold, AForkDoesNotWaitForTheEndOfALongOne) {
-  const ChildResult result = ForkBesideALongHold(ForkHold::kDescriptor);
+TEST(ForkGuard, AForkDoesNotWaitForTheEndOfALongOne) {
+  const ChildResult result = ForkBesideALongHold(ForkGuard::kDescriptor);
   EXPECT_FALSE(result.timed_out);
   EXPECT_EQ(result.code, 0);
 }
 
-TEST(ForkHold, AChildOfALongOneKnowsThatLocksAreLost) {
-  EXPECT_EQ(ForkBesideALongHold(ForkHold::kLibraryLock).code, 1);
-  EXPECT_FALSE(ForkHold::LocksAreLost());
+TEST(ForkGuard, AChildOfALongOneKnowsThatLocksAreLost) {
+  EXPECT_EQ(ForkBesideALongHold(ForkGuard::kLibraryLock).code, 1);
+  EXPECT_FALSE(ForkGuard::LocksAreLost());
 }
 
-TEST(ForkHold, AChildOfItsOwnThreadKnowsThatLocksAreLost) {
-  const ForkHold hold(ForkHold::kLibraryLock);
-  EXPECT_EQ(RunInChild([] { return ForkHold::LocksAreLost() ? 1 : 0; }).code, 1);
+TEST(ForkGuard, AChildOfItsOwnThreadKnowsThatLocksAreLost) {
+  const ForkGuard hold(ForkGuard::kLibraryLock);
+  EXPECT_EQ(RunInChild([] { return ForkGuard::LocksAreLost() ? 1 : 0; }).code, 1);
 }
 
-TEST(ForkHold, HoldsDoNotWaitForEachOther) {
-  const ForkHold hold(ForkHold::kDescriptor);
-  std::thread([] { const ForkHold other(ForkHold::kDescriptor); }).join();
+TEST(ForkGuard, HoldsDoNotWaitForEachOther) {
+  const ForkGuard hold(ForkGuard::kDescriptor);
+  std::thread([] { const ForkGuard other(ForkGuard::kDescriptor); }).join();
 }
 
-TEST(ForkHold, ThreadsMayForkAndHoldAtOnce) {
+TEST(ForkGuard, ThreadsMayForkAndHoldAtOnce) {
   std::vector<std::thread> threads;
   std::atomic<int> good{0};
   for (int i = 0; i < 4; ++i) {
     threads.emplace_back([&good] {
       for (int round = 0; round < 50; ++round) {
-        { const ForkHold hold(ForkHold::kLibraryLock); }
-        good += RunInChild([] { return ForkHold::LocksAreLost() ? 1 : 0; }).code == 0 ? 1 : 0;
+        { const ForkGuard hold(ForkGuard::kLibraryLock); }
+        good += RunInChild([] { return ForkGuard::LocksAreLost() ? 1 : 0; }).code == 0 ? 1 : 0;
       }
     });
   }
@@ -120,31 +120,31 @@ TEST(ForkHold, ThreadsMayForkAndHoldAtOnce) {
   EXPECT_EQ(good, 200);
 }
 
-TEST(UninheritedFile, OpensCreatesAndClosesAsOpenDoes) {
+TEST(ForkClosedFile, OpensCreatesAndClosesAsOpenDoes) {
   const TempDir folder;
   const DescriptorGuard descriptors;
   {
-    const UninheritedFile file(folder.File("log").c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
+    const ForkClosedFile file(folder.File("log").c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
     ASSERT_TRUE(file.Valid());
     EXPECT_EQ(write(file.Get(), "text", 4), 4);
   }
   EXPECT_EQ(ReadFile(folder.File("log")), "text");
 }
 
-TEST(UninheritedFile, WithoutAPathOrAFolderItIsNotValidAndErrnoTellsWhy) {
+TEST(ForkClosedFile, WithoutAPathOrAFolderItIsNotValidAndErrnoTellsWhy) {
   errno = 0;
-  EXPECT_FALSE(UninheritedFile(nullptr, O_RDONLY, 0).Valid());
+  EXPECT_FALSE(ForkClosedFile(nullptr, O_RDONLY, 0).Valid());
   EXPECT_EQ(errno, EFAULT);
-  EXPECT_FALSE(UninheritedFile("/nowhere/file", O_RDONLY, 0).Valid());
+  EXPECT_FALSE(ForkClosedFile("/nowhere/file", O_RDONLY, 0).Valid());
   EXPECT_EQ(errno, ENOENT);
 }
 
-TEST(UninheritedFile, AChildHasNoneOfThoseThatAreOpen) {
+TEST(ForkClosedFile, AChildHasNoneOfThoseThatAreOpen) {
   const TempDir folder;
-  std::unique_ptr<UninheritedFile> files[3];
+  std::unique_ptr<ForkClosedFile> files[3];
   for (int i = 0; i < 3; ++i) {
     const std::string path = folder.File(std::to_string(i));
-    files[i] = std::make_unique<UninheritedFile>(path.c_str(), O_WRONLY | O_CREAT, 0600);
+    files[i] = std::make_unique<ForkClosedFile>(path.c_str(), O_WRONLY | O_CREAT, 0600);
   }
   EXPECT_EQ(RunInChild([&] { return OpenIn(folder.Path()); }).code, 0);
   files[1].reset();
@@ -155,29 +155,29 @@ TEST(UninheritedFile, AChildHasNoneOfThoseThatAreOpen) {
   EXPECT_EQ(OpenIn(folder.Path()), 0);
 }
 
-TEST(UninheritedFile, ADescriptorThatWasClosedIsNotTakenFromAChild) {
+TEST(ForkClosedFile, ADescriptorThatWasClosedIsNotTakenFromAChild) {
   const TempDir folder;
   const std::string path = folder.File("file");
-  { const UninheritedFile closed(path.c_str(), O_WRONLY | O_CREAT, 0600); }
-  const OwnedFd same_number(open(path.c_str(), O_RDONLY | O_CLOEXEC));
+  { const ForkClosedFile closed(path.c_str(), O_WRONLY | O_CREAT, 0600); }
+  const UniqueFd same_number(open(path.c_str(), O_RDONLY | O_CLOEXEC));
   EXPECT_EQ(RunInChild([&] { return OpenIn(folder.Path()); }).code, 1);
 }
 
-TEST(UninheritedFile, TheParentKeepsItsLockWhenAChildStarts) {
+TEST(ForkClosedFile, TheParentKeepsItsLockWhenAChildStarts) {
   const TempDir folder;
   const std::string path = folder.File("file");
-  const UninheritedFile file(path.c_str(), O_WRONLY | O_CREAT, 0600);
+  const ForkClosedFile file(path.c_str(), O_WRONLY | O_CREAT, 0600);
   ASSERT_EQ(flock(file.Get(), LOCK_EX), 0);
   EXPECT_EQ(RunInChild([] { return 0; }).code, 0);
-  const OwnedFd other(open(path.c_str(), O_RDONLY | O_CLOEXEC));
+  const UniqueFd other(open(path.c_str(), O_RDONLY | O_CLOEXEC));
   EXPECT_EQ(flock(other.Get(), LOCK_EX | LOCK_NB), -1);
 }
 
-TEST(UninheritedFile, ItsStreamWritesWhenItIsFlushedAndIsClosedWithIt) {
+TEST(ForkClosedFile, ItsStreamWritesWhenItIsFlushedAndIsClosedWithIt) {
   const TempDir folder;
   const DescriptorGuard descriptors;
   char buffer[1024];
-  UninheritedFile file(folder.File("log").c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
+  ForkClosedFile file(folder.File("log").c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
   ASSERT_TRUE(file.MakeStream(buffer, sizeof(buffer)));
   fprintf(file.Stream(), "%s", "text");
   EXPECT_EQ(ReadFile(folder.File("log")), "");
@@ -185,19 +185,19 @@ TEST(UninheritedFile, ItsStreamWritesWhenItIsFlushedAndIsClosedWithIt) {
   EXPECT_EQ(ReadFile(folder.File("log")), "text");
 }
 
-TEST(UninheritedFile, WhatCannotBeWrittenIsDropped) {
+TEST(ForkClosedFile, WhatCannotBeWrittenIsDropped) {
   char buffer[1024];
-  UninheritedFile file("/dev/full", O_WRONLY | O_CLOEXEC, 0);
+  ForkClosedFile file("/dev/full", O_WRONLY | O_CLOEXEC, 0);
   ASSERT_TRUE(file.MakeStream(buffer, sizeof(buffer)));
   fprintf(file.Stream(), "%s", "text");
   EXPECT_FALSE(file.Flush());
   EXPECT_EQ(__fpending(file.Stream()), 0u);
 }
 
-TEST(UninheritedFile, AChildThatEndsWritesNothingOfItsStream) {
+TEST(ForkClosedFile, AChildThatEndsWritesNothingOfItsStream) {
   const TempDir folder;
   char buffer[1024];
-  UninheritedFile file(folder.File("log").c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
+  ForkClosedFile file(folder.File("log").c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
   ASSERT_TRUE(file.MakeStream(buffer, sizeof(buffer)));
   fprintf(file.Stream(), "%s", "text");
   // The number of the closed descriptor is the next one that the child opens.
@@ -212,13 +212,13 @@ TEST(UninheritedFile, AChildThatEndsWritesNothingOfItsStream) {
   EXPECT_EQ(ReadFile(folder.File("log")), "text");
 }
 
-TEST(UninheritedFile, AStreamThatCannotBeMadeLeavesTheDescriptorToItsOwner) {
+TEST(ForkClosedFile, AStreamThatCannotBeMadeLeavesTheDescriptorToItsOwner) {
   const TempDir folder;
   const DescriptorGuard descriptors;
   Faults faults;
   faults.FailNth(Call::kFopencookie, 1, ENOMEM);
   char buffer[1024];
-  UninheritedFile file(folder.File("log").c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
+  ForkClosedFile file(folder.File("log").c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
   EXPECT_FALSE(file.MakeStream(buffer, sizeof(buffer)));
   EXPECT_EQ(errno, ENOMEM);
 }

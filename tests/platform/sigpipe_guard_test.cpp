@@ -40,7 +40,7 @@ bool GuardedWriteBreaks() {
   close(ends[0]);
   SigpipeGuard guard;
   const bool broken = write(ends[1], "x", 1) == -1 && errno == EPIPE;
-  guard.TakeBack();
+  guard.DiscardPending();
   const bool errno_kept = errno == EPIPE;
   close(ends[1]);
   return broken && errno_kept;

@@ -121,7 +121,8 @@ void RunEndings(const char* program, const char* form, const char* setting, Case
   }
 }
 
-// Each with the shared library and with the archive, and with memory that is spoilt when it is freed.
+// Each with the shared library and with the archive, and with memory that is spoilt when it is
+// freed.
 void EndInForm(const char* form, CaseResult& result) {
   const SharedRecord record;
   for (const char* program : {TARNWICK_ENDING_SHARED, TARNWICK_ENDING_STATIC}) {

@@ -36,8 +36,8 @@ class BlackHolePort {
   std::vector<int> fillers_;
 };
 
-// A TCP socket bound to a free port of 127.0.0.1, which goes into `*port`; -1 and a failed test when
-// there is none.
+// A TCP socket bound to a free port of 127.0.0.1, which goes into `*port`; -1 and a failed test
+// when there is none.
 int BindLoopback(int* port);
 
 #endif  // TARNWICK_TESTS_SUPPORT_PORTS_H_

@@ -33,7 +33,7 @@ int SslFailure(int error) {
 
 }  // namespace
 
-// NOLINTBEGIN(readability-inconsistent-declaration-parameter-name): theirs are cut short or reserved
+// NOLINTBEGIN(readability-inconsistent-declaration-parameter-name): theirs are short or reserved
 extern "C" int SSL_read(SSL* ssl, void* buf, int length) {
   static const auto next = Next("SSL_read", SSL_read);
   const Verdict verdict = Ask(kSslRead);

@@ -53,8 +53,8 @@ void DetachedThread(Stage& stage) {
 void WholeWrite(Stage& stage) {
   int ends[2];
   socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0, ends);
-  const OwnedFd writes(ends[0]);
-  const OwnedFd reads(ends[1]);
+  const UniqueFd writes(ends[0]);
+  const UniqueFd reads(ends[1]);
   const std::string text(3000, 'w');
   int result = -1;
   stage.Run([&] { result = WriteFd(ends[0], text.data(), static_cast<int>(text.size())); });

@@ -18,8 +18,8 @@ class Stage {
   // The peer's, on 127.0.0.1.
   int Port() const { return port_; }
 
-  // Runs a step of the library's, which the fault may strike. An exception out of it is a mistake. A
-  // cancelled thread ends here at the latest: what the operation holds it must own.
+  // Runs a step of the library's, which the fault may strike. An exception out of it is a mistake.
+  // A cancelled thread ends here at the latest: what the operation holds it must own.
   template <typename Step>
   void Run(Step step) {
     if (!RunMayThrow<NoException>(step)) return;

@@ -10,9 +10,9 @@
 
 namespace {
 
-tarnwick::OwnedFd Refuse(const std::string& path, const std::string& reason, std::string* error) {
+tarnwick::UniqueFd Refuse(const std::string& path, const std::string& reason, std::string* error) {
   *error = path + ": " + reason;
-  return tarnwick::OwnedFd(-1);
+  return tarnwick::UniqueFd(-1);
 }
 
 // A slash at the end would follow a link.
@@ -41,7 +41,7 @@ bool ReadAll(int fd, size_t most, std::string* bytes) {
 
 }  // namespace
 
-bool WriteAll(const tarnwick::OwnedFd& fd, const std::string& bytes) {
+bool WriteAll(const tarnwick::UniqueFd& fd, const std::string& bytes) {
   for (size_t done = 0; done < bytes.size();) {
     const ssize_t count = write(fd.Get(), bytes.data() + done, bytes.size() - done);
     if (count == -1 && errno == EINTR) continue;
@@ -51,7 +51,7 @@ bool WriteAll(const tarnwick::OwnedFd& fd, const std::string& bytes) {
   return true;
 }
 
-tarnwick::OwnedFd OpenPrivateFolder(const std::string& path, std::string* error) {
+tarnwick::UniqueFd OpenPrivateFolder(const std::string& path, std::string* error) {
   const std::string folder = WithoutSlashes(path);
   std::error_code ignored;  // mkdir tells what is wrong
   const auto above = std::filesystem::path(folder).parent_path();
@@ -59,7 +59,7 @@ tarnwick::OwnedFd OpenPrivateFolder(const std::string& path, std::string* error)
   if (mkdir(folder.c_str(), 0700) != 0 && errno != EEXIST) {
     return Refuse(folder, std::strerror(errno), error);
   }
-  tarnwick::OwnedFd fd(open(folder.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
+  tarnwick::UniqueFd fd(open(folder.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
   if (!fd.Valid()) {
     struct stat state = {};
     const int reason = errno;
@@ -72,17 +72,18 @@ tarnwick::OwnedFd OpenPrivateFolder(const std::string& path, std::string* error)
   return fd;
 }
 
-bool WritePrivateFile(const tarnwick::OwnedFd& folder, const std::string& name,
+bool WritePrivateFile(const tarnwick::UniqueFd& folder, const std::string& name,
                       const std::string& bytes, std::string* error) {
   unlinkat(folder.Get(), name.c_str(), 0);  // where it cannot, the next call tells
   const int flags = O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC;
-  const tarnwick::OwnedFd fd(openat(folder.Get(), name.c_str(), flags, 0600));
+  const tarnwick::UniqueFd fd(openat(folder.Get(), name.c_str(), flags, 0600));
   if (fd.Valid() && WriteAll(fd, bytes)) return true;
   *error = name + ": " + std::strerror(errno);
   return false;
 }
 
-tarnwick::OwnedFd OpenOwnFile(const std::string& path, int flags, mode_t mode, std::string* error) {
+tarnwick::UniqueFd OpenOwnFile(const std::string& path, int flags, mode_t mode,
+                               std::string* error) {
   const bool system = IsBelow(path, "/dev/") || IsBelow(path, "/proc/");
   struct stat state = {};
   const auto foreign = [&] { return !S_ISCHR(state.st_mode) && state.st_uid != geteuid(); };
@@ -91,7 +92,7 @@ tarnwick::OwnedFd OpenOwnFile(const std::string& path, int flags, mode_t mode, s
     if (S_ISLNK(state.st_mode)) return Refuse(path, "it is a link", error);
     if (foreign()) return Refuse(path, "it belongs to another user", error);
   }
-  tarnwick::OwnedFd fd(
+  tarnwick::UniqueFd fd(
       open(path.c_str(), flags | O_CREAT | O_CLOEXEC | (system ? 0 : O_NOFOLLOW), mode));
   if (!fd.Valid() || fstat(fd.Get(), &state) != 0) {
     return Refuse(path, std::strerror(errno), error);
@@ -100,10 +101,10 @@ tarnwick::OwnedFd OpenOwnFile(const std::string& path, int flags, mode_t mode, s
   return fd;
 }
 
-bool ReadRegularFile(const tarnwick::OwnedFd& folder, const std::string& name, size_t most,
+bool ReadRegularFile(const tarnwick::UniqueFd& folder, const std::string& name, size_t most,
                      std::string* bytes, std::string* error) {
   const int flags = O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC;
-  const tarnwick::OwnedFd fd(openat(folder.Get(), name.c_str(), flags));
+  const tarnwick::UniqueFd fd(openat(folder.Get(), name.c_str(), flags));
   struct stat state = {};
   if (!fd.Valid() || fstat(fd.Get(), &state) != 0) {
     *error = name + ": " + (errno == ELOOP ? "it is a link" : std::strerror(errno));

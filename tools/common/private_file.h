@@ -8,27 +8,27 @@
 
 #include "tarnwick/platform/unique.h"
 
-// All of these follow no link at the end of a path, and return an invalid descriptor, or false, with
-// the reason in `error`.
+// All of these follow no link at the end of a path, and return an invalid descriptor, or false,
+// with the reason in `error`.
 
 // The directory at `path`, made with mode 0700 when it is missing, the ones above it with the usual
 // mode. One of another user is refused.
-tarnwick::OwnedFd OpenPrivateFolder(const std::string& path, std::string* error);
+tarnwick::UniqueFd OpenPrivateFolder(const std::string& path, std::string* error);
 
 // Writes the file `name` of the directory with mode 0600, in the place of whatever has the name.
-bool WritePrivateFile(const tarnwick::OwnedFd& folder, const std::string& name,
+bool WritePrivateFile(const tarnwick::UniqueFd& folder, const std::string& name,
                       const std::string& bytes, std::string* error);
 
 // Results: false with errno.
-bool WriteAll(const tarnwick::OwnedFd& fd, const std::string& bytes);
+bool WriteAll(const tarnwick::UniqueFd& fd, const std::string& bytes);
 
 // A file to write to, made with `mode` when it is missing. One of another user is refused, but no
 // device. Below /dev and /proc, where no other user makes files, links are followed: shells write
 // /dev/fd/63 for a pipe to another program.
-tarnwick::OwnedFd OpenOwnFile(const std::string& path, int flags, mode_t mode, std::string* error);
+tarnwick::UniqueFd OpenOwnFile(const std::string& path, int flags, mode_t mode, std::string* error);
 
 // Reads the regular file `name` of the directory, of `most` bytes at most.
-bool ReadRegularFile(const tarnwick::OwnedFd& folder, const std::string& name, size_t most,
+bool ReadRegularFile(const tarnwick::UniqueFd& folder, const std::string& name, size_t most,
                      std::string* bytes, std::string* error);
 
 #endif  // TARNWICK_TOOLS_COMMON_PRIVATE_FILE_H_

@@ -59,7 +59,7 @@ bool IsKnownEnd(const std::string& end) {
 }
 
 // The bytes of the file that the member names. A recording may come from a stranger.
-bool ReadNamed(const tarnwick::OwnedFd& folder, const Json::Value& line, const char* member,
+bool ReadNamed(const tarnwick::UniqueFd& folder, const Json::Value& line, const char* member,
                std::string* bytes, std::string* error) {
   const std::string name = line.get(member, "").asString();
   if (name.empty() || name.find('/') != std::string::npos || name == ".." ||
@@ -94,7 +94,7 @@ bool ReadPieces(const Json::Value& line, RecordedExchange* exchange, std::string
   return false;
 }
 
-bool ReadExchange(const tarnwick::OwnedFd& folder, const Json::Value& line,
+bool ReadExchange(const tarnwick::UniqueFd& folder, const Json::Value& line,
                   RecordedExchange* exchange, std::string* error) {
   exchange->number = line.get("number", 0).asInt();
   exchange->connection = line.get("connection", exchange->number).asInt();
@@ -118,8 +118,8 @@ bool ReadExchange(const tarnwick::OwnedFd& folder, const Json::Value& line,
          ReadPieces(line, exchange, error);
 }
 
-bool ParseLine(const tarnwick::OwnedFd& folder, const std::string& text, RecordedExchange* exchange,
-               std::string* error) {
+bool ParseLine(const tarnwick::UniqueFd& folder, const std::string& text,
+               RecordedExchange* exchange, std::string* error) {
   const std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
   Json::Value line;
   if (!reader->parse(text.data(), text.data() + text.size(), &line, error)) return false;
@@ -134,7 +134,7 @@ bool ParseLine(const tarnwick::OwnedFd& folder, const std::string& text, Recorde
 
 bool WriteRecording(const std::string& folder, const std::vector<RecordedExchange>& exchanges,
                     std::string* error) {
-  const tarnwick::OwnedFd opened = OpenPrivateFolder(folder, error);
+  const tarnwick::UniqueFd opened = OpenPrivateFolder(folder, error);
   if (!opened.Valid()) return false;
   std::string index;
   bool written = true;
@@ -152,7 +152,7 @@ bool WriteRecording(const std::string& folder, const std::vector<RecordedExchang
 
 bool ReadRecording(const std::string& folder, std::vector<RecordedExchange>* exchanges,
                    std::string* error) {
-  const tarnwick::OwnedFd opened(open(folder.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+  const tarnwick::UniqueFd opened(open(folder.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
   if (!opened.Valid()) {
     *error = folder + "/" + kIndex + ": " + std::strerror(errno);
     return false;

@@ -51,8 +51,8 @@ struct RecordedExchange {
   int64_t endDelayMs = 0;
 };
 
-// Writes `exchanges` into `folder`, which is created when missing, for the caller alone; files of an
-// earlier recording are replaced. A link, or a folder of another user, is refused.
+// Writes `exchanges` into `folder`, which is created when missing, for the caller alone; files of
+// an earlier recording are replaced. A link, or a folder of another user, is refused.
 // Results: false with the reason in `error`.
 bool WriteRecording(const std::string& folder, const std::vector<RecordedExchange>& exchanges,
                     std::string* error);

@@ -180,7 +180,7 @@ bool Certificates::Make(const std::set<std::string>& hosts, std::string* error) 
 }
 
 bool Certificates::WriteAuthority(const std::string& path, std::string* error) const {
-  tarnwick::OwnedFd fd =
+  tarnwick::UniqueFd fd =
       OpenOwnFile(path, O_WRONLY | O_TRUNC, 0644, error);  // clients of other users read it
   if (!fd.Valid()) return false;
   FILE* file = fdopen(fd.Get(), "w");

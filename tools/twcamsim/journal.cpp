@@ -19,7 +19,7 @@ bool Journal::Open(const std::string& path, std::string* error) {
     file_ = stdout;
     return true;
   }
-  tarnwick::OwnedFd fd = OpenOwnFile(path, O_WRONLY | O_APPEND, 0600, error);
+  tarnwick::UniqueFd fd = OpenOwnFile(path, O_WRONLY | O_APPEND, 0600, error);
   if (!fd.Valid()) return false;
   file_ = fdopen(fd.Get(), "a");
   if (!file_) {

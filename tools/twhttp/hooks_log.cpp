@@ -15,7 +15,7 @@ std::string Formatted(const char* format, va_list arguments) __attribute__((form
 std::string Formatted(const char* format, va_list arguments) {
   char* text = nullptr;
   if (vasprintf(&text, format, arguments) < 0) return "";
-  const tarnwick::OwnedMemory<char> owner(text);
+  const tarnwick::UniqueMalloc<char> owner(text);
   return text;
 }
 

@@ -60,7 +60,7 @@ bool StillConnecting(const Connection& connection) {
 }
 
 void NoteRead(int fd, const void* buf, ssize_t count) {
-  const tarnwick::ErrnoKeeper keeper;
+  const tarnwick::ErrnoSaver keeper;
   const int number = ConnectionOf(fd);
   const double now = g_hooks->Now();
   if (count > 0) {
@@ -122,7 +122,7 @@ extern "C" int __wrap_bind(int fd, const sockaddr* address, socklen_t length) {
   if (connection != nullptr && g_hooks->peer != nullptr) return 0;
   const int result = __real_bind(fd, address, length);
   if (connection == nullptr) return result;
-  const tarnwick::ErrnoKeeper keeper;
+  const tarnwick::ErrnoSaver keeper;
   Finish(&connection->source, result == 0, errno, std::strerror(errno));
   return result;
 }
@@ -156,7 +156,7 @@ extern "C" int __wrap_connect(int fd, const sockaddr* address, socklen_t length)
     address = reinterpret_cast<const sockaddr*>(&g_hooks->peer->Address());
   }
   const int result = __real_connect(fd, address, length);
-  const tarnwick::ErrnoKeeper keeper;
+  const tarnwick::ErrnoSaver keeper;
   if (result == 0 || errno != EINPROGRESS) {
     Finish(&connection->connect, result == 0, errno, std::strerror(errno));
   }
@@ -168,7 +168,7 @@ extern "C" int __wrap_getsockopt(int fd, int level, int option, void* value, soc
   const int result = __real_getsockopt(fd, level, option, value, length);
   Connection* const connection = Watched(fd);
   if (connection == nullptr || option != SO_ERROR || !StillConnecting(*connection)) return result;
-  const tarnwick::ErrnoKeeper keeper;
+  const tarnwick::ErrnoSaver keeper;
   const int error = result == 0 ? *static_cast<int*>(value) : errno;
   Finish(&connection->connect, error == 0, error, std::strerror(error));
   return result;
@@ -190,7 +190,7 @@ extern "C" int __wrap_select(int count, fd_set* readable, fd_set* writable, fd_s
     result = __real_select(count, readable, writable, exceptional, left);
   }
   if (result < 0) TurnIntoCancelled();
-  const tarnwick::ErrnoKeeper keeper;
+  const tarnwick::ErrnoSaver keeper;
   if (StillConnecting(*connection)) {
     if (result > 0) return result;
     const int error = result == 0 ? ETIMEDOUT : errno;
@@ -218,7 +218,7 @@ extern "C" ssize_t __wrap_write(int fd, const void* buf, size_t length) {
   BeginGiveUp();
   const ssize_t count = __real_write(fd, buf, length);
   if (count < 0) TurnIntoCancelled();
-  const tarnwick::ErrnoKeeper keeper;
+  const tarnwick::ErrnoSaver keeper;
   const int number = ConnectionOf(fd);
   if (count > 0) {
     EndGiveUp();

@@ -61,7 +61,7 @@ std::string CertificateText(const SSL* ssl) {
 }
 
 void NoteHandshake(SSL* ssl, Connection* connection, int result) {
-  const tarnwick::ErrnoKeeper keeper;
+  const tarnwick::ErrnoSaver keeper;
   Step& step = connection->handshake;
   step.end = CurrentHooks()->Now();
   step.failed = result != 1;
@@ -82,7 +82,7 @@ void NoteFailedRead(int number, double now) {
 }
 
 void NoteRead(SSL* ssl, const void* buf, int count) {
-  const tarnwick::ErrnoKeeper keeper;
+  const tarnwick::ErrnoSaver keeper;
   Hooks* const hooks = CurrentHooks();
   const int number = Watched(ssl)->number;
   const int error = SSL_get_error(ssl, count);
@@ -145,7 +145,7 @@ extern "C" int __wrap_SSL_write(SSL* ssl, const void* buf, int length) {
   const double begin = CurrentHooks()->Now();
   BeginGiveUp();
   const int count = __real_SSL_write(ssl, buf, length);
-  const tarnwick::ErrnoKeeper keeper;
+  const tarnwick::ErrnoSaver keeper;
   const int error = SSL_get_error(ssl, count);
   const bool waits = error == SSL_ERROR_WANT_READ || error == SSL_ERROR_WANT_WRITE;
   Trace* const trace = CurrentHooks()->trace;

@@ -6,12 +6,12 @@
 
 #include "tools/twhttp/options.h"
 
-// A whole request: logins, cookies, the login of a URL and the values of secret parameters (those of
-// the query, and of a body of form fields) become ***, unless secrets are to be shown.
+// A whole request: logins, cookies, the login of a URL and the values of secret parameters (those
+// of the query, and of a body of form fields) become ***, unless secrets are to be shown.
 std::string MaskRequest(const Options& options, const std::string& request);
 
-// A whole response: the same in its heads, by as many asterisks, because the sizes of its pieces and
-// its Content-Length stay.
+// A whole response: the same in its heads, by as many asterisks, because the sizes of its pieces
+// and its Content-Length stay.
 std::string MaskResponse(const Options& options, const std::string& response);
 
 #endif  // TARNWICK_TOOLS_TWHTTP_RECORD_MASKS_H_

@@ -166,7 +166,7 @@ void Runner::RawResp() {
 }
 
 void Runner::ByCurl(TW_HTTP_METHOD method) {
-  tarnwick::OwnedFile file(nullptr);
+  tarnwick::UniqueFile file(nullptr);
   if (!options_.response_file.empty()) {
     file.reset(std::fopen(options_.response_file.c_str(), "w+e"));
     outcome_.output_failed = !file;

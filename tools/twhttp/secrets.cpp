@@ -19,7 +19,7 @@ void ReplaceAll(std::string* text, const std::string& secret) {
 }
 
 std::string Base64(const std::string& text) {
-  const tarnwick::OwnedMemory<char> encoded(Base64Encode(text.c_str()));
+  const tarnwick::UniqueMalloc<char> encoded(Base64Encode(text.c_str()));
   return encoded ? encoded.get() : "";
 }
 

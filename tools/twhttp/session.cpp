@@ -20,7 +20,7 @@ bool ReadAll(FILE* file, std::string* text) {
 
 bool ReadBodyFile(const std::string& path, std::string* body) {
   if (path == "-") return ReadAll(stdin, body);
-  const tarnwick::OwnedFile file(std::fopen(path.c_str(), "re"));
+  const tarnwick::UniqueFile file(std::fopen(path.c_str(), "re"));
   return file && ReadAll(file.get(), body);
 }
 
@@ -38,7 +38,7 @@ bool LoadBody(const Options& options, std::string* body) {
   if (options.body_file.empty() || options.operation->id == OperationId::kUpload) {
     // Only whether it is there: an upload is sent while it is read.
     const bool check = !options.body_file.empty() && options.body_file != "-";
-    const tarnwick::OwnedFile file(check ? std::fopen(options.body_file.c_str(), "re") : nullptr);
+    const tarnwick::UniqueFile file(check ? std::fopen(options.body_file.c_str(), "re") : nullptr);
     if (!check || file) return SuitsOperation(options, *body);
   } else if (ReadBodyFile(options.body_file, body)) {
     return SuitsOperation(options, *body);

@@ -28,7 +28,7 @@ bool WriteFile(TWHttpClient* client, FILE* file) {
 bool WritePayload(TWHttpClient* client, const Options& options, const std::string& text) {
   if (options.body_file.empty()) return Write(client, text);
   if (options.body_file == "-") return WriteFile(client, stdin);
-  const tarnwick::OwnedFile file(std::fopen(options.body_file.c_str(), "re"));
+  const tarnwick::UniqueFile file(std::fopen(options.body_file.c_str(), "re"));
   return file && WriteFile(client, file.get());
 }
 

@@ -27,7 +27,8 @@ constexpr unsigned long kFewFiles = 16;
 
 // Opens it as the library does, but makes no file and waits for nobody. Results: 0 or errno.
 int TryToOpen(const char* path) {
-  const tarnwick::OwnedFd fd(open(path, O_WRONLY | O_APPEND | O_CLOEXEC | O_NONBLOCK | O_NOFOLLOW));
+  const tarnwick::UniqueFd fd(
+      open(path, O_WRONLY | O_APPEND | O_CLOEXEC | O_NONBLOCK | O_NOFOLLOW));
   return fd.Valid() ? 0 : errno;
 }
 

@@ -98,7 +98,7 @@ void TellHolders(int fd, const std::string& path, Findings* findings) {
 
 void CheckLock(const char* path, Findings* findings) {
   // No more than reading is asked for, which is enough for a lock and harms no file.
-  const tarnwick::OwnedFd fd(open(path, O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOFOLLOW));
+  const tarnwick::UniqueFd fd(open(path, O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOFOLLOW));
   if (!fd.Valid()) {
     const int error = errno;
     if (error == ENOENT) return;

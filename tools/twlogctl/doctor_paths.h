@@ -21,8 +21,8 @@ std::string DescribeState(const struct stat& state);
 std::optional<Finding> OddFile(const char* check, const std::string& path,
                                const struct stat& state);
 
-// The finding for a directory that somebody else owns or anybody may write. Results: nothing when it
-// belongs to root or this user and others cannot write it.
+// The finding for a directory that somebody else owns or anybody may write. Results: nothing when
+// it belongs to root or this user and others cannot write it.
 std::optional<Finding> OpenDirectory(const char* check, const std::string& path,
                                      const struct stat& state);
 

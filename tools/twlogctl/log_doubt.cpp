@@ -8,8 +8,8 @@
 
 namespace {
 
-// Local time without a zone goes back by an hour in autumn, a clock that is set by more than that is
-// rare, and a line may wait long for the lock after its time was taken.
+// Local time without a zone goes back by an hour in autumn, a clock that is set by more than that
+// is rare, and a line may wait long for the lock after its time was taken.
 constexpr std::chrono::hours kMargin(2);
 
 // The number behind a word at the beginning of a line of /proc/stat.

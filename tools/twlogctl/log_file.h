@@ -21,7 +21,7 @@ class LogFile {
   };
 
   // REQUIRES: a regular file's descriptor, open for reading.
-  explicit LogFile(tarnwick::OwnedFd fd) : m_fd(std::move(fd)) {}
+  explicit LogFile(tarnwick::UniqueFd fd) : m_fd(std::move(fd)) {}
 
   // Puts the next bytes, 64 KiB at most, into `data`.
   Result Read(std::string* data);
@@ -49,7 +49,7 @@ class LogFile {
   void Remember(const std::string& data);
   Result Restart();
 
-  tarnwick::OwnedFd m_fd;
+  tarnwick::UniqueFd m_fd;
   off_t m_offset = 0;
   Mark m_head;  // the first bytes of the file
   Mark m_tail;  // the last ones in front of m_offset

@@ -7,8 +7,8 @@
 class LogPrinter {
  public:
   // Without `json` a pipe or a file gets the bytes of the log, unless `mark`. On a terminal control
-  // bytes are escaped, and lines have the colour of their level. There, and with `mark`, "? " stands
-  // in front of a doubtful message and "| " in front of the further lines of each one.
+  // bytes are escaped, and lines have the colour of their level. There, and with `mark`, "? "
+  // stands in front of a doubtful message and "| " in front of the further lines of each one.
   LogPrinter(bool json, bool mark);
 
   void Print(const LogMessage& message);

@@ -37,8 +37,8 @@ int ReadMessages(int fd, const MessageSink& sink) {
 }  // namespace
 
 int ReadLog(const std::string& path, const LogFilter& filter, const WantedSink& sink) {
-  const tarnwick::OwnedFd file(path == "-" ? dup(STDIN_FILENO)
-                                           : open(path.c_str(), O_RDONLY | O_CLOEXEC));
+  const tarnwick::UniqueFd file(path == "-" ? dup(STDIN_FILENO)
+                                            : open(path.c_str(), O_RDONLY | O_CLOEXEC));
   if (!file.Valid()) return errno;
   LogSelector selector(filter, NewestLineOf(file.Get()), IsOwnLog(path));
   return ReadMessages(file.Get(), [&](std::string_view text, bool continues) {

@@ -51,7 +51,7 @@ LogTail::SourceIterator LogTail::Known(const struct stat& status) {
 // where it was left. Results: 0 or an errno.
 int LogTail::OpenFile() {
   // Not blocking, for the sake of a pipe of that name.
-  tarnwick::OwnedFd fd(open(m_path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
+  tarnwick::UniqueFd fd(open(m_path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
   struct stat status = {};
   if (!fd.Valid() || fstat(fd.Get(), &status) != 0) return errno;
   if (!S_ISREG(status.st_mode)) return S_ISDIR(status.st_mode) ? EISDIR : EINVAL;

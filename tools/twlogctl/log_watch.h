@@ -27,7 +27,7 @@ class LogWatch {
   void Drain();
 
  private:
-  tarnwick::OwnedFd m_fd;
+  tarnwick::UniqueFd m_fd;
 };
 
 #endif  // TARNWICK_TOOLS_TWLOGCTL_LOG_WATCH_H_

@@ -15,8 +15,8 @@ struct ProcessInfo {
   double ageSeconds = 0;  // since it was started
 };
 
-// "camerad (812)". The name is what the process calls itself; one that is not plain is quoted for the
-// shell, so that it cannot look like several processes.
+// "camerad (812)". The name is what the process calls itself; one that is not plain is quoted for
+// the shell, so that it cannot look like several processes.
 std::string NameAndPid(const ProcessInfo& process);
 
 // A command that shows whose process it is and what it runs, and changes nothing.

@@ -139,7 +139,7 @@ bool ParseSettings(std::string_view text, SavedLevels* saved, SettingsFault* fau
 }
 
 SettingsState ReadSettings(SavedLevels* saved, SettingsFault* fault) {
-  const tarnwick::OwnedFd fd(open(kSettingsPath, O_RDONLY | O_CLOEXEC | O_NONBLOCK));
+  const tarnwick::UniqueFd fd(open(kSettingsPath, O_RDONLY | O_CLOEXEC | O_NONBLOCK));
   std::string text;
   if (!fd.Valid() || !ReadAll(fd.Get(), &text)) {
     const int error = errno;

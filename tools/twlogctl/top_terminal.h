@@ -23,7 +23,7 @@ class TopSignals {
   static void EndBy(int signal);
 
  private:
-  tarnwick::OwnedFd m_fd;
+  tarnwick::UniqueFd m_fd;
 };
 
 // The screen, put back as it was when this goes.

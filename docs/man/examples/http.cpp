@@ -5,9 +5,9 @@
 #include "tarnwick/http/twhttp.h"
 
 int CameraNumber(const std::string& host, int port) {
-  Json::Value reply;
-  int result = SendHttpGet(host, port, "api/info?full=1", reply, 5, false);  // 0: success
-  return result == 0 ? reply["camera"].asInt() : -1;
+  Json::Value response;
+  int result = SendHttpGet(host, port, "api/info?full=1", response, 5, false);  // 0: success
+  return result == 0 ? response["camera"].asInt() : -1;
 }
 
 std::string InfoPage(const std::string& host, int port) {

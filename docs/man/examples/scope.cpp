@@ -9,6 +9,6 @@ int AskDevice(const std::string& host, int port) {
   TWRequestScope scope;
   scope.SetEscapedLog(true);
   if (!scope.Valid()) return -1;  // no memory: its lines would not be escaped
-  Json::Value reply;
-  return SendHttpGet(host, port, "/info.json", reply, 5, false);
+  Json::Value response;
+  return SendHttpGet(host, port, "/info.json", response, 5, false);
 }

@@ -1,4 +1,5 @@
-// GNU libmicrohttpd as a device: keeps connections, and knows Basic and Digest with MD5 and SHA-256.
+// GNU libmicrohttpd as a device: keeps connections, and knows Basic and Digest with MD5 and
+// SHA-256.
 //
 //   mhd_server PORT
 #include <microhttpd.h>

@@ -67,7 +67,7 @@ class Site : public Profile {
   // It may hold a password. What cannot be written is missed by whoever looks for it.
   void Keep(const std::string& body) const {
     std::string error;
-    const tarnwick::OwnedFd fd = OpenOwnFile(posted_, O_WRONLY | O_TRUNC, 0600, &error);
+    const tarnwick::UniqueFd fd = OpenOwnFile(posted_, O_WRONLY | O_TRUNC, 0600, &error);
     if (fd.Valid()) (void)WriteAll(fd, body);
   }
 
