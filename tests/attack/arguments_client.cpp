@@ -88,7 +88,9 @@ void ReadData(Ground& ground, Draw& draw) {
   const int size = static_cast<int>(draw.Size());
   const std::unique_ptr<char[]> buffer(new char[static_cast<size_t>(size)]);
   if (draw.OneIn(8)) {
-    ground.Expect(Client(ground).ReadData(nullptr, draw.Int()) == -1, "null was taken");
+    const int length = draw.Int();
+    const int none = Client(ground).ReadData(nullptr, length);
+    ground.Expect(none == -1 || length == 0, "null was taken");
     return;
   }
   const int result = Client(ground).ReadData(buffer.get(), size);

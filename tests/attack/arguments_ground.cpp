@@ -135,8 +135,9 @@ int Ground::Descriptor() {
       if (pipe2(ends, O_NONBLOCK | O_CLOEXEC) != 0) return -1;
       close(ends[0]);
       return Kept(ends[1]);
-    case 6:  // a pipe that has room for 64 KiB
+    case 6:  // a pipe that has room for every text: WriteFd waits for a full one without a limit
       if (pipe2(ends, O_NONBLOCK | O_CLOEXEC) != 0) return -1;
+      fcntl(ends[1], F_SETPIPE_SZ, 1 << 20);
       Kept(ends[0]);
       return Kept(ends[1]);
     case 7:

@@ -125,7 +125,8 @@ void ReadData(Ground& ground, Draw& draw) {
   const Buffer buffer(static_cast<unsigned>(size));
   TWSocket& socket = ground.AnySocket();
   if (draw.OneIn(8)) {
-    ground.Expect(socket.ReadData(nullptr, draw.Int()) == -1, "null was taken");
+    const int length = draw.Int();
+    ground.Expect(socket.ReadData(nullptr, length) == -1 || length == 0, "null was taken");
     ground.Expect(socket.ReadData(buffer.Get(), -1 - size) == -1, "a negative length was taken");
     return;
   }
