@@ -4,7 +4,7 @@ namespace {
 
 // The lines of a message that follow so much of it are kept as one more: a file that is no log must
 // not fill the memory.
-constexpr size_t kLongest = 1 << 20;
+constexpr size_t kLongest = 16 << 20;
 
 }  // namespace
 
