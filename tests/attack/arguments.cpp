@@ -1,5 +1,5 @@
-// Calls of the public functions with hostile arguments, in rounds: each makes its objects anew, calls
-// functions in any order, and ends with the descriptors with which it began.
+// Calls of the public functions with hostile arguments, in rounds: each makes its objects anew,
+// calls functions in any order, and ends with the descriptors with which it began.
 #include <sys/stat.h>
 #include <syslog.h>
 #include <unistd.h>

@@ -21,8 +21,8 @@ struct PacedTimer {
   int period = 0;
 };
 
-// A client. Init and InitSocket make a socket each time and leave the one before; so they are called
-// on a client without one.
+// A client. Init and InitSocket make a socket each time and leave the one before, so they are
+// called on a client without one.
 struct HeldClient {
   std::unique_ptr<TWHttpClient> client;
   bool has_socket = false;

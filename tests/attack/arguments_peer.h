@@ -9,9 +9,9 @@
 #include "tests/support/process.h"
 #include "tests/support/tls_identity.h"
 
-// A process with a port for each response that it knows, over TCP and over TLS. It reads once, sends
-// the response and closes, and does not wait for a client that sends nothing: so no call waits for
-// it, whatever its time limit.
+// A process with a port for each response that it knows, over TCP and over TLS. It reads once,
+// sends the response and closes, and does not wait for a client that sends nothing: so no call
+// waits for it, whatever its time limit.
 class ArgumentsPeer {
  public:
   ArgumentsPeer();

@@ -1,4 +1,4 @@
-// What stands in the place of the log's directory, and files that others have put at the log's path.
+// What stands in the place of the log's directory, and files that others have put at its path.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <sched.h>

@@ -16,6 +16,7 @@
 namespace {
 
 using std::chrono::seconds;
+using tarnwick::WriteSettingValue;
 using ::testing::ElementsAre;
 
 constexpr char kFormat[] = "%s=\"%s\"\n";

@@ -57,7 +57,7 @@ def test_a_log_that_is_no_file_is_not_followed(soon, plant, kind):
 
 @pytest.mark.parametrize("path, option", [(LOG, []), (NOTIFICATIONS, ["--notification"])])
 @pytest.mark.parametrize("kind", NO_FILES)
-def test_a_line_for_a_log_that_is_no_file_is_told_to_be_missing(soon, record, plant, kind, path, option):
+def test_a_line_for_a_log_that_is_no_file_is_missing(soon, record, plant, kind, path, option):
     planted = plant(kind, path)
     code, output, error = soon("write", *option, "text")
     assert (code, output) == (1, b"")
@@ -67,7 +67,7 @@ def test_a_line_for_a_log_that_is_no_file_is_told_to_be_missing(soon, record, pl
 
 @pytest.mark.parametrize("path", [LOG, NOTIFICATIONS, SETTINGS])
 @pytest.mark.parametrize("kind", KINDS)
-def test_doctor_and_status_wait_for_nothing_at_a_fixed_path(soon, record, rotation, plant, kind, path):
+def test_doctor_and_status_wait_for_no_file(soon, record, rotation, plant, kind, path):
     planted = plant(kind, path)
     assert soon("doctor")[0] == 1
     assert soon("status")[0] == 0

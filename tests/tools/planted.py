@@ -90,8 +90,8 @@ NO_FILES = {
 
 
 class Planted:
-    """One of KINDS at `path`. Links lead to `target`, whose text has to stay, and what is written to a
-    FIFO that is read is found."""
+    """One of KINDS at `path`. Links lead to `target`, whose text has to stay, and what is written to
+    a FIFO that is read is found."""
 
     def __init__(self, kind, path):
         path = pathlib.Path(path)
