@@ -25,6 +25,16 @@ bool IsBelow(const std::string& path, const char* folder) {
   return path.compare(0, std::strlen(folder), folder) == 0;
 }
 
+// Below /dev and /proc, in a directory into which no other user can put a link: /dev/shm and
+// /dev/mqueue are open to everybody, and "/dev/.." leads elsewhere.
+bool IsSystemFile(const std::string& path) {
+  if (!IsBelow(path, "/dev/") && !IsBelow(path, "/proc/")) return false;
+  struct stat state = {};
+  if (stat(path.substr(0, path.rfind('/') + 1).c_str(), &state) != 0) return false;
+  const bool own = state.st_uid == 0 || state.st_uid == geteuid();
+  return own && (state.st_mode & (S_IWGRP | S_IWOTH)) == 0;
+}
+
 bool ReadAll(int fd, size_t most, std::string* bytes) {
   char piece[65536];
   for (;;) {
@@ -84,7 +94,7 @@ bool WritePrivateFile(const tarnwick::UniqueFd& folder, const std::string& name,
 
 tarnwick::UniqueFd OpenOwnFile(const std::string& path, int flags, mode_t mode,
                                std::string* error) {
-  const bool system = IsBelow(path, "/dev/") || IsBelow(path, "/proc/");
+  const bool system = IsSystemFile(path);
   struct stat state = {};
   const auto foreign = [&] { return !S_ISCHR(state.st_mode) && state.st_uid != geteuid(); };
   // Before it is opened, too: the open of somebody else's FIFO would wait.
@@ -99,6 +109,15 @@ tarnwick::UniqueFd OpenOwnFile(const std::string& path, int flags, mode_t mode,
   }
   if (!system && foreign()) return Refuse(path, "it belongs to another user", error);
   return fd;
+}
+
+tarnwick::UniqueFd OpenRegularFile(const char* path) {
+  tarnwick::UniqueFd fd(open(path, O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
+  struct stat state = {};
+  if (!fd.Valid() || fstat(fd.Get(), &state) != 0) return tarnwick::UniqueFd(-1);
+  if (S_ISREG(state.st_mode)) return fd;
+  errno = S_ISDIR(state.st_mode) ? EISDIR : EINVAL;
+  return tarnwick::UniqueFd(-1);
 }
 
 bool ReadRegularFile(const tarnwick::UniqueFd& folder, const std::string& name, size_t most,

@@ -8,8 +8,8 @@
 
 #include "tarnwick/platform/unique.h"
 
-// All of these follow no link at the end of a path, and return an invalid descriptor, or false,
-// with the reason in `error`.
+// All of these but OpenRegularFile follow no link at the end of a path, and return an invalid
+// descriptor, or false, with the reason in `error`.
 
 // The directory at `path`, made with mode 0700 when it is missing, the ones above it with the usual
 // mode. One of another user is refused.
@@ -23,9 +23,14 @@ bool WritePrivateFile(const tarnwick::UniqueFd& folder, const std::string& name,
 bool WriteAll(const tarnwick::UniqueFd& fd, const std::string& bytes);
 
 // A file to write to, made with `mode` when it is missing. One of another user is refused, but no
-// device. Below /dev and /proc, where no other user makes files, links are followed: shells write
-// /dev/fd/63 for a pipe to another program.
+// device. Below /dev and /proc, in directories in which no other user makes files, links are
+// followed: shells write /dev/fd/63 for a pipe to another program.
 tarnwick::UniqueFd OpenOwnFile(const std::string& path, int flags, mode_t mode, std::string* error);
+
+// Opens the regular file at `path` to read it, without a wait for whatever else has the path. Links
+// are followed.
+// Results: not Valid() with errno: EISDIR for a directory, EINVAL for a FIFO or a device.
+tarnwick::UniqueFd OpenRegularFile(const char* path);
 
 // Reads the regular file `name` of the directory, of `most` bytes at most.
 bool ReadRegularFile(const tarnwick::UniqueFd& folder, const std::string& name, size_t most,

@@ -1,5 +1,7 @@
 #include "tools/twhttp/session.h"
 
+#include <sys/stat.h>
+
 #include <cerrno>
 #include <cstdio>
 #include <cstring>
@@ -24,6 +26,16 @@ bool ReadBodyFile(const std::string& path, std::string* body) {
   return file && ReadAll(file.get(), body);
 }
 
+// Whether the file is there. An upload is sent while it is read.
+bool MayUpload(const std::string& path) {
+  if (path.empty() || path == "-") return true;
+  const tarnwick::UniqueFile file(std::fopen(path.c_str(), "re"));
+  struct stat state = {};
+  if (!file || fstat(fileno(file.get()), &state) != 0) return false;
+  errno = EISDIR;
+  return !S_ISDIR(state.st_mode);
+}
+
 bool SuitsOperation(const Options& options, const std::string& body) {
   const OperationId id = options.operation->id;
   if ((id != OperationId::kXmlPost && id != OperationId::kXmlPut) || IsXml(body)) return true;
@@ -36,10 +48,7 @@ bool SuitsOperation(const Options& options, const std::string& body) {
 bool LoadBody(const Options& options, std::string* body) {
   *body = options.body;
   if (options.body_file.empty() || options.operation->id == OperationId::kUpload) {
-    // Only whether it is there: an upload is sent while it is read.
-    const bool check = !options.body_file.empty() && options.body_file != "-";
-    const tarnwick::UniqueFile file(check ? std::fopen(options.body_file.c_str(), "re") : nullptr);
-    if (!check || file) return SuitsOperation(options, *body);
+    if (MayUpload(options.body_file)) return SuitsOperation(options, *body);
   } else if (ReadBodyFile(options.body_file, body)) {
     return SuitsOperation(options, *body);
   }

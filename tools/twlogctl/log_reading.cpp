@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "tarnwick/platform/unique.h"
+#include "tools/common/private_file.h"
 #include "tools/twlogctl/log_messages.h"
 #include "tools/twlogctl/log_paths.h"
 
@@ -20,6 +21,15 @@ Moment NewestLineOf(int fd) {
   struct stat status = {};
   if (fstat(fd, &status) != 0 || !S_ISREG(status.st_mode)) return Now();
   return std::min(Now(), Moment(std::chrono::seconds(status.st_mtim.tv_sec + 1)));
+}
+
+// A file that somebody names may be a pipe, and is waited for. At a path of the library there is a
+// regular file, or nothing is read: a FIFO would hold the reader, and a device may have no end.
+// Results: not Valid() with errno.
+tarnwick::UniqueFd OpenLog(const std::string& path) {
+  if (path == "-") return tarnwick::UniqueFd(dup(STDIN_FILENO));
+  if (!IsOwnLog(path)) return tarnwick::UniqueFd(open(path.c_str(), O_RDONLY | O_CLOEXEC));
+  return OpenRegularFile(path.c_str());
 }
 
 int ReadMessages(int fd, const MessageSink& sink) {
@@ -37,8 +47,7 @@ int ReadMessages(int fd, const MessageSink& sink) {
 }  // namespace
 
 int ReadLog(const std::string& path, const LogFilter& filter, const WantedSink& sink) {
-  const tarnwick::UniqueFd file(path == "-" ? dup(STDIN_FILENO)
-                                            : open(path.c_str(), O_RDONLY | O_CLOEXEC));
+  const tarnwick::UniqueFd file = OpenLog(path);
   if (!file.Valid()) return errno;
   LogSelector selector(filter, NewestLineOf(file.Get()), IsOwnLog(path));
   return ReadMessages(file.Get(), [&](std::string_view text, bool continues) {

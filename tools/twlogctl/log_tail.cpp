@@ -1,12 +1,13 @@
 #include "tools/twlogctl/log_tail.h"
 
-#include <fcntl.h>
 #include <sys/stat.h>
 
 #include <algorithm>
 #include <cerrno>
 #include <iterator>
 #include <utility>
+
+#include "tools/common/private_file.h"
 
 namespace {
 
@@ -50,11 +51,9 @@ LogTail::SourceIterator LogTail::Known(const struct stat& status) {
 // Makes the file at the path the last source. One that comes back under its old name is read on
 // where it was left. Results: 0 or an errno.
 int LogTail::OpenFile() {
-  // Not blocking, for the sake of a pipe of that name.
-  tarnwick::UniqueFd fd(open(m_path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
+  tarnwick::UniqueFd fd = OpenRegularFile(m_path.c_str());
   struct stat status = {};
   if (!fd.Valid() || fstat(fd.Get(), &status) != 0) return errno;
-  if (!S_ISREG(status.st_mode)) return S_ISDIR(status.st_mode) ? EISDIR : EINVAL;
   const SourceIterator known = Known(status);
   if (known != m_sources.end()) {
     m_sources.splice(m_sources.end(), m_sources, known);

@@ -1,6 +1,5 @@
 #include "tools/twlogctl/settings_file.h"
 
-#include <fcntl.h>
 #include <unistd.h>
 
 #include <cerrno>
@@ -9,13 +8,14 @@
 
 #include "tarnwick/log/twdebuglog.h"
 #include "tarnwick/platform/unique.h"
+#include "tools/common/private_file.h"
 #include "tools/common/terminal.h"
 
 namespace {
 
 constexpr std::string_view kBlanks = " \t\r";
 
-// A settings file of the whole product is small; a device in its place has no end.
+// A settings file of the whole product is small.
 constexpr size_t kLongestFile = 16 << 20;
 
 // A value and where it stands.
@@ -139,7 +139,7 @@ bool ParseSettings(std::string_view text, SavedLevels* saved, SettingsFault* fau
 }
 
 SettingsState ReadSettings(SavedLevels* saved, SettingsFault* fault) {
-  const tarnwick::UniqueFd fd(open(kSettingsPath, O_RDONLY | O_CLOEXEC | O_NONBLOCK));
+  const tarnwick::UniqueFd fd = OpenRegularFile(kSettingsPath);
   std::string text;
   if (!fd.Valid() || !ReadAll(fd.Get(), &text)) {
     const int error = errno;

@@ -14,6 +14,7 @@
 
 #include "tarnwick/platform/unique.h"
 #include "tools/common/json_output.h"
+#include "tools/common/private_file.h"
 #include "tools/twlogctl/commands.h"
 #include "tools/twlogctl/log_paths.h"
 #include "tools/twlogctl/report.h"
@@ -26,7 +27,7 @@ const char* PathOf(LOG_TYPE type) {
 
 // The library waits for the lock for as long as it takes, and a script would seem to hang.
 void TellWhenLocked(const char* path) {
-  const tarnwick::UniqueFd fd(open(path, O_WRONLY | O_APPEND | O_CLOEXEC | O_NONBLOCK));
+  const tarnwick::UniqueFd fd(open(path, O_WRONLY | O_APPEND | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
   if (!fd.Valid()) return;
   for (int tries = 0; tries < 20; ++tries) {
     if (flock(fd.Get(), LOCK_EX | LOCK_NB) == 0 || errno != EWOULDBLOCK) return;
@@ -43,7 +44,7 @@ class LogEnd {
 
   // A rotation in between leaves the line in the new file, or in the old one under another name.
   bool Has(const std::string& line) const {
-    const tarnwick::UniqueFd fd(open(m_path, O_RDONLY | O_CLOEXEC | O_NONBLOCK));
+    const tarnwick::UniqueFd fd = OpenRegularFile(m_path);
     struct stat now = {};
     if (!fd.Valid() || fstat(fd.Get(), &now) != 0) return false;
     const bool sameFile = m_known && now.st_ino == m_state.st_ino && now.st_dev == m_state.st_dev;
