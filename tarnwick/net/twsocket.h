@@ -108,7 +108,7 @@ class TARNWICK_API TWSocket {
   // when the stream ends or an error comes after some bytes.
   // Results: the bytes delivered; 0 at the end of the stream, when IsEOF() becomes true; -1 on an
   //   error or time-out that came before any byte, on a wait that failed, which loses the bytes
-  //   before it, and when `buf` is null or `len` negative.
+  //   before it, when `len` is negative, and when it is positive and `buf` null.
   // State: a buffered read that failed clears IsConnected(), a wait that failed does not; the
   //   descriptor stays open.
   // Blocks for `timeout` seconds a wait; a small buffered read that gets nothing makes seven. One

@@ -6,7 +6,10 @@
 #include <cmath>
 #include <cstdio>
 
-namespace {
+#ifdef __SANITIZE_ADDRESS__
+// GCC 12 comes without the sanitizer's header that declares it.
+extern "C" size_t __sanitizer_get_current_allocated_bytes();
+#endif
 
 long ResidentKib() {
   FILE* file = fopen("/proc/self/statm", "re");
@@ -19,11 +22,13 @@ long ResidentKib() {
 }
 
 long InUseKib() {
+#ifdef __SANITIZE_ADDRESS__
+  return static_cast<long>(__sanitizer_get_current_allocated_bytes() / 1024);
+#else
   const struct mallinfo2 info = mallinfo2();
   return static_cast<long>((info.uordblks + info.hblkhd) / 1024);
+#endif
 }
-
-}  // namespace
 
 void MemoryMeter::Sample(double seconds) {
   points_.push_back({seconds / 60, ResidentKib(), InUseKib()});

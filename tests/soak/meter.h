@@ -5,6 +5,10 @@
 #include <cstddef>
 #include <vector>
 
+// The process's memory now: what is resident, and what malloc has given out.
+long ResidentKib();
+long InUseKib();
+
 // A least-squares line through samples.
 struct Slope {
   double kib_per_minute = 0;

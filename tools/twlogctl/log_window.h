@@ -23,6 +23,7 @@ class LogWindow {
     std::string text;
     std::optional<Moment> moment;
     bool doubtful = false;
+    bool continues = false;  // lines of a long message whose beginning came before
   };
   size_t m_size;
   std::deque<Kept> m_kept;

@@ -7,15 +7,18 @@
 #include <cstdio>
 #include <cstdlib>
 #include <ctime>
-#include <fstream>
-#include <iterator>
 #include <sstream>
 
 #include "tarnwick/log/twdebuglog.h"
+#include "tarnwick/platform/unique.h"
+#include "tools/common/private_file.h"
 #include "tools/common/shell.h"
 #include "tools/twlogctl/owned_folder.h"
 
 namespace {
+
+// The maps of a process of 100,000 mappings take 8 MiB.
+constexpr size_t kLongestFile = 64 << 20;
 
 // The file name under which a System V segment stands in /proc/PID/maps.
 std::string SegmentName() {
@@ -62,8 +65,14 @@ LibraryUser LookAtMemory(pid_t pid, int segment) {
 }  // namespace
 
 std::string ReadWholeFile(const std::string& path) {
-  std::ifstream file(path, std::ios::binary);
-  return std::string(std::istreambuf_iterator<char>(file), {});
+  const tarnwick::UniqueFd file = OpenRegularFile(path.c_str());
+  std::string text;
+  char piece[65536];
+  for (ssize_t count; (count = read(file.Get(), piece, sizeof(piece))) > 0;) {
+    text.append(piece, static_cast<size_t>(count));
+    if (text.size() > kLongestFile) return "";
+  }
+  return text;
 }
 
 std::string NameAndPid(const ProcessInfo& process) {

@@ -43,7 +43,8 @@ struct LibraryUser {
 // seen by root alone. `segment` is the record's id, or -1 for none.
 std::vector<LibraryUser> LibraryUsers(int segment);
 
-// The whole text of a file, empty when it cannot be read. For /proc, whose files have no size.
+// The whole text of a regular file, empty when it cannot be read or has more than 64 MiB. For /proc
+// too, whose files have no size.
 std::string ReadWholeFile(const std::string& path);
 
 #endif  // TARNWICK_TOOLS_TWLOGCTL_PROCESSES_H_
