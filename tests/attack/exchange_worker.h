@@ -1,0 +1,73 @@
+// One client thread with its hostile server: takes exchanges by their numbers, plays and judges
+// them.
+#ifndef TARNWICK_TESTS_ATTACK_EXCHANGE_WORKER_H_
+#define TARNWICK_TESTS_ATTACK_EXCHANGE_WORKER_H_
+
+#include <atomic>
+#include <mutex>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "tests/attack/exchange.h"
+#include "tests/attack/figures.h"
+#include "tests/attack/judge.h"
+#include "tests/attack/peer_thread.h"
+
+// What all workers count together.
+struct ExchangeTally {
+  unsigned long exchanges = 0;
+  unsigned long over_tls = 0;
+  unsigned long by_curl = 0;
+  unsigned long stalled = 0;  // the server did pause
+  unsigned long stalled_over_tls = 0;
+  unsigned long understood = 0;  // of clean responses, whose status was compared
+  unsigned long escaped = 0;
+  unsigned long requests = 0;
+  unsigned long findings = 0;
+};
+
+struct ExchangeRun {
+  AttackOptions options;
+  Shares shares;
+  const PeerContexts* contexts = nullptr;
+  uint64_t first = 0;
+  uint64_t end = 0;  // after the last number
+  std::atomic<uint64_t> next{0};
+  LongestCall longest;
+  LongestCall longest_without_pause;
+  std::mutex mutex;  // of what follows
+  ExchangeTally tally;
+  std::vector<std::string> findings;
+};
+
+class ExchangeWorker {
+ public:
+  explicit ExchangeWorker(ExchangeRun* run);
+  ~ExchangeWorker();
+  ExchangeWorker(const ExchangeWorker&) = delete;
+  ExchangeWorker& operator=(const ExchangeWorker&) = delete;
+
+  // Seconds of the steady clock at which the exchange under way began; 0 without one.
+  long BusySince() const { return busy_since_; }
+  uint64_t Number() const { return number_; }
+
+ private:
+  void Work();
+  void PlayOne(uint64_t number);
+  Played Play(const HostileExchange& exchange);
+  void Note(const HostileExchange& exchange, const Played& played);
+
+  ExchangeRun* const run_;
+  PeerThread peer_;
+  std::atomic<long> busy_since_{0};
+  std::atomic<uint64_t> number_{0};
+  std::thread thread_;
+};
+
+long SteadySeconds();
+
+// Brings the violation `kind` into an exchange, as --plant names it. False for an unknown name.
+bool IsPlant(const std::string& kind);
+
+#endif  // TARNWICK_TESTS_ATTACK_EXCHANGE_WORKER_H_
