@@ -149,12 +149,16 @@ std::string Escaped(const std::string& bytes) {
 
 }  // namespace
 
+bool Stalls(uint64_t seed, uint64_t number, const Shares& shares) {
+  return Dice(seed, number).PerCent(shares.stall);
+}
+
 HostileExchange MakeExchange(uint64_t seed, uint64_t number, const Shares& shares) {
   Dice dice(seed, number);
   HostileExchange exchange;
   exchange.number = number;
-  const bool tls = dice.PerCent(shares.tls);
   exchange.stalls = dice.PerCent(shares.stall);
+  const bool tls = dice.PerCent(shares.tls);
   exchange.operation = &PickOperation(tls, &dice);
   exchange.target = PickTarget(tls, exchange.stalls, &dice);
   exchange.escaped = dice.OneIn(2);

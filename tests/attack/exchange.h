@@ -61,9 +61,12 @@ struct HostileExchange {
 
 // Shares in per cent.
 struct Shares {
-  size_t tls = 20;
-  size_t stall = 10;
+  size_t tls = 25;
+  size_t stall = 12;
 };
+
+// Whether the server pauses in it, which is known without making it.
+bool Stalls(uint64_t seed, uint64_t number, const Shares& shares);
 
 HostileExchange MakeExchange(uint64_t seed, uint64_t number, const Shares& shares);
 

@@ -86,8 +86,8 @@ bool IsPlant(const std::string& kind) {
   return kind.empty();
 }
 
-ExchangeWorker::ExchangeWorker(ExchangeRun* run)
-    : run_(run), peer_(*run->contexts), thread_([this] { Work(); }) {}
+ExchangeWorker::ExchangeWorker(ExchangeRun* run, bool stalls)
+    : run_(run), stalls_(stalls), peer_(*run->contexts), thread_([this] { Work(); }) {}
 
 ExchangeWorker::~ExchangeWorker() {
   thread_.join();
@@ -98,9 +98,9 @@ void ExchangeWorker::Work() {
   xmlSetStructuredErrorFunc(nullptr, SayNothing);
   for (;;) {
     busy_since_ = SteadySeconds();
-    const uint64_t number = run_->next++;
+    const uint64_t number = run_->next[stalls_ ? 1 : 0]++;
     if (number >= run_->end) break;
-    PlayOne(number);
+    if (Stalls(run_->options.seed, number, run_->shares) == stalls_) PlayOne(number);
   }
   busy_since_ = 0;
 }

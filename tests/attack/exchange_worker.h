@@ -32,8 +32,8 @@ struct ExchangeRun {
   Shares shares;
   const PeerContexts* contexts = nullptr;
   uint64_t first = 0;
-  uint64_t end = 0;  // after the last number
-  std::atomic<uint64_t> next{0};
+  uint64_t end = 0;                        // after the last number
+  std::atomic<uint64_t> next[2] = {0, 0};  // of those without a pause and with one
   LongestCall longest;
   LongestCall longest_without_pause;
   std::mutex mutex;  // of what follows
@@ -43,7 +43,9 @@ struct ExchangeRun {
 
 class ExchangeWorker {
  public:
-  explicit ExchangeWorker(ExchangeRun* run);
+  // Plays the exchanges in which the server pauses, or the others. The first sleep most of the time
+  // and many of them overlap; of the others a few keep the processors busy.
+  ExchangeWorker(ExchangeRun* run, bool stalls);
   ~ExchangeWorker();
   ExchangeWorker(const ExchangeWorker&) = delete;
   ExchangeWorker& operator=(const ExchangeWorker&) = delete;
@@ -59,6 +61,7 @@ class ExchangeWorker {
   void Note(const HostileExchange& exchange, const Played& played);
 
   ExchangeRun* const run_;
+  const bool stalls_;
   PeerThread peer_;
   std::atomic<long> busy_since_{0};
   std::atomic<uint64_t> number_{0};
@@ -67,7 +70,7 @@ class ExchangeWorker {
 
 long SteadySeconds();
 
-// Brings the violation `kind` into an exchange, as --plant names it. False for an unknown name.
+// True for a violation that --plant knows, and for none.
 bool IsPlant(const std::string& kind);
 
 #endif  // TARNWICK_TESTS_ATTACK_EXCHANGE_WORKER_H_

@@ -20,7 +20,10 @@ namespace {
 
 constexpr unsigned long kExchanges = 2000000;
 constexpr unsigned long kQuickExchanges = 20000;
-constexpr int kThreads = 128;
+
+// Of those without pauses; and how many with pauses for each of them.
+constexpr int kThreads = 8;
+constexpr int kPatientThreads = 15;
 
 constexpr int kProgressSeconds = 30;
 
@@ -69,9 +72,9 @@ Footprint Watch(ExchangeRun* run, const Workers& workers) {
   const long start = SteadySeconds();
   long next = start + kProgressSeconds;
   const uint64_t a_third = run->first + (run->end - run->first) / 3;
-  while (!IsOver(workers) || run->next < run->end) {
+  while (!IsOver(workers) || run->next[0] < run->end || run->next[1] < run->end) {
     usleep(20000);
-    if (third.resident_kib == 0 && run->next >= a_third) third = CurrentFootprint();
+    if (third.resident_kib == 0 && run->next[0] >= a_third) third = CurrentFootprint();
     EndIfHanging(*run, workers);
     if (SteadySeconds() < next) continue;
     PrintProgress(SteadySeconds() - start, run);
@@ -142,7 +145,7 @@ bool SetUp(const AttackOptions& options, ExchangeRun* run) {
     run->first = static_cast<uint64_t>(options.only);
     run->end = run->first + 1;
   }
-  run->next = run->first;
+  run->next[0] = run->next[1] = run->first;
   if (run->options.threads == 0) run->options.threads = options.only >= 0 ? 1 : kThreads;
   return true;
 }
@@ -164,7 +167,11 @@ int RunExchanges(const AttackOptions& options) {
   {
     Workers workers;
     for (int i = 0; i < run.options.threads; ++i) {
-      workers.push_back(std::make_unique<ExchangeWorker>(&run));
+      workers.push_back(std::make_unique<ExchangeWorker>(&run, false));
+      const int patient = options.only >= 0 ? 1 : kPatientThreads;
+      for (int k = 0; k < patient; ++k) {
+        workers.push_back(std::make_unique<ExchangeWorker>(&run, true));
+      }
     }
     third = Watch(&run, workers);
   }

@@ -36,6 +36,7 @@ bool IsSuccess(int status) {
 // The response that the operation must have understood; null when it need not have.
 const Response* UnderstoodResponse(const HostileExchange& exchange, const PeerRecord& record) {
   if (!record.whole || exchange.stalls || record.spoke_http2) return nullptr;
+  if (exchange.tls.fault != HandshakeFault::kNone) return nullptr;
   const Delivery& last = exchange.deliveries[static_cast<size_t>(record.last_delivery)];
   return last.response.clean_head ? &last.response : nullptr;
 }
