@@ -163,7 +163,8 @@ HostileExchange MakeExchange(uint64_t seed, uint64_t number, const Shares& share
   exchange.target = PickTarget(tls, exchange.stalls, &dice);
   exchange.escaped = dice.OneIn(2);
   if (tls) exchange.tls = PickTls(*exchange.operation, &dice);
-  for (int i = 0; i < exchange.operation->most_requests; ++i) {
+  constexpr int kMostPlanned = 3;
+  for (int i = 0; i < std::min(exchange.operation->most_requests, kMostPlanned); ++i) {
     exchange.deliveries.push_back(PickDelivery(exchange, &dice));
   }
   if (!exchange.stalls) return exchange;

@@ -12,6 +12,7 @@
 #include <optional>
 
 #include "tarnwick/net/twrequestscope.h"
+#include "tests/attack/exchange_plants.h"
 #include "tests/attack/in_flight.h"
 #include "tests/support/files.h"
 #include "tests/support/log_capture.h"
@@ -21,12 +22,6 @@ namespace {
 using Clock = std::chrono::steady_clock;
 
 constexpr size_t kFindingsKept = 50;
-
-// One exchange in so many has the planted violation.
-constexpr uint64_t kPlantEvery = 97;
-
-const char* const kPlants[] = {"status", "descriptor", "slow",  "split",  "result",
-                               "body",   "log",        "crash", "memory", "throw"};
 
 // A log of the thread's own: its lines are told from those of the others, whatever a peer writes
 // into them.
@@ -42,28 +37,11 @@ void TakeOwnLog() {
 // libxml2 tells of documents that are wrong, on the error output.
 void SayNothing(void* /*context*/, xmlError* /*error*/) {}
 
-void Plant(const std::string& kind, Played* played) {
-  OperationOutcome& outcome = played->outcome;
-  if (kind == "status") outcome.status = 299 + outcome.status;
-  if (kind == "status") outcome.result = outcome.result == 0 ? HTTP_RET_IO_ERROR : HTTP_RET_OK;
-  if (kind == "descriptor" && dup(STDERR_FILENO) < 0) abort();
-  if (kind == "slow") played->seconds += 100;
-  if (kind == "split") played->record.connections.push_back("X-Split: yes\r\n\r\n");
-  if (kind == "result") outcome.result = 77;
-  if (kind == "body") outcome.text += "x";
-  if (kind == "log") played->log += "Nov 22 04:40:00 [1] forged\x1b[2J\n";
-  if (kind == "memory") {
-    static std::atomic<void*> lost;
-    lost = new char[1 << 20]();
-  }
-  if (kind == "crash") *static_cast<volatile char*>(nullptr) = 1;
-  if (kind == "throw") outcome.mistake = "threw planted";
-}
-
-OperationOutcome RunGuarded(const HostileExchange& exchange) {
+OperationOutcome RunGuarded(const HostileExchange& exchange, const std::string& plant) {
   try {
     std::optional<TWRequestScope> scope;
-    if (exchange.escaped) scope.emplace().SetEscapedLog(true);
+    if (exchange.escaped && plant != "log") scope.emplace().SetEscapedLog(true);
+    PlantInCall(plant);
     return exchange.operation->run(exchange.target);
   } catch (const std::exception& exception) {
     OperationOutcome outcome;
@@ -79,13 +57,6 @@ long SteadySeconds() {
   return static_cast<long>(std::chrono::duration_cast<std::chrono::seconds>(now).count());
 }
 
-bool IsPlant(const std::string& kind) {
-  for (const char* const plant : kPlants) {
-    if (kind == plant) return true;
-  }
-  return kind.empty();
-}
-
 ExchangeWorker::ExchangeWorker(ExchangeRun* run, bool stalls)
     : run_(run), stalls_(stalls), peer_(*run->contexts), thread_([this] { Work(); }) {}
 
@@ -98,7 +69,7 @@ void ExchangeWorker::Work() {
   xmlSetStructuredErrorFunc(nullptr, SayNothing);
   for (;;) {
     busy_since_ = SteadySeconds();
-    const uint64_t number = run_->next[stalls_ ? 1 : 0]++;
+    const uint64_t number = run_->next[stalls_ ? 1 : 0].fetch_add(run_->step);
     if (number >= run_->end) break;
     if (Stalls(run_->options.seed, number, run_->shares) == stalls_) PlayOne(number);
   }
@@ -111,18 +82,17 @@ void ExchangeWorker::PlayOne(uint64_t number) {
   HostileExchange exchange = MakeExchange(run_->options.seed, number, run_->shares);
   exchange.target.port = peer_.Port();
   if (run_->options.verbose) printf("%s", Description(exchange).c_str());
-  Played played = Play(exchange);
-  if (!run_->options.plant.empty() && number % kPlantEvery == kPlantEvery - 1) {
-    Plant(run_->options.plant, &played);
-  }
+  const std::string plant = number % kPlantEvery == kPlantFirst ? run_->options.plant : "";
+  Played played = Play(exchange, plant);
+  PlantInExchange(plant, &exchange, &played);
   Note(exchange, played);
 }
 
-Played ExchangeWorker::Play(const HostileExchange& exchange) {
+Played ExchangeWorker::Play(const HostileExchange& exchange, const std::string& plant) {
   Played played;
   peer_.Begin(exchange);
   const auto start = Clock::now();
-  played.outcome = RunGuarded(exchange);
+  played.outcome = RunGuarded(exchange, plant);
   played.seconds = std::chrono::duration<double>(Clock::now() - start).count();
   played.record = peer_.Finish();
   if (exchange.escaped) played.log = ReadFile(kMainLog);
@@ -130,8 +100,18 @@ Played ExchangeWorker::Play(const HostileExchange& exchange) {
   return played;
 }
 
+// The words of the command line with which the exchange is played alone.
+std::string ExchangeWorker::WordsToPlayAgain(uint64_t number) const {
+  const AttackOptions& options = run_->options;
+  std::string words =
+      "--seed " + std::to_string(options.seed) + " --only " + std::to_string(number);
+  if (options.tls >= 0) words += " --tls " + std::to_string(options.tls);
+  if (options.stall >= 0) words += " --stall " + std::to_string(options.stall);
+  return words;
+}
+
 void ExchangeWorker::Note(const HostileExchange& exchange, const Played& played) {
-  const std::vector<std::string> findings = Judge(exchange, played);
+  const std::vector<std::string> findings = Judge(exchange, played, run_->margin);
   const PeerRecord& record = played.record;
   const bool stalled = !record.stalls_ms.empty();
   run_->longest.Add(played.seconds, Summary(exchange));
@@ -154,10 +134,10 @@ void ExchangeWorker::Note(const HostileExchange& exchange, const Played& played)
   for (const std::string& finding : findings) {
     ++tally.findings;
     if (run_->findings.size() >= kFindingsKept) continue;
-    const std::string text = Summary(exchange) + ": " + finding + " (--seed " +
-                             std::to_string(run_->options.seed) + " --only " +
-                             std::to_string(exchange.number) + ")";
+    const std::string text =
+        Summary(exchange) + ": " + finding + " (" + WordsToPlayAgain(exchange.number) + ")";
     run_->findings.push_back(text);
+    run_->found.push_back(exchange.number);
     printf("FINDING: %s\n", text.c_str());
     fflush(stdout);
   }

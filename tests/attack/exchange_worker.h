@@ -32,13 +32,20 @@ struct ExchangeRun {
   Shares shares;
   const PeerContexts* contexts = nullptr;
   uint64_t first = 0;
-  uint64_t end = 0;                        // after the last number
+  uint64_t end = 0;  // after the last number
+  uint64_t step = 1;
+  double margin = 3;                       // seconds; see LongestAllowed
   std::atomic<uint64_t> next[2] = {0, 0};  // of those without a pause and with one
+  Footprint start;
+  Footprint third;  // after the first third of the exchanges
+  Footprint finish;
+  long seconds = 0;
   LongestCall longest;
   LongestCall longest_without_pause;
   std::mutex mutex;  // of what follows
   ExchangeTally tally;
-  std::vector<std::string> findings;
+  std::vector<std::string> findings;  // the first ones, and the numbers of their exchanges
+  std::vector<uint64_t> found;
 };
 
 class ExchangeWorker {
@@ -57,7 +64,8 @@ class ExchangeWorker {
  private:
   void Work();
   void PlayOne(uint64_t number);
-  Played Play(const HostileExchange& exchange);
+  Played Play(const HostileExchange& exchange, const std::string& plant);
+  std::string WordsToPlayAgain(uint64_t number) const;
   void Note(const HostileExchange& exchange, const Played& played);
 
   ExchangeRun* const run_;
@@ -69,8 +77,5 @@ class ExchangeWorker {
 };
 
 long SteadySeconds();
-
-// True for a violation that --plant knows, and for none.
-bool IsPlant(const std::string& kind);
 
 #endif  // TARNWICK_TESTS_ATTACK_EXCHANGE_WORKER_H_

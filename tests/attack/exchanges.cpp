@@ -10,7 +10,8 @@
 #include <memory>
 
 #include "tests/attack/attacks.h"
-#include "tests/attack/exchange_worker.h"
+#include "tests/attack/exchange_plants.h"
+#include "tests/attack/exchange_run.h"
 #include "tests/attack/in_flight.h"
 #include "tests/http/http_test_util.h"
 #include "tests/support/log_capture.h"
@@ -88,14 +89,15 @@ void AddFinding(const std::string& text, ExchangeRun* run) {
   ++run->tally.findings;
 }
 
-void JudgeFootprints(const Footprint& start, const Footprint& third, const Footprint& end,
-                     ExchangeRun* run) {
-  if (end.descriptors != start.descriptors) {
-    AddFinding(std::to_string(start.descriptors) + " descriptors before, " +
-                   std::to_string(end.descriptors) + " after",
+void JudgeFootprints(ExchangeRun* run) {
+  if (run->finish.descriptors != run->start.descriptors) {
+    AddFinding(std::to_string(run->start.descriptors) + " descriptors before, " +
+                   std::to_string(run->finish.descriptors) + " after",
                run);
   }
-  if (end.in_use_kib > third.in_use_kib + kMostGrowthKib) AddFinding("memory grows", run);
+  if (run->finish.in_use_kib > run->third.in_use_kib + kMostGrowthKib) {
+    AddFinding("memory grows", run);
+  }
 }
 
 std::string SecondsOf(const LongestCall& call) {
@@ -104,12 +106,11 @@ std::string SecondsOf(const LongestCall& call) {
   return text + call.Name();
 }
 
-void PrintTable(const ExchangeRun& run, long seconds, const Footprint& start,
-                const Footprint& third, const Footprint& end) {
+void PrintTable(const ExchangeRun& run) {
   const ExchangeTally& tally = run.tally;
   puts("");
   PrintFigure("seed, seconds, threads", std::to_string(run.options.seed) + ", " +
-                                            std::to_string(seconds) + ", " +
+                                            std::to_string(run.seconds) + ", " +
                                             std::to_string(run.options.threads));
   PrintFigure("exchanges", std::to_string(tally.exchanges));
   PrintFigure("  plain", std::to_string(tally.exchanges - tally.over_tls));
@@ -120,9 +121,9 @@ void PrintTable(const ExchangeRun& run, long seconds, const Footprint& start,
   PrintFigure("  with an escaped log, checked", std::to_string(tally.escaped));
   PrintFigure("  clean, whose status was compared", std::to_string(tally.understood));
   PrintFigure("responses begun", std::to_string(tally.requests));
-  PrintFootprint("at the start", start);
-  PrintFootprint("after the first third", third);
-  PrintFootprint("at the end", end);
+  PrintFootprint("at the start", run.start);
+  PrintFootprint("after the first third", run.third);
+  PrintFootprint("at the end", run.finish);
   PrintFigure("longest call", SecondsOf(run.longest));
   PrintFigure("longest without a pause", SecondsOf(run.longest_without_pause));
   PrintFigure("findings", std::to_string(tally.findings));
@@ -132,6 +133,11 @@ void PrintTable(const ExchangeRun& run, long seconds, const Footprint& start,
 void WarmUp() {
   xmlInitParser();  // as libxml2 asks of programs with threads
   curl_global_init(CURL_GLOBAL_DEFAULT);
+}
+
+bool IsPlant(const std::string& kind) {
+  const std::vector<std::string>& plants = ExchangePlants();
+  return kind.empty() || std::find(plants.begin(), plants.end(), kind) != plants.end();
 }
 
 bool SetUp(const AttackOptions& options, ExchangeRun* run) {
@@ -145,38 +151,48 @@ bool SetUp(const AttackOptions& options, ExchangeRun* run) {
     run->first = static_cast<uint64_t>(options.only);
     run->end = run->first + 1;
   }
-  run->next[0] = run->next[1] = run->first;
   if (run->options.threads == 0) run->options.threads = options.only >= 0 ? 1 : kThreads;
   return true;
 }
 
+void StartWorkers(ExchangeRun* run, Workers* workers) {
+  run->next[0] = run->next[1] = run->first;
+  const bool one = run->first + run->step >= run->end;
+  const int patient = run->shares.stall == 0 || one ? 1 : kPatientThreads;
+  for (int i = 0; i < run->options.threads; ++i) {
+    workers->push_back(std::make_unique<ExchangeWorker>(run, false));
+    for (int k = 0; k < patient; ++k) {
+      workers->push_back(std::make_unique<ExchangeWorker>(run, true));
+    }
+  }
+}
+
 }  // namespace
 
-int RunExchanges(const AttackOptions& options) {
-  ExchangeRun run;
-  if (!SetUp(options, &run)) return 2;
+void PlayRun(ExchangeRun* run) {
   const PeerContexts contexts;
-  run.contexts = &contexts;
+  run->contexts = &contexts;
   const TrustedAuthority trusted(contexts.CaFile());
   const LogCapture log;
   WarmUp();
-  PrintInFlightAtDeath();
   const long began = SteadySeconds();
-  const Footprint start = CurrentFootprint();
-  Footprint third;
+  run->start = CurrentFootprint();
   {
     Workers workers;
-    for (int i = 0; i < run.options.threads; ++i) {
-      workers.push_back(std::make_unique<ExchangeWorker>(&run, false));
-      const int patient = options.only >= 0 ? 1 : kPatientThreads;
-      for (int k = 0; k < patient; ++k) {
-        workers.push_back(std::make_unique<ExchangeWorker>(&run, true));
-      }
-    }
-    third = Watch(&run, workers);
+    StartWorkers(run, &workers);
+    run->third = Watch(run, workers);
   }
-  const Footprint end = CurrentFootprint();
-  JudgeFootprints(start, third, end, &run);
-  PrintTable(run, SteadySeconds() - began, start, third, end);
+  run->finish = CurrentFootprint();
+  run->seconds = SteadySeconds() - began;
+  JudgeFootprints(run);
+}
+
+int RunExchanges(const AttackOptions& options) {
+  if (options.self_check) return CheckExchanges(options);
+  ExchangeRun run;
+  if (!SetUp(options, &run)) return 2;
+  PrintInFlightAtDeath();
+  PlayRun(&run);
+  PrintTable(run);
   return run.tally.findings == 0 ? 0 : 1;
 }

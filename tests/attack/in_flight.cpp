@@ -19,7 +19,7 @@ void Print() {
   const int length =
       snprintf(text, sizeof(text), "died at --seed %lu --only %lu\n",
                static_cast<unsigned long>(t_seed), static_cast<unsigned long>(t_number));
-  if (write(STDERR_FILENO, text, static_cast<size_t>(length)) != length) _exit(3);
+  if (write(STDOUT_FILENO, text, static_cast<size_t>(length)) != length) _exit(3);
 }
 
 void PrintAndDie(int signal_number) {

@@ -8,8 +8,6 @@
 
 namespace {
 
-constexpr double kMargin = 3;
-
 std::string TimeProblem(double took, double allowed) {
   if (took <= allowed) return "";
   char text[80];
@@ -129,8 +127,8 @@ bool IsUnderstood(const HostileExchange& exchange, const PeerRecord& record) {
   return UnderstoodResponse(exchange, record) != nullptr;
 }
 
-double LongestAllowed(const HostileExchange& exchange, const PeerRecord& record) {
-  double seconds = kMargin + record.sending;
+double LongestAllowed(const HostileExchange& exchange, const PeerRecord& record, double margin) {
+  double seconds = margin + record.sending;
   for (const unsigned pause : record.stalls_ms) seconds += CostOfPause(exchange, pause);
   return seconds;
 }
@@ -156,7 +154,8 @@ std::string EscapedLogProblem(const std::string& log) {
   return "";
 }
 
-std::vector<std::string> Judge(const HostileExchange& exchange, const Played& played) {
+std::vector<std::string> Judge(const HostileExchange& exchange, const Played& played,
+                               double margin) {
   std::vector<std::string> findings;
   const auto note = [&](const std::string& finding) {
     if (!finding.empty()) findings.push_back(finding);
@@ -164,7 +163,7 @@ std::vector<std::string> Judge(const HostileExchange& exchange, const Played& pl
   note(played.outcome.mistake);
   note(ResultProblem(exchange, played.outcome));
   note(RequestsProblem(exchange, played.record));
-  note(TimeProblem(played.seconds, LongestAllowed(exchange, played.record)));
+  note(TimeProblem(played.seconds, LongestAllowed(exchange, played.record, margin)));
   if (const Response* response = UnderstoodResponse(exchange, played.record)) {
     note(StatusProblem(exchange, *response, played.outcome));
     // A body after another response is decoded by that one's transfer encoding.

@@ -18,12 +18,13 @@ struct Played {
 
 // The seconds that the exchange may take at most. A pause of the server's holds a call for as long
 // as it lasts, or for the operation's waits of docs/longest-call.md if that is less; to this comes
-// the time that the server took to send, and a margin for a machine with more threads than
+// the time that the server took to send, and `margin` seconds for a machine with more threads than
 // processors.
-double LongestAllowed(const HostileExchange& exchange, const PeerRecord& record);
+double LongestAllowed(const HostileExchange& exchange, const PeerRecord& record, double margin);
 
 // The findings; empty when there are none.
-std::vector<std::string> Judge(const HostileExchange& exchange, const Played& played);
+std::vector<std::string> Judge(const HostileExchange& exchange, const Played& played,
+                               double margin);
 
 // Whether a clean response came whole, so that the status and the body were compared.
 bool IsUnderstood(const HostileExchange& exchange, const PeerRecord& record);

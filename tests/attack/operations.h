@@ -61,6 +61,10 @@ struct PeerOperation {
   int most_requests = 1;
 };
 
+// A server of an attack answers so many requests of one operation, and closes then: some operations
+// would go on for as long as it answers.
+inline constexpr int kMostDeliveries = 12;
+
 const std::vector<PeerOperation>& PeerOperations();
 
 // What the requests carry.

@@ -22,9 +22,6 @@ constexpr int kBacklog = 64;
 constexpr int kRequestLimitMs = 5000;
 constexpr int kNextRequestMs = 100;
 
-// No operation asks so often: the server ends what would go on for ever.
-constexpr int kMostDeliveries = 12;
-
 constexpr char kHttp2Preface[] = "PRI * HTTP/2.0";
 
 TlsOptions Stranger() {
