@@ -4,6 +4,7 @@
 #include <unistd.h>
 
 #include <cstdio>
+#include <initializer_list>
 
 #if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
 #include <sanitizer/common_interface_defs.h>
