@@ -57,6 +57,7 @@ class PeerLink {
   BIO* from_client_ = nullptr;
   BIO* to_client_ = nullptr;
   bool faulty_ = false;
+  bool spoilt_ = false;  // the fault has been sent
   size_t handshake_sent_ = 0;
   std::string received_;
 };
