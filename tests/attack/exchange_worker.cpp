@@ -110,12 +110,16 @@ std::string ExchangeWorker::WordsToPlayAgain(uint64_t number) const {
   return words;
 }
 
+void ExchangeWorker::NoteTime(const HostileExchange& exchange, double seconds, bool stalled) {
+  LongestCall& longest = stalled ? run_->longest : run_->longest_without_pause;
+  if (seconds > longest.Seconds()) longest.Add(seconds, Summary(exchange));
+}
+
 void ExchangeWorker::Note(const HostileExchange& exchange, const Played& played) {
   const std::vector<std::string> findings = Judge(exchange, played, run_->margin);
   const PeerRecord& record = played.record;
   const bool stalled = !record.stalls_ms.empty();
-  run_->longest.Add(played.seconds, Summary(exchange));
-  if (!stalled) run_->longest_without_pause.Add(played.seconds, Summary(exchange));
+  NoteTime(exchange, played.seconds, stalled);
   const std::lock_guard<std::mutex> lock(run_->mutex);
   ExchangeTally& tally = run_->tally;
   ++tally.exchanges;

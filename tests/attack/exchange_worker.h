@@ -67,6 +67,7 @@ class ExchangeWorker {
   Played Play(const HostileExchange& exchange, const std::string& plant);
   std::string WordsToPlayAgain(uint64_t number) const;
   void Note(const HostileExchange& exchange, const Played& played);
+  void NoteTime(const HostileExchange& exchange, double seconds, bool stalled);
 
   ExchangeRun* const run_;
   const bool stalls_;

@@ -124,8 +124,8 @@ void PrintTable(const ExchangeRun& run) {
   PrintFootprint("at the start", run.start);
   PrintFootprint("after the first third", run.third);
   PrintFootprint("at the end", run.finish);
-  PrintFigure("longest call", SecondsOf(run.longest));
-  PrintFigure("longest without a pause", SecondsOf(run.longest_without_pause));
+  PrintFigure("longest call with a pause", SecondsOf(run.longest));
+  PrintFigure("longest call without one", SecondsOf(run.longest_without_pause));
   PrintFigure("findings", std::to_string(tally.findings));
 }
 
