@@ -77,6 +77,7 @@ void PeerLink::Decode() {
 }
 
 bool PeerLink::Read(int limit_ms) {
+  if (spoilt_) limit_ms = std::min(limit_ms, kSpoiltLimitMs);
   if (fd_ < 0 || WaitFor(POLLIN, limit_ms) != Event::kReadable) return false;
   const bool more = Receive();
   Decode();
