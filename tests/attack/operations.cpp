@@ -14,8 +14,8 @@ const std::vector<int> kOutcome = {HTTP_RET_OK,           HTTP_RET_NOT_READY,   
 
 // The waits are those of docs/longest-call.md for one silence: of the head 7 T and T, of a chunked
 // body 14 T and 2 T; an operation that reads on after a failure waits for each. libcurl asks four
-// times where a server changes between Basic and Digest, and without an end where it calls each
-// nonce stale, which the server of the attack does for kMostDeliveries responses.
+// times where a server changes between Basic and Digest, and more often than kMostDeliveries where
+// it calls each nonce stale.
 const std::vector<PeerOperation>& PeerOperations() {
   constexpr auto kEither = OverTls::kEither;
   constexpr auto kNever = OverTls::kNever;

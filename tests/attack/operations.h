@@ -1,5 +1,5 @@
-// Every operation of the HTTP client and of the sockets that reads from a peer: one table, with what
-// the headers and docs/longest-call.md say of each.
+// Every operation of the HTTP client and of the sockets that reads from a peer: one table, with
+// what the headers and docs/longest-call.md say of each.
 #ifndef TARNWICK_TESTS_ATTACK_OPERATIONS_H_
 #define TARNWICK_TESTS_ATTACK_OPERATIONS_H_
 
@@ -61,8 +61,7 @@ struct PeerOperation {
   int most_requests = 1;
 };
 
-// A server of an attack answers so many requests of one operation, and closes then: some operations
-// would go on for as long as it answers.
+// A server of an attack responds to so many requests of one operation, and closes then.
 inline constexpr int kMostDeliveries = 12;
 
 const std::vector<PeerOperation>& PeerOperations();
