@@ -91,9 +91,11 @@ void ExchangeWorker::PlayOne(uint64_t number) {
 Played ExchangeWorker::Play(const HostileExchange& exchange, const std::string& plant) {
   Played played;
   peer_.Begin(exchange);
+  const double before = SecondsWithoutProcessor();
   const auto start = Clock::now();
   played.outcome = RunGuarded(exchange, plant);
   played.seconds = std::chrono::duration<double>(Clock::now() - start).count();
+  played.without_processor = SecondsWithoutProcessor() - before;
   played.record = peer_.Finish();
   if (exchange.escaped) played.log = ReadFile(kMainLog);
   unlink(kMainLog);

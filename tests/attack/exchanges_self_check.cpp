@@ -49,8 +49,8 @@ bool CheckCrash() {
                 "a crash names its exchange");
 }
 
-// Found among many; and those that belong to an exchange by its number alone, where nothing is found
-// without the violation.
+// Found among many; and those that belong to an exchange by its number alone, where nothing is
+// found without the violation.
 bool CheckPlant(const std::string& plant) {
   long number = -1;
   long again = -1;

@@ -127,8 +127,9 @@ bool IsUnderstood(const HostileExchange& exchange, const PeerRecord& record) {
   return UnderstoodResponse(exchange, record) != nullptr;
 }
 
-double LongestAllowed(const HostileExchange& exchange, const PeerRecord& record, double margin) {
-  double seconds = margin + record.sending;
+double LongestAllowed(const HostileExchange& exchange, const Played& played, double margin) {
+  const PeerRecord& record = played.record;
+  double seconds = margin + record.sending + record.without_processor + played.without_processor;
   for (const unsigned pause : record.stalls_ms) seconds += CostOfPause(exchange, pause);
   return seconds;
 }
@@ -163,7 +164,7 @@ std::vector<std::string> Judge(const HostileExchange& exchange, const Played& pl
   note(played.outcome.mistake);
   note(ResultProblem(exchange, played.outcome));
   note(RequestsProblem(exchange, played.record));
-  note(TimeProblem(played.seconds, LongestAllowed(exchange, played.record, margin)));
+  note(TimeProblem(played.seconds, LongestAllowed(exchange, played, margin)));
   if (const Response* response = UnderstoodResponse(exchange, played.record)) {
     note(StatusProblem(exchange, *response, played.outcome));
     // A body after another response is decoded by that one's transfer encoding.

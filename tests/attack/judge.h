@@ -13,14 +13,15 @@ struct Played {
   OperationOutcome outcome;
   PeerRecord record;
   double seconds = 0;
-  std::string log;  // what the library has logged
+  double without_processor = 0;  // of these seconds; see SecondsWithoutProcessor
+  std::string log;               // what the library has logged
 };
 
 // The seconds that the exchange may take at most. A pause of the server's holds a call for as long
 // as it lasts, or for the operation's waits of docs/longest-call.md if that is less; to this comes
-// the time that the server took to send, and `margin` seconds for a machine with more threads than
-// processors.
-double LongestAllowed(const HostileExchange& exchange, const PeerRecord& record, double margin);
+// the time that the server took to send, the time that either thread was ready and had no processor,
+// and a margin in seconds.
+double LongestAllowed(const HostileExchange& exchange, const Played& played, double margin);
 
 // The findings; empty when there are none.
 std::vector<std::string> Judge(const HostileExchange& exchange, const Played& played,

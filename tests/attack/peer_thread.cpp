@@ -10,6 +10,7 @@
 #include <cstdio>
 #include <cstdlib>
 
+#include "tests/attack/figures.h"
 #include "tests/attack/peer_link.h"
 #include "tests/attack/request_check.h"
 #include "tests/support/ports.h"
@@ -190,7 +191,9 @@ void PeerThread::Run() {
   for (;;) {
     WaitAndReset(begin_);
     if (exchange_ == nullptr) return;
+    const double before = SecondsWithoutProcessor();
     Play();
+    record_.without_processor = SecondsWithoutProcessor() - before;
     WaitAndReset(over_);
     Signal(ready_);
   }

@@ -39,6 +39,7 @@ struct PeerRecord {
   int deliveries = 0;
   bool spoke_http2 = false;
   double sending = 0;               // seconds, pauses between pieces included
+  double without_processor = 0;     // seconds; see SecondsWithoutProcessor
   std::vector<unsigned> stalls_ms;  // the pauses that were begun, as planned
 };
 
