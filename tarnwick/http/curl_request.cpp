@@ -44,8 +44,13 @@ bool CurlRequest::AddHeader(const std::string& line) {
 // libcurl would else ignore SIGPIPE for the whole process while it works, and requests of several
 // threads could leave that for good. And it would keep the TLS session for a next request of the
 // handle, which there is never: version 7.88 frees a name twice when memory runs out in doing so.
+// And it would ask again without an end where a peer calls each nonce stale; version 8.3 has made
+// kMostRepeats its own default. Pinned by
+// SendRequestByPost.ANonceThatIsAlwaysStaleIsAskedFor30TimesAtMost.
 CURLcode CurlRequest::SetOwnOptions() {
+  constexpr long kMostRepeats = 30;
   CURLcode code = Set(CURLOPT_NOSIGNAL, 1L);
+  if (code == CURLE_OK) code = Set(CURLOPT_MAXREDIRS, kMostRepeats);
   if (code == CURLE_OK) code = Set(CURLOPT_OPENSOCKETFUNCTION, OpenSocket);
   return code == CURLE_OK ? Set(CURLOPT_SSL_SESSIONID_CACHE, 0L) : code;
 }

@@ -15,6 +15,10 @@ struct Footprint {
 
 Footprint CurrentFootprint();
 
+// The seconds that the calling thread has been ready to run, since its start, and had no processor:
+// what a busy machine adds to a call. 0 where the kernel does not tell.
+double SecondsWithoutProcessor();
+
 // The call that took longest, and which one it was.
 // Threads: any.
 class LongestCall {

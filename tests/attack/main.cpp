@@ -1,7 +1,8 @@
 // Generated attacks on the library:
 //
 //   scripts/sandbox tarnwick_attack exchanges|arguments [COUNT] [--seed N] [--only N] [--verbose]
-//       [--threads N] [--tls PERCENT] [--stall PERCENT] [--plant VIOLATION] [--quick] [--self-check]
+//       [--threads N] [--tls PERCENT] [--stall PERCENT] [--plant VIOLATION] [--quick]
+//       [--self-check]
 //
 // A finding is printed with the --seed and --only that play it again. The exit code is 1 when there
 // was a finding, 2 for a wrong call.

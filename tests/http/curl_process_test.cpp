@@ -105,8 +105,8 @@ TEST_F(CurlProcess, TheMaskOfTheThreadIsAsBefore) {
 }
 
 TEST(CurlProcessOptions, ARefusedOneEndsTheRequest) {
-  for (const CURLoption option :
-       {CURLOPT_NOSIGNAL, CURLOPT_OPENSOCKETFUNCTION, CURLOPT_SSL_SESSIONID_CACHE}) {
+  for (const CURLoption option : {CURLOPT_NOSIGNAL, CURLOPT_MAXREDIRS, CURLOPT_OPENSOCKETFUNCTION,
+                                  CURLOPT_SSL_SESSIONID_CACHE}) {
     const LogCapture log;
     TWHttpClient client("127.0.0.1", ClosedPort().Port(), "x", "", "", 5, false, true, false, false,
                         HTTP_VERSION_NONE, "");

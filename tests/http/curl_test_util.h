@@ -35,13 +35,13 @@ class FileInMemory {
   FILE* file_ = tmpfile();
 };
 
-// The options that were set, in their order, but for the three that each transfer ends them with:
-// those keep it from the process's signals and children (see curl_process_test.cpp), and from a
-// cache that nobody would use.
+// The options that were set, in their order, but for the four that each transfer ends them with:
+// those keep it from the process's signals and children (see curl_process_test.cpp), from repeating a
+// request without an end, and from a cache that nobody would use.
 inline std::vector<CURLoption> OptionsOf(const Faults& faults) {
   std::vector<CURLoption> options;
   for (const CurlOption& given : faults.CurlOptions()) {
-    const bool ends = given.option == CURLOPT_NOSIGNAL ||
+    const bool ends = given.option == CURLOPT_NOSIGNAL || given.option == CURLOPT_MAXREDIRS ||
                       given.option == CURLOPT_OPENSOCKETFUNCTION ||
                       given.option == CURLOPT_SSL_SESSIONID_CACHE;
     if (!ends) options.push_back(given.option);

@@ -256,6 +256,15 @@ TEST(SendRequestByPost, AChallengeOfDigestOrBasicIsAnswered) {
   }
 }
 
+TEST(SendRequestByPost, ANonceThatIsAlwaysStaleIsAskedFor30TimesAtMost) {
+  const std::string refusal =
+      "HTTP/1.1 401 No\r\nConnection: close\r\nContent-Length: 0\r\n"
+      "WWW-Authenticate: Digest realm=\"r\", nonce=\"n\", stale=true\r\n\r\n";
+  ScriptedPeer peer(std::vector<Script>(31, Exchange(refusal)));
+  ClientProbe client(peer.Port(), WithLogin());
+  EXPECT_EQ(client.SendRequestByPost("?"), HTTP_RET_IO_ERROR);
+}
+
 TEST(SendRequestByPost, TheBodyOfTheReplyIsThrownAway) {
   ScriptedPeer peer({Exchange(kOk)});
   ClientProbe client(peer.Port());

@@ -6,8 +6,9 @@
 #include <cmath>
 #include <cstdio>
 
-#ifdef __SANITIZE_ADDRESS__
-// GCC 12 comes without the sanitizer's header that declares it.
+#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
+#define TARNWICK_SANITIZERS_MALLOC
+// GCC 12 comes without the sanitizers' header that declares it.
 extern "C" size_t __sanitizer_get_current_allocated_bytes();
 #endif
 
@@ -22,7 +23,7 @@ long ResidentKib() {
 }
 
 long InUseKib() {
-#ifdef __SANITIZE_ADDRESS__
+#ifdef TARNWICK_SANITIZERS_MALLOC
   return static_cast<long>(__sanitizer_get_current_allocated_bytes() / 1024);
 #else
   const struct mallinfo2 info = mallinfo2();
