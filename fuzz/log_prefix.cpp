@@ -98,7 +98,8 @@ int Open(const char* path, int flags, mode_t mode) {
   g_system.path = path;
   if (!g_system.opens) return errno = EMFILE, -1;
   constexpr int kWanted = O_WRONLY | O_CREAT | O_APPEND | O_NONBLOCK | O_NOCTTY;
-  Expect("the log is opened for appending, without a wait", (flags & ~O_CLOEXEC) == kWanted && mode == 0666);
+  Expect("the log is opened for appending, without a wait",
+         (flags & ~O_CLOEXEC) == kWanted && mode == 0666);
   const std::string real = "/proc/self/fd/" + std::to_string(g_system.file);
   return __real_open64(real.c_str(), O_WRONLY | O_APPEND | O_CLOEXEC);
 }
