@@ -44,6 +44,9 @@ def summary(records):
     head = ("file", "drawn", "not built", "killed", "survived", "equivalent", "share killed")
     rows = [head, *(_row(path, of) for path, of in sorted(by_path.items())), _row("all", records)]
     parts.append("\n".join(_line(row) for row in rows))
+    doubts = sorted({str(name) for record in records for name in record.get("doubts", [])})
+    if doubts:
+        parts.append("\n  ".join(["failed, but not again or without a change too:", *doubts]))
     seconds = sum(record.get("seconds", 0) for record in records)
     parts.append(f"{seconds / 60:.0f} minutes of building and testing, all copies added up")
     return "\n\n".join(parts)

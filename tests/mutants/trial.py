@@ -109,16 +109,6 @@ def _judge_changed(copy, groups):
     return {"verdict": SURVIVED, "doubts": doubts}
 
 
-def failing(copy, groups):
-    """The tests of the unchanged sources that fail."""
-    failures = [
-        failure_of(copy, program, of_program, [])
-        for stage in stages(groups)
-        for program, of_program in stage
-    ]
-    return [failure["by"] for failure in failures if failure]
-
-
 def stages(groups):
     """[[(program, its groups), ...], ...]: the fastest tests first."""
     result, passed, total = [], 0, 0.0
