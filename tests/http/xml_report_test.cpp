@@ -249,6 +249,7 @@ TEST(XmlReport, WithoutAHandlerTheContextOfOneThatWasTakenBackStays) {
 }
 
 TEST(XmlReport, AHandlerOfNewThreadsIsTheirOwn) {
+  xmlInitParser();  // sets the handlers of new threads
   Reports reports;
   xmlThrDefSetGenericErrorFunc(&reports, Note);
   InAThread([] { Parse(ParseXml, "<a>"); });
