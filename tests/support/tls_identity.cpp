@@ -79,6 +79,8 @@ int TakeHttp2(SSL*, const unsigned char** taken, unsigned char* length,
 
 SSL_CTX* TlsIdentity::NewServerContext() const {
   SSL_CTX* context = SSL_CTX_new(TLS_server_method());
+  // 20,480 sessions would be kept, which nobody resumes.
+  if (context != nullptr) SSL_CTX_set_session_cache_mode(context, SSL_SESS_CACHE_OFF);
   SSL_CTX_use_certificate(context, certificate_);
   SSL_CTX_use_PrivateKey(context, key_);
   if (options_.max_version != 0) SSL_CTX_set_max_proto_version(context, options_.max_version);
