@@ -7,10 +7,8 @@
 #include <cstdio>
 #include <cstdlib>
 #include <ctime>
-#include <initializer_list>
 
-// The sanitizers' runtime, when there is one.
-extern "C" __attribute__((weak)) void __sanitizer_set_death_callback(void (*callback)());
+#include "tests/attack/death.h"
 
 namespace {
 
@@ -25,12 +23,6 @@ void Tell() {
           static_cast<unsigned long long>(seed_now.load()), round_now.load());
 }
 
-void TellAndDie(int number) {
-  Tell();
-  signal(number, SIG_DFL);
-  raise(number);
-}
-
 long Now() {
   timespec now = {};
   clock_gettime(CLOCK_MONOTONIC, &now);
@@ -41,12 +33,7 @@ long Now() {
 
 DeathNote::DeathNote(uint64_t seed) {
   seed_now = seed;
-  if (__sanitizer_set_death_callback != nullptr) {
-    __sanitizer_set_death_callback(Tell);
-  } else {
-    for (const int number : {SIGSEGV, SIGBUS, SIGFPE, SIGILL}) signal(number, TellAndDie);
-  }
-  for (const int number : {SIGABRT, SIGPIPE}) signal(number, TellAndDie);
+  TellAtDeath(Tell);
   watcher_ = std::thread([this] { Watch(); });
 }
 

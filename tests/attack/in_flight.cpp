@@ -1,14 +1,10 @@
 #include "tests/attack/in_flight.h"
 
-#include <signal.h>
 #include <unistd.h>
 
 #include <cstdio>
-#include <initializer_list>
 
-#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
-#include <sanitizer/common_interface_defs.h>
-#endif
+#include "tests/attack/death.h"
 
 namespace {
 
@@ -23,12 +19,6 @@ void Print() {
   if (write(STDOUT_FILENO, text, static_cast<size_t>(length)) != length) _exit(3);
 }
 
-void PrintAndDie(int signal_number) {
-  Print();
-  signal(signal_number, SIG_DFL);
-  raise(signal_number);
-}
-
 }  // namespace
 
 void SetInFlight(uint64_t seed, uint64_t number) {
@@ -37,10 +27,5 @@ void SetInFlight(uint64_t seed, uint64_t number) {
 }
 
 void PrintInFlightAtDeath() {
-  signal(SIGABRT, PrintAndDie);
-#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
-  __sanitizer_set_death_callback(Print);
-#else
-  for (const int fatal : {SIGSEGV, SIGBUS, SIGFPE, SIGILL}) signal(fatal, PrintAndDie);
-#endif
+  TellAtDeath(Print);
 }
