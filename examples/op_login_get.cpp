@@ -1,5 +1,5 @@
-// Fetches a page behind a login: SendRequest asks, is refused, and logs in by Digest or Basic, as
-// the device wants it.
+// Fetches a page that needs credentials: SendRequest asks, is refused, and asks again with them, by
+// Digest or Basic, as the device wants it.
 //
 //   op_login_get HOST PORT PATH USER PASSWORD
 #include <cstdio>

@@ -1,4 +1,4 @@
-// The look-up of Enum2String.
+// How Enum2String finds a name.
 #ifndef TARNWICK_LOG_LOG_NAMES_H_
 #define TARNWICK_LOG_LOG_NAMES_H_
 
