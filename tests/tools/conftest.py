@@ -1,7 +1,9 @@
 """What the tools' tests share. They run inside scripts/sandbox, where the record of levels, the log
-folder and the settings file belong to the run:
+directory and the settings file belong to the run:
 
     scripts/sandbox python3 -m pytest tests/tools -q
+
+With pytest-xdist, each worker has a sandbox and process numbers of its own (run_tools in ./dev).
 
 TARNWICK_TOOLS_DIR is the build's folder of tools, build/debug/tools when it is unset.
 TARNWICK_TEST_EMULATOR is a command that runs a tool of another architecture ("qemu-arm -L root").
@@ -39,6 +41,10 @@ def end_by_signals_again():
 
 def pytest_sessionstart(session):
     end_by_signals_again()
+    if session.config.getoption("dist", "no") != "no":  # this process hands the tests to workers
+        if os.environ.get("TARNWICK_SANDBOX"):
+            pytest.exit("workers need a sandbox each: see run_tools in ./dev", returncode=3)
+        return
     if not os.environ.get("TARNWICK_SANDBOX"):
         pytest.exit("these tests write system paths: run them in scripts/sandbox", returncode=3)
     provide_terminals()

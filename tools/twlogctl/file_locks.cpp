@@ -104,5 +104,6 @@ std::vector<pid_t> LockHolders(int fd) {
     ended |= pid > 0 && !ReadProcess(pid);
     holders.push_back(pid);
   }
-  return ended ? HoldersByDescriptor(fd) : holders;
+  // In a PID namespace, /proc/locks leaves out the lock of a process that has ended.
+  return ended || holders.empty() ? HoldersByDescriptor(fd) : holders;
 }
