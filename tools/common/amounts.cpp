@@ -19,10 +19,10 @@ std::optional<double> UnitInMilliseconds(std::string_view unit) {
 }
 
 // "3 h 20 min", or "3 h" without a second part.
-std::string TwoUnits(long long large, const char* largeUnit, long long small,
-                     const char* smallUnit) {
-  std::string text = std::to_string(large) + ' ' + largeUnit;
-  if (small > 0) text += ' ' + std::to_string(small) + ' ' + smallUnit;
+std::string TwoUnits(long long large, const char* large_unit, long long small,
+                     const char* small_unit) {
+  std::string text = std::to_string(large) + ' ' + large_unit;
+  if (small > 0) text += ' ' + std::to_string(small) + ' ' + small_unit;
   return text;
 }
 

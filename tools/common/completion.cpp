@@ -18,11 +18,11 @@ std::string FirstSentence(const std::string& text) {
 
 class ModelBuilder {
  public:
-  explicit ModelBuilder(const CompletionWords& words) : m_words(words) {}
+  explicit ModelBuilder(const CompletionWords& words) : words_(words) {}
 
-  CompletedCommand Command(const CLI::App& app, bool isProgram) {
+  CompletedCommand Command(const CLI::App& app, bool is_program) {
     CompletedCommand command;
-    command.name = isProgram ? "" : app.get_name();
+    command.name = is_program ? "" : app.get_name();
     command.description = FirstSentence(app.get_description());
     AddOptions(app, &command);
     return command;
@@ -39,14 +39,14 @@ class ModelBuilder {
       }
     }
     // An option group is a sub-command without a name.
-    const auto isGroup = [](const CLI::App* group) { return group->get_name().empty(); };
-    for (const CLI::App* group : app.get_subcommands(isGroup)) AddOptions(*group, command);
+    const auto is_group = [](const CLI::App* group) { return group->get_name().empty(); };
+    for (const CLI::App* group : app.get_subcommands(is_group)) AddOptions(*group, command);
   }
 
   CompletedOption Option(const CLI::Option& option, const std::string& command) {
     CompletedOption completed;
     completed.description = FirstSentence(option.get_description());
-    completed.takesValue = option.get_items_expected_max() > 0;
+    completed.takes_value = option.get_items_expected_max() > 0;
     for (const std::string& name : option.get_snames()) completed.names.push_back("-" + name);
     for (const std::string& name : option.get_lnames()) completed.names.push_back("--" + name);
     for (const std::string& name : completed.names) {
@@ -58,16 +58,16 @@ class ModelBuilder {
   CompletedValue Value(const std::string& name, const std::string& command) {
     std::string own = command;
     own += ":" + name;
-    const std::string& key = m_words.count(own) > 0 ? own : name;
+    const std::string& key = words_.count(own) > 0 ? own : name;
     return {WordsOf(key), WordsOf(key + "=")};
   }
 
   std::vector<std::string> WordsOf(const std::string& key) {
-    const auto words = m_words.find(key);
-    return words == m_words.end() ? std::vector<std::string>() : words->second;
+    const auto words = words_.find(key);
+    return words == words_.end() ? std::vector<std::string>() : words->second;
   }
 
-  const CompletionWords& m_words;
+  const CompletionWords& words_;
 };
 
 CompletedProgram ProgramOf(const CLI::App& app, const CompletionWords& words) {
@@ -75,10 +75,10 @@ CompletedProgram ProgramOf(const CLI::App& app, const CompletionWords& words) {
   CompletedProgram program;
   program.name = app.get_name();
   program.commands.push_back(builder.Command(app, true));
-  const auto hasName = [](const CLI::App* command) {
+  const auto has_name = [](const CLI::App* command) {
     return !command->get_name().empty() && !command->get_group().empty();
   };
-  for (const CLI::App* command : app.get_subcommands(hasName)) {
+  for (const CLI::App* command : app.get_subcommands(has_name)) {
     program.commands.push_back(builder.Command(*command, false));
   }
   return program;

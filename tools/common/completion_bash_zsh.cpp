@@ -35,7 +35,7 @@ std::string ValueCases(const std::vector<std::string>& places, const CompletedVa
 std::string CasesOf(const CompletedCommand& command) {
   std::string cases;
   for (const CompletedOption& option : command.options) {
-    if (!option.takesValue) continue;
+    if (!option.takes_value) continue;
     std::vector<std::string> places;
     for (const std::string& name : option.names) places.push_back(command.name + ":" + name);
     cases += ValueCases(places, option.value);

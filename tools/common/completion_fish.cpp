@@ -50,10 +50,10 @@ std::string ConditionOf(const CompletedProgram& program, const CompletedCommand&
 std::string OptionLine(const std::string& start, const CompletedOption& option) {
   std::string line = start;
   for (const std::string& name : option.names) {
-    const bool isLong = name.compare(0, 2, "--") == 0;
-    line += (isLong ? " -l " : " -s ") + name.substr(isLong ? 2 : 1);
+    const bool is_long = name.compare(0, 2, "--") == 0;
+    line += (is_long ? " -l " : " -s ") + name.substr(is_long ? 2 : 1);
   }
-  if (option.takesValue) line += " -r" + CandidatesOf(option.value);
+  if (option.takes_value) line += " -r" + CandidatesOf(option.value);
   return line + " -d " + Quote(option.description) + "\n";
 }
 

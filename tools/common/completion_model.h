@@ -13,7 +13,7 @@ struct CompletedValue {
 struct CompletedOption {
   std::vector<std::string> names;  // with their dashes
   std::string description;
-  bool takesValue = false;
+  bool takes_value = false;
   CompletedValue value;
 };
 

@@ -42,12 +42,12 @@ Json::Value IndexLine(const RecordedExchange& exchange) {
   Json::Value& pieces = line["pieces"] = Json::Value(Json::arrayValue);
   for (const RecordedPiece& piece : exchange.pieces) {
     Json::Value entry(Json::objectValue);
-    entry["delay_ms"] = static_cast<Json::Int64>(piece.delayMs);
+    entry["delay_ms"] = static_cast<Json::Int64>(piece.delay_ms);
     entry["bytes"] = static_cast<Json::UInt64>(piece.bytes);
     pieces.append(entry);
   }
   line["end"] = exchange.end;
-  line["end_delay_ms"] = static_cast<Json::Int64>(exchange.endDelayMs);
+  line["end_delay_ms"] = static_cast<Json::Int64>(exchange.end_delay_ms);
   return line;
 }
 
@@ -70,17 +70,17 @@ bool ReadNamed(const tarnwick::UniqueFd& folder, const Json::Value& line, const 
   return ReadRegularFile(folder, name, kMostBytes, bytes, error);
 }
 
-bool IsDelay(int64_t delayMs) {
-  return delayMs >= 0 && delayMs <= kLongestDelay;
+bool IsDelay(int64_t delay_ms) {
+  return delay_ms >= 0 && delay_ms <= kLongestDelay;
 }
 
 bool ReadPieces(const Json::Value& line, RecordedExchange* exchange, std::string* error) {
   size_t left = exchange->response.size();
   for (const Json::Value& entry : line["pieces"]) {
     RecordedPiece piece;
-    piece.delayMs = entry.get("delay_ms", 0).asInt64();
+    piece.delay_ms = entry.get("delay_ms", 0).asInt64();
     const uint64_t bytes = entry.get("bytes", 0).asUInt64();
-    if (!IsDelay(piece.delayMs)) {
+    if (!IsDelay(piece.delay_ms)) {
       *error = "a delay is not between none and a day";
       return false;
     }
@@ -104,12 +104,12 @@ bool ReadExchange(const tarnwick::UniqueFd& folder, const Json::Value& line,
   exchange->method = line.get("method", "").asString();
   exchange->target = line.get("target", "").asString();
   exchange->end = line.get("end", "close").asString();
-  exchange->endDelayMs = line.get("end_delay_ms", 0).asInt64();
+  exchange->end_delay_ms = line.get("end_delay_ms", 0).asInt64();
   if (!IsKnownEnd(exchange->end)) {
     *error = "\"end\" is none of the known ends";
     return false;
   }
-  if (!IsDelay(exchange->endDelayMs)) {
+  if (!IsDelay(exchange->end_delay_ms)) {
     *error = "\"end_delay_ms\" is not between none and a day";
     return false;
   }

@@ -32,7 +32,7 @@
 #include <vector>
 
 struct RecordedPiece {
-  int64_t delayMs = 0;
+  int64_t delay_ms = 0;
   size_t bytes = 0;
 };
 
@@ -48,7 +48,7 @@ struct RecordedExchange {
   std::string response;  // bytes
   std::vector<RecordedPiece> pieces;
   std::string end;
-  int64_t endDelayMs = 0;
+  int64_t end_delay_ms = 0;
 };
 
 // Writes `exchanges` into `folder`, which is created when missing, for the caller alone; files of

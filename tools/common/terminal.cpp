@@ -114,8 +114,8 @@ bool IsTerminal(int fd) {
 }
 
 bool MayColour(int fd) {
-  const char* const noColour = std::getenv("NO_COLOR");
-  if (noColour != nullptr && *noColour != '\0') return false;
+  const char* const no_colour = std::getenv("NO_COLOR");
+  if (no_colour != nullptr && *no_colour != '\0') return false;
   const char* const type = std::getenv("TERM");
   return type != nullptr && *type != '\0' && std::strcmp(type, "dumb") != 0 && IsTerminal(fd);
 }

@@ -50,8 +50,8 @@ std::vector<std::string> NearestNames(std::string_view text,
   std::vector<std::string> nearest;
   for (const auto& [distance, name] : ranked) {
     // Beside a name that is one letter away, one that is three away is not what was meant.
-    const bool isNear = distance <= ranked.front().first + 1;
-    if (isNear && nearest.size() < kNearestCount) nearest.push_back(name);
+    const bool is_near = distance <= ranked.front().first + 1;
+    if (is_near && nearest.size() < kNearestCount) nearest.push_back(name);
   }
   return nearest;
 }

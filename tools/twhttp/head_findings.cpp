@@ -10,21 +10,21 @@ constexpr size_t kLibraryLines = 30;
 
 struct LineFacts {
   size_t longest = 0;
-  int bareLineFeeds = 0;
-  bool nullBytes = false;
-  std::string withoutColon;  // the first such line
-  bool withoutName = false;
-  bool onlyDelimiters = false;
+  int bare_line_feeds = 0;
+  bool null_bytes = false;
+  std::string without_colon;  // the first such line
+  bool without_name = false;
+  bool only_delimiters = false;
 };
 
 // `line` is one behind the status line, without its end.
 void MeasureHeader(const std::string& line, LineFacts* facts) {
   if (line.empty()) return;
   const size_t colon = line.find(':');
-  if (colon == std::string::npos && facts->withoutColon.empty()) facts->withoutColon = line;
-  if (colon == 0) facts->withoutName = true;
+  if (colon == std::string::npos && facts->without_colon.empty()) facts->without_colon = line;
+  if (colon == 0) facts->without_name = true;
   // What the library takes for ends of a name.
-  if (line.find_first_not_of(" :;=") == std::string::npos) facts->onlyDelimiters = true;
+  if (line.find_first_not_of(" :;=") == std::string::npos) facts->only_delimiters = true;
 }
 
 LineFacts Measure(const std::string& head) {
@@ -34,10 +34,10 @@ LineFacts Measure(const std::string& head) {
     facts.longest = std::max(facts.longest, end - begin);
     const size_t text = end > begin && head[end - 1] == '\r' ? end - 1 : end;
     if (begin > 0) MeasureHeader(head.substr(begin, text - begin), &facts);
-    if (end < head.size() && (end == begin || head[end - 1] != '\r')) ++facts.bareLineFeeds;
+    if (end < head.size() && (end == begin || head[end - 1] != '\r')) ++facts.bare_line_feeds;
     begin = end + 1;
   }
-  facts.nullBytes = head.find('\0') != std::string::npos;
+  facts.null_bytes = head.find('\0') != std::string::npos;
   return facts;
 }
 
@@ -64,21 +64,21 @@ void InspectLines(const ReplyMessage& reply, std::vector<HeadFinding>* found) {
                       "the library reads 30; the others are taken for the beginning of the body",
                       true});
   }
-  if (facts.bareLineFeeds > 0) {
-    found->push_back({std::to_string(facts.bareLineFeeds) + " head lines end in a bare line feed",
+  if (facts.bare_line_feeds > 0) {
+    found->push_back({std::to_string(facts.bare_line_feeds) + " head lines end in a bare line feed",
                       "the library takes either line end"});
   }
-  if (facts.nullBytes) {
+  if (facts.null_bytes) {
     found->push_back({"zero bytes in the head", "the library's line ends at the first of them"});
   }
-  if (!facts.withoutColon.empty()) {
-    found->push_back({"a header line without a colon: " + facts.withoutColon.substr(0, 60),
+  if (!facts.without_colon.empty()) {
+    found->push_back({"a header line without a colon: " + facts.without_colon.substr(0, 60),
                       "the library takes its first word for the name"});
   }
-  if (facts.onlyDelimiters) {
+  if (facts.only_delimiters) {
     found->push_back({"a header line without a name and without a value",
                       "the library takes the whole head for malformed", true});
-  } else if (facts.withoutName) {
+  } else if (facts.without_name) {
     found->push_back({"a header line that begins with its colon",
                       "the library takes the next word for the name"});
   }

@@ -26,12 +26,12 @@ Credentials CredentialsOf(pid_t pid) {
   for (std::string line; std::getline(status, line);) {
     std::istringstream fields(line);
     std::string name;
-    unsigned long realNumber = 0;
+    unsigned long real_number = 0;
     unsigned long number = 0;
     fields >> name;
-    if (name == "Uid:" && fields >> realNumber >> number)
+    if (name == "Uid:" && fields >> real_number >> number)
       credentials.user = static_cast<uid_t>(number);
-    if (name == "Gid:" && fields >> realNumber >> number) {
+    if (name == "Gid:" && fields >> real_number >> number) {
       credentials.groups.push_back(static_cast<gid_t>(number));
     }
     while (name == "Groups:" && fields >> number) {
@@ -82,7 +82,7 @@ bool MayAttach(const Credentials& credentials, const RecordSegment& segment) {
 
 void CheckAttached(const LibraryUser& user, const Credentials& credentials,
                    const std::optional<RecordSegment>& segment, Findings* findings) {
-  if (!segment || user.hasRecord) return;
+  if (!segment || user.has_record) return;
   if (!MayAttach(credentials, *segment)) {
     findings->push_back(OtherUsersProcess(
         user, credentials.user,

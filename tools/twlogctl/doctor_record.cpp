@@ -105,12 +105,12 @@ void CheckLevels(Findings* findings) {
   const auto segment = FindRecord();
   const AttachedRecord record = segment && segment->HasRightSize() ? Attach(*segment) : nullptr;
   if (!record) return;
-  std::map<int, std::vector<std::string>> byLevel;
+  std::map<int, std::vector<std::string>> by_level;
   for (int value = 0; value < LOG_CATEG_COUNT; ++value) {
     const auto categ = static_cast<LOG_CATEG>(value);
-    byLevel[record->Level(categ)].emplace_back(Enum2String(categ));
+    by_level[record->Level(categ)].emplace_back(Enum2String(categ));
   }
-  for (const auto& [level, names] : byLevel) {
+  for (const auto& [level, names] : by_level) {
     if (level < LOG_LEVEL_NOTICE || level > LOG_LEVEL_DEBUG3) TellLevel(level, names, findings);
   }
 }

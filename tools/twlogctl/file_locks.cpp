@@ -30,9 +30,9 @@ std::string MountDevice(int fd) {
 }
 
 // A file as /proc/locks writes it: "08:01:131", the device in hexadecimal.
-std::string LockName(unsigned majorNumber, unsigned minorNumber, ino_t inode) {
+std::string LockName(unsigned major_number, unsigned minor_number, ino_t inode) {
   char text[64];
-  snprintf(text, sizeof(text), "%02x:%02x:%llu", majorNumber, minorNumber,
+  snprintf(text, sizeof(text), "%02x:%02x:%llu", major_number, minor_number,
            static_cast<unsigned long long>(inode));
   return text;
 }
@@ -43,10 +43,10 @@ std::vector<std::string> LockNames(int fd) {
   std::vector<std::string> names = {
       LockName(major(state.st_dev), minor(state.st_dev), state.st_ino)};
   std::istringstream device(MountDevice(fd));
-  unsigned majorNumber = 0, minorNumber = 0;
+  unsigned major_number = 0, minor_number = 0;
   char colon = 0;
-  if (device >> majorNumber >> colon >> minorNumber) {
-    names.push_back(LockName(majorNumber, minorNumber, state.st_ino));
+  if (device >> major_number >> colon >> minor_number) {
+    names.push_back(LockName(major_number, minor_number, state.st_ino));
   }
   return names;
 }

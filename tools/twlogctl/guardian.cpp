@@ -87,14 +87,14 @@ class BlockedSignals {
   BlockedSignals() {
     sigset_t signals = EndingSignals();
     sigaddset(&signals, SIGCHLD);
-    sigprocmask(SIG_BLOCK, &signals, &m_before);
+    sigprocmask(SIG_BLOCK, &signals, &before_);
   }
-  ~BlockedSignals() { sigprocmask(SIG_SETMASK, &m_before, nullptr); }
+  ~BlockedSignals() { sigprocmask(SIG_SETMASK, &before_, nullptr); }
   BlockedSignals(const BlockedSignals&) = delete;
   BlockedSignals& operator=(const BlockedSignals&) = delete;
 
  private:
-  sigset_t m_before;
+  sigset_t before_;
 };
 
 // The child with this process's end of its socket.
@@ -104,22 +104,22 @@ class Guardian {
            std::chrono::milliseconds span) {
     int ends[2];
     if (socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0, ends) == -1) return;
-    m_socket = ends[0];
-    m_pid = fork();
-    if (m_pid == 0) {
-      close(m_socket);
+    socket_ = ends[0];
+    pid_ = fork();
+    if (pid_ == 0) {
+      close(socket_);
       Guard(record, changes, span, ends[1]);
     }
     close(ends[1]);
   }
   ~Guardian() {
-    if (m_socket >= 0) close(m_socket);
+    if (socket_ >= 0) close(socket_);
   }
   Guardian(const Guardian&) = delete;
   Guardian& operator=(const Guardian&) = delete;
 
-  bool IsReady() const { return m_pid > 0 && ReceiveByte(m_socket); }
-  void LevelsAreSet() const { SendByte(m_socket); }
+  bool IsReady() const { return pid_ > 0 && ReceiveByte(socket_); }
+  void LevelsAreSet() const { SendByte(socket_); }
 
   // Waits for its end or for a signal to this process, which is the result; 0 for its end.
   int WaitForEndOrSignal() {
@@ -134,23 +134,23 @@ class Guardian {
 
   // Lets it act at once. Results: false when it was killed before it could.
   bool Finish() {
-    close(m_socket);
-    m_socket = -1;
-    while (!m_ended && !HasEnded(0)) {
+    close(socket_);
+    socket_ = -1;
+    while (!ended_ && !HasEnded(0)) {
     }
-    return WIFEXITED(m_status) && WEXITSTATUS(m_status) == 0;
+    return WIFEXITED(status_) && WEXITSTATUS(status_) == 0;
   }
 
  private:
   bool HasEnded(int flags) {
-    if (waitpid(m_pid, &m_status, flags) == m_pid) m_ended = true;
-    return m_ended;
+    if (waitpid(pid_, &status_, flags) == pid_) ended_ = true;
+    return ended_;
   }
 
-  int m_socket = -1;
-  pid_t m_pid = -1;
-  bool m_ended = false;
-  int m_status = 0;
+  int socket_ = -1;
+  pid_t pid_ = -1;
+  bool ended_ = false;
+  int status_ = 0;
 };
 
 }  // namespace

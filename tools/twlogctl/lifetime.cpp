@@ -48,9 +48,9 @@ int AlreadyThere(const RecordSegment& segment, const CreateOptions& options, con
              std::to_string(sizeof(TWDbgLogCfg)) + "; \"twlogctl remove\" takes it away");
     return kExitWrong;
   }
-  const bool otherMode = options.mode && segment.mode != wanted.mode;
-  const bool otherGroup = wanted.group && segment.group != *wanted.group;
-  if (otherMode || otherGroup) {
+  const bool other_mode = options.mode && segment.mode != wanted.mode;
+  const bool other_group = wanted.group && segment.group != *wanted.group;
+  if (other_mode || other_group) {
     Complain("there is a record already, of group " + GroupName(segment.group) + " with mode " +
              ModeText(segment.mode) + "; \"twlogctl remove\" takes it away");
     return kExitWrong;

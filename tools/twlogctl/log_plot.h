@@ -13,7 +13,7 @@ bool MayDrawBlocks();
 
 // Amounts per second over [begin, end), one value a column, `columns` at most: fewer when there
 // are fewer seconds. A column holds the mean of its seconds.
-std::vector<double> PlotColumns(const std::map<int64_t, uint64_t>& bySecond, int64_t begin,
+std::vector<double> PlotColumns(const std::map<int64_t, uint64_t>& by_second, int64_t begin,
                                 int64_t end, size_t columns);
 
 // The rows of a plot, the highest first, scaled to the greatest value.

@@ -28,10 +28,10 @@ class LogTail {
 
   // How long to wait at most, unless Descriptor() becomes readable, before the next Poll.
   std::chrono::milliseconds Patience() const;
-  int Descriptor() const { return m_watch.Descriptor(); }
+  int Descriptor() const { return watch_.Descriptor(); }
 
   // 0 while the path leads to a log that can be read, else the errno of opening it.
-  int Error() const { return m_error; }
+  int Error() const { return error_; }
 
  private:
   struct Source {
@@ -50,11 +50,11 @@ class LogTail {
   void ReadAll(const MessageSink& sink);
   void DropOver(const MessageSink& sink);
 
-  std::string m_path;
-  LogWatch m_watch;
-  std::list<Source> m_sources;  // the last one is that at the path, if m_error is 0
-  Clock::time_point m_folderWatched;
-  int m_error = 0;
+  std::string path_;
+  LogWatch watch_;
+  std::list<Source> sources_;  // the last one is that at the path, if error_ is 0
+  Clock::time_point folder_watched_;
+  int error_ = 0;
 };
 
 #endif  // TARNWICK_TOOLS_TWLOGCTL_LOG_TAIL_H_

@@ -21,13 +21,13 @@ class LogWatch {
   void Remove(int watch);
 
   // Readable when there are events; -1 when the system has no more watches to give.
-  int Descriptor() const { return m_fd.Get(); }
+  int Descriptor() const { return fd_.Get(); }
 
   // Takes the events off.
   void Drain();
 
  private:
-  tarnwick::UniqueFd m_fd;
+  tarnwick::UniqueFd fd_;
 };
 
 #endif  // TARNWICK_TOOLS_TWLOGCTL_LOG_WATCH_H_

@@ -53,11 +53,11 @@ std::string IpcNamespace(const std::string& process) {
 
 LibraryUser LookAtMemory(pid_t pid, int segment) {
   LibraryUser user;
-  const std::string segmentName = SegmentName();
+  const std::string segment_name = SegmentName();
   std::istringstream maps(ReadWholeFile("/proc/" + std::to_string(pid) + "/maps"));
   for (std::string line; std::getline(maps, line);) {
-    if (line.find("/libtarnwick.so") != std::string::npos) user.hasLibrary = true;
-    if (IsSegment(line, segmentName, segment)) user.hasRecord = true;
+    if (line.find("/libtarnwick.so") != std::string::npos) user.has_library = true;
+    if (IsSegment(line, segment_name, segment)) user.has_record = true;
   }
   return user;
 }
@@ -101,10 +101,10 @@ std::optional<ProcessInfo> ReadProcess(pid_t pid) {
   fields >> process.state;
   std::string skipped;
   for (int field = 4; field < 22; ++field) fields >> skipped;
-  double startTicks = 0;  // field 22, since the machine was started
-  fields >> startTicks;
-  process.ageSeconds =
-      std::max(0.0, SecondsSinceBoot() - startTicks / static_cast<double>(sysconf(_SC_CLK_TCK)));
+  double start_ticks = 0;  // field 22, since the machine was started
+  fields >> start_ticks;
+  process.age_seconds =
+      std::max(0.0, SecondsSinceBoot() - start_ticks / static_cast<double>(sysconf(_SC_CLK_TCK)));
   return process;
 }
 
@@ -122,11 +122,11 @@ std::vector<pid_t> AllProcesses() {
 
 std::vector<LibraryUser> LibraryUsers(int segment) {
   std::vector<LibraryUser> users;
-  const std::string ownNamespace = IpcNamespace("self");
+  const std::string own_namespace = IpcNamespace("self");
   for (const pid_t pid : AllProcesses()) {
-    if (pid == getpid() || IpcNamespace(std::to_string(pid)) != ownNamespace) continue;
+    if (pid == getpid() || IpcNamespace(std::to_string(pid)) != own_namespace) continue;
     LibraryUser user = LookAtMemory(pid, segment);
-    if (!user.hasLibrary && !user.hasRecord) continue;
+    if (!user.has_library && !user.has_record) continue;
     const std::optional<ProcessInfo> process = ReadProcess(pid);
     if (!process) continue;
     user.process = *process;

@@ -63,7 +63,7 @@ std::string DescribeAttached(const RecordSegment& segment) {
   const unsigned long count = AttachedOthers(segment);
   std::string names;
   for (const LibraryUser& user : LibraryUsers(segment.id)) {
-    if (!user.hasRecord) continue;
+    if (!user.has_record) continue;
     names += (names.empty() ? ": " : ", ") + NameAndPid(user.process);
   }
   return std::to_string(count) + (count == 1 ? " process" : " processes") + names;

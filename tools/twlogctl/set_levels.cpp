@@ -51,9 +51,9 @@ std::string TimeAfter(std::chrono::milliseconds span) {
   struct tm local = {};
   localtime_r(&now, &today);
   localtime_r(&then, &local);
-  const bool sameDay = today.tm_yday == local.tm_yday && today.tm_year == local.tm_year;
+  const bool same_day = today.tm_yday == local.tm_yday && today.tm_year == local.tm_year;
   char text[64];
-  strftime(text, sizeof(text), sameDay ? "%T" : "%F %T", &local);
+  strftime(text, sizeof(text), same_day ? "%T" : "%F %T", &local);
   return text;
 }
 
@@ -98,8 +98,8 @@ bool AssignmentsAreRight(const std::vector<std::string>& assignments) {
 
 int HoldForSpan(TWDbgLogCfg* record, std::vector<LevelChange> changes, const SetOptions& options) {
   // What stands at its new level already is not this call's to put back.
-  const auto changesNothing = [](const LevelChange& c) { return c.before == c.after; };
-  changes.erase(std::remove_if(changes.begin(), changes.end(), changesNothing), changes.end());
+  const auto changes_nothing = [](const LevelChange& c) { return c.before == c.after; };
+  changes.erase(std::remove_if(changes.begin(), changes.end(), changes_nothing), changes.end());
   if (changes.empty()) return kExitDone;
   const GuardResult result = HoldLevels(record, changes, *options.span, [&options] {
     Complain("for " + FormatSpan(*options.span) + ", until " + TimeAfter(*options.span) +

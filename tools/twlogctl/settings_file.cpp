@@ -98,12 +98,12 @@ bool ParseLevels(const Value& value, std::vector<int>* levels, SettingsFault* fa
   }
 }
 
-bool ParseTimeScale(const Value& value, bool* timeScale, SettingsFault* fault) {
+bool ParseTimeScale(const Value& value, bool* time_scale, SettingsFault* fault) {
   if (value.text != "yes" && value.text != "no") {
     const std::string found = "\"" + EscapeControls(value.text) + "\"";
     return Fail(value, 0, found + " is neither \"yes\" nor \"no\"", fault);
   }
-  *timeScale = value.text == "yes";
+  *time_scale = value.text == "yes";
   return true;
 }
 
@@ -131,11 +131,11 @@ std::string SettingsFault::Describe() const {
 
 bool ParseSettings(std::string_view text, SavedLevels* saved, SettingsFault* fault) {
   Value levels;
-  Value timeScale;
+  Value time_scale;
   return FindValue(text, kLevelsKey, &levels, fault) &&
          ParseLevels(levels, &saved->levels, fault) &&
-         FindValue(text, kTimeScaleKey, &timeScale, fault) &&
-         ParseTimeScale(timeScale, &saved->timeScale, fault);
+         FindValue(text, kTimeScaleKey, &time_scale, fault) &&
+         ParseTimeScale(time_scale, &saved->time_scale, fault);
 }
 
 SettingsState ReadSettings(SavedLevels* saved, SettingsFault* fault) {

@@ -27,7 +27,7 @@ double Seconds(const StatsReport& report) {
 // The name of a process that still runs: its number may be another one's by now, which the manual
 // page says.
 std::string CommandOf(const StatsReport& report, const std::string& pid) {
-  if (!report.ownProcesses || pid.empty()) return "";
+  if (!report.own_processes || pid.empty()) return "";
   const auto process = ReadProcess(static_cast<pid_t>(std::strtol(pid.c_str(), nullptr, 10)));
   return process ? process->name : "";
 }
@@ -70,7 +70,7 @@ void AddPlot(const StatsReport& report, const StatsLayout& layout,
   const int64_t begin = SecondOf(report.begin);
   const int64_t end = std::max(SecondOf(report.end - std::chrono::milliseconds(1)), begin) + 1;
   const std::vector<double> values =
-      PlotColumns(report.linesBySecond, begin, end, std::max<size_t>(layout.width - 2, 10));
+      PlotColumns(report.lines_by_second, begin, end, std::max<size_t>(layout.width - 2, 10));
   char title[96];
   snprintf(title, sizeof(title), "lines a second, at most %.2f",
            *std::max_element(values.begin(), values.end()));

@@ -35,7 +35,7 @@ std::vector<std::pair<std::string, int>> LevelsOf(const TWDbgLogCfg& record, boo
 Json::Value ProcessesJson(const RecordSegment& segment) {
   Json::Value list(Json::arrayValue);
   for (const LibraryUser& user : LibraryUsers(segment.id)) {
-    if (!user.hasRecord) continue;
+    if (!user.has_record) continue;
     Json::Value process;
     process["pid"] = static_cast<Json::Int64>(user.process.pid);
     process["name"] = user.process.name;

@@ -19,7 +19,7 @@ void AddWait(int64_t ms, Wire* wire) {
 void AddEnd(const RecordedExchange& exchange, Wire* wire) {
   const auto add = [wire](Action action) { wire->push_back({action, Part::kBody, "", {}}); };
   if (exchange.end == "kept") return;
-  AddWait(exchange.endDelayMs, wire);
+  AddWait(exchange.end_delay_ms, wire);
   if (exchange.end == "close" || exchange.end == "tls") add(Action::kClose);
   if (exchange.end == "reset" || exchange.end == "refused") add(Action::kReset);
   if (exchange.end == "silent" || exchange.end == "unreachable") add(Action::kStall);
@@ -29,7 +29,7 @@ Wire StepsOf(const RecordedExchange& exchange) {
   Wire wire;
   size_t at = 0;
   for (const RecordedPiece& piece : exchange.pieces) {
-    AddWait(piece.delayMs, &wire);
+    AddWait(piece.delay_ms, &wire);
     wire.push_back({Action::kSend, Part::kBody, exchange.response.substr(at, piece.bytes), {}});
     at += piece.bytes;
   }
