@@ -1,6 +1,7 @@
 """The completion scripts of the tools, in the shells themselves."""
 
 import os
+import shlex
 import shutil
 import subprocess
 
@@ -49,6 +50,17 @@ def scripts(run, tmp_path_factory):
         (folder / shell).mkdir()
         (folder / shell / name).write_text(result.stdout)
     return folder
+
+
+@pytest.fixture(autouse=True)
+def tool_on_path(command, tmp_path, monkeypatch):
+    """The scripts ask the tool that PATH leads to."""
+    folder = tmp_path / "bin"
+    folder.mkdir()
+    program = folder / "twlogctl"
+    program.write_text(f'#!/bin/sh\nexec {shlex.join(command("twlogctl"))} "$@"\n')
+    program.chmod(0o755)
+    monkeypatch.setenv("PATH", f"{folder}:{os.environ['PATH']}")
 
 
 def need(shell):

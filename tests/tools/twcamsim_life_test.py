@@ -171,10 +171,16 @@ def test_each_fault_tells_its_arguments_and_their_standards(run):
     }
 
 
-@pytest.mark.parametrize("shell", ["bash", "zsh", "fish"])
-def test_a_completion_script_knows_the_faults(run, shell):
-    done = run("twcamsim", "--completion", shell)
-    assert done.returncode == 0 and "black-hole" in done.stdout and "cgi-digest" in done.stdout
+@pytest.mark.parametrize(
+    "typed, candidates",
+    [
+        (["-f", "black"], "black-hole\n"),
+        (["--fault=black"], "--fault=black-hole\n"),
+        (["-e", "cgi-d"], "cgi-digest\n"),
+    ],
+)
+def test_completion_knows_faults_and_profiles(run, typed, candidates):
+    assert run("twcamsim", "__complete", *typed).stdout == candidates
 
 
 def test_help_has_a_sentence_for_each_option(run):

@@ -105,8 +105,7 @@ def test_each_option_has_its_sentence(run, operation):
         assert re.search(r"[A-Z][a-z].*[.)]$", entry), entry
 
 
-@pytest.mark.parametrize("shell", ["bash", "zsh", "fish"])
-def test_completion_knows_the_operations(run, shell):
-    script = run("twhttp", "--completion", shell)
-    assert script.returncode == 0
-    assert "soap-auth" in script.stdout and "give-up" in script.stdout
+def test_completion_knows_the_operations_and_their_options(run):
+    assert run("twhttp", "__complete", "soap-a").stdout.startswith("soap-auth\t")
+    assert run("twhttp", "__complete", "get", "--give").stdout.startswith("--give-up\t")
+    assert run("twhttp", "__complete", "get", "--http", "1.").stdout == "1.0\n1.1\n"

@@ -43,7 +43,12 @@ void AddVersionFlag(CLI::App* app) {
                         "print the version");
 }
 
-std::optional<int> ParseArguments(CLI::App* app, int argc, char** argv) try {
+std::optional<int> ParseArguments(CLI::App* app, const CompletionWords& words, int argc,
+                                  char** argv) try {
+  if (argc > 1 && std::string(argv[1]) == "__complete") {
+    fputs(CompletionCandidates(*app, words, {argv + 2, argv + argc}).c_str(), stdout);
+    return 0;
+  }
   app->parse(argc, argv);
   return std::nullopt;
 } catch (const CLI::RuntimeError& error) {

@@ -135,8 +135,8 @@ std::optional<int> ParseArguments(int argc, char** argv, Arguments* arguments) {
   AddFiles(&app, arguments);
   AddLimits(&app, arguments);
   AddLists(&app, arguments);
-  AddCompletion(&app, Words());
-  return ParseArguments(&app, argc, argv);
+  AddCompletion(&app);
+  return ParseArguments(&app, Words(), argc, argv);
 }
 
 bool MakeEndpoints(const Arguments& arguments, std::vector<std::unique_ptr<Endpoint>>* endpoints,

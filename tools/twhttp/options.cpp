@@ -240,14 +240,15 @@ bool ReadOptions(int argc, char** argv, Options* options, int* exit_code) {
   app.require_subcommand(1);
   app.footer(kFooter);
   AddVersionFlag(&app);
-  AddCompletion(&app, {{"--http", {"default", "1.0", "1.1"}},
-                       {"--data-file", {kCompleteFiles}},
-                       {"--password-file", {kCompleteFiles}},
-                       {"--response-file", {kCompleteFiles}},
-                       {"--record", {kCompleteFiles}}});
+  AddCompletion(&app);
   for (const Operation& operation : Operations()) AddOperation(&app, operation, options, &raw);
   app.add_subcommand("codes", "list the exit codes");
-  if (const auto code = ParseArguments(&app, argc, argv)) {
+  const CompletionWords words = {{"--http", {"default", "1.0", "1.1"}},
+                                 {"--data-file", {kCompleteFiles}},
+                                 {"--password-file", {kCompleteFiles}},
+                                 {"--response-file", {kCompleteFiles}},
+                                 {"--record", {kCompleteFiles}}};
+  if (const auto code = ParseArguments(&app, words, argc, argv)) {
     *exit_code = *code;
     return false;
   }

@@ -48,8 +48,8 @@ int main(int argc, char** argv) try {
   AddVersionFlag(&app);
   int exit_code = kExitDone;
   AddCommands(&app, &exit_code);
-  AddCompletion(&app, Words());
-  if (const auto ended = ParseArguments(&app, argc, argv)) return *ended;
+  AddCompletion(&app);
+  if (const auto ended = ParseArguments(&app, Words(), argc, argv)) return *ended;
   if (fflush(stdout) != 0 || ferror(stdout) != 0) {
     Complain("cannot write the output");
     return kExitWrong;
