@@ -104,6 +104,5 @@ std::vector<pid_t> LockHolders(int fd) {
     ended |= pid > 0 && !ReadProcess(pid);
     holders.push_back(pid);
   }
-  // In a PID namespace, /proc/locks leaves out the lock of a process that has ended.
-  return ended || holders.empty() ? HoldersByDescriptor(fd) : holders;
+  return ended ? HoldersByDescriptor(fd) : holders;
 }
