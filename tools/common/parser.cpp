@@ -6,7 +6,7 @@
 
 #include "tarnwick/version.h"
 #include "tools/common/terminal.h"
-#include "tools/common/words.h"
+#include "tools/common/text.h"
 
 namespace {
 

@@ -4,9 +4,9 @@
 #include <algorithm>
 #include <set>
 
-#include "tools/common/amounts.h"
 #include "tools/common/completion.h"
 #include "tools/common/parser.h"
+#include "tools/common/units.h"
 
 namespace {
 

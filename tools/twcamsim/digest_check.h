@@ -5,7 +5,7 @@
 #include <map>
 #include <string>
 
-#include "tools/twcamsim/login.h"
+#include "tools/twcamsim/authenticator.h"
 
 // A parameter of an Authorization line.
 struct DigestWord {

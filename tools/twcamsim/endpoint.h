@@ -8,8 +8,8 @@
 #include <string>
 #include <vector>
 
+#include "tools/twcamsim/authenticator.h"
 #include "tools/twcamsim/faults.h"
-#include "tools/twcamsim/login.h"
 #include "tools/twcamsim/profile.h"
 
 struct Endpoint {

@@ -4,7 +4,7 @@
 
 #include <charconv>
 
-#include "tools/common/words.h"
+#include "tools/common/text.h"
 
 namespace {
 

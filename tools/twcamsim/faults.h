@@ -6,8 +6,8 @@
 #include <string>
 #include <vector>
 
+#include "tools/twcamsim/authenticator.h"
 #include "tools/twcamsim/behaviour.h"
-#include "tools/twcamsim/login.h"
 #include "tools/twcamsim/random.h"
 #include "tools/twcamsim/request.h"
 #include "tools/twcamsim/response.h"

@@ -7,7 +7,7 @@
 #include <string>
 
 #include "tools/twcamsim/behaviour.h"
-#include "tools/twcamsim/link.h"
+#include "tools/twcamsim/connection.h"
 #include "tools/twcamsim/memory_budget.h"
 #include "tools/twcamsim/request.h"
 

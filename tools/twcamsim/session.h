@@ -11,9 +11,9 @@
 
 #include "tools/twcamsim/behaviour.h"
 #include "tools/twcamsim/certificates.h"
+#include "tools/twcamsim/connection.h"
 #include "tools/twcamsim/endpoint.h"
 #include "tools/twcamsim/journal.h"
-#include "tools/twcamsim/link.h"
 #include "tools/twcamsim/random.h"
 #include "tools/twcamsim/request_reader.h"
 

@@ -5,10 +5,10 @@
 #include <string>
 #include <vector>
 
-#include "tools/twhttp/interrupt.h"
 #include "tools/twhttp/options.h"
 #include "tools/twhttp/run.h"
 #include "tools/twhttp/trace.h"
+#include "tools/twhttp/watchdog.h"
 
 enum class FailureClass {
   kNone,

@@ -8,7 +8,7 @@
 
 #include "tools/twhttp/fake_peer.h"
 #include "tools/twhttp/hooks.h"
-#include "tools/twhttp/interrupt.h"
+#include "tools/twhttp/watchdog.h"
 
 namespace {
 

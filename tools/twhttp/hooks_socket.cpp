@@ -15,7 +15,7 @@
 #include "tarnwick/platform/unique.h"
 #include "tools/twhttp/fake_peer.h"
 #include "tools/twhttp/hooks.h"
-#include "tools/twhttp/interrupt.h"
+#include "tools/twhttp/watchdog.h"
 
 namespace {
 

@@ -8,10 +8,10 @@
 #include <iostream>
 #include <map>
 
-#include "tools/common/amounts.h"
 #include "tools/common/completion.h"
 #include "tools/common/parser.h"
 #include "tools/common/terminal.h"
+#include "tools/common/units.h"
 #include "tools/twhttp/failure.h"
 
 namespace {

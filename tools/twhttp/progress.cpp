@@ -5,8 +5,8 @@
 #include <algorithm>
 #include <cstdio>
 
-#include "tools/common/amounts.h"
 #include "tools/common/terminal.h"
+#include "tools/common/units.h"
 
 namespace {
 

@@ -4,7 +4,7 @@
 #include <iterator>
 #include <string_view>
 
-#include "tools/common/words.h"
+#include "tools/common/text.h"
 #include "tools/twhttp/message.h"
 #include "tools/twhttp/secrets.h"
 

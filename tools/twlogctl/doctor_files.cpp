@@ -12,8 +12,8 @@
 #include <vector>
 
 #include "tarnwick/platform/unique.h"
-#include "tools/common/amounts.h"
 #include "tools/common/shell.h"
+#include "tools/common/units.h"
 #include "tools/twlogctl/doctor.h"
 #include "tools/twlogctl/doctor_paths.h"
 #include "tools/twlogctl/log_paths.h"

@@ -2,7 +2,7 @@
 
 #include <cstdio>
 
-#include "tools/common/amounts.h"
+#include "tools/common/units.h"
 
 namespace {
 

@@ -2,9 +2,9 @@
 #include <CLI/CLI.hpp>
 #include <memory>
 
-#include "tools/common/amounts.h"
+#include "tools/common/units.h"
 #include "tools/twlogctl/commands.h"
-#include "tools/twlogctl/lifetime.h"
+#include "tools/twlogctl/create_remove.h"
 #include "tools/twlogctl/set_levels.h"
 #include "tools/twlogctl/settings_commands.h"
 #include "tools/twlogctl/status.h"

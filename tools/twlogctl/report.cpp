@@ -10,7 +10,7 @@
 #include "tarnwick/log/twdebuglog.h"
 #include "tools/common/names.h"
 #include "tools/common/terminal.h"
-#include "tools/common/words.h"
+#include "tools/common/text.h"
 
 namespace {
 

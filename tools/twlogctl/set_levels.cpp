@@ -8,13 +8,13 @@
 #include <ctime>
 #include <map>
 
-#include "tools/common/amounts.h"
 #include "tools/common/json_output.h"
 #include "tools/common/terminal.h"
+#include "tools/common/units.h"
 #include "tools/twlogctl/commands.h"
-#include "tools/twlogctl/guardian.h"
 #include "tools/twlogctl/record.h"
 #include "tools/twlogctl/report.h"
+#include "tools/twlogctl/temporary_levels.h"
 
 namespace {
 

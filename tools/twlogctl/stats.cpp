@@ -12,8 +12,8 @@
 #include <memory>
 #include <optional>
 
-#include "tools/common/amounts.h"
 #include "tools/common/terminal.h"
+#include "tools/common/units.h"
 #include "tools/twlogctl/commands.h"
 #include "tools/twlogctl/log_options.h"
 #include "tools/twlogctl/log_plot.h"

@@ -6,9 +6,9 @@
 #include <cstdio>
 #include <cstdlib>
 
-#include "tools/common/amounts.h"
 #include "tools/common/json_output.h"
 #include "tools/common/terminal.h"
+#include "tools/common/units.h"
 #include "tools/twlogctl/log_plot.h"
 #include "tools/twlogctl/processes.h"
 

@@ -1,7 +1,7 @@
 // A camera's CGI programs, which answer with lines of text; in the open, behind Basic, behind
 // Digest.
+#include "tools/twcamsim/echo.h"
 #include "tools/twcamsim/profile.h"
-#include "tools/twcamsim/tell.h"
 
 namespace {
 

@@ -2,8 +2,8 @@
 #include <json/value.h>
 
 #include "tools/common/json_output.h"
+#include "tools/twcamsim/echo.h"
 #include "tools/twcamsim/profile.h"
-#include "tools/twcamsim/tell.h"
 
 namespace {
 

@@ -6,8 +6,8 @@
 #include <mutex>
 
 #include "tools/common/private_file.h"
+#include "tools/twcamsim/echo.h"
 #include "tools/twcamsim/profile.h"
-#include "tools/twcamsim/tell.h"
 #include "tools/twcamsim/upload_counter.h"
 
 namespace {

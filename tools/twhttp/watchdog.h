@@ -1,7 +1,7 @@
 // Ending an operation from outside: Ctrl-C, and the tool's own limit for what the library lets wait
 // without one.
-#ifndef TARNWICK_TOOLS_TWHTTP_INTERRUPT_H_
-#define TARNWICK_TOOLS_TWHTTP_INTERRUPT_H_
+#ifndef TARNWICK_TOOLS_TWHTTP_WATCHDOG_H_
+#define TARNWICK_TOOLS_TWHTTP_WATCHDOG_H_
 
 enum class Stop { kNone, kInterrupted, kGaveUp };
 
@@ -28,4 +28,4 @@ class GiveUpWait {
   GiveUpWait& operator=(const GiveUpWait&) = delete;
 };
 
-#endif  // TARNWICK_TOOLS_TWHTTP_INTERRUPT_H_
+#endif  // TARNWICK_TOOLS_TWHTTP_WATCHDOG_H_

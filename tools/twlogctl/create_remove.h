@@ -1,6 +1,6 @@
 // Making and removing the record.
-#ifndef TARNWICK_TOOLS_TWLOGCTL_LIFETIME_H_
-#define TARNWICK_TOOLS_TWLOGCTL_LIFETIME_H_
+#ifndef TARNWICK_TOOLS_TWLOGCTL_CREATE_REMOVE_H_
+#define TARNWICK_TOOLS_TWLOGCTL_CREATE_REMOVE_H_
 
 #include <sys/types.h>
 
@@ -23,4 +23,4 @@ std::optional<mode_t> ParseRecordMode(const std::string& text);
 int CreateRecord(const CreateOptions& options);
 int RemoveRecord(bool yes, bool json);
 
-#endif  // TARNWICK_TOOLS_TWLOGCTL_LIFETIME_H_
+#endif  // TARNWICK_TOOLS_TWLOGCTL_CREATE_REMOVE_H_

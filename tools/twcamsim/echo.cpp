@@ -1,4 +1,4 @@
-#include "tools/twcamsim/tell.h"
+#include "tools/twcamsim/echo.h"
 
 #include <fmt/format.h>
 #include <json/value.h>

@@ -1,6 +1,6 @@
 // Spans of time and sizes, as people write and read them.
-#ifndef TARNWICK_TOOLS_COMMON_AMOUNTS_H_
-#define TARNWICK_TOOLS_COMMON_AMOUNTS_H_
+#ifndef TARNWICK_TOOLS_COMMON_UNITS_H_
+#define TARNWICK_TOOLS_COMMON_UNITS_H_
 
 #include <chrono>
 #include <optional>
@@ -17,4 +17,4 @@ std::string FormatSpan(std::chrono::milliseconds span);
 // "512 B", "1.2 KiB", "3.4 MiB".
 std::string FormatBytes(double bytes);
 
-#endif  // TARNWICK_TOOLS_COMMON_AMOUNTS_H_
+#endif  // TARNWICK_TOOLS_COMMON_UNITS_H_

@@ -1,4 +1,4 @@
-#include "tools/twhttp/interrupt.h"
+#include "tools/twhttp/watchdog.h"
 
 #include <sys/time.h>
 #include <unistd.h>

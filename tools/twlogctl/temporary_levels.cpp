@@ -1,4 +1,4 @@
-#include "tools/twlogctl/guardian.h"
+#include "tools/twlogctl/temporary_levels.h"
 
 #include <fcntl.h>
 #include <poll.h>

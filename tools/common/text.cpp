@@ -1,4 +1,4 @@
-#include "tools/common/words.h"
+#include "tools/common/text.h"
 
 #include <algorithm>
 #include <utility>

@@ -1,5 +1,5 @@
 // Faults of the login. An endpoint without a login gets one by Digest.
-#include "tools/twcamsim/login.h"
+#include "tools/twcamsim/authenticator.h"
 
 #include "tools/twcamsim/faults.h"
 

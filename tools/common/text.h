@@ -1,6 +1,6 @@
 // What people meant by the names that they typed.
-#ifndef TARNWICK_TOOLS_COMMON_WORDS_H_
-#define TARNWICK_TOOLS_COMMON_WORDS_H_
+#ifndef TARNWICK_TOOLS_COMMON_TEXT_H_
+#define TARNWICK_TOOLS_COMMON_TEXT_H_
 
 #include <string>
 #include <string_view>
@@ -14,4 +14,4 @@ std::string LowerCase(std::string_view text);
 // than the nearest are left out.
 std::vector<std::string> NearestNames(std::string_view text, const std::vector<std::string>& names);
 
-#endif  // TARNWICK_TOOLS_COMMON_WORDS_H_
+#endif  // TARNWICK_TOOLS_COMMON_TEXT_H_

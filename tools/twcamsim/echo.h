@@ -1,6 +1,6 @@
 // Answers that tell what arrived.
-#ifndef TARNWICK_TOOLS_TWCAMSIM_TELL_H_
-#define TARNWICK_TOOLS_TWCAMSIM_TELL_H_
+#ifndef TARNWICK_TOOLS_TWCAMSIM_ECHO_H_
+#define TARNWICK_TOOLS_TWCAMSIM_ECHO_H_
 
 #include "tools/twcamsim/profile.h"
 
@@ -14,4 +14,4 @@ Response TellAsJson(const Exchange& exchange);
 // element "joined" runs over two lines.
 Response TellAsXml(const Exchange& exchange);
 
-#endif  // TARNWICK_TOOLS_TWCAMSIM_TELL_H_
+#endif  // TARNWICK_TOOLS_TWCAMSIM_ECHO_H_

@@ -1,4 +1,4 @@
-#include "tools/twcamsim/login.h"
+#include "tools/twcamsim/authenticator.h"
 
 #include <fmt/format.h>
 #include <openssl/evp.h>

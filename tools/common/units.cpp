@@ -1,4 +1,4 @@
-#include "tools/common/amounts.h"
+#include "tools/common/units.h"
 
 #include <charconv>
 #include <cmath>

@@ -1,4 +1,4 @@
-#include "tools/twcamsim/link.h"
+#include "tools/twcamsim/connection.h"
 
 #include <linux/sockios.h>
 #include <poll.h>

@@ -3,8 +3,8 @@
 // The process that puts them back is a child in a session of its own, so neither Ctrl-C nor the end
 // of the terminal reaches it, and it has a socket whose other end only its parent has: when the
 // parent is gone, even by SIGKILL, the child reads the end of the stream and acts at once.
-#ifndef TARNWICK_TOOLS_TWLOGCTL_GUARDIAN_H_
-#define TARNWICK_TOOLS_TWLOGCTL_GUARDIAN_H_
+#ifndef TARNWICK_TOOLS_TWLOGCTL_TEMPORARY_LEVELS_H_
+#define TARNWICK_TOOLS_TWLOGCTL_TEMPORARY_LEVELS_H_
 
 #include <chrono>
 #include <functional>
@@ -31,4 +31,4 @@ struct GuardResult {
 GuardResult HoldLevels(TWDbgLogCfg* record, const std::vector<LevelChange>& changes,
                        std::chrono::milliseconds span, const std::function<void()>& started);
 
-#endif  // TARNWICK_TOOLS_TWLOGCTL_GUARDIAN_H_
+#endif  // TARNWICK_TOOLS_TWLOGCTL_TEMPORARY_LEVELS_H_

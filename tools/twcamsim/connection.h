@@ -1,7 +1,7 @@
 // One accepted connection, plain or with TLS: every call has a limit, and another thread can stop
 // it.
-#ifndef TARNWICK_TOOLS_TWCAMSIM_LINK_H_
-#define TARNWICK_TOOLS_TWCAMSIM_LINK_H_
+#ifndef TARNWICK_TOOLS_TWCAMSIM_CONNECTION_H_
+#define TARNWICK_TOOLS_TWCAMSIM_CONNECTION_H_
 
 #include <openssl/ssl.h>
 
@@ -76,4 +76,4 @@ class Link {
   std::unique_ptr<Impl> impl_;
 };
 
-#endif  // TARNWICK_TOOLS_TWCAMSIM_LINK_H_
+#endif  // TARNWICK_TOOLS_TWCAMSIM_CONNECTION_H_

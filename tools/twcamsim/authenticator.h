@@ -1,6 +1,6 @@
 // The login that an endpoint asks for, and what was wrong with the one that came.
-#ifndef TARNWICK_TOOLS_TWCAMSIM_LOGIN_H_
-#define TARNWICK_TOOLS_TWCAMSIM_LOGIN_H_
+#ifndef TARNWICK_TOOLS_TWCAMSIM_AUTHENTICATOR_H_
+#define TARNWICK_TOOLS_TWCAMSIM_AUTHENTICATOR_H_
 
 #include <cstdint>
 #include <map>
@@ -95,4 +95,4 @@ class Login {
   std::vector<std::string> order_;  // of the nonces, the oldest first
 };
 
-#endif  // TARNWICK_TOOLS_TWCAMSIM_LOGIN_H_
+#endif  // TARNWICK_TOOLS_TWCAMSIM_AUTHENTICATOR_H_

@@ -1,4 +1,4 @@
-#include "tools/twlogctl/lifetime.h"
+#include "tools/twlogctl/create_remove.h"
 
 #include <grp.h>
 #include <json/value.h>
