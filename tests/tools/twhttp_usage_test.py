@@ -5,7 +5,9 @@ import re
 import pytest
 
 from twhttp_fixtures import peer  # noqa: F401 (fixture)
-from twhttp_server import reply
+from twhttp_server import response
+
+pytestmark = pytest.mark.native
 
 URL = "http://camera.invalid/"
 
@@ -82,7 +84,7 @@ def test_an_option_that_the_operation_has_no_use_for_is_refused(run, words):
 
 
 def test_a_document_that_is_no_xml_is_not_sent(run, peer):
-    server = peer(reply(b"x"))
+    server = peer(response(b"x"))
     result = run("twhttp", "xml-post", "-d", "<preset>", server.url())
     assert (result.returncode, server.connections) == (3, 0)
     assert "no well-formed XML" in result.stderr

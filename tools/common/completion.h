@@ -1,4 +1,5 @@
-// Completion in shells: each has a small script that asks the tool itself, "TOOL __complete WORD...".
+// Completion in shells: each has a small script that asks the tool itself, "TOOL __complete
+// WORD...".
 #ifndef TARNWICK_TOOLS_COMMON_COMPLETION_H_
 #define TARNWICK_TOOLS_COMMON_COMPLETION_H_
 
@@ -7,7 +8,7 @@
 #include <string>
 #include <vector>
 
-// The values of options and arguments, by the name that the parser gave them ("--category", or
+// The values of options and arguments, by the name that the parser has for them ("--category", or
 // "levels" for a positional argument). A sub-command's own entry is "set:levels", which goes before
 // one without the sub-command.
 //

@@ -26,11 +26,8 @@ std::string UnknownCommand(const CLI::App& app, int argc, char** argv) {
   }
   if (names.empty() || argc < 2 || argv[1][0] == '-' || !app.get_subcommands().empty()) return "";
   std::string text = "unknown sub-command \"" + std::string(argv[1]) + "\"";
-  std::string nearest;
-  for (const std::string& name : NearestNames(argv[1], names)) {
-    nearest += (nearest.empty() ? "" : ", ") + name;
-  }
-  return nearest.empty() ? text : text + " (did you mean " + nearest + "?)";
+  const std::string hint = DidYouMean(argv[1], names);
+  return hint.empty() ? text : text + " (" + hint + ")";
 }
 
 }  // namespace

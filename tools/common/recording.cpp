@@ -59,15 +59,15 @@ bool IsKnownEnd(const std::string& end) {
 }
 
 // The bytes of the file that the member names. A recording may come from a stranger.
-bool ReadNamed(const tarnwick::UniqueFd& folder, const Json::Value& line, const char* member,
+bool ReadNamed(const tarnwick::UniqueFd& directory, const Json::Value& line, const char* member,
                std::string* bytes, std::string* error) {
   const std::string name = line.get(member, "").asString();
   if (name.empty() || name.find('/') != std::string::npos || name == ".." ||
       name.find('\0') != std::string::npos) {
-    *error = std::string("\"") + member + "\" is no name of a file in the folder";
+    *error = std::string("\"") + member + "\" is no name of a file in the directory";
     return false;
   }
-  return ReadRegularFile(folder, name, kMostBytes, bytes, error);
+  return ReadRegularFile(directory, name, kMostBytes, bytes, error);
 }
 
 bool IsDelay(int64_t delay_ms) {
@@ -94,7 +94,7 @@ bool ReadPieces(const Json::Value& line, RecordedExchange* exchange, std::string
   return false;
 }
 
-bool ReadExchange(const tarnwick::UniqueFd& folder, const Json::Value& line,
+bool ReadExchange(const tarnwick::UniqueFd& directory, const Json::Value& line,
                   RecordedExchange* exchange, std::string* error) {
   exchange->number = line.get("number", 0).asInt();
   exchange->connection = line.get("connection", exchange->number).asInt();
@@ -113,12 +113,12 @@ bool ReadExchange(const tarnwick::UniqueFd& folder, const Json::Value& line,
     *error = "\"end_delay_ms\" is not between none and a day";
     return false;
   }
-  return ReadNamed(folder, line, "request", &exchange->request, error) &&
-         ReadNamed(folder, line, "response", &exchange->response, error) &&
+  return ReadNamed(directory, line, "request", &exchange->request, error) &&
+         ReadNamed(directory, line, "response", &exchange->response, error) &&
          ReadPieces(line, exchange, error);
 }
 
-bool ParseLine(const tarnwick::UniqueFd& folder, const std::string& text,
+bool ParseLine(const tarnwick::UniqueFd& directory, const std::string& text,
                RecordedExchange* exchange, std::string* error) {
   const std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
   Json::Value line;
@@ -127,14 +127,14 @@ bool ParseLine(const tarnwick::UniqueFd& folder, const std::string& text,
     *error = "no object with an array \"pieces\"";
     return false;
   }
-  return ReadExchange(folder, line, exchange, error);
+  return ReadExchange(directory, line, exchange, error);
 }
 
 }  // namespace
 
-bool WriteRecording(const std::string& folder, const std::vector<RecordedExchange>& exchanges,
+bool WriteRecording(const std::string& directory, const std::vector<RecordedExchange>& exchanges,
                     std::string* error) {
-  const tarnwick::UniqueFd opened = OpenPrivateFolder(folder, error);
+  const tarnwick::UniqueFd opened = OpenPrivateDirectory(directory, error);
   if (!opened.Valid()) return false;
   std::string index;
   bool written = true;
@@ -146,20 +146,20 @@ bool WriteRecording(const std::string& folder, const std::vector<RecordedExchang
     index += CompactJson(IndexLine(exchange)) + "\n";
   }
   if (written && WritePrivateFile(opened, kIndex, index, error)) return true;
-  *error = folder + "/" + *error;
+  *error = directory + "/" + *error;
   return false;
 }
 
-bool ReadRecording(const std::string& folder, std::vector<RecordedExchange>* exchanges,
+bool ReadRecording(const std::string& directory, std::vector<RecordedExchange>* exchanges,
                    std::string* error) {
-  const tarnwick::UniqueFd opened(open(folder.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+  const tarnwick::UniqueFd opened(open(directory.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
   if (!opened.Valid()) {
-    *error = folder + "/" + kIndex + ": " + std::strerror(errno);
+    *error = directory + "/" + kIndex + ": " + std::strerror(errno);
     return false;
   }
   std::string text;
   if (!ReadRegularFile(opened, kIndex, kMostBytes, &text, error)) {
-    *error = folder + "/" + *error;
+    *error = directory + "/" + *error;
     return false;
   }
   std::istringstream index(text);

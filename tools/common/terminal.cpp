@@ -120,7 +120,7 @@ bool MayColour(int fd) {
   return type != nullptr && *type != '\0' && std::strcmp(type, "dumb") != 0 && IsTerminal(fd);
 }
 
-std::string Paint(Colour colour, std::string_view text, bool enabled) {
+std::string InColour(Colour colour, std::string_view text, bool enabled) {
   if (!enabled || colour == Colour::kNone) return std::string(text);
   std::string result(CodeOf(colour));
   result.append(text);

@@ -1,5 +1,7 @@
 #include "tools/common/text.h"
 
+#include <strings.h>
+
 #include <algorithm>
 #include <utility>
 
@@ -37,8 +39,11 @@ std::string LowerCase(std::string_view text) {
   return result;
 }
 
-std::vector<std::string> NearestNames(std::string_view text,
-                                      const std::vector<std::string>& names) {
+bool EqualsIgnoringCase(std::string_view left, std::string_view right) {
+  return left.size() == right.size() && strncasecmp(left.data(), right.data(), left.size()) == 0;
+}
+
+std::string DidYouMean(std::string_view text, const std::vector<std::string>& names) {
   const std::string typed = LowerCase(text.substr(0, 64));  // nothing longer is near a name
   std::vector<std::pair<size_t, std::string>> ranked;
   for (const std::string& name : names) {
@@ -47,11 +52,11 @@ std::vector<std::string> NearestNames(std::string_view text,
   }
   std::stable_sort(ranked.begin(), ranked.end(),
                    [](const auto& a, const auto& b) { return a.first < b.first; });
-  std::vector<std::string> nearest;
-  for (const auto& [distance, name] : ranked) {
+  std::string nearest;
+  for (size_t i = 0; i < ranked.size() && i < kNearestCount; ++i) {
     // Beside a name that is one letter away, one that is three away is not what was meant.
-    const bool is_near = distance <= ranked.front().first + 1;
-    if (is_near && nearest.size() < kNearestCount) nearest.push_back(name);
+    if (ranked[i].first > ranked.front().first + 1) break;
+    nearest += (i == 0 ? "did you mean " : ", ") + ranked[i].second;
   }
-  return nearest;
+  return nearest.empty() ? "" : nearest + "?";
 }

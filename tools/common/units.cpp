@@ -54,6 +54,12 @@ std::string FormatSpan(std::chrono::milliseconds span) {
   return TwoUnits(seconds / 86400, "d", seconds % 86400 / 3600, "h");
 }
 
+std::string FormatSeconds(double seconds, int decimals) {
+  char text[64];
+  snprintf(text, sizeof(text), "%.*f s", decimals, seconds);
+  return text;
+}
+
 std::string FormatBytes(double bytes) {
   constexpr const char* kUnits[] = {"B", "KiB", "MiB", "GiB", "TiB"};
   size_t unit = 0;

@@ -14,6 +14,9 @@ std::optional<std::chrono::milliseconds> ParseSpan(std::string_view text);
 // "250 ms", "12.5 s", "10 min", "3 h 20 min": the two largest units.
 std::string FormatSpan(std::chrono::milliseconds span);
 
+// "2.50 s" with so many decimals.
+std::string FormatSeconds(double seconds, int decimals);
+
 // "512 B", "1.2 KiB", "3.4 MiB".
 std::string FormatBytes(double bytes);
 

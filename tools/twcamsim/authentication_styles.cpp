@@ -2,45 +2,45 @@
 
 namespace {
 
-LoginStyle Digest(const char* name, const char* meaning) {
-  LoginStyle style;
+AuthenticationStyle Digest(const char* name, const char* meaning) {
+  AuthenticationStyle style;
   style.name = name;
   style.meaning = meaning;
   style.digest = true;
   return style;
 }
 
-LoginStyle DigestQop(const char* name, const char* qop, const char* meaning) {
-  LoginStyle style = Digest(name, meaning);
+AuthenticationStyle DigestQop(const char* name, const char* qop, const char* meaning) {
+  AuthenticationStyle style = Digest(name, meaning);
   style.qop = qop;
   return style;
 }
 
-LoginStyle DigestAlgorithm(const char* name, const char* algorithm, const char* meaning) {
-  LoginStyle style = DigestQop(name, "auth", meaning);
+AuthenticationStyle DigestAlgorithm(const char* name, const char* algorithm, const char* meaning) {
+  AuthenticationStyle style = DigestQop(name, "auth", meaning);
   style.algorithm = algorithm;
   return style;
 }
 
-LoginStyle Both(const char* name, const char* meaning) {
-  LoginStyle style = DigestQop(name, "auth", meaning);
+AuthenticationStyle Both(const char* name, const char* meaning) {
+  AuthenticationStyle style = DigestQop(name, "auth", meaning);
   style.basic = true;
   return style;
 }
 
-void AddPlain(std::vector<LoginStyle>* styles) {
-  LoginStyle none;
+void AddPlain(std::vector<AuthenticationStyle>* styles) {
+  AuthenticationStyle none;
   none.name = "none";
-  none.meaning = "no login is asked for";
+  none.meaning = "no credentials are asked for";
   styles->push_back(none);
-  LoginStyle basic;
+  AuthenticationStyle basic;
   basic.name = "basic";
   basic.meaning = "Basic";
   basic.basic = true;
   styles->push_back(basic);
 }
 
-void AddDigest(std::vector<LoginStyle>* styles) {
+void AddDigest(std::vector<AuthenticationStyle>* styles) {
   styles->push_back(DigestQop("digest", "auth", "Digest with qop=\"auth\""));
   styles->push_back(Digest("digest-no-qop", "Digest without qop, as RFC 2069 has it"));
   styles->push_back(
@@ -66,12 +66,13 @@ void AddDigest(std::vector<LoginStyle>* styles) {
   styles->back().unquoted = true;
 }
 
-void AddPicky(std::vector<LoginStyle>* styles) {
-  styles->push_back(DigestQop("digest-stale", "auth",
-                              "Digest; each nonce's first answer comes too late: stale=true"));
+void AddPicky(std::vector<AuthenticationStyle>* styles) {
+  styles->push_back(
+      DigestQop("digest-stale", "auth",
+                "Digest; the first credentials for each nonce come too late: stale=true"));
   styles->back().stale_first = true;
   styles->push_back(
-      DigestQop("digest-strict", "auth", "Digest, refusing answers whose quotes are wrong"));
+      DigestQop("digest-strict", "auth", "Digest, refusing credentials whose quotes are wrong"));
   styles->back().strict_quotes = true;
   styles->push_back(DigestAlgorithm("digest-strict-algorithm", "MD5",
                                     "the same, and the algorithm may have no quotes either"));
@@ -85,9 +86,9 @@ void AddPicky(std::vector<LoginStyle>* styles) {
 
 }  // namespace
 
-const std::vector<LoginStyle>& LoginStyles() {
-  static const std::vector<LoginStyle> kStyles = [] {
-    std::vector<LoginStyle> styles;
+const std::vector<AuthenticationStyle>& AuthenticationStyles() {
+  static const std::vector<AuthenticationStyle> kStyles = [] {
+    std::vector<AuthenticationStyle> styles;
     AddPlain(&styles);
     AddDigest(&styles);
     AddPicky(&styles);
@@ -96,8 +97,8 @@ const std::vector<LoginStyle>& LoginStyles() {
   return kStyles;
 }
 
-const LoginStyle* FindLoginStyle(const std::string& name) {
-  for (const LoginStyle& style : LoginStyles()) {
+const AuthenticationStyle* FindAuthenticationStyle(const std::string& name) {
+  for (const AuthenticationStyle& style : AuthenticationStyles()) {
     if (style.name == name) return &style;
   }
   return nullptr;

@@ -11,7 +11,7 @@
 namespace {
 
 constexpr char kOpaque[] = "c0ffee5eed";
-constexpr size_t kMostNonces = 4096;  // a client that never answers leaves them behind
+constexpr size_t kMostNonces = 4096;  // a client that never sends credentials leaves them unused
 
 Verdict Refused(const std::string& scheme, const std::string& user, const std::string& field,
                 const std::string& text) {
@@ -41,7 +41,7 @@ std::string Word(const DigestWords& words, const char* name) {
   return found == words.end() ? "" : found->second.value;
 }
 
-bool Offers(const LoginStyle& style, const std::string& qop) {
+bool Offers(const AuthenticationStyle& style, const std::string& qop) {
   return ("," + style.qop + ",").find("," + qop + ",") != std::string::npos;
 }
 
@@ -50,13 +50,14 @@ bool IsHex(const std::string& text, size_t size) {
          text.find_first_not_of("0123456789abcdefABCDEF") == std::string::npos;
 }
 
-bool IsSession(const LoginStyle& style) {
+bool IsSession(const AuthenticationStyle& style) {
   return style.algorithm.find("MD5-sess") != std::string::npos;
 }
 
 // What is wrong with the fields beside nonce and response: its name, and a sentence.
-std::pair<std::string, std::string> CheckFields(const LoginStyle& style, const Account& account,
-                                                const Request& request, const DigestWords& words) {
+std::pair<std::string, std::string> CheckFields(const AuthenticationStyle& style,
+                                                const Account& account, const Request& request,
+                                                const DigestWords& words) {
   const auto differs = [](const char* what, const std::string& got, const std::string& wanted) {
     return fmt::format("the {} is \"{}\", not \"{}\"", what, got, wanted);
   };
@@ -71,7 +72,7 @@ std::pair<std::string, std::string> CheckFields(const LoginStyle& style, const A
   }
   const std::string algorithm = Word(words, "algorithm"),
                     wanted = IsSession(style) ? "MD5-sess" : "MD5";
-  if (!algorithm.empty() && !SameName(algorithm, wanted)) {
+  if (!algorithm.empty() && !EqualsIgnoringCase(algorithm, wanted)) {
     return {"algorithm", differs("algorithm", algorithm, wanted)};
   }
   const std::string qop = Word(words, "qop");
@@ -82,8 +83,8 @@ std::pair<std::string, std::string> CheckFields(const LoginStyle& style, const A
   return {};
 }
 
-DigestInput InputOf(const LoginStyle& style, const Account& account, const Request& request,
-                    const DigestWords& words) {
+DigestInput InputOf(const AuthenticationStyle& style, const Account& account,
+                    const Request& request, const DigestWords& words) {
   DigestInput input;
   input.user = account.user;
   input.realm = account.realm;
@@ -101,7 +102,7 @@ DigestInput InputOf(const LoginStyle& style, const Account& account, const Reque
 
 }  // namespace
 
-Verdict Login::Check(const LoginStyle& style, const Request& request) {
+Verdict Authenticator::Check(const AuthenticationStyle& style, const Request& request) {
   const std::string line = request.Get("Authorization");
   const size_t blank = std::min(line.find(' '), line.size());
   const std::string word = line.substr(0, blank),
@@ -114,19 +115,20 @@ Verdict Login::Check(const LoginStyle& style, const Request& request) {
   }
   if (line.empty()) return Refused("none", "", "missing", "the request has no Authorization line");
   Verdict verdict = Refused(word, "", "scheme", "the scheme \"" + word + "\" was not asked for");
-  if (SameName(word, "basic") && style.basic) verdict = CheckBasic(rest);
-  if (SameName(word, "digest") && style.digest) verdict = CheckDigest(style, request, rest);
+  if (EqualsIgnoringCase(word, "basic") && style.basic) verdict = CheckBasic(rest);
+  if (EqualsIgnoringCase(word, "digest") && style.digest)
+    verdict = CheckDigest(style, request, rest);
   if (verdict.passed && style.never) {
     return Refused(verdict.scheme, verdict.user, "never",
-                   "the login is right, and refused all the same");
+                   "the credentials are right, and refused all the same");
   }
   return verdict;
 }
 
-Verdict Login::CheckBasic(const std::string& text) const {
+Verdict Authenticator::CheckBasic(const std::string& text) const {
   std::string bytes;
   if (!DecodeBase64(text, &bytes)) {
-    return Refused("basic", "", "encoding", "the login is not base64");
+    return Refused("basic", "", "encoding", "the credentials are not base64");
   }
   const size_t colon = bytes.find(':');
   if (colon == std::string::npos) {
@@ -145,8 +147,8 @@ Verdict Login::CheckBasic(const std::string& text) const {
   return verdict;
 }
 
-Verdict Login::CheckDigest(const LoginStyle& style, const Request& request,
-                           const std::string& text) {
+Verdict Authenticator::CheckDigest(const AuthenticationStyle& style, const Request& request,
+                                   const std::string& text) {
   DigestWords words;
   if (!ParseDigestWords(text, &words)) {
     return Refused("digest", "", "quotes", "the line is not a list of name=value");
@@ -175,8 +177,8 @@ Verdict Login::CheckDigest(const LoginStyle& style, const Request& request,
 }
 
 // Last of all, so that "stale" always means: right but for the nonce.
-bool Login::CheckNonce(const LoginStyle& style, const std::string& nonce, const std::string& count,
-                       Verdict* verdict) {
+bool Authenticator::CheckNonce(const AuthenticationStyle& style, const std::string& nonce,
+                               const std::string& count, Verdict* verdict) {
   const std::lock_guard<std::mutex> lock(mutex_);
   const auto found = nonces_.find(nonce);
   verdict->field = "nonce";
@@ -192,7 +194,7 @@ bool Login::CheckNonce(const LoginStyle& style, const std::string& nonce, const 
     return false;
   }
   if (style.stale_first && found->second.uses++ == 0) {
-    verdict->text = "the nonce is stale; the same login with the new nonce will do";
+    verdict->text = "the nonce is stale; the same credentials with the new nonce will do";
     return false;
   }
   const int64_t number = count.empty() ? found->second.count + 1 : std::stoll(count, nullptr, 16);
@@ -206,7 +208,7 @@ bool Login::CheckNonce(const LoginStyle& style, const std::string& nonce, const 
   return true;
 }
 
-std::string Login::NewNonce(int uses, Random* random) {
+std::string Authenticator::NewNonce(int uses, Random* random) {
   std::string nonce = random->Hex(12);
   const std::lock_guard<std::mutex> lock(mutex_);
   if (order_.size() >= kMostNonces) {
@@ -218,7 +220,8 @@ std::string Login::NewNonce(int uses, Random* random) {
   return nonce;
 }
 
-std::string Login::DigestChallenge(const LoginStyle& style, bool stale, Random* random) {
+std::string Authenticator::DigestChallenge(const AuthenticationStyle& style, bool stale,
+                                           Random* random) {
   const char* quote = style.unquoted ? "" : "\"";
   const std::string realm = fmt::format("realm={0}{1}{0}", quote, account_.realm);
   const std::string nonce = fmt::format("nonce={0}{1}{0}", quote, NewNonce(stale ? 1 : 0, random));
@@ -237,8 +240,8 @@ std::string Login::DigestChallenge(const LoginStyle& style, bool stale, Random* 
          fmt::format("{}", fmt::join(words, style.odd_order ? " , " : ", "));
 }
 
-std::vector<std::string> Login::Challenges(const LoginStyle& style, const Verdict& verdict,
-                                           Random* random) {
+std::vector<std::string> Authenticator::Challenges(const AuthenticationStyle& style,
+                                                   const Verdict& verdict, Random* random) {
   std::vector<std::string> lines;
   if (style.hide_challenge) return lines;
   const bool stale = verdict.stale || (style.always_stale && verdict.field != "missing");

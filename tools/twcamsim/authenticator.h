@@ -1,4 +1,5 @@
-// The login that an endpoint asks for, and what was wrong with the one that came.
+// The authentication that an endpoint asks for, and what was wrong with the credentials that
+// came.
 #ifndef TARNWICK_TOOLS_TWCAMSIM_AUTHENTICATOR_H_
 #define TARNWICK_TOOLS_TWCAMSIM_AUTHENTICATOR_H_
 
@@ -12,8 +13,8 @@
 #include "tools/twcamsim/random.h"
 #include "tools/twcamsim/request.h"
 
-// How the challenge looks and how an answer is judged.
-struct LoginStyle {
+// How the challenge looks and how credentials are judged.
+struct AuthenticationStyle {
   std::string name;
   std::string meaning;
   bool basic = false;
@@ -25,25 +26,25 @@ struct LoginStyle {
   std::string algorithm;       // as it stands in the challenge, with quotes if it is to have some
   bool odd_order = false;      // nonce, then realm, with domain and stale in between
   bool unquoted = false;       // realm and nonce without quotes
-  bool stale_first = false;    // the first right answer of a connection's nonce comes too late
-  bool strict_quotes = false;  // refuses an answer whose quotes are not RFC 2617's
+  bool stale_first = false;    // the first right credentials for a connection's nonce come too late
+  bool strict_quotes = false;  // refuses credentials whose quotes are not RFC 2617's
 
   // What faults make of it.
-  bool never = false;         // no answer is right
-  bool never_nonce = false;   // no nonce is known any more when its answer comes
+  bool never = false;         // no credentials are right
+  bool never_nonce = false;   // no nonce is known any more when its credentials come
   bool always_stale = false;  // and the challenge says so
   bool hide_realm = false;
   bool hide_nonce = false;
   bool hide_challenge = false;
-  bool forbid = false;  // 403 behind a right login
+  bool forbid = false;  // 403 after right credentials
   std::string scheme;   // another word in front of the challenge
 };
 
 // All styles, "none" and "basic" first.
-const std::vector<LoginStyle>& LoginStyles();
+const std::vector<AuthenticationStyle>& AuthenticationStyles();
 
 // nullptr when there is none of that name.
-const LoginStyle* FindLoginStyle(const std::string& name);
+const AuthenticationStyle* FindAuthenticationStyle(const std::string& name);
 
 struct Account {
   std::string user;
@@ -64,14 +65,14 @@ struct Verdict {
 
 // One endpoint's accounts and nonces.
 // Threads: any.
-class Login {
+class Authenticator {
  public:
-  explicit Login(Account account) : account_(std::move(account)) {}
+  explicit Authenticator(Account account) : account_(std::move(account)) {}
 
-  Verdict Check(const LoginStyle& style, const Request& request);
+  Verdict Check(const AuthenticationStyle& style, const Request& request);
 
   // The WWW-Authenticate values of a 401, in their order.
-  std::vector<std::string> Challenges(const LoginStyle& style, const Verdict& verdict,
+  std::vector<std::string> Challenges(const AuthenticationStyle& style, const Verdict& verdict,
                                       Random* random);
 
   const Account& GetAccount() const { return account_; }
@@ -83,10 +84,11 @@ class Login {
   };
 
   Verdict CheckBasic(const std::string& text) const;
-  Verdict CheckDigest(const LoginStyle& style, const Request& request, const std::string& text);
-  bool CheckNonce(const LoginStyle& style, const std::string& nonce, const std::string& count,
-                  Verdict* verdict);
-  std::string DigestChallenge(const LoginStyle& style, bool stale, Random* random);
+  Verdict CheckDigest(const AuthenticationStyle& style, const Request& request,
+                      const std::string& text);
+  bool CheckNonce(const AuthenticationStyle& style, const std::string& nonce,
+                  const std::string& count, Verdict* verdict);
+  std::string DigestChallenge(const AuthenticationStyle& style, bool stale, Random* random);
   std::string NewNonce(int uses, Random* random);
 
   const Account account_;

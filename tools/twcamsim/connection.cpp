@@ -40,7 +40,7 @@ Io Classify(const error_code& code, std::string* text) {
 
 }  // namespace
 
-struct Link::Impl {
+struct Connection::Impl {
   explicit Impl(int fd) {
     error_code code;
     socket.assign(tcp::v4(), fd, code);
@@ -80,7 +80,7 @@ struct Link::Impl {
   }
 
   // Whether one of `events` has come, without waiting. A peer that only closed its direction
-  // (POLLRDHUP) may still want its answer.
+  // (POLLRDHUP) may still want its response.
   bool Came(int events) {
     pollfd watched = {socket.native_handle(), POLLRDHUP, 0};
     return poll(&watched, 1, 0) > 0 && (watched.revents & events) != 0;
@@ -98,16 +98,16 @@ struct Link::Impl {
   uint64_t bytes_out = 0;
 };
 
-Link::Link(int fd) : impl_(std::make_unique<Impl>(fd)) {}
+Connection::Connection(int fd) : impl_(std::make_unique<Impl>(fd)) {}
 
-Link::~Link() = default;
+Connection::~Connection() = default;
 
-void Link::Stop() {
+void Connection::Stop() {
   impl_->stopped = true;
   asio::post(impl_->io, [impl = impl_.get()] { impl->Cancel(); });
 }
 
-Io Link::Handshake(SSL_CTX* context, Milliseconds limit) {
+Io Connection::Handshake(SSL_CTX* context, Milliseconds limit) {
   SSL_CTX_up_ref(context);  // the context below gives it back
   impl_->context.emplace(context);
   impl_->tls.emplace(impl_->socket, *impl_->context);
@@ -118,7 +118,7 @@ Io Link::Handshake(SSL_CTX* context, Milliseconds limit) {
   });
 }
 
-Io Link::Read(std::string* bytes, size_t most, Milliseconds limit) {
+Io Connection::Read(std::string* bytes, size_t most, Milliseconds limit) {
   if (!impl_->tls) {
     const size_t before = bytes->size();
     const Io result = ReadRaw(bytes, most, limit);
@@ -135,7 +135,7 @@ Io Link::Read(std::string* bytes, size_t most, Milliseconds limit) {
   return result;
 }
 
-Io Link::ReadRaw(std::string* bytes, size_t most, Milliseconds limit) {
+Io Connection::ReadRaw(std::string* bytes, size_t most, Milliseconds limit) {
   std::string piece(most, '\0');
   size_t moved = 0;
   const Io result = impl_->Await(limit, &moved, [&](auto handler) {
@@ -145,7 +145,7 @@ Io Link::ReadRaw(std::string* bytes, size_t most, Milliseconds limit) {
   return result;
 }
 
-Io Link::Write(std::string_view bytes, Milliseconds limit) {
+Io Connection::Write(std::string_view bytes, Milliseconds limit) {
   if (bytes.empty()) return Io::kDone;
   size_t moved = 0;
   const asio::const_buffer buffer(bytes.data(), bytes.size());
@@ -160,14 +160,14 @@ Io Link::Write(std::string_view bytes, Milliseconds limit) {
   return result;
 }
 
-Io Link::WriteRaw(std::string_view bytes, Milliseconds limit) {
+Io Connection::WriteRaw(std::string_view bytes, Milliseconds limit) {
   size_t moved = 0;
   const asio::const_buffer buffer(bytes.data(), bytes.size());
   return impl_->Await(limit, &moved,
                       [&](auto handler) { asio::async_write(impl_->socket, buffer, handler); });
 }
 
-Io Link::Pause(Milliseconds span) {
+Io Connection::Pause(Milliseconds span) {
   const auto end = std::chrono::steady_clock::now() + span;
   constexpr Milliseconds kStep{100};  // how late a break is noticed
   for (;;) {
@@ -183,7 +183,7 @@ Io Link::Pause(Milliseconds span) {
   }
 }
 
-Io Link::HoldUntilPeerLeaves(Milliseconds limit) {
+Io Connection::WaitUntilPeerLeaves(Milliseconds limit) {
   const auto end = std::chrono::steady_clock::now() + limit;
   for (;;) {
     const auto left = std::chrono::ceil<Milliseconds>(end - std::chrono::steady_clock::now());
@@ -195,7 +195,7 @@ Io Link::HoldUntilPeerLeaves(Milliseconds limit) {
 }
 
 // The end of what nobody reads is not to be read either.
-Io Link::HoldUnread(Milliseconds limit) {
+Io Connection::WaitUnread(Milliseconds limit) {
   constexpr Milliseconds kStep{100};
   for (Milliseconds left = limit; left.count() > 0; left -= kStep) {
     if (impl_->Came(POLLRDHUP)) return Io::kEnd;
@@ -205,7 +205,7 @@ Io Link::HoldUnread(Milliseconds limit) {
   return Io::kTimeout;
 }
 
-void Link::Close(bool close_notice) {
+void Connection::Close(bool close_notice) {
   if (!IsOpen()) return;
   size_t ignored = 0;
   if (impl_->tls && close_notice) {
@@ -215,12 +215,12 @@ void Link::Close(bool close_notice) {
   }
   error_code code;
   impl_->socket.shutdown(tcp::socket::shutdown_send, code);
-  if (!code) HoldUntilPeerLeaves(kLinger);
+  if (!code) WaitUntilPeerLeaves(kLinger);
   impl_->socket.close(code);
 }
 
 // The peer is to get what was written before the reset, which throws away what is still on its way.
-void Link::Reset() {
+void Connection::Reset() {
   constexpr Milliseconds kStep{5};
   int unsent = 0;
   for (int i = 0; i < 200 && ioctl(impl_->socket.native_handle(), SIOCOUTQ, &unsent) == 0; ++i) {
@@ -231,26 +231,26 @@ void Link::Reset() {
   impl_->socket.close(ignored);
 }
 
-bool Link::IsOpen() const {
+bool Connection::IsOpen() const {
   return impl_->socket.is_open();
 }
 
-std::string Link::Peer() const {
+std::string Connection::Peer() const {
   return impl_->peer;
 }
 
-std::string Link::TlsVersion() const {
+std::string Connection::TlsVersion() const {
   return impl_->tls ? SSL_get_version(impl_->tls->native_handle()) : "";
 }
 
-const std::string& Link::ErrorText() const {
+const std::string& Connection::ErrorText() const {
   return impl_->error;
 }
 
-uint64_t Link::BytesIn() const {
+uint64_t Connection::BytesIn() const {
   return impl_->bytes_in;
 }
 
-uint64_t Link::BytesOut() const {
+uint64_t Connection::BytesOut() const {
   return impl_->bytes_out;
 }

@@ -21,15 +21,15 @@ enum class Io {
 };
 
 // Threads: one at a time, but for Stop.
-class Link {
+class Connection {
  public:
   using Milliseconds = std::chrono::milliseconds;
 
   // Owns `fd`, a connected TCP socket.
-  explicit Link(int fd);
-  ~Link();
-  Link(const Link&) = delete;
-  Link& operator=(const Link&) = delete;
+  explicit Connection(int fd);
+  ~Connection();
+  Connection(const Connection&) = delete;
+  Connection& operator=(const Connection&) = delete;
 
   // Makes every call, the current one included, return kStopped.
   void Stop();
@@ -46,14 +46,14 @@ class Link {
   Io ReadRaw(std::string* bytes, size_t most, Milliseconds limit);
   Io WriteRaw(std::string_view bytes, Milliseconds limit);
 
-  // Waits for that long: kDone behind it, kReset when the peer breaks the connection.
+  // Waits for that long: kDone after it, kReset when the peer breaks the connection.
   Io Pause(Milliseconds span);
 
-  // Waits until the peer leaves, and throws away what it sends. TLS is of no use behind that.
-  Io HoldUntilPeerLeaves(Milliseconds limit);
+  // Waits until the peer leaves, and throws away what it sends. TLS is of no use after that.
+  Io WaitUntilPeerLeaves(Milliseconds limit);
 
   // The same without reading.
-  Io HoldUnread(Milliseconds limit);
+  Io WaitUnread(Milliseconds limit);
 
   // Ends the connection in good order. Waits a moment for the peer's end, so that bytes of it that
   // nobody read do not turn the end into a reset.

@@ -8,7 +8,7 @@
 
 namespace {
 
-// The document in a request's body, without its declaration and the blanks behind it.
+// The document in a request's body, without its declaration and the blanks after it.
 std::string Inner(std::string document) {
   if (document.compare(0, 5, "<?xml") == 0) {
     const size_t end = document.find("?>");
@@ -20,7 +20,7 @@ std::string Inner(std::string document) {
 
 }  // namespace
 
-Response TellAsText(const Exchange& exchange) {
+Response EchoAsText(const Exchange& exchange) {
   const Request& request = exchange.request;
   return MakeResponse(
       200, "text/plain",
@@ -29,7 +29,7 @@ Response TellAsText(const Exchange& exchange) {
                   request.Get("Content-Type"), request.Get("Cookie"), exchange.user, request.body));
 }
 
-Response TellAsJson(const Exchange& exchange) {
+Response EchoAsJson(const Exchange& exchange) {
   Json::Value value(Json::objectValue);
   value["success"] = true;
   value["method"] = exchange.request.method;
@@ -40,7 +40,7 @@ Response TellAsJson(const Exchange& exchange) {
   return MakeResponse(200, "application/json", CompactJson(value));
 }
 
-Response TellAsXml(const Exchange& exchange) {
+Response EchoAsXml(const Exchange& exchange) {
   const Request& request = exchange.request;
   return MakeResponse(
       request.query == "fault" ? 500 : 200, "application/xml",

@@ -1,10 +1,10 @@
-// From a request to the answer.
+// From a request to the response.
 #include "tools/twcamsim/session.h"
 
 namespace {
 
 bool WantsContinue(const Request& request) {
-  return SameName(request.Get("Expect"), "100-continue");
+  return EqualsIgnoringCase(request.Get("Expect"), "100-continue");
 }
 
 }  // namespace
@@ -19,7 +19,7 @@ bool Session::TakeRequest(Request* request) {
   if (!request->head.empty()) NoteRequest(*request, Verdict());
   switch (reading) {
     case Reading::kBad:
-      return Refuse(*request, 400, "Bad request: " + request->sloppy + "\n");
+      return Refuse(*request, 400, "Bad request: " + request->deviation + "\n");
     case Reading::kFull:
       return Refuse(*request, 503, "All connections together hold 80 MiB of requests\n");
     case Reading::kLimit:
@@ -32,12 +32,12 @@ bool Session::TakeRequest(Request* request) {
 bool Session::Refuse(const Request& request, int status, const std::string& text) {
   Response response = MakeResponse(status, "text/plain", text);
   response.close = true;
-  const Wire wire = RenderResponse(response, request);
-  NoteAnswer(request, wire);
-  return Play(wire) && CloseNow();
+  const Steps steps = RenderResponse(response, request);
+  NoteResponse(request, steps);
+  return Play(steps) && CloseNow();
 }
 
-bool Session::BeforeAnswer() {
+bool Session::BeforeResponse() {
   switch (behaviour_.after_request) {
     case AfterRequest::kAnswer:
       return true;
@@ -46,27 +46,28 @@ bool Session::BeforeAnswer() {
     case AfterRequest::kReset:
       return ResetNow();
     case AfterRequest::kStall:
-      return Hold();
+      return StallUntilPeerLeaves();
   }
   return false;
 }
 
-LoginStyle Session::StyleFor(const Request& request) {
+AuthenticationStyle Session::StyleFor(const Request& request) {
   const std::string own = endpoint_->profile->LoginFor(request);
-  LoginStyle style = *FindLoginStyle(own.empty() ? endpoint_->login_style : own);
+  AuthenticationStyle style =
+      *FindAuthenticationStyle(own.empty() ? endpoint_->authentication_style : own);
   for (const Fault& fault : endpoint_->faults) {
-    if (!fault.type->hooks.login) continue;
-    fault.type->hooks.login(&style, {fault.arguments, &request, &random_});
+    if (!fault.type->hooks.authentication) continue;
+    fault.type->hooks.authentication(&style, {fault.arguments, &request, &random_});
     NoteFault(fault);
   }
   return style;
 }
 
-Response Session::MakeAnswer(const Request& request, const LoginStyle& style,
-                             const Verdict& verdict) {
+Response Session::MakeResponseTo(const Request& request, const AuthenticationStyle& style,
+                                 const Verdict& verdict) {
   if (!verdict.passed) return Refuse(style, verdict);
   Response response = style.forbid
-                          ? MakeResponse(403, "text/plain", "This login may not do that.\n")
+                          ? MakeResponse(403, "text/plain", "These credentials may not do that.\n")
                           : Ask(request, verdict);
   if (response.raw) return response;
   for (const Fault& fault : endpoint_->faults) {
@@ -77,10 +78,11 @@ Response Session::MakeAnswer(const Request& request, const LoginStyle& style,
   return response;
 }
 
-Response Session::Refuse(const LoginStyle& style, const Verdict& verdict) {
-  Response response = MakeResponse(401, "text/plain",
-                                   "Login refused: " + verdict.field + ": " + verdict.text + "\n");
-  for (const std::string& challenge : endpoint_->login.Challenges(style, verdict, &random_)) {
+Response Session::Refuse(const AuthenticationStyle& style, const Verdict& verdict) {
+  Response response = MakeResponse(
+      401, "text/plain", "Credentials refused: " + verdict.field + ": " + verdict.text + "\n");
+  for (const std::string& challenge :
+       endpoint_->authenticator.Challenges(style, verdict, &random_)) {
     response.headers.push_back({"WWW-Authenticate", challenge});
   }
   return response;
@@ -91,16 +93,16 @@ Response Session::Ask(const Request& request, const Verdict& verdict) {
   const bool streams = endpoint_->profile->TakesStream(request);
   if (streams && WantsContinue(request)) Send("HTTP/1.1 100 Continue\r\n\r\n");
   const std::string user = verdict.scheme == "none" ? "" : verdict.user;
-  return endpoint_->profile->Answer({request, user, &random_, streams ? &source : nullptr});
+  return endpoint_->profile->Respond({request, user, &random_, streams ? &source : nullptr});
 }
 
-Wire Session::Render(const Response& response, const Request& request) {
-  Wire wire = RenderResponse(response, request);
-  if (response.raw) return wire;
+Steps Session::Render(const Response& response, const Request& request) {
+  Steps steps = RenderResponse(response, request);
+  if (response.raw) return steps;
   for (const Fault& fault : endpoint_->faults) {
-    if (!fault.type->hooks.wire) continue;
-    fault.type->hooks.wire(&wire, {fault.arguments, &request, &random_});
+    if (!fault.type->hooks.steps) continue;
+    fault.type->hooks.steps(&steps, {fault.arguments, &request, &random_});
     NoteFault(fault);
   }
-  return wire;
+  return steps;
 }

@@ -1,6 +1,7 @@
-// What is odd about a reply's head, and what the library makes of it.
+// What is odd about a response's head, and what the library makes of it.
 #include <algorithm>
 
+#include "tools/common/text.h"
 #include "tools/twhttp/message.h"
 
 namespace {
@@ -17,7 +18,7 @@ struct LineFacts {
   bool only_delimiters = false;
 };
 
-// `line` is one behind the status line, without its end.
+// `line` is one after the status line, without its end.
 void MeasureHeader(const std::string& line, LineFacts* facts) {
   if (line.empty()) return;
   const size_t colon = line.find(':');
@@ -52,15 +53,15 @@ size_t CountOf(const HeaderLines& headers, const char* name) {
   }));
 }
 
-void InspectLines(const ReplyMessage& reply, std::vector<HeadFinding>* found) {
-  const LineFacts facts = Measure(reply.Head());
+void InspectLines(const ResponseMessage& response, std::vector<HeadFinding>* found) {
+  const LineFacts facts = Measure(response.Head());
   if (facts.longest > kLibraryLine) {
     found->push_back({"a head line of " + std::to_string(facts.longest) + " bytes",
                       "the library cuts a line at 2,047 bytes and takes the rest for another line",
                       true});
   }
-  if (reply.Headers().size() > kLibraryLines) {
-    found->push_back({std::to_string(reply.Headers().size()) + " header lines",
+  if (response.Headers().size() > kLibraryLines) {
+    found->push_back({std::to_string(response.Headers().size()) + " header lines",
                       "the library reads 30; the others are taken for the beginning of the body",
                       true});
   }
@@ -84,8 +85,8 @@ void InspectLines(const ReplyMessage& reply, std::vector<HeadFinding>* found) {
   }
   for (const char* known : {"Content-Type", "Content-Length", "Content-Range", "Set-Cookie",
                             "WWW-Authenticate", "Transfer-Encoding"}) {
-    if (CountOf(reply.Headers(), known) == 0 || !reply.Value(known).empty()) continue;
-    const bool breaks = reply.Head().find(std::string(known) + ":\r\n") != std::string::npos;
+    if (CountOf(response.Headers(), known) == 0 || !response.Value(known).empty()) continue;
+    const bool breaks = response.Head().find(std::string(known) + ":\r\n") != std::string::npos;
     found->push_back({std::string("an empty ") + known + " line",
                       breaks ? "the library takes the whole head for malformed"
                              : "the blank in it keeps the library from refusing the head",
@@ -93,21 +94,21 @@ void InspectLines(const ReplyMessage& reply, std::vector<HeadFinding>* found) {
   }
 }
 
-void InspectFraming(const ReplyMessage& reply, std::vector<HeadFinding>* found) {
-  const std::string coding = reply.Value("Transfer-Encoding");
-  const std::string length = reply.Value("Content-Length");
+void InspectFraming(const ResponseMessage& response, std::vector<HeadFinding>* found) {
+  const std::string coding = response.Value("Transfer-Encoding");
+  const std::string length = response.Value("Content-Length");
   if (!length.empty() && length.find_first_not_of("0123456789") != std::string::npos) {
     found->push_back({"Content-Length: " + length + " is no length",
-                      "only a SOAP reply needs one; libcurl refuses the head"});
+                      "only a SOAP response needs one; libcurl refuses the head"});
   }
-  if (CountOf(reply.Headers(), "Content-Length") > 1) {
+  if (CountOf(response.Headers(), "Content-Length") > 1) {
     found->push_back({"more than one Content-Length", "the library keeps the first of them"});
   }
-  if (!coding.empty() && !reply.Value("Content-Length").empty()) {
+  if (!coding.empty() && !response.Value("Content-Length").empty()) {
     found->push_back({"a Content-Length beside a Transfer-Encoding", "the chunks count"});
   }
-  if (!reply.Value("Content-Encoding").empty()) {
-    found->push_back({"Content-Encoding: " + reply.Value("Content-Encoding"),
+  if (!response.Value("Content-Encoding").empty()) {
+    found->push_back({"Content-Encoding: " + response.Value("Content-Encoding"),
                       "the library decodes none, and hands the body on as it is"});
   }
   if (!coding.empty() && coding != "chunked") {
@@ -120,25 +121,25 @@ void InspectFraming(const ReplyMessage& reply, std::vector<HeadFinding>* found) 
 
 }  // namespace
 
-std::vector<HeadFinding> InspectHead(const ReplyMessage& reply) {
+std::vector<HeadFinding> InspectHead(const ResponseMessage& response) {
   std::vector<HeadFinding> found;
-  const std::string& head = reply.Head();
+  const std::string& head = response.Head();
   const std::string start = head.substr(0, 8);
   const bool known = start == "HTTP/1.0" || start == "HTTP/1.1";
   const bool complete = head.find('\n') != std::string::npos;
-  if (known && complete && reply.Interims() == 0 && reply.Status() < 100) {
+  if (known && complete && response.Interims() == 0 && response.Status() < 100) {
     found.push_back({"the status line has no status of three digits: " + FirstLine(head),
                      "the library takes it for no success", true});
   }
   if (!head.empty() && !known) {
-    found.push_back({"the reply begins with \"" + FirstLine(head) + "\"",
-                     "the library reads replies of HTTP/1.0 and HTTP/1.1", true});
+    found.push_back({"the response begins with \"" + FirstLine(head) + "\"",
+                     "the library reads responses of HTTP/1.0 and HTTP/1.1", true});
   }
-  if (reply.Interims() > 0) {
-    found.push_back({"an interim reply of status 100 to 199 came first",
-                     "the library takes it for the reply", true});
+  if (response.Interims() > 0) {
+    found.push_back({"an interim response of status 100 to 199 came first",
+                     "the library takes it for the response", true});
   }
-  InspectLines(reply, &found);
-  if (reply.HeadComplete()) InspectFraming(reply, &found);
+  InspectLines(response, &found);
+  if (response.HeadComplete()) InspectFraming(response, &found);
   return found;
 }

@@ -47,12 +47,12 @@ Stop StopReason() {
   return g_gave_up != 0 ? Stop::kGaveUp : Stop::kNone;
 }
 
-void SetGiveUp(double seconds) {
+void SetWatchdog(double seconds) {
   g_limit = seconds;
   g_gave_up = 0;
 }
 
-void RestartGiveUp() {
+void RestartWatchdog() {
   if (StopReason() != Stop::kNone || g_limit <= 0) return;
   g_waiting = true;
   struct itimerval timer = {{0, kRepeatUs}, {0, 0}};
@@ -62,11 +62,11 @@ void RestartGiveUp() {
   setitimer(ITIMER_REAL, &timer, nullptr);
 }
 
-void BeginGiveUp() {
-  if (!g_waiting) RestartGiveUp();
+void StartWatchdog() {
+  if (!g_waiting) RestartWatchdog();
 }
 
-void EndGiveUp() {
+void StopWatchdog() {
   g_waiting = false;
   if (g_interrupts > 0) return;
   const struct itimerval none = {};

@@ -11,21 +11,21 @@ void CatchInterrupts();
 // Why the operation is to stop.
 Stop StopReason();
 
-// Begins a wait of at most `seconds`, 0 for no limit, as given to SetGiveUp.
-void SetGiveUp(double seconds);
-void RestartGiveUp();
-void EndGiveUp();
+// Each wait from now on ends after `seconds`; 0 for no limit.
+void SetWatchdog(double seconds);
 
-// As RestartGiveUp, unless a wait has begun already.
-void BeginGiveUp();
+// Begins a wait; StartWatchdog does so only when none has begun.
+void RestartWatchdog();
+void StartWatchdog();
+void StopWatchdog();
 
 // A wait from here to the end of the block.
-class GiveUpWait {
+class WatchedWait {
  public:
-  GiveUpWait() { RestartGiveUp(); }
-  ~GiveUpWait() { EndGiveUp(); }
-  GiveUpWait(const GiveUpWait&) = delete;
-  GiveUpWait& operator=(const GiveUpWait&) = delete;
+  WatchedWait() { RestartWatchdog(); }
+  ~WatchedWait() { StopWatchdog(); }
+  WatchedWait(const WatchedWait&) = delete;
+  WatchedWait& operator=(const WatchedWait&) = delete;
 };
 
 #endif  // TARNWICK_TOOLS_TWHTTP_WATCHDOG_H_

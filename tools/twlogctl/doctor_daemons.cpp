@@ -53,11 +53,11 @@ bool MayDo(const Credentials& credentials, const struct stat& state, mode_t bits
 }
 
 bool MayWrite(const Credentials& credentials, const char* path) {
-  struct stat folder = {};
+  struct stat directory = {};
   struct stat file = {};
-  if (stat(kLogFolder, &folder) != 0) return true;  // another finding tells of that
+  if (stat(kLogDirectory, &directory) != 0) return true;  // another finding tells of that
   const bool exists = stat(path, &file) == 0;
-  if (!MayDo(credentials, folder, exists ? S_IXOTH : S_IWOTH | S_IXOTH)) return false;
+  if (!MayDo(credentials, directory, exists ? S_IXOTH : S_IWOTH | S_IXOTH)) return false;
   return !exists || MayDo(credentials, file, S_IWOTH);
 }
 
@@ -106,7 +106,7 @@ void CheckDaemon(const LibraryUser& user, const std::optional<RecordSegment>& se
   findings->push_back(OtherUsersProcess(
       user, credentials.user,
       std::string("write ") + kMainLogPath +
-          "; when it is a daemon of this machine, the folder needs a group for its user"));
+          "; when it is a daemon of this machine, the directory needs a group for its user"));
 }
 
 }  // namespace

@@ -7,7 +7,7 @@
 #include <sstream>
 #include <string>
 
-#include "tools/twlogctl/owned_folder.h"
+#include "tools/twlogctl/owned_directory.h"
 #include "tools/twlogctl/processes.h"
 
 namespace {
@@ -80,10 +80,10 @@ std::vector<pid_t> HoldersByDescriptor(int fd) {
   if (fstat(fd, &file) != 0) return holders;
   for (const pid_t pid : AllProcesses()) {
     const std::string process = "/proc/" + std::to_string(pid);
-    const OwnedFolder folder(opendir((process + "/fd").c_str()));
-    if (!folder) continue;
+    const OwnedDirectory directory(opendir((process + "/fd").c_str()));
+    if (!directory) continue;
     bool holds = false;
-    while (const struct dirent* const entry = readdir(folder.get())) {
+    while (const struct dirent* const entry = readdir(directory.get())) {
       if (entry->d_name[0] != '.') holds |= IsLockedDescriptor(process, entry->d_name, file);
     }
     if (holds) holders.push_back(pid);

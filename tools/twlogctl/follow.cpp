@@ -25,9 +25,9 @@ struct FollowOptions : LogOptions {
 
 // Says on standard error that the log is away and that it is back. A rotation leaves it away for a
 // moment, which is not worth a word.
-class Absence {
+class MissingLogNotice {
  public:
-  explicit Absence(std::string path) : path_(std::move(path)) {}
+  explicit MissingLogNotice(std::string path) : path_(std::move(path)) {}
 
   void Look(int error) {
     if (error == 0 && told_ != 0) Tell("it is there");
@@ -62,7 +62,7 @@ class Follower {
         path_(FollowedPath(options)),
         selector_(MakeFilter(options, Now(), Direction::kAhead), Now(), IsOwnLog(path_)),
         tail_(path_),
-        absence_(path_) {}
+        missing_(path_) {}
 
   int Run(std::optional<size_t> count);
 
@@ -78,7 +78,7 @@ class Follower {
   std::string path_;
   LogSelector selector_;
   LogTail tail_;
-  Absence absence_;
+  MissingLogNotice missing_;
 };
 
 // What stands in the log already: all of it that is wanted when a time was given, else the last
@@ -97,7 +97,7 @@ bool Follower::ShowExisting(std::optional<size_t> count) {
   tail_.Flush(take);
   window.Drain(print);
   const int error = tail_.Error();
-  if (error == ENOENT) absence_.TellAway(error);
+  if (error == ENOENT) missing_.TellAway(error);
   if (error == 0 || error == ENOENT) return true;
   Complain(path_ + ": " + std::strerror(error));
   return false;
@@ -110,7 +110,7 @@ void Follower::Take(std::string_view text, bool continues) {
 void Follower::Poll() {
   selector_.Advance(Now());
   tail_.Poll([this](std::string_view text, bool continues) { Take(text, continues); });
-  absence_.Look(tail_.Error());
+  missing_.Look(tail_.Error());
 }
 
 bool Follower::Ended() {

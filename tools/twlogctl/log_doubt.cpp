@@ -12,7 +12,7 @@ namespace {
 // is rare, and a line may wait long for the lock after its time was taken.
 constexpr std::chrono::hours kMargin(2);
 
-// The number behind a word at the beginning of a line of /proc/stat.
+// The number after a word at the beginning of a line of /proc/stat.
 std::optional<long long> SystemFigure(const std::string& name) {
   std::istringstream lines(ReadWholeFile("/proc/stat"));
   for (std::string line; std::getline(lines, line);) {

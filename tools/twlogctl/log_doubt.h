@@ -7,9 +7,9 @@
 
 #include "tools/twlogctl/log_time.h"
 
-// Whether a process can have written a line, as far as /proc knows: not one with a number that this
-// system does not give; and not one that runs and was started after the line. The latter is certain
-// only while no number was given twice since the start of the system.
+// Whether a process can have written a line, as far as /proc knows: not one with a number above
+// this system's largest; and not one that runs and was started after the line. The latter is
+// certain only while no number was given twice since the start of the system.
 class ProcessNumbers {
  public:
   ProcessNumbers();

@@ -14,13 +14,13 @@ using MessageSink = std::function<void(std::string_view text, bool continues)>;
 // Puts messages together from the bytes of one log, in the pieces in which they come.
 class MessageSplitter {
  public:
-  // Gives out each message whose end is known by the beginning of the next one.
+  // Hands out each message whose end is known by the beginning of the next one.
   void Feed(std::string_view bytes, const MessageSink& sink);
 
-  // Gives out the whole lines: nothing has followed for a while. An incomplete line stays.
+  // Hands out the whole lines: nothing has followed for a while. An incomplete line stays.
   void Flush(const MessageSink& sink);
 
-  // Gives out everything: the file has ended.
+  // Hands out everything: the file has ended.
   void End(const MessageSink& sink);
 
   // True while there is something for Flush.

@@ -81,7 +81,7 @@ void LogPrinter::PrintText(const LogMessage& message) {
   while (!rest.empty()) {
     const std::string_view line = rest.substr(0, rest.find('\n'));
     Put(mark);
-    terminal_ ? Put(Paint(colour, EscapeControls(line), colour_)) : Put(line);
+    terminal_ ? Put(InColour(colour, EscapeControls(line), colour_)) : Put(line);
     Put("\n");
     rest.remove_prefix(std::min(rest.size(), line.size() + 1));
     mark = "| ";

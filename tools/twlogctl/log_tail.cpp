@@ -18,7 +18,7 @@ using std::chrono::seconds;
 // The lines of a message come at once, or nearly so when it is longer than the writer's buffer.
 constexpr milliseconds kMessageEnd(100);
 
-// Looks without an event, for what gives none.
+// Looks without an event, for what has none.
 constexpr seconds kLook(1);
 
 constexpr minutes kQuiet(1);
@@ -26,7 +26,7 @@ constexpr minutes kQuiet(1);
 // Files that are read on. Rotations come hours apart.
 constexpr size_t kMostSources = 16;
 
-std::string FolderOf(const std::string& path) {
+std::string DirectoryOf(const std::string& path) {
   const size_t slash = path.rfind('/');
   if (slash == std::string::npos) return ".";
   return slash == 0 ? "/" : path.substr(0, slash);
@@ -35,12 +35,12 @@ std::string FolderOf(const std::string& path) {
 }  // namespace
 
 LogTail::LogTail(std::string path) : path_(std::move(path)) {
-  WatchFolder();
+  WatchDirectory();
 }
 
-void LogTail::WatchFolder() {
-  watch_.AddFolder(FolderOf(path_));
-  folder_watched_ = Clock::now();
+void LogTail::WatchDirectory() {
+  watch_.AddDirectory(DirectoryOf(path_));
+  directory_watched_ = Clock::now();
 }
 
 LogTail::SourceIterator LogTail::Known(const struct stat& status) {
@@ -124,7 +124,7 @@ void LogTail::DropOver(const MessageSink& sink) {
 
 void LogTail::Poll(const MessageSink& sink) {
   watch_.Drain();
-  if (Clock::now() - folder_watched_ >= kLook) WatchFolder();
+  if (Clock::now() - directory_watched_ >= kLook) WatchDirectory();
   // What was written before the rotation comes before what was written after it.
   ReadAll(sink);
   FindFile();

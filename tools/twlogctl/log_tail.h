@@ -19,11 +19,11 @@ class LogTail {
 
   explicit LogTail(std::string path);
 
-  // Gives out the messages that are new, those of older files first. The last message of a file
+  // Hands out the messages that are new, those of older files first. The last message of a file
   // waits a little for further lines, and an incomplete line for its end.
   void Poll(const MessageSink& sink);
 
-  // Gives out what waits for further lines.
+  // Hands out what waits for further lines.
   void Flush(const MessageSink& sink);
 
   // How long to wait at most, unless Descriptor() becomes readable, before the next Poll.
@@ -45,7 +45,7 @@ class LogTail {
   SourceIterator Known(const struct stat& status);
   void FindFile();
   int OpenFile();
-  void WatchFolder();
+  void WatchDirectory();
   bool ReadSource(Source* source, const MessageSink& sink);
   void ReadAll(const MessageSink& sink);
   void DropOver(const MessageSink& sink);
@@ -53,7 +53,7 @@ class LogTail {
   std::string path_;
   LogWatch watch_;
   std::list<Source> sources_;  // the last one is that at the path, if error_ is 0
-  Clock::time_point folder_watched_;
+  Clock::time_point directory_watched_;
   int error_ = 0;
 };
 

@@ -5,7 +5,7 @@
 
 LogWatch::LogWatch() : fd_(inotify_init1(IN_NONBLOCK | IN_CLOEXEC)) {}
 
-void LogWatch::AddFolder(const std::string& path) {
+void LogWatch::AddDirectory(const std::string& path) {
   inotify_add_watch(fd_.Get(), path.c_str(),
                     IN_CREATE | IN_DELETE | IN_MOVED_FROM | IN_MOVED_TO | IN_ONLYDIR);
 }

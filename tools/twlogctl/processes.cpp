@@ -4,6 +4,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <cerrno>
 #include <cstdio>
 #include <cstdlib>
 #include <ctime>
@@ -13,7 +14,7 @@
 #include "tarnwick/platform/unique.h"
 #include "tools/common/private_file.h"
 #include "tools/common/shell.h"
-#include "tools/twlogctl/owned_folder.h"
+#include "tools/twlogctl/owned_directory.h"
 
 namespace {
 
@@ -67,12 +68,8 @@ LibraryUser LookAtMemory(pid_t pid, int segment) {
 std::string ReadWholeFile(const std::string& path) {
   const tarnwick::UniqueFd file = OpenRegularFile(path.c_str());
   std::string text;
-  char piece[65536];
-  for (ssize_t count; (count = read(file.Get(), piece, sizeof(piece))) > 0;) {
-    text.append(piece, static_cast<size_t>(count));
-    if (text.size() > kLongestFile) return "";
-  }
-  return text;
+  const bool read = ReadAll(file.Get(), kLongestFile, &text);
+  return read || errno != EFBIG ? text : "";
 }
 
 std::string NameAndPid(const ProcessInfo& process) {
@@ -110,9 +107,9 @@ std::optional<ProcessInfo> ReadProcess(pid_t pid) {
 
 std::vector<pid_t> AllProcesses() {
   std::vector<pid_t> pids;
-  const OwnedFolder folder(opendir("/proc"));
-  if (!folder) return pids;
-  while (const struct dirent* const entry = readdir(folder.get())) {
+  const OwnedDirectory directory(opendir("/proc"));
+  if (!directory) return pids;
+  while (const struct dirent* const entry = readdir(directory.get())) {
     const long pid = std::strtol(entry->d_name, nullptr, 10);  // 0 for what is no process
     if (pid > 0) pids.push_back(static_cast<pid_t>(pid));
   }

@@ -73,6 +73,12 @@ void RecordDetacher::operator()(const TWDbgLogCfg* record) const {
   if (record != g_pDbgLogCfg) shmdt(record);
 }
 
+AttachedRecord Attach(const RecordSegment& segment, int flags) {
+  void* const address = shmat(segment.id, nullptr, flags);
+  if (reinterpret_cast<intptr_t>(address) == -1) return nullptr;
+  return AttachedRecord(static_cast<TWDbgLogCfg*>(address));
+}
+
 AttachedRecord AttachRecord(Access access) {
   const std::optional<RecordSegment> segment = FindRecord();
   if (!segment) {
@@ -84,16 +90,16 @@ AttachedRecord AttachRecord(Access access) {
              std::to_string(sizeof(TWDbgLogCfg)) + "; \"twlogctl doctor\" tells what to do");
     return nullptr;
   }
-  // The library has it already, unless it may only be read. A second time would count as a process.
+  // The library has it already, unless it may only be read. A second time would show as another
+  // process.
   if (g_pDbgLogCfg != nullptr) return AttachedRecord(g_pDbgLogCfg);
-  void* const address = shmat(segment->id, nullptr, access == Access::kRead ? SHM_RDONLY : 0);
-  if (reinterpret_cast<intptr_t>(address) == -1) {
+  AttachedRecord record = Attach(*segment, access == Access::kRead ? SHM_RDONLY : 0);
+  if (!record) {
     const int error = errno;
     Complain(std::string("the record may not be ") +
              (access == Access::kRead ? "read: " : "changed: ") + strerror(error) +
              "; it belongs to " + UserName(segment->owner) + ":" + GroupName(segment->group) +
              " with mode " + ModeText(segment->mode));
-    return nullptr;
   }
-  return AttachedRecord(static_cast<TWDbgLogCfg*>(address));
+  return record;
 }

@@ -41,7 +41,7 @@ bool Unquote(Value* value, SettingsFault* fault) {
   return true;
 }
 
-// The value behind the "=", when the line is one of `key`.
+// The value after the "=", when the line is one of `key`.
 std::optional<Value> ValueInLine(std::string_view line, std::string_view key) {
   const size_t equals = line.find('=');
   const size_t start = line.find_first_not_of(kBlanks);
@@ -107,20 +107,6 @@ bool ParseTimeScale(const Value& value, bool* time_scale, SettingsFault* fault) 
   return true;
 }
 
-bool ReadAll(int fd, std::string* text) {
-  char piece[4096];
-  for (;;) {
-    const ssize_t count = read(fd, piece, sizeof(piece));
-    if (count == 0) return true;
-    if (count == -1 && errno == EINTR) continue;
-    if (count == -1) return false;
-    text->append(piece, static_cast<size_t>(count));
-    if (text->size() <= kLongestFile) continue;
-    errno = EFBIG;
-    return false;
-  }
-}
-
 }  // namespace
 
 std::string SettingsFault::Describe() const {
@@ -141,7 +127,7 @@ bool ParseSettings(std::string_view text, SavedLevels* saved, SettingsFault* fau
 SettingsState ReadSettings(SavedLevels* saved, SettingsFault* fault) {
   const tarnwick::UniqueFd fd = OpenRegularFile(kSettingsPath);
   std::string text;
-  if (!fd.Valid() || !ReadAll(fd.Get(), &text)) {
+  if (!fd.Valid() || !ReadAll(fd.Get(), kLongestFile, &text)) {
     const int error = errno;
     *fault = {0, 0, strerror(error)};
     return error == ENOENT ? SettingsState::kMissing : SettingsState::kUnreadable;

@@ -90,7 +90,7 @@ void PrintLevels(const TWDbgLogCfg& record, bool all) {
   const auto levels = LevelsOf(record, all);
   const size_t others = LOG_CATEG_COUNT - levels.size();
   for (const auto& [name, level] : levels) {
-    printf("%-15s%s\n", name.c_str(), Paint(ColourOf(level), LevelWords(level), colour).c_str());
+    printf("%-15s%s\n", name.c_str(), InColour(ColourOf(level), LevelWords(level), colour).c_str());
   }
   if (others > 0) printf("%zu %s at notice\n", others, others == 1 ? "category" : "categories");
 }

@@ -16,7 +16,7 @@
 
 namespace {
 
-// The signals that end a waiting tool; the guardian takes them for "now" as well, because a service
+// The signals that end a waiting tool; the reverter takes them for "now" as well, because a service
 // manager sends SIGTERM to all processes of a service.
 sigset_t EndingSignals() {
   sigset_t signals;
@@ -39,18 +39,18 @@ bool StartTimer(int timer, std::chrono::milliseconds span) {
   return timerfd_settime(timer, 0, &setting, nullptr) == 0;
 }
 
-// A pipe that the parent writes to would stay open as long as the guardian has it.
+// A pipe that the parent writes to would stay open as long as the reverter has it.
 void LeaveTerminal() {
   setsid();
   prctl(PR_SET_NAME, "twlogctl-guard");
   const int null = open("/dev/null", O_RDWR | O_CLOEXEC);
   for (int fd = 0; fd < 3; ++fd) dup2(null, fd);
   if (null > 2) close(null);
-  // A folder that cannot be left keeps its file system busy, no more.
+  // A directory that cannot be left keeps its file system busy, no more.
   if (chdir("/") != 0) return;
 }
 
-// One byte goes each way: the guardian is ready; the levels are set.
+// One byte goes each way: the reverter is ready; the levels are set.
 bool SendByte(int socket) {
   return send(socket, "", 1, MSG_NOSIGNAL) == 1;
 }
@@ -68,8 +68,8 @@ void WaitForAny(int first, int second, int third) {
   }
 }
 
-[[noreturn]] void Guard(TWDbgLogCfg* record, const std::vector<LevelChange>& changes,
-                        std::chrono::milliseconds span, int parent) {
+[[noreturn]] void RevertLater(TWDbgLogCfg* record, const std::vector<LevelChange>& changes,
+                              std::chrono::milliseconds span, int parent) {
   LeaveTerminal();
   const sigset_t signals = EndingSignals();
   const int signal = signalfd(-1, &signals, SFD_CLOEXEC);
@@ -98,9 +98,9 @@ class BlockedSignals {
 };
 
 // The child with this process's end of its socket.
-class Guardian {
+class Reverter {
  public:
-  Guardian(TWDbgLogCfg* record, const std::vector<LevelChange>& changes,
+  Reverter(TWDbgLogCfg* record, const std::vector<LevelChange>& changes,
            std::chrono::milliseconds span) {
     int ends[2];
     if (socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0, ends) == -1) return;
@@ -108,15 +108,15 @@ class Guardian {
     pid_ = fork();
     if (pid_ == 0) {
       close(socket_);
-      Guard(record, changes, span, ends[1]);
+      RevertLater(record, changes, span, ends[1]);
     }
     close(ends[1]);
   }
-  ~Guardian() {
+  ~Reverter() {
     if (socket_ >= 0) close(socket_);
   }
-  Guardian(const Guardian&) = delete;
-  Guardian& operator=(const Guardian&) = delete;
+  Reverter(const Reverter&) = delete;
+  Reverter& operator=(const Reverter&) = delete;
 
   bool IsReady() const { return pid_ > 0 && ReceiveByte(socket_); }
   void LevelsAreSet() const { SendByte(socket_); }
@@ -155,19 +155,21 @@ class Guardian {
 
 }  // namespace
 
-GuardResult HoldLevels(TWDbgLogCfg* record, const std::vector<LevelChange>& changes,
-                       std::chrono::milliseconds span, const std::function<void()>& started) {
+TemporaryResult SetTemporarily(TWDbgLogCfg* record, const std::vector<LevelChange>& changes,
+                               std::chrono::milliseconds span,
+                               const std::function<void()>& started) {
   const BlockedSignals blocked;
-  Guardian guardian(record, changes, span);
-  if (!guardian.IsReady()) return {GuardEnd::kNoGuardian, 0, {}};
+  Reverter reverter(record, changes, span);
+  if (!reverter.IsReady()) return {TemporaryEnd::kNoReverter, 0, {}};
   for (const LevelChange& change : changes) record->SetLevel(change.categ, change.after);
-  guardian.LevelsAreSet();
+  reverter.LevelsAreSet();
   started();
-  const int signal = guardian.WaitForEndOrSignal();
-  GuardResult result = {signal == 0 ? GuardEnd::kTimePassed : GuardEnd::kInterrupted, signal, {}};
-  if (!guardian.Finish()) {
+  const int signal = reverter.WaitForEndOrSignal();
+  TemporaryResult result = {
+      signal == 0 ? TemporaryEnd::kTimePassed : TemporaryEnd::kInterrupted, signal, {}};
+  if (!reverter.Finish()) {
     PutBack(record, changes);
-    result.end = GuardEnd::kGuardianKilled;
+    result.end = TemporaryEnd::kReverterKilled;
   }
   for (const LevelChange& change : changes) {
     if (record->Level(change.categ) != change.before) result.left.push_back(change);

@@ -12,15 +12,15 @@
 
 #include "tools/twlogctl/level_plan.h"
 
-enum class GuardEnd {
+enum class TemporaryEnd {
   kTimePassed,
   kInterrupted,     // by a signal to this process
-  kGuardianKilled,  // this process has put the levels back in its place, before the time
-  kNoGuardian,      // it could not be started; nothing was changed
+  kReverterKilled,  // this process has put the levels back in its place, before the time
+  kNoReverter,      // it could not be started; nothing was changed
 };
 
-struct GuardResult {
-  GuardEnd end;
+struct TemporaryResult {
+  TemporaryEnd end;
   int signal = 0;                 // the one that interrupted
   std::vector<LevelChange> left;  // what does not stand at its old level, because others changed it
 };
@@ -28,7 +28,8 @@ struct GuardResult {
 // Sets the changed levels in `record`, calls `started`, waits for `span` or a signal (SIGINT,
 // SIGTERM, SIGHUP, SIGQUIT), and has the old levels back before it returns. A level that is not the
 // one that was set is somebody else's by then, and left alone.
-GuardResult HoldLevels(TWDbgLogCfg* record, const std::vector<LevelChange>& changes,
-                       std::chrono::milliseconds span, const std::function<void()>& started);
+TemporaryResult SetTemporarily(TWDbgLogCfg* record, const std::vector<LevelChange>& changes,
+                               std::chrono::milliseconds span,
+                               const std::function<void()>& started);
 
 #endif  // TARNWICK_TOOLS_TWLOGCTL_TEMPORARY_LEVELS_H_

@@ -2,17 +2,6 @@
 
 #include <sys/shm.h>
 
-#include <cstdint>
-
-bool TopRecord::Attach(int id, int flags) {
-  void* const address = shmat(id, nullptr, flags);
-  if (reinterpret_cast<intptr_t>(address) == -1) return false;
-  record_.reset(static_cast<TWDbgLogCfg*>(address));
-  id_ = id;
-  writable_ = (flags & SHM_RDONLY) == 0;
-  return true;
-}
-
 void TopRecord::Refresh() {
   const std::optional<RecordSegment> segment = FindRecord();
   const bool usable = segment && segment->HasRightSize();
@@ -22,7 +11,12 @@ void TopRecord::Refresh() {
                     : "no record of levels: read only, everything stands at notice";
     return;
   }
-  if (record_ == nullptr && !Attach(segment->id, 0)) Attach(segment->id, SHM_RDONLY);
+  if (record_ == nullptr) {
+    id_ = segment->id;
+    record_ = Attach(*segment, 0);
+    writable_ = record_ != nullptr;
+    if (!writable_) record_ = Attach(*segment, SHM_RDONLY);
+  }
   if (record_ == nullptr) {
     note_ = "the record may not be read: read only";
   } else {

@@ -22,8 +22,6 @@ class TopRecord {
   const std::string& Note() const { return note_; }
 
  private:
-  bool Attach(int id, int flags);
-
   AttachedRecord record_;
   int id_ = -1;
   bool writable_ = false;

@@ -36,7 +36,7 @@ void TellWhenLocked(const char* path) {
   Complain(std::string("waits for the lock of ") + path + "; \"twlogctl doctor\" tells who has it");
 }
 
-// The log's end before a line is written, so that the line can be looked for behind it. The library
+// The log's end before a line is written, so that the line can be looked for after it. The library
 // does not say whether it has written one.
 class LogEnd {
  public:

@@ -1,11 +1,11 @@
-// Faults of the login. An endpoint without a login gets one by Digest.
+// Faults of authentication. An endpoint that asks for none then asks for Digest.
 #include "tools/twcamsim/authenticator.h"
 
 #include "tools/twcamsim/faults.h"
 
 namespace {
 
-void NeedLogin(LoginStyle* style) {
+void NeedLogin(AuthenticationStyle* style) {
   if (style->basic || style->digest) return;
   style->digest = true;
   style->qop = "auth";
@@ -15,68 +15,68 @@ template <typename Change>
 FaultType Make(const char* name, const char* meaning, Change hook,
                std::vector<ArgumentRule> rules = {}) {
   FaultHooks hooks;
-  hooks.login = hook;
+  hooks.authentication = hook;
   return {name, "login", std::move(rules), meaning, hooks};
 }
 
-template <bool LoginStyle::*kFlag>
-void Raise(LoginStyle* style, const FaultContext&) {
+template <bool AuthenticationStyle::*kFlag>
+void Raise(AuthenticationStyle* style, const FaultContext&) {
   NeedLogin(style);
   style->*kFlag = true;
 }
 
-void SetScheme(LoginStyle* style, const FaultContext& context) {
+void SetScheme(AuthenticationStyle* style, const FaultContext& context) {
   NeedLogin(style);
   style->scheme = context.Text(0);
 }
 
-void SetQop(LoginStyle* style, const FaultContext& context) {
+void SetQop(AuthenticationStyle* style, const FaultContext& context) {
   NeedLogin(style);
   style->qop = context.Text(0);
 }
 
-void SetAlgorithm(LoginStyle* style, const FaultContext& context) {
+void SetAlgorithm(AuthenticationStyle* style, const FaultContext& context) {
   NeedLogin(style);
   style->algorithm = context.Text(0);
 }
 
-void DigestOnly(LoginStyle* style) {
+void DigestOnly(AuthenticationStyle* style) {
   style->digest = true;
   style->basic = false;
 }
 
-void NonceChanging(LoginStyle* style, const FaultContext&) {
+void NonceChanging(AuthenticationStyle* style, const FaultContext&) {
   DigestOnly(style);
   style->never_nonce = true;
 }
 
-void Stale(LoginStyle* style, const FaultContext&) {
+void Stale(AuthenticationStyle* style, const FaultContext&) {
   DigestOnly(style);
   style->always_stale = true;
 }
 
-void NoNonce(LoginStyle* style, const FaultContext&) {
+void NoNonce(AuthenticationStyle* style, const FaultContext&) {
   DigestOnly(style);
   style->hide_nonce = true;
 }
 
 }  // namespace
 
-std::vector<FaultType> LoginFaults() {
+std::vector<FaultType> AuthenticationFaults() {
   return {
-      Make("endless-401", "each login is refused, the right one as well",
-           Raise<&LoginStyle::never>),
-      Make("nonce-changing", "each answer finds its nonce replaced, without stale=true",
-           NonceChanging),
-      Make("stale", "each answer finds its nonce stale", Stale),
-      Make("no-realm", "the challenge has no realm", Raise<&LoginStyle::hide_realm>),
+      Make("endless-401", "all credentials are refused, the right ones as well",
+           Raise<&AuthenticationStyle::never>),
+      Make("nonce-changing",
+           "the nonce is replaced before the credentials come, without stale=true", NonceChanging),
+      Make("stale", "the nonce is stale when the credentials come", Stale),
+      Make("no-realm", "the challenge has no realm", Raise<&AuthenticationStyle::hide_realm>),
       Make("no-nonce", "the Digest challenge has no nonce", NoNonce),
       Make("no-challenge", "the 401 has no WWW-Authenticate line",
-           Raise<&LoginStyle::hide_challenge>),
+           Raise<&AuthenticationStyle::hide_challenge>),
       Make("other-scheme", "the challenge begins with that word", SetScheme, {{"WORD", "Bearer"}}),
       Make("other-qop", "the challenge has that qop", SetQop, {{"QOP", "auth-conf"}}),
       Make("other-algorithm", "the challenge has that algorithm", SetAlgorithm,
            {{"NAME", "SHA-256"}}),
-      Make("forbidden", "403 behind a right login", Raise<&LoginStyle::forbid>),
+      Make("forbidden", "403 after right credentials", Raise<&AuthenticationStyle::forbid>),
   };
 }

@@ -1,4 +1,4 @@
-"""Every style of login, answered rightly and wrongly, and what the camera says about it."""
+"""Every style of authentication, with right and wrong credentials, and what the camera says."""
 
 import base64
 import http.client
@@ -18,6 +18,8 @@ from twcamsim_support import (
     request_with,
     status_of,
 )
+
+pytestmark = pytest.mark.native
 
 ASK = request_with("X-None: 1")
 PLAIN_DIGESTS = [
@@ -42,14 +44,14 @@ def qop_of(words):
 
 
 def challenge_of(running):
-    """The first Digest challenge for a request without a login."""
+    """The first Digest challenge for a request without credentials."""
     seen = running.ask(ASK)
     assert status_of(seen.bytes) == 401
     return next(line for line in headers_of(seen.bytes, "WWW-Authenticate") if "igest" in line)
 
 
-def answer(running, words, qop=None, **changes):
-    """Sends the answer to a challenge."""
+def authenticate(running, words, qop=None, **changes):
+    """Sends credentials for a challenge."""
     qop = qop_of(words) if qop is None else qop
     line = digest_line(words, qop, **changes)
     return running.ask(
@@ -63,7 +65,7 @@ def refusal(seen):
     return body_of(seen.bytes).decode().split(": ")[1]
 
 
-def test_no_login_is_asked_for_without_a_style(camera):
+def test_no_credentials_are_asked_for_without_a_style(camera):
     running = camera("-e", "cgi")
     assert status_of(running.ask(ASK).bytes) == 200
     assert running.journal()[0]["requests"][0]["login"] == {"passed": True, "scheme": "none"}
@@ -99,10 +101,10 @@ def test_basic_names_the_wrong_part(camera, line, status, field):
 
 
 @pytest.mark.parametrize("style", PLAIN_DIGESTS)
-def test_the_right_answer_passes(camera, style):
+def test_the_right_credentials_pass(camera, style):
     running = camera("-e", f"cgi,login={style}")
     words = challenge_words(challenge_of(running))
-    seen = answer(running, words)
+    seen = authenticate(running, words)
     assert (status_of(seen.bytes), body_of(seen.bytes)[:7]) == (200, b"camera=")
     assert running.journal(2)[1]["requests"][0]["login"]["user"] == "operator"
 
@@ -111,7 +113,7 @@ def test_the_right_answer_passes(camera, style):
 def test_a_wrong_password_is_a_wrong_response(camera, style):
     running = camera("-e", f"cgi,login={style}")
     words = challenge_words(challenge_of(running))
-    assert refusal(answer(running, words, password="gate-8")) == "response"
+    assert refusal(authenticate(running, words, password="gate-8")) == "response"
 
 
 @pytest.mark.parametrize(
@@ -147,7 +149,7 @@ def test_both_schemes_have_a_line_each(camera, style, schemes):
     lines = headers_of(running.ask(ASK).bytes, "WWW-Authenticate")
     assert [line.split()[0] for line in lines] == schemes
     assert status_of(running.ask(request_with(basic("operator:gate-7"))).bytes) == 200
-    assert status_of(answer(running, challenge_words(challenge_of(running))).bytes) == 200
+    assert status_of(authenticate(running, challenge_words(challenge_of(running))).bytes) == 200
 
 
 @pytest.mark.parametrize(
@@ -165,7 +167,7 @@ def test_both_schemes_have_a_line_each(camera, style, schemes):
 )
 def test_the_wrong_field_is_named(camera, changes, field, phrase):
     running = camera("-e", "cgi-digest")
-    seen = answer(running, challenge_words(challenge_of(running)), **changes)
+    seen = authenticate(running, challenge_words(challenge_of(running)), **changes)
     assert refusal(seen) == field and phrase in body_of(seen.bytes).decode()
     verdict = running.journal(2)[1]["requests"][0]["login"]
     assert (verdict["field"], phrase in verdict["text"]) == (field, True)
@@ -183,14 +185,14 @@ def test_the_wrong_field_is_named(camera, changes, field, phrase):
 def test_a_word_of_the_challenge_must_come_back(camera, name, value, field):
     running = camera("-e", "cgi,login=digest-odd-order")
     words = challenge_words(challenge_of(running))
-    assert refusal(answer(running, {**words, name: value})) == field
+    assert refusal(authenticate(running, {**words, name: value})) == field
 
 
 def test_a_response_without_the_qop_that_it_names_is_explained(camera):
     running = camera("-e", "cgi-digest")
     words = challenge_words(challenge_of(running))
     plain = digest_line(words, "").partition('response="')[2].partition('"')[0]
-    seen = answer(running, words, response=plain)
+    seen = authenticate(running, words, response=plain)
     assert "computed without qop" in body_of(seen.bytes).decode()
 
 
@@ -215,25 +217,25 @@ def test_auth_int_takes_the_body_into_account(camera):
 def test_a_nonce_takes_a_count_once(camera):
     running = camera("-e", "cgi-digest")
     words = challenge_words(challenge_of(running))
-    assert status_of(answer(running, words).bytes) == 200
-    again = answer(running, words)
+    assert status_of(authenticate(running, words).bytes) == 200
+    again = authenticate(running, words)
     assert refusal(again) == "nc"
     assert "stale=true" in headers_of(again.bytes, "WWW-Authenticate")[0]
-    assert status_of(answer(running, words, nc="00000002").bytes) == 200
+    assert status_of(authenticate(running, words, nc="00000002").bytes) == 200
 
 
 def test_a_stale_nonce_is_said_to_be_stale_and_the_next_one_passes(camera):
     running = camera("-e", "cgi,login=digest-stale")
-    seen = answer(running, challenge_words(challenge_of(running)))
+    seen = authenticate(running, challenge_words(challenge_of(running)))
     assert refusal(seen) == "nonce"
     challenge = headers_of(seen.bytes, "WWW-Authenticate")[0]
     assert challenge.endswith("stale=true")
-    assert status_of(answer(running, challenge_words(challenge)).bytes) == 200
+    assert status_of(authenticate(running, challenge_words(challenge)).bytes) == 200
 
 
 def test_a_wrong_password_is_never_stale(camera):
     running = camera("-e", "cgi,login=digest-stale")
-    seen = answer(running, challenge_words(challenge_of(running)), password="x")
+    seen = authenticate(running, challenge_words(challenge_of(running)), password="x")
     assert refusal(seen) == "response"
     assert "stale" not in headers_of(seen.bytes, "WWW-Authenticate")[0]
 
@@ -287,11 +289,11 @@ def test_the_account_is_an_option(camera):
     running = camera("-e", "cgi-digest,user=guest,password=pw,realm=garden")
     challenge = challenge_of(running)
     assert 'realm="garden"' in challenge
-    seen = answer(running, challenge_words(challenge), user="guest", password="pw")
+    seen = authenticate(running, challenge_words(challenge), user="guest", password="pw")
     assert status_of(seen.bytes) == 200
 
 
-def test_a_login_works_over_one_connection(camera):
+def test_credentials_work_over_one_connection(camera):
     running = camera("-e", "cgi-digest")
     client = http.client.HTTPConnection("127.0.0.1", running.port(), timeout=HANG)
     client.request("GET", "/info.cgi")
@@ -310,19 +312,19 @@ def challenged(camera, fault, endpoint="cgi-digest"):
     return running, headers_of(running.ask(ASK).bytes, "WWW-Authenticate")
 
 
-def test_fault_endless_401_refuses_the_right_login(camera):
+def test_fault_endless_401_refuses_the_right_credentials(camera):
     running, lines = challenged(camera, "endless-401")
-    seen = answer(running, challenge_words(lines[0]))
+    seen = authenticate(running, challenge_words(lines[0]))
     assert refusal(seen) == "never" and "right" in body_of(seen.bytes).decode()
 
 
-def test_fault_endless_401_makes_a_login_where_there_was_none(camera):
+def test_fault_endless_401_asks_for_credentials_where_there_was_no_need(camera):
     assert challenged(camera, "endless-401", "json")[1][0].startswith("Digest ")
 
 
 def test_fault_nonce_changing_finds_each_nonce_replaced(camera):
     running, lines = challenged(camera, "nonce-changing")
-    seen = answer(running, challenge_words(lines[0]))
+    seen = authenticate(running, challenge_words(lines[0]))
     assert refusal(seen) == "nonce"
     assert "stale" not in headers_of(seen.bytes, "WWW-Authenticate")[0]
 
@@ -330,7 +332,7 @@ def test_fault_nonce_changing_finds_each_nonce_replaced(camera):
 def test_fault_stale_never_ends(camera):
     running, lines = challenged(camera, "stale")
     for _ in range(3):
-        seen = answer(running, challenge_words(lines[0]))
+        seen = authenticate(running, challenge_words(lines[0]))
         assert refusal(seen) == "nonce"
         lines = headers_of(seen.bytes, "WWW-Authenticate")
         assert "stale=true" in lines[0]
@@ -356,6 +358,6 @@ def test_fault_of_the_challenge(camera, fault, endpoint, expected):
         assert re.fullmatch(pattern, line)
 
 
-def test_fault_forbidden_follows_a_right_login(camera):
+def test_fault_forbidden_follows_right_credentials(camera):
     running, lines = challenged(camera, "forbidden")
-    assert status_of(answer(running, challenge_words(lines[0])).bytes) == 403
+    assert status_of(authenticate(running, challenge_words(lines[0])).bytes) == 403
