@@ -3,9 +3,9 @@
 #include <strings.h>
 
 #include <algorithm>
-#include <climits>
-#include <cstdlib>
 #include <string>
+
+#include "tarnwick/platform/text_view.h"
 
 namespace tarnwick {
 
@@ -20,12 +20,6 @@ std::string_view NextToken(std::string_view* rest, const char* delimiters) {
   const std::string_view token = rest->substr(begin, end - begin);
   rest->remove_prefix(std::min(end + 1, rest->size()));
   return token;
-}
-
-// A status that does not fit stays out of every range, on every word size.
-int ParseStatus(std::string_view text) {
-  const long value = std::strtol(std::string(text).c_str(), nullptr, 10);
-  return static_cast<int>(std::clamp<long>(value, INT_MIN, INT_MAX));
 }
 
 // The last letter is compared first: that rejects most other names without a call of strncasecmp.
@@ -52,7 +46,7 @@ StatusLine ParseStatusLine(std::string_view line, int* status) {
   if (protocol != "HTTP/1.0" && protocol != "HTTP/1.1") return StatusLine::kNotHttp;
   const std::string_view number = NextToken(&line, " ");
   if (number.empty()) return StatusLine::kIncomplete;
-  *status = ParseStatus(number);
+  *status = ToInt(std::string(number));
   return StatusLine::kParsed;
 }
 
@@ -71,15 +65,10 @@ HeaderLine ParseHeaderLine(std::string_view line) {
   return result;
 }
 
-std::string_view TrimSpaces(std::string_view text) {
-  const size_t first = std::min(text.find_first_not_of(' '), text.size());
-  return text.substr(first, text.find_last_not_of(' ') + 1 - first);
-}
-
 std::string_view ParseCookie(std::string_view value) {
   const size_t semicolon = value.find(';');
   if (semicolon == std::string_view::npos) return {};
-  return TrimSpaces(value.substr(0, semicolon + 1));
+  return Trim(value.substr(0, semicolon + 1), " ");
 }
 
 }  // namespace tarnwick

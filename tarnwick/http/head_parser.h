@@ -28,9 +28,6 @@ struct HeaderLine {
 // Splits a header line.
 HeaderLine ParseHeaderLine(std::string_view line);
 
-// `text` without the spaces at its ends; tabs stay.
-std::string_view TrimSpaces(std::string_view text);
-
 // The cookie of a Set-Cookie value: up to its first ";", which stays, without spaces at the ends.
 // Without a ";" there is no cookie.
 std::string_view ParseCookie(std::string_view value);

@@ -7,6 +7,7 @@
 #include <utility>
 
 #include "tarnwick/http/kept_fields.h"
+#include "tarnwick/http/request_parts.h"
 #include "tarnwick/net/socket_access.h"
 #include "tarnwick/net/sslsocket.h"
 
@@ -90,6 +91,12 @@ void TWHttpClient::InitSocket(int timeout, bool bufferedRead) {
 
 bool TWHttpClient::Reconnect() {
   return m_pSocket != nullptr && m_pSocket->Connect() == 0;
+}
+
+// What the next request to `path` is made of. REQUIRES: `path` outlives it.
+RequestParts TWHttpClient::Parts(const std::string& path) const {
+  return {m_strHost,          m_port,        path,    m_strUser, m_strPassword, m_strCookie,
+          m_strAuthorization, m_httpVersion, m_bHttps};
 }
 
 void TWHttpClient::SetPath(std::string path) {

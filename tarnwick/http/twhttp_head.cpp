@@ -7,6 +7,7 @@
 #include "tarnwick/http/twhttp.h"
 #include "tarnwick/log/twdebuglog.h"
 #include "tarnwick/net/request_settings.h"
+#include "tarnwick/platform/text_view.h"
 
 using namespace tarnwick;
 
@@ -72,7 +73,7 @@ bool TWHttpClient::StoreHeader(const char* line) {
   if (parsed.value.empty()) return false;
   switch (parsed.field->as) {
     case KeptAs::kContent:
-      m_mapContent.try_emplace(parsed.field->key, TrimSpaces(parsed.value));
+      m_mapContent.try_emplace(parsed.field->key, Trim(parsed.value, " "));
       break;
     case KeptAs::kCookie:
       m_strCookie = ParseCookie(parsed.value);
@@ -81,7 +82,7 @@ bool TWHttpClient::StoreHeader(const char* line) {
       m_strAuthenticate = parsed.value;
       break;
     case KeptAs::kTransferEncoding:
-      m_strTransferEncoding = TrimSpaces(parsed.value);
+      m_strTransferEncoding = Trim(parsed.value, " ");
       break;
   }
   return true;
