@@ -1,6 +1,6 @@
 // Asks a JSON service in one call: SendHttpGet.
 //
-//   op_json_get HOST PORT PATH
+//   op_json HOST PORT PATH
 #include <json/json.h>
 
 #include <cstdio>
@@ -25,7 +25,7 @@ const char* Reason(int result) {
 
 int main(int argc, char** argv) {
   if (argc != 4) {
-    std::fprintf(stderr, "usage: op_json_get HOST PORT PATH\n");
+    std::fprintf(stderr, "usage: op_json HOST PORT PATH\n");
     return 2;
   }
   Json::Value response;

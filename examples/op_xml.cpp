@@ -1,7 +1,7 @@
 // Posts an XML document to a device: SendReqByXMLPost, then GetResponseXML. Of a long document only
 // the first 8,191 bytes are sent; SendReqByXMLPut has no such limit.
 //
-//   op_xml_post HOST PORT PATH USER PASSWORD
+//   op_xml HOST PORT PATH USER PASSWORD
 #include <libxml/tree.h>
 
 #include <cstdio>
@@ -36,7 +36,7 @@ void PrintAnswer(TWHttpClient* client) {
 
 int main(int argc, char** argv) {
   if (argc != 6) {
-    std::fprintf(stderr, "usage: op_xml_post HOST PORT PATH USER PASSWORD\n");
+    std::fprintf(stderr, "usage: op_xml HOST PORT PATH USER PASSWORD\n");
     return 2;
   }
   TWHttpClient client(argv[1], std::atoi(argv[2]), argv[3], argv[4], argv[5], 5, false, true, false,
