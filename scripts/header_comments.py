@@ -1,4 +1,4 @@
-"""The public headers as documentation: what they declare for everybody, with the comments above it."""
+"""The public headers as documentation: what they declare for everybody, with its comments."""
 
 import os
 import re
@@ -95,7 +95,7 @@ def name_of(declaration):
         r"#define (\w+)",
         r"class .*?(\w+)(?: : [^{]*)? *\{$",
         r".*?(~?\w+)\(",
-        r".*?(\w+);",
+        r".*?(\w+)(?: = .*)?;",
     )
     matches = (re.match(pattern, declaration.replace("\n", " ")) for pattern in patterns)
     return next(match.expand(r"\1") or match.group(2) for match in matches if match)

@@ -6,11 +6,11 @@
 //   #define TW_LOG_SOURCE "camerad"  // the source that its log lines name
 //   #include "tarnwick/log/twdebuglog.h"
 //   ...
-//   TW_LOG(LOG_CATEG_CAMERA, LOG_LEVEL_WARN, "camera %d does not answer\n", id);
+//   TW_LOG(LOG_CATEG_CAMERA, LOG_LEVEL_WARN, "camera %d does not respond\n", id);
 //
 // which appends to /var/log/tarnwick/tarnwick.log a line such as
 //
-//   Mar  5 14:03:09 [812][camera][warn] camerad:57:Probe(): camera 3 does not answer
+//   Mar  5 14:03:09 [812][camera][warn] camerad:57:Probe(): camera 3 does not respond
 //
 // when the shared record lets the category write at that level. Several files may name one source,
 // as the library's own do (all of TWHttpClient is "twhttp"): find a line by its function and
@@ -106,7 +106,7 @@ enum LOG_CATEG : int {
   LOG_CATEG_SHARE_LIB = 73,
 };
 
-// How many there are, and levels in the record.
+// How many categories there are, and levels in the record.
 constexpr int LOG_CATEG_COUNT = 74;
 
 // How severe a line is; the lower, the more severe.

@@ -26,7 +26,7 @@ extern "C" {
 // Reads the value of `key` from the file at `path` into `value`.
 //
 // Arguments: `size` is the size of `value` in bytes; at most size - 1 bytes of the value and a
-//   terminating zero byte are stored. `flags` is accepted for the platform's sake and not used.
+//   terminating zero byte are stored. `flags` is ignored.
 // Results: the length of the whole value in bytes when the key was found, also when the buffer held
 //   only a part of it; 0 when the key is not in the file or its value is empty; -1 when the file
 //   could not be read or an argument is null, empty or not positive.
