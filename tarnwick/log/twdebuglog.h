@@ -297,12 +297,13 @@ TARNWICK_API const char* TWLogName(LOG_LEVEL value) noexcept;
 #endif
 
 // TW_LOG(category, level, format, ...) writes a line to the main log when TWLogEnabled says so for
-// category and level. One statement, safe after `if` and before `else`; while the level is off, the
-// arguments after `level` are not evaluated. `format` is a printf(3) format with its own "\n".
+// the LOG_CATEG and the LOG_LEVEL. One statement, safe after `if` and before `else`; while the
+// level is off, the arguments after `level` are not evaluated. `format` is a printf(3) format with
+// its own "\n".
 #define TW_LOG(categ, level, ...) TW_LOG_AS(__func__, categ, level, __VA_ARGS__)
 
-// TW_LOG under the name of another function: for a helper that logs for the operation it is a step
-// of, so that readers of the log find the name that they call.
+// TW_LOG under the name of another function, `func`: for a helper that logs for the operation it is
+// a step of, so that readers of the log find the name that they call.
 #define TW_LOG_AS(func, categ, level, ...)                                                 \
   do {                                                                                     \
     const LOG_CATEG twLogCateg = (categ);                                                  \
