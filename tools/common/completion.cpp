@@ -104,10 +104,10 @@ class Completer {
     const std::vector<std::string> assigned = WordsOf(name, "=");
     const bool assigns = !assigned.empty() && typed.find('=') != std::string::npos;
     const size_t base = typed.rfind(assigns ? '=' : ',') + 1;  // 0 when there is none
+    const char* const end = assigned.empty() || assigns ? "\n" : "=\n";
     for (const std::string& value : assigns ? assigned : WordsOf(name)) {
       if (!StartsWith(value, typed.substr(base))) continue;
-      const bool open = !assigned.empty() && !assigns;
-      candidates_ += prefix + typed.substr(0, base) + value + (open ? "=\n" : "\n");
+      candidates_.append(prefix).append(typed, 0, base).append(value).append(end);
     }
   }
 
