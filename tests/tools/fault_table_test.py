@@ -12,6 +12,8 @@ import sys
 
 import pytest
 
+pytestmark = pytest.mark.native
+
 LOGIN = "operator:gate-7@"
 TRUSTED = pathlib.Path("/etc/ssl/certs/ca-certificates.crt")
 GET = ("get", "--direct", "--timeout", "1")

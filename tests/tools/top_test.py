@@ -1,5 +1,6 @@
 """twlogctl top: what it shows, and its keys."""
 
+import pytest
 
 from conftest import wait_until
 from log_help import LOG, Screen, line, without_privileges
@@ -24,6 +25,8 @@ from top_support import (
     top,
     wait_for_levels,
 )
+
+pytestmark = pytest.mark.native
 
 
 def test_categories_stand_above_and_the_log_below(top, record, run):

@@ -12,6 +12,8 @@ import pytest
 from conftest import HANG, wait_until
 from twcamsim_support import GET, camera, challenge_words, headers_of, read_all, status_of
 
+pytestmark = pytest.mark.native
+
 
 # ---- the end
 

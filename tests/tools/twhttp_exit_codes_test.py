@@ -12,8 +12,6 @@ from conftest import HANG, ROOT, wait_until
 from twhttp_fixtures import identity, peer  # noqa: F401 (fixtures)
 from twhttp_server import Script, challenge, closed_port, response
 
-pytestmark = pytest.mark.native
-
 LOGIN = "operator:gate-7"
 DIGEST = 'Digest realm="camera", nonce="5f3d9c", qop="auth"'
 CHUNKED = b"HTTP/1.1 200 OK\r\nTransfer-Encoding: chunked\r\n\r\n"

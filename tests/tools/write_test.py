@@ -10,6 +10,8 @@ import pytest
 from conftest import LOG_DIRECTORY
 from levels_support import LOG
 
+pytestmark = pytest.mark.native
+
 
 LINE = r"[A-Z][a-z]{2} [ \d]\d \d\d:\d\d:\d\d \[\d+\]"
 
