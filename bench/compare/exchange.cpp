@@ -37,6 +37,17 @@ Exchange SoapPost() {
           Envelope(4096),  Envelope(4096)};
 }
 
+Exchange SoapXml() {
+  return {
+      Exchange::kSoap,
+      false,
+      false,
+      "/soap_xml",
+      "application/soap+xml; charset=utf-8",
+      Envelope(512),
+      "<e:Envelope xmlns:e=\"urn:e\">\r\n  <e:Body>\r\n<a>1\r\n2</a></e:Body>\r\n</e:Envelope>"};
+}
+
 Exchange TlsGet() {
   Exchange exchange = JsonGet();
   exchange.tls = true;

@@ -33,6 +33,7 @@ Exchange JsonGet();
 Exchange DigestGet();
 Exchange FormPost();
 Exchange SoapPost();
+Exchange SoapXml();
 Exchange TlsGet();
 Exchange BodyGet(size_t size, bool chunked);
 Exchange TlsBodyGet(size_t size);

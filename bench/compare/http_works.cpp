@@ -1,12 +1,15 @@
 #include "bench/compare/http_works.h"
 
 #include <json/reader.h>
+#include <libxml/parser.h>
 #include <malloc.h>
 
 #include <cstdio>
 #include <cstdlib>
 #include <fstream>
 #include <vector>
+
+#include "bench/plain.h"
 
 namespace {
 
@@ -47,6 +50,46 @@ class FetchingJson : public TimedContender {
   void Run(int count) override {
     for (int i = 0; i < count; ++i) {
       Expect(Fetch()["success"].asBool(), m_client.name, "has no success");
+    }
+  }
+
+  const HttpClient m_client;
+  const Exchange m_exchange;
+};
+
+using XmlDocument = std::unique_ptr<xmlDoc, decltype(&xmlFreeDoc)>;
+
+XmlDocument ParseXml(std::string text) {
+  RemovePlainly(&text, '\r');
+  RemovePlainly(&text, '\n');
+  return {xmlParseMemory(text.data(), static_cast<int>(text.size())), xmlFreeDoc};
+}
+
+// The document's texts, one after the other.
+std::string TextOf(const XmlDocument& document) {
+  Expect(document != nullptr, "XML", "cannot be parsed");
+  xmlChar* const content = xmlNodeGetContent(xmlDocGetRootElement(document.get()));
+  std::string text(reinterpret_cast<const char*>(content));
+  xmlFree(content);
+  return text;
+}
+
+class FetchingXml : public TimedContender {
+ public:
+  explicit FetchingXml(const HttpClient& client) : m_client(client), m_exchange(SoapXml()) {
+    Expect(TextOf(Fetch()) == TextOf(ParseXml(m_exchange.reply)), client.name,
+           "fetches another document");
+  }
+
+ private:
+  XmlDocument Fetch() const {
+    if (m_client.fetchXml != nullptr) return {m_client.fetchXml(m_exchange), xmlFreeDoc};
+    return ParseXml(m_client.fetch(m_exchange));
+  }
+
+  void Run(int count) override {
+    for (int i = 0; i < count; ++i) {
+      Expect(Fetch() != nullptr, m_client.name, "fetches no document");
     }
   }
 
@@ -168,6 +211,7 @@ void AddHttpClient(Registry* registry, const HttpClient& client) {
   Add<FetchingJson>(registry, "json_get", client);
   Add<Fetching>(registry, "form_post", client, FormPost);
   Add<Fetching>(registry, "soap_post_4k", client, SoapPost);
+  Add<FetchingXml>(registry, "soap_xml", client);
   if (client.digest) Add<Fetching>(registry, "digest_get", client, DigestGet);
   AddBodies(registry, client);
   if (client.fetchPieces != nullptr) {

@@ -3,6 +3,7 @@
 #define TARNWICK_BENCH_COMPARE_HTTP_WORKS_H_
 
 #include <json/value.h>
+#include <libxml/tree.h>
 
 #include <functional>
 #include <memory>
@@ -23,6 +24,10 @@ struct HttpClient {
 
   // As fetch of JsonGet and the parse of the answer, where the client does that by itself.
   Json::Value (*fetchJson)(const Exchange& exchange) = nullptr;
+
+  // As fetch of SoapXml, the removal of its line ends and the parse, where the client does that by
+  // itself. The caller frees the document.
+  xmlDoc* (*fetchXml)(const Exchange& exchange) = nullptr;
 
   // As fetch, with the body handed to `take` in pieces of 64 KiB, or the pieces that it has.
   using Take = std::function<void(const char* bytes, size_t size)>;

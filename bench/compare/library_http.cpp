@@ -42,6 +42,13 @@ Json::Value FetchJson(const Exchange& exchange) {
   return value;
 }
 
+xmlDoc* FetchXml(const Exchange& exchange) {
+  xmlDoc* document = nullptr;
+  const int result = ClientFor(exchange)->SendReqByXMLSocketPost(exchange.body, document);
+  Expect(result == HTTP_RET_OK, kLibrary, "cannot get the document");
+  return document;
+}
+
 void FetchPieces(const Exchange& exchange, const HttpClient::Take& take) {
   const auto client = ClientFor(exchange);
   ExpectSuccess(client.get(), client->SendRequest(HTTP_METHOD_GET, "?"));
@@ -74,6 +81,7 @@ void AddLibraryHttp(Registry* registry) {
   client.digest = true;
   client.tls = true;
   client.fetchJson = FetchJson;
+  client.fetchXml = FetchXml;
   client.fetchPieces = FetchPieces;
   client.upload = UploadPieces;
   client.fetchAndStay = FetchAndStay;

@@ -15,7 +15,6 @@ namespace {
 constexpr struct option kOptions[] = {
     {"list", no_argument, nullptr, Options::kList},
     {"list-counted", no_argument, nullptr, Options::kListCounted},
-    {"serve", no_argument, nullptr, Options::kServe},
     {"one", required_argument, nullptr, Options::kMeasureOne},
     {"counted", required_argument, nullptr, Options::kCountOne},
     {"contender", required_argument, nullptr, 'c'},
@@ -72,13 +71,8 @@ void PrintSections() {
 }
 
 bool TakeAll(int argc, char** argv, Options* options) {
-  // "+": what --serve is to run has options of its own.
-  for (int option; (option = getopt_long(argc, argv, "+", kOptions, nullptr)) != -1;) {
+  for (int option; (option = getopt_long(argc, argv, "", kOptions, nullptr)) != -1;) {
     if (!Take(option, optarg, options)) return false;
-  }
-  if (options->mode == Options::kServe) {
-    options->command = argv + optind;
-    return optind < argc;
   }
   options->selected.assign(argv + optind, argv + argc);
   const auto& selected = options->selected;
@@ -94,14 +88,14 @@ bool ParseOptions(int argc, char** argv, Options* options) {
   if (TakeAll(argc, argv, options)) return true;
   std::fputs(
       "usage: tarnwick_compare [--rounds N] [--milliseconds N] [--seconds N] [SECTION|WORK...]\n"
-      "       tarnwick_compare --list | --list-counted [SECTION|WORK...] | --serve COMMAND...\n"
+      "       tarnwick_compare --list | --list-counted [SECTION|WORK...]\n"
+      "       tarnwick_compare --counted WORK --contender NAME --count N\n"
       "--rounds        how often each contender of a work is measured (default: 25)\n"
       "--milliseconds  how long each measurement takes (default: 50)\n"
       "--seconds       when the rounds of a work end early, but for three (default: 60)\n"
       "--list          the works by section, and who does them\n"
       "--list-counted  section, work, contender and the operations of a counted run\n"
-      "--serve         becomes COMMAND, with the servers beside it, which\n"
-      "                --counted WORK --contender NAME --count N asks\n",
+      "--counted       does the work of one contender N times, for bench/count\n",
       stderr);
   PrintSections();
   return false;

@@ -10,9 +10,8 @@ struct Options {
     kCompare,      // all selected works, round by round
     kList,         // what there is
     kListCounted,  // what is counted, and how often it is done for that
-    kServe,        // becomes another program, beside the servers
     kMeasureOne,   // one measurement, for the process that looks at memory
-    kCountOne,     // one contender's work in CountedRun, for who counts what it executes
+    kCountOne,     // one contender's work in CountedRun, where bench/count counts
   };
   Mode mode = kCompare;
 
@@ -21,15 +20,13 @@ struct Options {
   int seconds = 60;                   // for all rounds of a work
   std::vector<std::string> selected;  // sections and works; empty for all
 
-  char** command = nullptr;  // what kServe becomes, with its arguments
-
   // Of kMeasureOne and kCountOne.
   const char* work = nullptr;
   const char* contender = nullptr;
   int count = 0;
 };
 
-// Results: false for a wrong command line, behind the usage on stderr.
+// Results: false for a wrong command line, and the usage on stderr.
 bool ParseOptions(int argc, char** argv, Options* options);
 
 #endif  // TARNWICK_BENCH_COMPARE_OPTIONS_H_

@@ -31,8 +31,8 @@ Registry* MutableRegistry() {
 const std::vector<Work>& AllWorks() {
   constexpr Unit kNs = Unit::kNanoseconds;
   static const std::vector<Work> works = {
-      {"log", "log_disabled", kNs, 0, 0, true, 1000},
-      {"log", "log_disabled_record", kNs, 0, 0, false, 1000},
+      {"log", "log_disabled", kNs, 0, 0, true, 10000},
+      {"log", "log_disabled_record", kNs, 0, 0, false, 10000},
       {"log", "log_line", kNs, 0, 2000, false, 200},
       {"log", "log_line_4_processes", kNs, 0, 16000, false, 0},
       {"log", "log_line_16_processes", kNs, 0, 32000, false, 0},
@@ -40,10 +40,13 @@ const std::vector<Work>& AllWorks() {
       {"request", "digest_get", kNs, 0, 0, false, 20},
       {"request", "form_post", kNs, 0, 0, false, 20},
       {"request", "soap_post_4k", kNs, 0, 0, false, 20},
+      {"request", "soap_xml", kNs, 0, 0, false, 20},
       {"parse", "head_30", kNs, 0, 0, false, 200},
       {"parse", "lines", kNs, 60000, 0, false, 20},
       {"parse", "chunked_64", kNs, kMiB, 0, false, 4},
       {"parse", "chunked_4k", kNs, kMiB, 0, false, 4},
+      {"parse", "memory_body_1m", kNs, kMiB, 0, false, 4},
+      {"parse", "memory_body_64m", kNs, 64 * kMiB, 0, false, 1},
       {"parse", "line_ends_1m", kNs, kMiB, 0, false, 4},
       {"parse", "line_ends_16m", kNs, 16 * kMiB, 0, false, 1},
       {"body", "body_1m", kNs, kMiB, 0, false, 0},

@@ -21,7 +21,7 @@
 
 namespace {
 
-constexpr const char* kPortVariables[] = {"TARNWICK_COMPARE_PORT", "TARNWICK_COMPARE_TLS_PORT"};
+constexpr const char* kPortVariables[] = {"TARNWICK_BENCH_PORT", "TARNWICK_BENCH_TLS_PORT"};
 
 std::string Answer(const char* status, const std::string& headers, const std::string& body) {
   return std::string("HTTP/1.1 ") + status + "\r\nServer: camera\r\n" + headers +
@@ -110,6 +110,7 @@ class Server {
     if (path == "/digest") return AnswerToDigest(request);
     if (path == "/form") return AnswerToPost(FormPost(), request);
     if (path == "/soap") return AnswerToPost(SoapPost(), request);
+    if (path == "/soap_xml") return AnswerToPost(SoapXml(), request);
     if (path == "/upload" && !Swallow(stream, request.body.size())) return nullptr;
     std::string& answer = m_answers[path];
     if (answer.empty()) answer = Make(path);
@@ -182,7 +183,8 @@ const std::string Server::m_refusal = Answer("400 Bad Request", "Content-Length:
   }
 }
 
-void Start(bool tls) {
+// Results: its port.
+int Start(bool tls) {
   int port = 0;
   const int listener = ListenOnLoopback(&port);
   const pid_t child = fork();
@@ -193,14 +195,15 @@ void Start(bool tls) {
     ServeForEver(listener, tls);
   }
   close(listener);
-  setenv(kPortVariables[tls ? 1 : 0], std::to_string(port).c_str(), 1);
+  return port;
 }
 
 }  // namespace
 
 void StartServers() {
-  Start(false);
-  Start(true);
+  for (const bool tls : {false, true}) {
+    setenv(kPortVariables[tls ? 1 : 0], std::to_string(ServerPort(tls)).c_str(), 1);
+  }
 }
 
 int ServerPort(bool tls) {
@@ -208,8 +211,7 @@ int ServerPort(bool tls) {
   int& port = ports[tls ? 1 : 0];
   if (port == 0) {
     const char* const text = std::getenv(kPortVariables[tls ? 1 : 0]);
-    Expect(text != nullptr, "server", "is not there");
-    port = std::atoi(text);
+    port = text != nullptr ? std::atoi(text) : Start(tls);
   }
   return port;
 }

@@ -2,10 +2,10 @@
 #ifndef TARNWICK_BENCH_COMPARE_SERVER_H_
 #define TARNWICK_BENCH_COMPARE_SERVER_H_
 
-// Starts both. They end with this process. REQUIRES: no threads yet.
+// Starts both, for this process and those that it starts. They end with it.
 void StartServers();
 
-// The port that it listens at on 127.0.0.1. Known to programs that this one starts, too.
+// The port that the server listens at on 127.0.0.1. Starts it when nobody has.
 int ServerPort(bool tls);
 
 #endif  // TARNWICK_BENCH_COMPARE_SERVER_H_

@@ -22,10 +22,13 @@ WORKS = {
     "digest_get": "GET that is asked for a Digest login",
     "form_post": "POST of a form",
     "soap_post_4k": "POST of a SOAP envelope of 4 KiB, answered by another",
+    "soap_xml": "the same with 512 bytes, and the response parsed as XML",
     "head_30": "a response's head of 30 lines",
     "lines": "lines of 58 bytes",
     "chunked_64": "a body of 1 MiB in chunks of 64 bytes",
     "chunked_4k": "a body of 1 MiB in chunks of 4 KiB",
+    "memory_body_1m": "a body of 1 MiB into a string",
+    "memory_body_64m": "a body of 64 MiB into a string",
     "line_ends_1m": "line ends out of a SOAP reply of 1 MiB",
     "line_ends_16m": "line ends out of a SOAP reply of 16 MiB",
     "body_1m": "1 MiB into a string",
@@ -56,8 +59,8 @@ Whoever delivers a wrong body, a torn line or too few of them ends the run.
 Times change from machine to machine and from run to run. Instructions and system calls do not:
 those of one operation stand beside the times of all works but those whose number of reads depends
 on how the server's bytes arrive. callgrind counts the instructions in the contender's process,
-behind a first operation that is not counted, and strace the calls, as the difference between a run
-and one of twice as many operations. The C library is held to the ways that every processor has.
+after two operations that are not counted, and strace the calls. The C library is held to the ways
+that every processor has.
 
 | contender | is |
 |---|---|
