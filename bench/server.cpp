@@ -1,0 +1,217 @@
+// Accepts a connection, reads one request, writes the answer and closes; then the next one. Fixed
+// and simple, so that it costs all contenders the same.
+#include "bench/server.h"
+
+#include <sys/prctl.h>
+#include <sys/socket.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <csignal>
+#include <cstdlib>
+#include <cstring>
+#include <map>
+#include <string>
+
+#include "bench/contender.h"
+#include "bench/exchange.h"
+#include "bench/listen.h"
+#include "bench/server_stream.h"
+#include "bench/texts.h"
+
+namespace {
+
+constexpr const char* kPortVariables[] = {"TARNWICK_BENCH_PORT", "TARNWICK_BENCH_TLS_PORT"};
+
+std::string Answer(const char* status, const std::string& headers, const std::string& body) {
+  return std::string("HTTP/1.1 ") + status + "\r\nServer: camera\r\n" + headers +
+         "Connection: close\r\n\r\n" + body;
+}
+
+std::string Plain(const std::string& type, const std::string& body) {
+  return Answer(
+      "200 OK",
+      "Content-Type: " + type + "\r\nContent-Length: " + std::to_string(body.size()) + "\r\n",
+      body);
+}
+
+struct Request {
+  std::string head;
+  std::string body;
+
+  std::string Path() const {
+    const size_t begin = head.find(' ') + 1;
+    return head.substr(begin, head.find(' ', begin) - begin);
+  }
+
+  // The value of a header; empty without one.
+  std::string Value(const std::string& name) const {
+    const char* const found = strcasestr(head.c_str(), ("\r\n" + name + ": ").c_str());
+    if (found == nullptr) return "";
+    const char* const begin = found + name.size() + 4;
+    return std::string(begin, std::strstr(begin, "\r\n"));
+  }
+};
+
+// A parameter of a login, quoted or not.
+std::string Parameter(const std::string& login, const std::string& name) {
+  for (const char before : {' ', ','}) {
+    size_t begin = login.find(before + name + "=");
+    if (begin == std::string::npos) continue;
+    begin += name.size() + 2;
+    if (login[begin] == '"') return login.substr(begin + 1, login.find('"', begin + 1) - begin - 1);
+    return login.substr(begin, login.find(',', begin) - begin);
+  }
+  return "";
+}
+
+bool IsRightLogin(const std::string& login, const std::string& path) {
+  const std::string secret = Md5Hex(std::string(kUser) + ":" + kRealm + ":" + kPassword);
+  return Parameter(login, "uri") == path &&
+         Parameter(login, "response") ==
+             Md5Hex(secret + ":" + kNonce + ":" + Parameter(login, "nc") + ":" +
+                    Parameter(login, "cnonce") + ":auth:" + Md5Hex("GET:" + path));
+}
+
+class Server {
+ public:
+  void Serve(ServerStream* stream) {
+    Request request;
+    if (!Read(stream, &request)) return;
+    const std::string* const answer = AnswerTo(stream, request);
+    if (answer != nullptr) stream->Write(answer->data(), answer->size());
+  }
+
+ private:
+  // Reads a request with its body, but not that of the upload.
+  bool Read(ServerStream* stream, Request* request) {
+    std::string bytes;
+    char piece[16384];
+    size_t end;
+    while ((end = bytes.find("\r\n\r\n")) == std::string::npos) {
+      const ssize_t count = stream->Read(piece, sizeof(piece));
+      if (count <= 0) return false;
+      bytes.append(piece, static_cast<size_t>(count));
+    }
+    request->head = bytes.substr(0, end + 2);
+    request->body = bytes.substr(end + 4);
+    if (request->Path() == "/upload") return true;
+    const size_t length = std::strtoul(request->Value("Content-Length").c_str(), nullptr, 10);
+    while (request->body.size() < length) {
+      const ssize_t count = stream->Read(piece, sizeof(piece));
+      if (count <= 0) return false;
+      request->body.append(piece, static_cast<size_t>(count));
+    }
+    return true;
+  }
+
+  const std::string* AnswerTo(ServerStream* stream, const Request& request) {
+    const std::string path = request.Path();
+    if (path == "/digest") return AnswerToDigest(request);
+    if (path == "/form") return AnswerToPost(FormPost(), request);
+    if (path == "/soap") return AnswerToPost(SoapPost(), request);
+    if (path == "/soap_xml") return AnswerToPost(SoapXml(), request);
+    if (path == "/upload" && !Swallow(stream, request.body.size())) return nullptr;
+    std::string& answer = m_answers[path];
+    if (answer.empty()) answer = Make(path);
+    return &answer;
+  }
+
+  // Reads the upload until all of its bytes have come.
+  static bool Swallow(ServerStream* stream, size_t done) {
+    static char piece[256 << 10];
+    while (done < kUploadSize) {
+      const ssize_t count = stream->Read(piece, sizeof(piece));
+      if (count <= 0) return false;
+      done += static_cast<size_t>(count);
+    }
+    return true;
+  }
+
+  static std::string Make(const std::string& path) {
+    if (path == "/json") return Plain("application/json", JsonGet().reply);
+    if (path == "/upload") return Plain("text/plain", Upload().reply);
+    if (path.rfind("/body/", 0) == 0) {
+      return Plain("application/octet-stream", BodyText(std::strtoul(&path[6], nullptr, 10)));
+    }
+    if (path.rfind("/chunked/", 0) == 0) {
+      return Answer("200 OK", "Transfer-Encoding: chunked\r\n",
+                    Chunked(BodyText(std::strtoul(&path[9], nullptr, 10)), kChunkSize));
+    }
+    return m_refusal;
+  }
+
+  // The first request is asked for a login. What a login says is checked now and then: each time
+  // would be work of the server's that is the same for all and hides the clients'.
+  const std::string* AnswerToDigest(const Request& request) {
+    static const std::string challenge =
+        Answer("401 Unauthorized",
+               std::string("WWW-Authenticate: Digest realm=\"") + kRealm + "\", nonce=\"" + kNonce +
+                   "\", qop=\"auth\", algorithm=MD5\r\nContent-Length: 0\r\n",
+               "");
+    static const std::string good = Plain("application/json", DigestGet().reply);
+    const std::string login = request.Value("Authorization");
+    if (login.rfind("Digest ", 0) != 0) return &challenge;
+    const bool checked = m_logins++ % 64 == 0;
+    return checked && !IsRightLogin(login, "/digest") ? &m_refusal : &good;
+  }
+
+  const std::string* AnswerToPost(const Exchange& exchange, const Request& request) {
+    std::string& answer = m_answers[exchange.path];
+    if (answer.empty()) answer = Plain(exchange.contentType, exchange.reply);
+    std::string& expected = m_bodies[exchange.path];
+    if (expected.empty()) expected = exchange.body;
+    return request.body == expected ? &answer : &m_refusal;
+  }
+
+  static const std::string m_refusal;
+  std::map<std::string, std::string> m_answers;
+  std::map<std::string, std::string> m_bodies;  // that posts must have
+  unsigned m_logins = 0;
+};
+
+const std::string Server::m_refusal = Answer("400 Bad Request", "Content-Length: 0\r\n", "");
+
+[[noreturn]] void ServeForEver(int listener, bool tls) {
+  const ServerIdentity identity(tls);
+  Server server;
+  for (;;) {
+    const int connection = accept(listener, nullptr, nullptr);
+    if (connection < 0) _exit(1);
+    ServerStream stream(connection, identity);
+    server.Serve(&stream);
+  }
+}
+
+// Results: its port.
+int Start(bool tls) {
+  int port = 0;
+  const int listener = ListenOnLoopback(&port);
+  const pid_t child = fork();
+  Expect(child >= 0, "server", "cannot be started");
+  if (child == 0) {
+    prctl(PR_SET_PDEATHSIG, SIGKILL);
+    signal(SIGPIPE, SIG_IGN);
+    ServeForEver(listener, tls);
+  }
+  close(listener);
+  return port;
+}
+
+}  // namespace
+
+void StartServers() {
+  for (const bool tls : {false, true}) {
+    setenv(kPortVariables[tls ? 1 : 0], std::to_string(ServerPort(tls)).c_str(), 1);
+  }
+}
+
+int ServerPort(bool tls) {
+  static int ports[2] = {0, 0};
+  int& port = ports[tls ? 1 : 0];
+  if (port == 0) {
+    const char* const text = std::getenv(kPortVariables[tls ? 1 : 0]);
+    port = text != nullptr ? std::atoi(text) : Start(tls);
+  }
+  return port;
+}
