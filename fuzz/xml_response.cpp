@@ -8,7 +8,7 @@
 #include <string_view>
 #include <vector>
 
-#include "fuzz/oracle/xml_reply.h"
+#include "fuzz/oracle/xml_response.h"
 #include "fuzz/support/script.h"
 #include "fuzz/support/target.h"
 #include "fuzz/support/xml.h"

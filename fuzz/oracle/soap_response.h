@@ -1,6 +1,6 @@
 // A client that posts SOAP envelopes, told once more in the plainest way.
-#ifndef TARNWICK_FUZZ_ORACLE_SOAP_REPLY_H_
-#define TARNWICK_FUZZ_ORACLE_SOAP_REPLY_H_
+#ifndef TARNWICK_FUZZ_ORACLE_SOAP_RESPONSE_H_
+#define TARNWICK_FUZZ_ORACLE_SOAP_RESPONSE_H_
 
 #include <string>
 
@@ -42,4 +42,4 @@ std::string WithoutLineEnds(const std::string& text);
 
 }  // namespace oracle
 
-#endif  // TARNWICK_FUZZ_ORACLE_SOAP_REPLY_H_
+#endif  // TARNWICK_FUZZ_ORACLE_SOAP_RESPONSE_H_

@@ -1,4 +1,4 @@
-#include "fuzz/oracle/json_reply.h"
+#include "fuzz/oracle/json_response.h"
 
 #include <algorithm>
 #include <cstdlib>

@@ -11,7 +11,7 @@
 #include <mutex>
 #include <string>
 
-#include "fuzz/oracle/json_reply.h"
+#include "fuzz/oracle/json_response.h"
 #include "fuzz/support/target.h"
 
 using namespace tarnwick;

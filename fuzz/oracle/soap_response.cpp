@@ -1,4 +1,4 @@
-#include "fuzz/oracle/soap_reply.h"
+#include "fuzz/oracle/soap_response.h"
 
 #include <algorithm>
 #include <climits>

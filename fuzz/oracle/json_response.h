@@ -1,7 +1,7 @@
 // What decides about a response, by a parser that is not the library's: nlohmann's, which takes
 // nothing but RFC 8259.
-#ifndef TARNWICK_FUZZ_ORACLE_JSON_REPLY_H_
-#define TARNWICK_FUZZ_ORACLE_JSON_REPLY_H_
+#ifndef TARNWICK_FUZZ_ORACLE_JSON_RESPONSE_H_
+#define TARNWICK_FUZZ_ORACLE_JSON_RESPONSE_H_
 
 #include <string>
 
@@ -21,4 +21,4 @@ int NestingOf(const std::string& text);
 
 }  // namespace oracle
 
-#endif  // TARNWICK_FUZZ_ORACLE_JSON_REPLY_H_
+#endif  // TARNWICK_FUZZ_ORACLE_JSON_RESPONSE_H_

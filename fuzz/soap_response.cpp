@@ -13,7 +13,7 @@
 #include <string_view>
 #include <vector>
 
-#include "fuzz/oracle/soap_reply.h"
+#include "fuzz/oracle/soap_response.h"
 #include "fuzz/support/script.h"
 #include "fuzz/support/target.h"
 #include "fuzz/support/wire.h"

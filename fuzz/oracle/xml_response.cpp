@@ -1,4 +1,4 @@
-#include "fuzz/oracle/xml_reply.h"
+#include "fuzz/oracle/xml_response.h"
 
 #include <utility>
 

@@ -1,6 +1,6 @@
 // The answers that pile up in a client until they are parsed as one document.
-#ifndef TARNWICK_FUZZ_ORACLE_XML_REPLY_H_
-#define TARNWICK_FUZZ_ORACLE_XML_REPLY_H_
+#ifndef TARNWICK_FUZZ_ORACLE_XML_RESPONSE_H_
+#define TARNWICK_FUZZ_ORACLE_XML_RESPONSE_H_
 
 #include <cstddef>
 #include <optional>
@@ -28,4 +28,4 @@ class Answers {
 
 }  // namespace oracle
 
-#endif  // TARNWICK_FUZZ_ORACLE_XML_REPLY_H_
+#endif  // TARNWICK_FUZZ_ORACLE_XML_RESPONSE_H_
