@@ -19,7 +19,7 @@ class FloorLine : public LineWriter {
 
   void Write(int process, int number) override {
     char line[256];
-    const int size = std::snprintf(line, sizeof(line), COMPARE_MESSAGE "\n", process, number);
+    const int size = std::snprintf(line, sizeof(line), BENCH_MESSAGE "\n", process, number);
     const int fd = open(kPath, O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, 0666);
     Expect(write(fd, line, static_cast<size_t>(size)) == size, kFloor, "cannot write");
     close(fd);
@@ -45,7 +45,7 @@ class RequiredLine : public LineWriter {
     char text[64];
     localtime_r(&now, &local);
     strftime(text, sizeof(text), "%b %e %T", &local);
-    std::fprintf(stream, "%s [%d][%s][%s] %s:%d:%s(): " COMPARE_MESSAGE "\n", text, own, "camera",
+    std::fprintf(stream, "%s [%d][%s][%s] %s:%d:%s(): " BENCH_MESSAGE "\n", text, own, "camera",
                  "warn", "compare", __LINE__, __func__, process, number);
     std::fflush(stream);
     flock(fd, LOCK_UN);

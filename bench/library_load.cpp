@@ -9,7 +9,7 @@ namespace {
 class Loading : public Contender {
  public:
   Loading(std::vector<std::string> before, const std::vector<std::string>& measured)
-      : m_command{TARNWICK_COMPARE_LOAD} {
+      : m_command{TARNWICK_BENCH_LOAD} {
     m_command.insert(m_command.end(), before.begin(), before.end());
     m_command.emplace_back("--");
     m_command.insert(m_command.end(), measured.begin(), measured.end());
@@ -26,7 +26,7 @@ class Loading : public Contender {
 };
 
 std::vector<std::string> Dependencies() {
-  std::istringstream words(TARNWICK_COMPARE_DEPENDENCIES);
+  std::istringstream words(TARNWICK_BENCH_DEPENDENCIES);
   std::vector<std::string> files;
   for (std::string file; words >> file;) files.push_back(file);
   return files;
@@ -38,7 +38,7 @@ void AddLoad(Registry* registry) {
   });
   registry->Add("load", kLibrary, [] {
     return std::make_unique<Loading>(Dependencies(),
-                                     std::vector<std::string>{TARNWICK_COMPARE_LIBRARY});
+                                     std::vector<std::string>{TARNWICK_BENCH_LIBRARY});
   });
 }
 

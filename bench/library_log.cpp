@@ -10,7 +10,7 @@ namespace {
 
 void CallDisabled(int count) {
   for (int i = 0; i < count; ++i) {
-    TW_LOG(LOG_CATEG_CAMERA, LOG_LEVEL_DEBUG, COMPARE_MESSAGE "\n", 0, i);
+    TW_LOG(LOG_CATEG_CAMERA, LOG_LEVEL_DEBUG, BENCH_MESSAGE "\n", 0, i);
     Use(&g_pDbgLogCfg);
   }
 }
@@ -37,7 +37,7 @@ class DisabledWithRecord : public TimedContender {
 class LibraryLine : public LineWriter {
  public:
   void Write(int process, int number) override {
-    TW_LOG(LOG_CATEG_CAMERA, LOG_LEVEL_WARN, COMPARE_MESSAGE "\n", process, number);
+    TW_LOG(LOG_CATEG_CAMERA, LOG_LEVEL_WARN, BENCH_MESSAGE "\n", process, number);
   }
 };
 

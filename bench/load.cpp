@@ -1,6 +1,6 @@
 // Loads libraries as a program's start does, and prints how many nanoseconds the measured took:
 //
-//   tarnwick_compare_load [BEFORE...] -- MEASURED...
+//   tarnwick_bench_load [BEFORE...] -- MEASURED...
 #include <dlfcn.h>
 
 #include <cstdio>

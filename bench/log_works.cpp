@@ -124,7 +124,7 @@ class Lines : public Contender {
       int process = -1, number = -1, end = 0;
       const bool whole =
           at != std::string::npos &&
-          std::sscanf(line.c_str() + at, COMPARE_MESSAGE "%n", &process, &number, &end) == 2 &&
+          std::sscanf(line.c_str() + at, BENCH_MESSAGE "%n", &process, &number, &end) == 2 &&
           line.size() == at + static_cast<size_t>(end);
       if (!whole) Fail(m_logger.name, "has torn a line: " + line);
       if (!messages.insert(line.substr(at)).second) Fail(m_logger.name, "has twice: " + line);

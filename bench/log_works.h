@@ -8,7 +8,7 @@
 #include "bench/contender.h"
 
 // The message of every line; the two numbers tell which line of which process it is.
-#define COMPARE_MESSAGE "process %02d: camera %06d does not answer"
+#define BENCH_MESSAGE "process %02d: camera %06d does not answer"
 
 // Writes lines to its file, each of them at once. Made in the process that uses it.
 class LineWriter {

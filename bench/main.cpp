@@ -197,7 +197,7 @@ int main(int argc, char** argv) {
   if (options.mode == Options::kList) return List();
   if (options.mode == Options::kListCounted) return ListCounted(options);
   if (std::getenv("TARNWICK_SANDBOX") == nullptr) {
-    std::fputs("tarnwick_compare: the log files are fixed; run it in scripts/sandbox\n", stderr);
+    std::fputs("tarnwick_bench: the log files are fixed; run it in scripts/sandbox\n", stderr);
     return 2;
   }
   AllowManyFiles();

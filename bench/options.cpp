@@ -56,7 +56,7 @@ bool IsKnown(const std::string& name) {
   const bool known = std::any_of(works.begin(), works.end(), [&name](const Work& work) {
     return name == work.section || name == work.name;
   });
-  if (!known) std::fprintf(stderr, "tarnwick_compare: no section or work '%s'\n", name.c_str());
+  if (!known) std::fprintf(stderr, "tarnwick_bench: no section or work '%s'\n", name.c_str());
   return known;
 }
 
@@ -87,9 +87,9 @@ bool TakeAll(int argc, char** argv, Options* options) {
 bool ParseOptions(int argc, char** argv, Options* options) {
   if (TakeAll(argc, argv, options)) return true;
   std::fputs(
-      "usage: tarnwick_compare [--rounds N] [--milliseconds N] [--seconds N] [SECTION|WORK...]\n"
-      "       tarnwick_compare --list | --list-counted [SECTION|WORK...]\n"
-      "       tarnwick_compare --counted WORK --contender NAME --count N\n"
+      "usage: tarnwick_bench [--rounds N] [--milliseconds N] [--seconds N] [SECTION|WORK...]\n"
+      "       tarnwick_bench --list | --list-counted [SECTION|WORK...]\n"
+      "       tarnwick_bench --counted WORK --contender NAME --count N\n"
       "--rounds        how often each contender of a work is measured (default: 25)\n"
       "--milliseconds  how long each measurement takes (default: 50)\n"
       "--seconds       when the rounds of a work end early, but for three (default: 60)\n"

@@ -1,4 +1,4 @@
-// The command line of tarnwick_compare.
+// The command line of tarnwick_bench.
 #ifndef TARNWICK_BENCH_OPTIONS_H_
 #define TARNWICK_BENCH_OPTIONS_H_
 

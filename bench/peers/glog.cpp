@@ -22,7 +22,7 @@ class GlogLine : public LineWriter {
 
   void Write(int process, int number) override {
     char message[128];
-    std::snprintf(message, sizeof(message), COMPARE_MESSAGE, process, number);
+    std::snprintf(message, sizeof(message), BENCH_MESSAGE, process, number);
     LOG(INFO) << message;
   }
 };

@@ -29,7 +29,7 @@ class Log4cplusLine : public LineWriter {
   }
 
   void Write(int process, int number) override {
-    LOG4CPLUS_WARN_FMT(m_logger, COMPARE_MESSAGE, process, number);
+    LOG4CPLUS_WARN_FMT(m_logger, BENCH_MESSAGE, process, number);
   }
 
  private:
@@ -43,7 +43,7 @@ class Disabled : public TimedContender {
  private:
   void Run(int count) override {
     for (int i = 0; i < count; ++i) {
-      LOG4CPLUS_DEBUG_FMT(m_logger, COMPARE_MESSAGE, 0, i);
+      LOG4CPLUS_DEBUG_FMT(m_logger, BENCH_MESSAGE, 0, i);
       Use(&m_logger);
     }
   }

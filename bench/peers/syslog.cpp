@@ -15,7 +15,7 @@ class SyslogLine : public LineWriter {
   SyslogLine() { openlog("camera", LOG_PID, LOG_USER); }
 
   void Write(int process, int number) override {
-    syslog(LOG_WARNING, COMPARE_MESSAGE, process, number);
+    syslog(LOG_WARNING, BENCH_MESSAGE, process, number);
   }
 };
 
