@@ -11,7 +11,7 @@
 // A contender that starts this program anew for each measurement.
 std::unique_ptr<Contender> MakeApart(const std::string& work, const std::string& contender);
 
-// Runs a program and gives the number that it prints. Ends this program when there is none.
+// Runs a program and returns the number that it prints. Ends this program when there is none.
 double NumberPrintedBy(const std::vector<std::string>& command);
 
 #endif  // TARNWICK_BENCH_APART_H_

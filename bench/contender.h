@@ -26,7 +26,7 @@ struct Work {
   size_t bytes;  // that one operation handles, for rates; 0 where they say nothing
   int count;     // operations of a round; 0: as many as fill the round's time
   bool apart;    // each measurement in a process of its own: memory is looked at, or a peer leaves
-                 // threads behind
+                 // threads
   int counted;   // operations whose instructions and system calls are counted; 0: none, because
                  // their number is not the same each time or tells nothing
 };

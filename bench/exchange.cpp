@@ -6,8 +6,8 @@
 
 namespace {
 
-Exchange Get(const std::string& path, const std::string& reply) {
-  return {Exchange::kGet, false, false, path, "", "", reply};
+Exchange Get(const std::string& path, const std::string& response) {
+  return {Exchange::kGet, false, false, path, "", "", response};
 }
 
 }  // namespace

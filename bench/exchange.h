@@ -1,4 +1,4 @@
-// What clients ask of the server, and what it answers. Both sides are made from these.
+// What clients send to the server, and its responses. Both sides are made from these.
 #ifndef TARNWICK_BENCH_EXCHANGE_H_
 #define TARNWICK_BENCH_EXCHANGE_H_
 
@@ -9,11 +9,11 @@ struct Exchange {
   enum Kind { kGet, kDigestGet, kForm, kSoap, kUpload };
   Kind kind;
   bool tls;
-  bool chunked;             // the reply
+  bool chunked;             // the response
   std::string path;         // with its "/"
   std::string contentType;  // of the request's body
   std::string body;         // of the request
-  std::string reply;        // the body of the answer
+  std::string response;     // the body of the response
 };
 
 constexpr char kHost[] = "127.0.0.1";
@@ -42,7 +42,7 @@ Exchange Upload();
 // `size` bytes whose pattern repeats at no power of two, so that a piece out of place is seen.
 std::string BodyText(size_t size);
 
-// The Digest login that answers the server's challenge for `path`, as one header line.
+// The Digest credentials for the server's challenge for `path`, as one header field.
 std::string DigestLine(const std::string& path);
 
 // `text` by MD5, in hex.

@@ -34,27 +34,27 @@ void Write(int fd, const char* bytes, size_t size) {
 // read until the server closes, appending to a string
 std::string ReadAll(int fd) {
   static char piece[kReadSize];
-  std::string reply;
+  std::string response;
   for (ssize_t count; (count = read(fd, piece, sizeof(piece))) > 0;) {
-    reply.append(piece, static_cast<size_t>(count));
+    response.append(piece, static_cast<size_t>(count));
   }
-  return reply;
+  return response;
 }
 
 // socket, connect, write, read until the server closes, close
 std::string Exchanged(const std::string& request) {
   const int fd = Connect();
   Write(fd, request.data(), request.size());
-  std::string reply = ReadAll(fd);
+  std::string response = ReadAll(fd);
   close(fd);
-  return reply;
+  return response;
 }
 
-// What stands behind the head, in place.
-std::string BodyOf(std::string reply) {
-  Expect(reply.rfind("HTTP/1.1 200", 0) == 0, kFloor, "has no success");
-  reply.erase(0, reply.find("\r\n\r\n") + 4);
-  return reply;
+// What follows the head, in place.
+std::string BodyOf(std::string response) {
+  Expect(response.rfind("HTTP/1.1 200", 0) == 0, kFloor, "has no success");
+  response.erase(0, response.find("\r\n\r\n") + 4);
+  return response;
 }
 
 // One pass over the chunks, in place.
@@ -72,12 +72,12 @@ std::string WithoutChunks(std::string body) {
   return body;
 }
 
-// One exchange; for a login two, with the login worked out beforehand.
+// One exchange; two with Digest credentials, which are computed beforehand.
 std::string Fetch(const Exchange& exchange) {
-  std::string reply = Exchanged(RequestText(exchange));
-  if (exchange.kind == Exchange::kDigestGet) reply = Exchanged(LoginText(exchange));
-  reply = BodyOf(std::move(reply));
-  return exchange.chunked ? WithoutChunks(std::move(reply)) : reply;
+  std::string response = Exchanged(RequestText(exchange));
+  if (exchange.kind == Exchange::kDigestGet) response = Exchanged(AuthorizedText(exchange));
+  response = BodyOf(std::move(response));
+  return exchange.chunked ? WithoutChunks(std::move(response)) : response;
 }
 
 // socket, connect, write, read of 64 KiB at most until the server closes, close
@@ -105,9 +105,9 @@ std::string UploadPieces(const Exchange& exchange, const std::string& piece) {
   for (size_t done = 0; done < kUploadSize; done += piece.size()) {
     Write(fd, piece.data(), piece.size());
   }
-  std::string reply = BodyOf(ReadAll(fd));
+  std::string response = BodyOf(ReadAll(fd));
   close(fd);
-  return reply;
+  return response;
 }
 
 void AddFloor(Registry* registry) {

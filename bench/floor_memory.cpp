@@ -57,9 +57,9 @@ void AppendPieces(int count) {
 
 template <size_t kSize>
 void RemoveLineEnds(int count) {
-  static const std::string reply = SoapReply(kSize);
+  static const std::string response = SoapResponse(kSize);
   for (int i = 0; i < count; ++i) {
-    std::string text = reply;
+    std::string text = response;
     RemovePlainly(&text, '\r');
     RemovePlainly(&text, '\n');
     Use(text.data());
@@ -69,9 +69,9 @@ void RemoveLineEnds(int count) {
 // The same by the standard library's algorithm, which goes byte by byte.
 template <size_t kSize>
 void RemoveByAlgorithm(int count) {
-  static const std::string reply = SoapReply(kSize);
+  static const std::string response = SoapResponse(kSize);
   for (int i = 0; i < count; ++i) {
-    std::string text = reply;
+    std::string text = response;
     for (const char c : {'\r', '\n'})
       text.erase(std::remove(text.begin(), text.end(), c), text.end());
     Use(text.data());

@@ -20,14 +20,15 @@ class Fetching : public TimedContender {
  public:
   Fetching(const HttpClient& client, Exchange exchange)
       : m_client(client), m_exchange(std::move(exchange)) {
-    Expect(m_client.fetch(m_exchange) == m_exchange.reply, m_client.name, "fetches another body");
+    Expect(m_client.fetch(m_exchange) == m_exchange.response, m_client.name,
+           "fetches another body");
   }
 
  private:
   void Run(int count) override {
     for (int i = 0; i < count; ++i) {
       const std::string body = m_client.fetch(m_exchange);
-      Expect(body.size() == m_exchange.reply.size(), m_client.name, "fetches too little");
+      Expect(body.size() == m_exchange.response.size(), m_client.name, "fetches too little");
     }
   }
 
@@ -38,7 +39,7 @@ class Fetching : public TimedContender {
 class FetchingJson : public TimedContender {
  public:
   explicit FetchingJson(const HttpClient& client) : m_client(client), m_exchange(JsonGet()) {
-    Expect(Fetch() == ParseJson(m_exchange.reply), client.name, "fetches another value");
+    Expect(Fetch() == ParseJson(m_exchange.response), client.name, "fetches another value");
   }
 
  private:
@@ -77,7 +78,7 @@ std::string TextOf(const XmlDocument& document) {
 class FetchingXml : public TimedContender {
  public:
   explicit FetchingXml(const HttpClient& client) : m_client(client), m_exchange(SoapXml()) {
-    Expect(TextOf(Fetch()) == TextOf(ParseXml(m_exchange.reply)), client.name,
+    Expect(TextOf(Fetch()) == TextOf(ParseXml(m_exchange.response)), client.name,
            "fetches another document");
   }
 
@@ -104,7 +105,7 @@ class FetchingPieces : public TimedContender {
     std::string body;
     m_client.fetchPieces(m_exchange,
                          [&](const char* bytes, size_t size) { body.append(bytes, size); });
-    Expect(body == m_exchange.reply, m_client.name, "fetches other pieces");
+    Expect(body == m_exchange.response, m_client.name, "fetches other pieces");
   }
 
  private:
@@ -115,7 +116,7 @@ class FetchingPieces : public TimedContender {
         Use(bytes);
         all += size;
       });
-      Expect(all == m_exchange.reply.size(), m_client.name, "fetches too little");
+      Expect(all == m_exchange.response.size(), m_client.name, "fetches too little");
     }
   }
 
@@ -130,7 +131,7 @@ class Uploading : public TimedContender {
 
   void Run(int count) override {
     for (int i = 0; i < count; ++i) {
-      Expect(m_client.upload(m_exchange, m_piece) == m_exchange.reply, m_client.name,
+      Expect(m_client.upload(m_exchange, m_piece) == m_exchange.response, m_client.name,
              "uploads something else");
     }
   }

@@ -17,15 +17,15 @@
 struct HttpClient {
   const char* name;
 
-  // Sends the request of `exchange` and gives the body of the answer, whose status must be 200.
+  // Sends the request of `exchange` and returns the body of the response, whose status must be 200.
   std::string (*fetch)(const Exchange& exchange) = nullptr;
-  bool digest = false;  // fetch logs in when it is asked to
-  bool tls = false;     // fetch does TLS, without asking who answers
+  bool digest = false;  // fetch sends credentials after a challenge
+  bool tls = false;     // fetch does TLS, without checking the certificate
 
-  // As fetch of JsonGet and the parse of the answer, where the client does that by itself.
+  // As fetch of JsonGet and the parse of the response, where the client does that by itself.
   Json::Value (*fetchJson)(const Exchange& exchange) = nullptr;
 
-  // As fetch of SoapXml, the removal of its line ends and the parse, where the client does that by
+  // As fetch of SoapXml, the removal of its CR and LF and the parse, where the client does that by
   // itself. The caller frees the document.
   xmlDoc* (*fetchXml)(const Exchange& exchange) = nullptr;
 
@@ -33,8 +33,8 @@ struct HttpClient {
   using Take = std::function<void(const char* bytes, size_t size)>;
   void (*fetchPieces)(const Exchange& exchange, const Take& take) = nullptr;
 
-  // Sends kUploadSize bytes: `piece`, which has kPieceSize of them, again and again. Gives the body
-  // of the answer.
+  // Sends kUploadSize bytes: `piece`, which has kPieceSize of them, again and again. Returns the
+  // body of the response.
   std::string (*upload)(const Exchange& exchange, const std::string& piece) = nullptr;
 
   // A client that stays after it has fetched.
@@ -47,7 +47,7 @@ void AddHttpClient(Registry* registry, const HttpClient& client);
 // Registers the works of TLS alone.
 void AddTlsClient(Registry* registry, const char* name, std::string (*fetch)(const Exchange&));
 
-// The answer's JSON by jsoncpp's reader, as the library parses it.
+// The response's JSON by jsoncpp's reader, as the library parses it.
 Json::Value ParseJson(const std::string& text);
 
 #endif  // TARNWICK_BENCH_HTTP_WORKS_H_

@@ -6,9 +6,9 @@
 namespace {
 
 std::unique_ptr<TWHttpClient> ClientFor(const Exchange& exchange) {
-  const bool login = exchange.kind == Exchange::kDigestGet;
+  const bool digest = exchange.kind == Exchange::kDigestGet;
   return std::make_unique<TWHttpClient>(kHost, ServerPort(exchange.tls), exchange.path,
-                                        login ? kUser : "", login ? kPassword : "", kTimeout,
+                                        digest ? kUser : "", digest ? kPassword : "", kTimeout,
                                         exchange.tls, true, false, false, HTTP_VERSION_1_1, "");
 }
 

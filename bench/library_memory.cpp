@@ -41,7 +41,7 @@ void Dechunk(int count) {
   static bool compared = false;
   for (int i = 0; i < count; ++i) {
     client.Memory()->Rewind();
-    client.SetBehindHead("chunked");
+    client.SetAfterHead("chunked");
     std::string body;
     Expect(client.ReadBody(body) == HTTP_RET_OK, kLibrary, "cannot decode");
     Expect(compared ? body.size() == plain.size() : body == plain, kLibrary,
@@ -57,7 +57,7 @@ void ReadBodies(int count) {
   static bool compared = false;
   for (int i = 0; i < count; ++i) {
     client.Memory()->Rewind();
-    client.SetBehindHead("");
+    client.SetAfterHead("");
     std::string body;
     Expect(client.ReadBody(body) == HTTP_RET_OK, kLibrary, "cannot read the body");
     Expect(compared ? body.size() == plain.size() : body == plain, kLibrary, "reads another body");
@@ -67,9 +67,9 @@ void ReadBodies(int count) {
 
 template <size_t kSize>
 void RemoveLineEnds(int count) {
-  static const std::string reply = SoapReply(kSize);
+  static const std::string response = SoapResponse(kSize);
   for (int i = 0; i < count; ++i) {
-    std::string text = reply;
+    std::string text = response;
     RemoveChar(text, '\r');
     RemoveChar(text, '\n');
     Use(text.data());

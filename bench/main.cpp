@@ -139,7 +139,7 @@ void Compare(const Work& work, const Options& options) {
   }
 }
 
-// For the process that was asked for one contender's work.
+// For a process that measures or counts one work of one contender.
 int RunOne(const Options& options) {
   for (const Registry::Entry& entry : AllContenders().Of(options.work)) {
     if (entry.contender != options.contender) continue;

@@ -13,10 +13,10 @@
 
 namespace {
 
-std::string BodyOf(std::string reply) {
-  Expect(reply.rfind("HTTP/1.1 200", 0) == 0, "OpenSSL", "has no success");
-  reply.erase(0, reply.find("\r\n\r\n") + 4);
-  return reply;
+std::string BodyOf(std::string response) {
+  Expect(response.rfind("HTTP/1.1 200", 0) == 0, "OpenSSL", "has no success");
+  response.erase(0, response.find("\r\n\r\n") + 4);
+  return response;
 }
 
 SSL* NewClient(SSL_CTX* context, int fd) {
@@ -40,15 +40,15 @@ std::string FetchPlainly(const Exchange& exchange) {
   SSL* const ssl = NewClient(context, fd);
   const std::string request = RequestText(exchange);
   SSL_write(ssl, request.data(), static_cast<int>(request.size()));
-  std::string reply;
+  std::string response;
   char piece[16384];
   for (int count; (count = SSL_read(ssl, piece, sizeof(piece))) > 0;) {
-    reply.append(piece, static_cast<size_t>(count));
+    response.append(piece, static_cast<size_t>(count));
   }
   SSL_shutdown(ssl);
   SSL_free(ssl);
   close(fd);
-  return BodyOf(std::move(reply));
+  return BodyOf(std::move(response));
 }
 
 // select unless decrypted bytes are waiting, SSL_read; again after a part of a record
@@ -79,15 +79,15 @@ std::string FetchAsRequired(const Exchange& exchange) {
   char piece[kBodyPiece];
   const int first = ReadTls(ssl, ahead, sizeof(ahead));
   Expect(first > 0, kRequired, "cannot read");
-  std::string reply = BodyOf(std::string(ahead, static_cast<size_t>(first)));
+  std::string response = BodyOf(std::string(ahead, static_cast<size_t>(first)));
   for (int count; (count = ReadTls(ssl, piece, sizeof(piece))) > 0;) {
-    reply.append(piece, static_cast<size_t>(count));
+    response.append(piece, static_cast<size_t>(count));
   }
   SSL_shutdown(ssl);
   SSL_free(ssl);
   SSL_CTX_free(context);
   close(fd);
-  return reply;
+  return response;
 }
 
 void AddOpenSsl(Registry* registry) {

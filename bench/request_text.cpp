@@ -2,8 +2,8 @@
 
 namespace {
 
-std::string GetText(const Exchange& exchange, const std::string& login) {
-  return "GET " + exchange.path + " HTTP/1.1\r\nUser-Agent: Quenrith Tarnwick\r\n" + login +
+std::string GetText(const Exchange& exchange, const std::string& credentials) {
+  return "GET " + exchange.path + " HTTP/1.1\r\nUser-Agent: Quenrith Tarnwick\r\n" + credentials +
          "Host: " + kHost + "\r\n\r\n";
 }
 
@@ -28,7 +28,7 @@ std::string RequestText(const Exchange& exchange) {
   }
 }
 
-std::string LoginText(const Exchange& exchange) {
-  static const std::string login = DigestLine(exchange.path) + "\r\n";
-  return GetText(exchange, login);
+std::string AuthorizedText(const Exchange& exchange) {
+  static const std::string credentials = DigestLine(exchange.path) + "\r\n";
+  return GetText(exchange, credentials);
 }

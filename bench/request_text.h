@@ -8,7 +8,7 @@
 
 std::string RequestText(const Exchange& exchange);
 
-// As RequestText, with the answer to the server's challenge.
-std::string LoginText(const Exchange& exchange);
+// As RequestText, with the credentials for the server's challenge.
+std::string AuthorizedText(const Exchange& exchange);
 
 #endif  // TARNWICK_BENCH_REQUEST_TEXT_H_

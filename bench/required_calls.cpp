@@ -15,14 +15,14 @@
 
 namespace {
 
-struct addrinfo* LookUp(int port) {
+struct addrinfo* Resolve(int port) {
   struct addrinfo hints = {};
   hints.ai_family = AF_INET;
   hints.ai_socktype = SOCK_STREAM;
   struct addrinfo* list = nullptr;
   char service[16];
   std::snprintf(service, sizeof(service), "%d", port);
-  Expect(getaddrinfo(kHost, service, &hints, &list) == 0, kRequired, "cannot look up the host");
+  Expect(getaddrinfo(kHost, service, &hints, &list) == 0, kRequired, "cannot resolve the host");
   return list;
 }
 
@@ -45,7 +45,7 @@ void WaitForConnect(int fd) {
 
 int RequiredConnect(int port) {
   const int fd = socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0);
-  struct addrinfo* const list = LookUp(port);
+  struct addrinfo* const list = Resolve(port);
   const int flags = fcntl(fd, F_GETFL);
   fcntl(fd, F_SETFL, flags | O_NONBLOCK);
   if (connect(fd, list->ai_addr, list->ai_addrlen) != 0) {

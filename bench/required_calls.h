@@ -10,8 +10,8 @@
 constexpr size_t kReadAhead = 64512;
 constexpr size_t kBodyPiece = 8192;
 
-// socket; fcntl twice, connect, select, getsockopt, fcntl; the address is looked up, which makes no
-// call for a dotted one. The descriptor is blocking. Results: the descriptor.
+// socket; fcntl twice, connect, select, getsockopt, fcntl; the name is resolved, which makes no call
+// for a dotted address. The descriptor is blocking. Results: the descriptor.
 int RequiredConnect(int port);
 
 // ioctl: from here on the descriptor does not block.

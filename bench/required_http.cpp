@@ -14,8 +14,8 @@
 
 namespace {
 
-// A reply while it is read: the head and the first of the body come with one read-ahead.
-struct Reply {
+// A response while it is read: the head and the first of the body come with one read-ahead.
+struct Response {
   int fd;
   char buffer[kReadAhead + 1];
   const char* unread;
@@ -31,46 +31,46 @@ int Send(const std::string& request) {
 }
 
 // select, read of 64,512 bytes
-void ReadHead(Reply* reply) {
-  const ssize_t count = RequiredRead(reply->fd, reply->buffer, kReadAhead);
+void ReadHead(Response* response) {
+  const ssize_t count = RequiredRead(response->fd, response->buffer, kReadAhead);
   Expect(count > 0, kRequired, "cannot read");
-  reply->buffer[count] = '\0';
-  const char* const end = std::strstr(reply->buffer, "\r\n\r\n");
+  response->buffer[count] = '\0';
+  const char* const end = std::strstr(response->buffer, "\r\n\r\n");
   Expect(end != nullptr, kRequired, "has no whole head");
-  reply->unread = end + 4;
-  reply->left = static_cast<size_t>(reply->buffer + count - reply->unread);
+  response->unread = end + 4;
+  response->left = static_cast<size_t>(response->buffer + count - response->unread);
 }
 
 // select, read of 8,192 bytes until the server closes. The end of the stream is met by the call
 // that delivers the last bytes and by the one that finds none, and each of them looks once more,
 // with a read-ahead: 8,192, 64,512; 8,192, 64,512.
-void ReadToEnd(Reply* reply, std::string* body) {
+void ReadToEnd(Response* response, std::string* body) {
   char piece[kBodyPiece];
-  body->assign(reply->unread, reply->left);
+  body->assign(response->unread, response->left);
   for (;;) {
-    const ssize_t count = RequiredRead(reply->fd, piece, sizeof(piece));
+    const ssize_t count = RequiredRead(response->fd, piece, sizeof(piece));
     if (count <= 0) break;
     body->append(piece, static_cast<size_t>(count));
   }
   for (const size_t room : {kReadAhead, kBodyPiece, kReadAhead}) {
-    RequiredRead(reply->fd, reply->buffer, room);
+    RequiredRead(response->fd, response->buffer, room);
   }
 }
 
-// What there is of a chunk and of the two bytes behind it, which are dropped.
-void TakeChunk(Reply* reply, size_t* rest, std::string* body) {
-  const size_t taken = std::min(*rest, reply->left);
-  body->append(reply->unread, *rest > 2 ? std::min(taken, *rest - 2) : 0);
-  reply->unread += taken;
-  reply->left -= taken;
+// What there is of a chunk and of the CRLF after it, which is dropped.
+void TakeChunk(Response* response, size_t* rest, std::string* body) {
+  const size_t taken = std::min(*rest, response->left);
+  body->append(response->unread, *rest > 2 ? std::min(taken, *rest - 2) : 0);
+  response->unread += taken;
+  response->left -= taken;
   *rest -= taken;
 }
 
 // What there is of a chunk's size. Results: true when that was all of it.
-bool TakeSize(Reply* reply, std::string* digits) {
-  while (reply->left > 0) {
-    const char c = *reply->unread++;
-    --reply->left;
+bool TakeSize(Response* response, std::string* digits) {
+  while (response->left > 0) {
+    const char c = *response->unread++;
+    --response->left;
     if (c == '\n') return true;
     *digits += c;
   }
@@ -78,18 +78,18 @@ bool TakeSize(Reply* reply, std::string* digits) {
 }
 
 // select, read of 64,512 bytes until the last chunk has come; one pass over the chunks
-void ReadChunks(Reply* reply, std::string* body) {
+void ReadChunks(Response* response, std::string* body) {
   std::string digits;
-  size_t rest = 0;  // of the chunk, with the two bytes behind it
+  size_t rest = 0;  // of the chunk, with the CRLF after it
   for (;;) {
-    if (reply->left == 0) {
-      const ssize_t count = RequiredRead(reply->fd, reply->buffer, kReadAhead);
+    if (response->left == 0) {
+      const ssize_t count = RequiredRead(response->fd, response->buffer, kReadAhead);
       Expect(count > 0, kRequired, "misses chunks");
-      reply->unread = reply->buffer;
-      reply->left = static_cast<size_t>(count);
+      response->unread = response->buffer;
+      response->left = static_cast<size_t>(count);
     } else if (rest > 0) {
-      TakeChunk(reply, &rest, body);
-    } else if (TakeSize(reply, &digits)) {
+      TakeChunk(response, &rest, body);
+    } else if (TakeSize(response, &digits)) {
       const size_t size = std::strtoul(digits.c_str(), nullptr, 16);
       if (size == 0) return;
       rest = size + 2;
@@ -98,76 +98,76 @@ void ReadChunks(Reply* reply, std::string* body) {
   }
 }
 
-// The reply of a SOAP post has a length: select, read of what is missing, if anything is.
-void ReadLength(Reply* reply, size_t length, std::string* body) {
+// The response of a SOAP post has a length: select, read of what is missing, if anything is.
+void ReadLength(Response* response, size_t length, std::string* body) {
   body->resize(length);
-  size_t done = std::min(reply->left, length);
-  std::memcpy(&(*body)[0], reply->unread, done);
+  size_t done = std::min(response->left, length);
+  std::memcpy(&(*body)[0], response->unread, done);
   while (done < length) {
-    const ssize_t count = RequiredRead(reply->fd, &(*body)[done], length - done);
+    const ssize_t count = RequiredRead(response->fd, &(*body)[done], length - done);
     Expect(count > 0, kRequired, "misses bytes");
     done += static_cast<size_t>(count);
   }
 }
 
-// Send; ReadHead; what the kind of reply asks for; close
+// Send; ReadHead; what the kind of response asks for; close
 std::string Exchanged(const Exchange& exchange, const std::string& request) {
-  static Reply reply;
+  static Response response;
   std::string body;
-  reply.fd = Send(request);
-  ReadHead(&reply);
-  Expect(std::strncmp(reply.buffer, "HTTP/1.1 200", 12) == 0, kRequired, "has no success");
+  response.fd = Send(request);
+  ReadHead(&response);
+  Expect(std::strncmp(response.buffer, "HTTP/1.1 200", 12) == 0, kRequired, "has no success");
   if (exchange.kind == Exchange::kSoap) {
-    ReadLength(&reply, exchange.reply.size(), &body);
+    ReadLength(&response, exchange.response.size(), &body);
   } else if (exchange.chunked) {
-    ReadChunks(&reply, &body);
+    ReadChunks(&response, &body);
   } else if (exchange.kind != Exchange::kForm) {
-    ReadToEnd(&reply, &body);
+    ReadToEnd(&response, &body);
   }
-  close(reply.fd);
+  close(response.fd);
   return body;
 }
 
-// For a login a first exchange, of which the head alone is read. The login is worked out
-// beforehand.
+// With Digest credentials there is a first exchange, of which the head alone is read. The
+// credentials are computed beforehand.
 std::string Fetch(const Exchange& exchange) {
   if (exchange.kind != Exchange::kDigestGet) return Exchanged(exchange, RequestText(exchange));
-  static Reply challenge;
+  static Response challenge;
   challenge.fd = Send(RequestText(exchange));
   ReadHead(&challenge);
   close(challenge.fd);
-  return Exchanged(exchange, LoginText(exchange));
+  return Exchanged(exchange, AuthorizedText(exchange));
 }
 
 // Send; ReadHead; select and read into 64 KiB until these are full or the server closes; close
 void FetchPieces(const Exchange& exchange, const HttpClient::Take& take) {
-  static Reply reply;
+  static Response response;
   static char piece[kPieceSize];
-  reply.fd = Send(RequestText(exchange));
-  ReadHead(&reply);
-  size_t done = reply.left;
-  std::memcpy(piece, reply.unread, done);
-  for (ssize_t count; (count = RequiredRead(reply.fd, piece + done, kPieceSize - done)) > 0;) {
+  response.fd = Send(RequestText(exchange));
+  ReadHead(&response);
+  size_t done = response.left;
+  std::memcpy(piece, response.unread, done);
+  for (ssize_t count; (count = RequiredRead(response.fd, piece + done, kPieceSize - done)) > 0;) {
     done += static_cast<size_t>(count);
     if (done < kPieceSize) continue;
     take(piece, done);
     done = 0;
   }
   take(piece, done);
-  close(reply.fd);
+  close(response.fd);
 }
 
-// Send; select and write for each piece; select and read of the answer; close
+// Send; select and write for each piece; select and read of the response; close
 std::string UploadPieces(const Exchange& exchange, const std::string& piece) {
-  static Reply reply;
+  static Response response;
   std::string body;
-  reply.fd = Send(RequestText(exchange));
+  response.fd = Send(RequestText(exchange));
   for (size_t done = 0; done < kUploadSize; done += piece.size()) {
-    RequiredWrite(reply.fd, piece.data(), piece.size());
+    RequiredWrite(response.fd, piece.data(), piece.size());
   }
-  ReadHead(&reply);
-  ReadToEnd(&reply, &body);
-  close(reply.fd);
+  ReadHead(&response);
+  ReadToEnd(&response, &body);
+  close(response.fd);
   return body;
 }
 

@@ -1,4 +1,4 @@
-// Accepts a connection, reads one request, writes the answer and closes; then the next one. Fixed
+// Accepts a connection, reads one request, writes the response and closes; then the next one. Fixed
 // and simple, so that it costs all contenders the same.
 #include "bench/server.h"
 
@@ -23,13 +23,13 @@ namespace {
 
 constexpr const char* kPortVariables[] = {"TARNWICK_BENCH_PORT", "TARNWICK_BENCH_TLS_PORT"};
 
-std::string Answer(const char* status, const std::string& headers, const std::string& body) {
+std::string Response(const char* status, const std::string& headers, const std::string& body) {
   return std::string("HTTP/1.1 ") + status + "\r\nServer: camera\r\n" + headers +
          "Connection: close\r\n\r\n" + body;
 }
 
 std::string Plain(const std::string& type, const std::string& body) {
-  return Answer(
+  return Response(
       "200 OK",
       "Content-Type: " + type + "\r\nContent-Length: " + std::to_string(body.size()) + "\r\n",
       body);
@@ -53,24 +53,25 @@ struct Request {
   }
 };
 
-// A parameter of a login, quoted or not.
-std::string Parameter(const std::string& login, const std::string& name) {
+// A parameter of Digest credentials, quoted or not.
+std::string Parameter(const std::string& credentials, const std::string& name) {
   for (const char before : {' ', ','}) {
-    size_t begin = login.find(before + name + "=");
+    size_t begin = credentials.find(before + name + "=");
     if (begin == std::string::npos) continue;
     begin += name.size() + 2;
-    if (login[begin] == '"') return login.substr(begin + 1, login.find('"', begin + 1) - begin - 1);
-    return login.substr(begin, login.find(',', begin) - begin);
+    if (credentials[begin] == '"')
+      return credentials.substr(begin + 1, credentials.find('"', begin + 1) - begin - 1);
+    return credentials.substr(begin, credentials.find(',', begin) - begin);
   }
   return "";
 }
 
-bool IsRightLogin(const std::string& login, const std::string& path) {
+bool AreRightCredentials(const std::string& credentials, const std::string& path) {
   const std::string secret = Md5Hex(std::string(kUser) + ":" + kRealm + ":" + kPassword);
-  return Parameter(login, "uri") == path &&
-         Parameter(login, "response") ==
-             Md5Hex(secret + ":" + kNonce + ":" + Parameter(login, "nc") + ":" +
-                    Parameter(login, "cnonce") + ":auth:" + Md5Hex("GET:" + path));
+  return Parameter(credentials, "uri") == path &&
+         Parameter(credentials, "response") ==
+             Md5Hex(secret + ":" + kNonce + ":" + Parameter(credentials, "nc") + ":" +
+                    Parameter(credentials, "cnonce") + ":auth:" + Md5Hex("GET:" + path));
 }
 
 class Server {
@@ -78,8 +79,8 @@ class Server {
   void Serve(ServerStream* stream) {
     Request request;
     if (!Read(stream, &request)) return;
-    const std::string* const answer = AnswerTo(stream, request);
-    if (answer != nullptr) stream->Write(answer->data(), answer->size());
+    const std::string* const response = ResponseTo(stream, request);
+    if (response != nullptr) stream->Write(response->data(), response->size());
   }
 
  private:
@@ -105,16 +106,16 @@ class Server {
     return true;
   }
 
-  const std::string* AnswerTo(ServerStream* stream, const Request& request) {
+  const std::string* ResponseTo(ServerStream* stream, const Request& request) {
     const std::string path = request.Path();
-    if (path == "/digest") return AnswerToDigest(request);
-    if (path == "/form") return AnswerToPost(FormPost(), request);
-    if (path == "/soap") return AnswerToPost(SoapPost(), request);
-    if (path == "/soap_xml") return AnswerToPost(SoapXml(), request);
+    if (path == "/digest") return ResponseToDigest(request);
+    if (path == "/form") return ResponseToPost(FormPost(), request);
+    if (path == "/soap") return ResponseToPost(SoapPost(), request);
+    if (path == "/soap_xml") return ResponseToPost(SoapXml(), request);
     if (path == "/upload" && !Swallow(stream, request.body.size())) return nullptr;
-    std::string& answer = m_answers[path];
-    if (answer.empty()) answer = Make(path);
-    return &answer;
+    std::string& response = m_responses[path];
+    if (response.empty()) response = Make(path);
+    return &response;
   }
 
   // Reads the upload until all of its bytes have come.
@@ -129,48 +130,48 @@ class Server {
   }
 
   static std::string Make(const std::string& path) {
-    if (path == "/json") return Plain("application/json", JsonGet().reply);
-    if (path == "/upload") return Plain("text/plain", Upload().reply);
+    if (path == "/json") return Plain("application/json", JsonGet().response);
+    if (path == "/upload") return Plain("text/plain", Upload().response);
     if (path.rfind("/body/", 0) == 0) {
       return Plain("application/octet-stream", BodyText(std::strtoul(&path[6], nullptr, 10)));
     }
     if (path.rfind("/chunked/", 0) == 0) {
-      return Answer("200 OK", "Transfer-Encoding: chunked\r\n",
-                    Chunked(BodyText(std::strtoul(&path[9], nullptr, 10)), kChunkSize));
+      return Response("200 OK", "Transfer-Encoding: chunked\r\n",
+                      Chunked(BodyText(std::strtoul(&path[9], nullptr, 10)), kChunkSize));
     }
     return m_refusal;
   }
 
-  // The first request is asked for a login. What a login says is checked now and then: each time
-  // would be work of the server's that is the same for all and hides the clients'.
-  const std::string* AnswerToDigest(const Request& request) {
+  // The first request gets a challenge. Credentials are checked now and then: to check them each time
+  // would be work of the server that is the same for all and hides the clients'.
+  const std::string* ResponseToDigest(const Request& request) {
     static const std::string challenge =
-        Answer("401 Unauthorized",
-               std::string("WWW-Authenticate: Digest realm=\"") + kRealm + "\", nonce=\"" + kNonce +
-                   "\", qop=\"auth\", algorithm=MD5\r\nContent-Length: 0\r\n",
-               "");
-    static const std::string good = Plain("application/json", DigestGet().reply);
-    const std::string login = request.Value("Authorization");
-    if (login.rfind("Digest ", 0) != 0) return &challenge;
-    const bool checked = m_logins++ % 64 == 0;
-    return checked && !IsRightLogin(login, "/digest") ? &m_refusal : &good;
+        Response("401 Unauthorized",
+                 std::string("WWW-Authenticate: Digest realm=\"") + kRealm + "\", nonce=\"" +
+                     kNonce + "\", qop=\"auth\", algorithm=MD5\r\nContent-Length: 0\r\n",
+                 "");
+    static const std::string good = Plain("application/json", DigestGet().response);
+    const std::string credentials = request.Value("Authorization");
+    if (credentials.rfind("Digest ", 0) != 0) return &challenge;
+    const bool checked = m_authorized++ % 64 == 0;
+    return checked && !AreRightCredentials(credentials, "/digest") ? &m_refusal : &good;
   }
 
-  const std::string* AnswerToPost(const Exchange& exchange, const Request& request) {
-    std::string& answer = m_answers[exchange.path];
-    if (answer.empty()) answer = Plain(exchange.contentType, exchange.reply);
+  const std::string* ResponseToPost(const Exchange& exchange, const Request& request) {
+    std::string& response = m_responses[exchange.path];
+    if (response.empty()) response = Plain(exchange.contentType, exchange.response);
     std::string& expected = m_bodies[exchange.path];
     if (expected.empty()) expected = exchange.body;
-    return request.body == expected ? &answer : &m_refusal;
+    return request.body == expected ? &response : &m_refusal;
   }
 
   static const std::string m_refusal;
-  std::map<std::string, std::string> m_answers;
+  std::map<std::string, std::string> m_responses;
   std::map<std::string, std::string> m_bodies;  // that posts must have
-  unsigned m_logins = 0;
+  unsigned m_authorized = 0;
 };
 
-const std::string Server::m_refusal = Answer("400 Bad Request", "Content-Length: 0\r\n", "");
+const std::string Server::m_refusal = Response("400 Bad Request", "Content-Length: 0\r\n", "");
 
 [[noreturn]] void ServeForEver(int listener, bool tls) {
   const ServerIdentity identity(tls);

@@ -44,7 +44,7 @@ struct Parser : http::response_parser<Body> {
   Parser() { this->body_limit(std::numeric_limits<std::uint64_t>::max()); }
 };
 
-// Writes the request and reads the whole answer.
+// Writes the request and reads the whole response.
 template <typename Stream>
 std::string Exchanged(Stream* stream, const Exchange& exchange) {
   http::write(*stream, RequestFor(exchange));

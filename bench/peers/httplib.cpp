@@ -42,11 +42,11 @@ void FetchPieces(const Exchange& exchange, const HttpClient::Take& take) {
 }
 
 std::string UploadPieces(const Exchange& exchange, const std::string& piece) {
-  const auto give = [&](size_t, size_t length, httplib::DataSink& sink) {
+  const auto provide = [&](size_t, size_t length, httplib::DataSink& sink) {
     return sink.write(piece.data(), std::min(length, piece.size()));
   };
   const httplib::Result result =
-      ClientFor(exchange)->Post(exchange.path, kUploadSize, give, exchange.contentType);
+      ClientFor(exchange)->Post(exchange.path, kUploadSize, provide, exchange.contentType);
   ExpectSuccess(result);
   return result->body;
 }

@@ -51,7 +51,7 @@ HTTPRequest RequestFor(const Exchange& exchange) {
   return request;
 }
 
-// Sends the request, with a login when it is asked for one, and gives the stream of the body.
+// Sends the request, with credentials after a challenge, and returns the stream of the body.
 std::istream& Send(HTTPClientSession* session, const Exchange& exchange) {
   HTTPRequest request = RequestFor(exchange);
   HTTPResponse response;

@@ -1,4 +1,4 @@
-// syslog(3), with the rsyslogd that scripts/bench has started behind /dev/log. The time is the
+// syslog(3), with the rsyslogd that scripts/bench has started at /dev/log. The time is the
 // caller's: the logger writes when the call has returned.
 #include <sys/stat.h>
 #include <syslog.h>
