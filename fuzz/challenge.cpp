@@ -13,7 +13,7 @@
 #include <string>
 #include <string_view>
 
-#include "fuzz/oracle/shared/model_login.h"
+#include "fuzz/oracle/shared/model_credentials.h"
 #include "fuzz/support/script.h"
 #include "fuzz/support/target.h"
 #include "fuzz/support/wire.h"
@@ -26,7 +26,7 @@ namespace {
 
 class Client : public TWHttpClient {
  public:
-  Client(const ModelLogin& login, const std::string& challenge) {
+  Client(const ModelCredentials& login, const std::string& challenge) {
     m_strUser = login.user;
     m_strPassword = login.password;
     m_strPath = login.path;
@@ -39,7 +39,7 @@ class Client : public TWHttpClient {
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
   LogEverything();
   std::string_view text(reinterpret_cast<const char*>(data), size);
-  ModelLogin login;
+  ModelCredentials login;
   login.user = TakeLine(&text);
   login.password = TakeLine(&text);
   login.path = TakeLine(&text);

@@ -27,8 +27,8 @@ constexpr long kTime = 1700000000;
 constexpr char kHost[] = "cam";
 constexpr char kEnvelope[] = "<Envelope/>";
 
-const ModelLogin& Login() {
-  static const ModelLogin login = {"admin", "secret", "soap/svc"};
+const ModelCredentials& Login() {
+  static const ModelCredentials login = {"admin", "secret", "soap/svc"};
   return login;
 }
 

@@ -6,8 +6,8 @@
 #include <string>
 #include <vector>
 
+#include "fuzz/oracle/shared/model_credentials.h"
 #include "fuzz/oracle/shared/model_head.h"
-#include "fuzz/oracle/shared/model_login.h"
 #include "fuzz/oracle/shared/model_socket.h"
 #include "fuzz/support/script.h"
 
@@ -20,7 +20,7 @@ struct ModelSettings {
   bool basic = false;
   int version = 0;  // 2: HTTP/1.1, 1: HTTP/1.0, 0: none chosen
   std::string keep;
-  ModelLogin login;
+  ModelCredentials login;
 };
 
 class ModelClient {

@@ -39,7 +39,7 @@ std::string WithoutLineEnds(const std::string& text) {
   return out;
 }
 
-SoapClient::SoapClient(ModelSocket* socket, std::string host, ModelLogin login, long time)
+SoapClient::SoapClient(ModelSocket* socket, std::string host, ModelCredentials login, long time)
     : socket_(socket), host_(std::move(host)), login_(std::move(login)), time_(time) {
   head_.state = 0;
 }

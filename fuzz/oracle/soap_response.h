@@ -4,8 +4,8 @@
 
 #include <string>
 
+#include "fuzz/oracle/shared/model_credentials.h"
 #include "fuzz/oracle/shared/model_head.h"
-#include "fuzz/oracle/shared/model_login.h"
 #include "fuzz/oracle/shared/model_socket.h"
 
 namespace oracle {
@@ -13,7 +13,7 @@ namespace oracle {
 class SoapClient {
  public:
   // `time` is what time(2) shows the library. REQUIRES: `socket` outlives the object.
-  SoapClient(ModelSocket* socket, std::string host, ModelLogin login, long time);
+  SoapClient(ModelSocket* socket, std::string host, ModelCredentials login, long time);
 
   // Results: the client's result codes; `reply` changes only when there is one.
   int Post(const std::string& envelope, std::string* reply);
@@ -27,7 +27,7 @@ class SoapClient {
 
   ModelSocket* socket_;
   std::string host_;
-  ModelLogin login_;
+  ModelCredentials login_;
   long time_;
   ModelHead head_;
   int result_ = 1;

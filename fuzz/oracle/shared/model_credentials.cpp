@@ -1,4 +1,4 @@
-#include "fuzz/oracle/shared/model_login.h"
+#include "fuzz/oracle/shared/model_credentials.h"
 
 #include <unistd.h>
 
@@ -47,7 +47,7 @@ char Lower(char c) {
 
 }  // namespace
 
-std::string ModelBasicLine(const ModelLogin& login) {
+std::string ModelBasicLine(const ModelCredentials& login) {
   static const char kDigits[] = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789+/";
   const std::string both = login.user + ":" + login.password;
   const std::string text = both.c_str();  // a zero byte ends it
@@ -64,7 +64,7 @@ std::string ModelBasicLine(const ModelLogin& login) {
   return "Authorization: Basic " + encoded;
 }
 
-std::string ModelDigestLine(const ModelLogin& login, const std::string& challenge,
+std::string ModelDigestLine(const ModelCredentials& login, const std::string& challenge,
                             const std::string& method, const std::string&, long time) {
   const std::string realm = ParameterOf(challenge, "realm");
   const std::string nonce = ParameterOf(challenge, "nonce");

@@ -1,21 +1,21 @@
 // The two logins, told once more in the plainest way.
-#ifndef TARNWICK_FUZZ_ORACLE_SHARED_MODEL_LOGIN_H_
-#define TARNWICK_FUZZ_ORACLE_SHARED_MODEL_LOGIN_H_
+#ifndef TARNWICK_FUZZ_ORACLE_SHARED_MODEL_CREDENTIALS_H_
+#define TARNWICK_FUZZ_ORACLE_SHARED_MODEL_CREDENTIALS_H_
 
 #include <string>
 
-struct ModelLogin {
+struct ModelCredentials {
   std::string user;
   std::string password;
   std::string path;  // without its leading "/"
 };
 
-std::string ModelBasicLine(const ModelLogin& login);
+std::string ModelBasicLine(const ModelCredentials& login);
 
 // REQUIRES: time(2) shows `time` while the library makes its own line.
-std::string ModelDigestLine(const ModelLogin& login, const std::string& challenge,
+std::string ModelDigestLine(const ModelCredentials& login, const std::string& challenge,
                             const std::string& method, const std::string& body, long time);
 
 bool ModelContains(const std::string& text, const std::string& word);
 
-#endif  // TARNWICK_FUZZ_ORACLE_SHARED_MODEL_LOGIN_H_
+#endif  // TARNWICK_FUZZ_ORACLE_SHARED_MODEL_CREDENTIALS_H_
