@@ -1,4 +1,4 @@
-// The reply of a JSON service: the input is its text.
+// The response of a JSON service: the input is its body.
 #include "tarnwick/http/json_response.h"
 
 #include <json/json.h>

@@ -1,4 +1,4 @@
-// A SOAP exchange: what of the peer's bytes becomes the reply, and what document.
+// A SOAP exchange: what the response is of the peer's bytes, and what the document.
 //
 //   login buffered 16 1
 //   HTTP/1.1 200 OK
@@ -6,8 +6,8 @@
 //
 //   <a/>
 //
-// Words of line 1: "login" answers a challenge, "document" parses the reply, "direct" reads without
-// the buffer, "twice" posts twice.
+// Words of line 1: "login" sends credentials after a challenge, "document" parses the response,
+// "direct" reads without the buffer, "twice" posts twice.
 #include <cstdint>
 #include <string>
 #include <string_view>
@@ -27,16 +27,16 @@ constexpr long kTime = 1700000000;
 constexpr char kHost[] = "cam";
 constexpr char kEnvelope[] = "<Envelope/>";
 
-const ModelCredentials& Login() {
-  static const ModelCredentials login = {"admin", "secret", "soap/svc"};
-  return login;
+const ModelCredentials& Credentials() {
+  static const ModelCredentials credentials = {"admin", "secret", "soap/svc"};
+  return credentials;
 }
 
 class Client : public TWHttpClient {
  public:
   explicit Client(bool buffered)
-      : TWHttpClient(kHost, 80, Login().path, Login().user, Login().password, kTimeout, false,
-                     buffered, false, false, HTTP_VERSION_NONE, "") {}
+      : TWHttpClient(kHost, 80, Credentials().path, Credentials().user, Credentials().password,
+                     kTimeout, false, buffered, false, false, HTTP_VERSION_NONE, "") {}
 
   int State() const { return m_connState; }
 };
@@ -48,15 +48,15 @@ class Exchange {
         wire_(connections, options.Numbers()),
         client_(!options.Has("direct")),
         socket_(kTimeout, !options.Has("direct"), connections, options.Numbers()),
-        model_(&socket_, kHost, Login(), kTime) {}
+        model_(&socket_, kHost, Credentials(), kTime) {}
 
   void Post() {
     const bool login = options_.Has("login");
     const bool document = !login && options_.Has("document");
     std::string expected = "before";
-    const int result =
-        login ? model_.PostWithLogin(kEnvelope, &expected) : model_.Post(kEnvelope, &expected);
-    document ? CheckDocument(result, expected) : CheckReply(login, result, expected);
+    const int result = login ? model_.PostWithCredentials(kEnvelope, &expected)
+                             : model_.Post(kEnvelope, &expected);
+    document ? CheckDocument(result, expected) : CheckResponse(login, result, expected);
   }
 
   void CheckClient() {
@@ -72,15 +72,15 @@ class Exchange {
   }
 
  private:
-  void CheckReply(bool login, int result, const std::string& expected) {
-    std::string reply = "before";
-    const int got = login ? client_.SendAuthReqBySocketPost(kEnvelope, reply)
-                          : client_.SendReqBySocketPost(kEnvelope, reply);
+  void CheckResponse(bool login, int result, const std::string& expected) {
+    std::string response = "before";
+    const int got = login ? client_.SendAuthReqBySocketPost(kEnvelope, response)
+                          : client_.SendReqBySocketPost(kEnvelope, response);
     ExpectSame("the result", got, result);
-    ExpectSame("the reply", reply, expected);
+    ExpectSame("the response", response, expected);
   }
 
-  void CheckDocument(int result, const std::string& reply) {
+  void CheckDocument(int result, const std::string& response) {
     xmlDoc before = {};
     xmlDoc* doc = &before;
     ExpectSame("the result", client_.SendReqByXMLSocketPost(kEnvelope, doc), result);
@@ -89,7 +89,7 @@ class Exchange {
       return;
     }
     const std::string reports = TakeXmlReports();
-    ExpectSame("the document", XmlText(doc), XmlTextOf(oracle::WithoutLineEnds(reply)));
+    ExpectSame("the document", XmlText(doc), XmlTextOf(oracle::WithoutLineEnds(response)));
     ExpectSame("what is reported", reports, TakeXmlReports());
     xmlFreeDoc(doc);
   }

@@ -1,5 +1,5 @@
-// The answers to XML requests. Line 1: the sizes of the pieces that libcurl delivers. The rest is
-// the answers; <<get>> parses what has come, <<lost>> is an allocation that failed.
+// The responses to XML requests. Line 1: the sizes of the pieces that libcurl delivers. The rest is
+// the responses; <<get>> parses what has come, <<lost>> is an allocation that failed.
 #include <algorithm>
 #include <cstdint>
 #include <cstdlib>
@@ -29,14 +29,14 @@ class Client : public TWHttpClient {
   // As the requests do: the two fields are the buffer.
   void Receive(std::string piece) {
     CurlBufferWrite(piece.data(), 1, piece.size(), &m_pRespBuf);
-    answers_.Add(piece);
+    responses_.Add(piece);
     CheckFields();
   }
 
   void Lose() {
     std::free(m_pRespBuf);
     m_pRespBuf = nullptr;
-    answers_.Lose();
+    responses_.Lose();
     CheckFields();
   }
 
@@ -44,10 +44,10 @@ class Client : public TWHttpClient {
     xmlDoc before = {};
     xmlDoc* doc = &before;
     const bool parsed = GetResponseXML(doc);
-    const std::optional<std::string> text = answers_.Take();
+    const std::optional<std::string> text = responses_.Take();
     CheckFields();
     if (!text) {
-      Expect("without an answer nothing is parsed", !parsed && doc == &before);
+      Expect("without a response nothing is parsed", !parsed && doc == &before);
       return;
     }
     const std::string reports = TakeXmlReports();
@@ -59,11 +59,11 @@ class Client : public TWHttpClient {
 
  private:
   void CheckFields() const {
-    ExpectSame("having an answer", m_pRespBuf != nullptr, answers_.There());
-    ExpectSame("the answer's size", m_respLen, static_cast<int64_t>(answers_.Size()));
+    ExpectSame("having a response", m_pRespBuf != nullptr, responses_.There());
+    ExpectSame("the response's size", m_respLen, static_cast<int64_t>(responses_.Size()));
   }
 
-  oracle::Answers answers_;
+  oracle::Responses responses_;
 };
 
 std::string_view TakeMark(std::string_view* text) {

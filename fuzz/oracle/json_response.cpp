@@ -98,7 +98,8 @@ size_t SkipString(const std::string& text, size_t at) {
 }  // namespace
 
 JsonVerdict JudgeJson(const std::string& text) {
-  // The parser takes a zero byte for the end, and skips a byte order mark, which JSON has not.
+  // The parser takes a zero byte for the end of the text, and it skips a byte order mark; neither is
+  // JSON.
   if (text.find('\0') != std::string::npos || text.rfind("\xef\xbb\xbf", 0) == 0) return {};
   Judge judge;
   judge.verdict.strict = Json::sax_parse(text, &judge);

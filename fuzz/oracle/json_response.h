@@ -1,4 +1,4 @@
-// What decides about a response, by a parser that is not the library's: nlohmann's, which takes
+// What decides about a response, by a parser that is not the library's: nlohmann's, which accepts
 // nothing but RFC 8259.
 #ifndef TARNWICK_FUZZ_ORACLE_JSON_RESPONSE_H_
 #define TARNWICK_FUZZ_ORACLE_JSON_RESPONSE_H_

@@ -39,13 +39,14 @@ std::string WithoutLineEnds(const std::string& text) {
   return out;
 }
 
-SoapClient::SoapClient(ModelSocket* socket, std::string host, ModelCredentials login, long time)
-    : socket_(socket), host_(std::move(host)), login_(std::move(login)), time_(time) {
+SoapClient::SoapClient(ModelSocket* socket, std::string host, ModelCredentials credentials,
+                       long time)
+    : socket_(socket), host_(std::move(host)), credentials_(std::move(credentials)), time_(time) {
   head_.state = 0;
 }
 
 std::string SoapClient::RequestFor(const std::string& envelope) {
-  std::string request = "POST /" + login_.path + " HTTP/1.1\r\n";
+  std::string request = "POST /" + credentials_.path + " HTTP/1.1\r\n";
   request += "Host: " + host_ + "\r\n";
   request += "Content-Type: application/soap+xml; charset=utf-8\r\n";
   if (!authorization_.empty()) request += std::exchange(authorization_, "") + "\r\n";
@@ -53,7 +54,7 @@ std::string SoapClient::RequestFor(const std::string& envelope) {
   return request + "\r\n" + envelope;
 }
 
-int SoapClient::Post(const std::string& envelope, std::string* reply) {
+int SoapClient::Post(const std::string& envelope, std::string* response) {
   if (envelope.empty()) return kIoError;
   if (socket_->Connect() != 0) return kIoError;
   if (socket_->Write(RequestFor(envelope)) <= 0) return kIoError;
@@ -65,19 +66,19 @@ int SoapClient::Post(const std::string& envelope, std::string* reply) {
   if (length <= 0) return kIoError;
   std::string body;
   if (socket_->Read(std::min(length, kMostRead), &body) <= 0) return kIoError;
-  *reply = body.substr(0, body.find('\0'));
+  *response = body.substr(0, body.find('\0'));
   return kOk;
 }
 
-int SoapClient::PostWithLogin(const std::string& envelope, std::string* reply) {
-  int outcome = Post(envelope, reply);
+int SoapClient::PostWithCredentials(const std::string& envelope, std::string* response) {
+  int outcome = Post(envelope, response);
   const std::string challenge = head_.challenge;
   if (result_ == kUnauthorized && ModelContains(challenge, "digest")) {
-    authorization_ = ModelDigestLine(login_, challenge, "POST", "", time_);
-    outcome = Post(envelope, reply);
+    authorization_ = ModelDigestLine(credentials_, challenge, "POST", "", time_);
+    outcome = Post(envelope, response);
   } else if (result_ == kUnauthorized && ModelContains(challenge, "basic")) {
-    authorization_ = ModelBasicLine(login_);
-    outcome = Post(envelope, reply);
+    authorization_ = ModelBasicLine(credentials_);
+    outcome = Post(envelope, response);
   }
   return outcome == kOk ? result_ : outcome;
 }

@@ -13,11 +13,11 @@ namespace oracle {
 class SoapClient {
  public:
   // `time` is what time(2) shows the library. REQUIRES: `socket` outlives the object.
-  SoapClient(ModelSocket* socket, std::string host, ModelCredentials login, long time);
+  SoapClient(ModelSocket* socket, std::string host, ModelCredentials credentials, long time);
 
-  // Results: the client's result codes; `reply` changes only when there is one.
-  int Post(const std::string& envelope, std::string* reply);
-  int PostWithLogin(const std::string& envelope, std::string* reply);
+  // Results: the client's result codes; `response` changes only when there is one.
+  int Post(const std::string& envelope, std::string* response);
+  int PostWithCredentials(const std::string& envelope, std::string* response);
 
   const ModelHead& Head() const { return head_; }
   int Result() const { return result_; }
@@ -27,17 +27,17 @@ class SoapClient {
 
   ModelSocket* socket_;
   std::string host_;
-  ModelCredentials login_;
+  ModelCredentials credentials_;
   long time_;
   ModelHead head_;
   int result_ = 1;
   std::string authorization_;
 };
 
-// The length that a header announces: its leading decimal number; 0 when no reply can be that long.
+// The length that a header field announces: its leading decimal number; 0 when no response can be that long.
 int AnnouncedLength(const std::string& value);
 
-// What of a reply is parsed as XML.
+// What of a response is parsed as XML.
 std::string WithoutLineEnds(const std::string& text);
 
 }  // namespace oracle

@@ -1,4 +1,4 @@
-// The answers that pile up in a client until they are parsed as one document.
+// The responses that pile up in a client until they are parsed as one document.
 #ifndef TARNWICK_FUZZ_ORACLE_XML_RESPONSE_H_
 #define TARNWICK_FUZZ_ORACLE_XML_RESPONSE_H_
 
@@ -8,14 +8,14 @@
 
 namespace oracle {
 
-class Answers {
+class Responses {
  public:
   void Add(const std::string& bytes);
 
   // Memory ran out: what came before shows zero bytes.
   void Lose();
 
-  // The text to parse, if there is any; none is left behind.
+  // The text to parse, if there is any; none is left.
   std::optional<std::string> Take();
 
   size_t Size() const { return text_.size(); }

@@ -47,9 +47,9 @@ char Lower(char c) {
 
 }  // namespace
 
-std::string ModelBasicLine(const ModelCredentials& login) {
+std::string ModelBasicLine(const ModelCredentials& credentials) {
   static const char kDigits[] = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789+/";
-  const std::string both = login.user + ":" + login.password;
+  const std::string both = credentials.user + ":" + credentials.password;
   const std::string text = both.c_str();  // a zero byte ends it
   std::string bits;
   for (const char c : text) {
@@ -64,21 +64,22 @@ std::string ModelBasicLine(const ModelCredentials& login) {
   return "Authorization: Basic " + encoded;
 }
 
-std::string ModelDigestLine(const ModelCredentials& login, const std::string& challenge,
+std::string ModelDigestLine(const ModelCredentials& credentials, const std::string& challenge,
                             const std::string& method, const std::string&, long time) {
   const std::string realm = ParameterOf(challenge, "realm");
   const std::string nonce = ParameterOf(challenge, "nonce");
   const std::string qop = ParameterOf(challenge, "qop");
   const std::string algorithm = ParameterOf(challenge, "algorithm");
   const std::string opaque = ParameterOf(challenge, "opaque");
-  const std::string uri = "/" + login.path;
+  const std::string uri = "/" + credentials.path;
   const std::string cnonce = ClientNonce(time);
 
-  std::string chain = Md5Of(login.user + ":" + realm + ":" + login.password) + ":" + nonce;
+  std::string chain =
+      Md5Of(credentials.user + ":" + realm + ":" + credentials.password) + ":" + nonce;
   if (qop == "auth" || qop == "auth-int") chain += ":00000001:" + cnonce + ":" + qop;
   const std::string response = Md5Of(chain + ":" + DigestOfRequest(method, uri, qop));
 
-  std::string line = "Authorization: Digest username=\"" + login.user;
+  std::string line = "Authorization: Digest username=\"" + credentials.user;
   line += "\", realm=\"" + realm + "\", nonce=\"" + nonce + "\", uri=\"" + uri;
   line += "\", response=\"" + response + kQuote;
   if (!qop.empty()) line += ", qop=" + qop + ", nc=00000001, cnonce=\"" + cnonce + kQuote;
