@@ -34,7 +34,7 @@
 #include "tarnwick/platform/export.h"
 
 namespace tarnwick {
-class CurlRequest;
+struct RequestParts;
 }
 typedef struct _xmlDoc xmlDoc;  // libxml2's document
 
@@ -359,34 +359,10 @@ class TARNWICK_API TWHttpClient {
 
  private:
   TARNWICK_LOCAL bool Reconnect();
+  TARNWICK_LOCAL tarnwick::RequestParts Parts(const std::string& path) const;
+  TARNWICK_LOCAL bool Authorize(const char* method);
   TARNWICK_LOCAL bool StoreHeader(const char* line);
-  TARNWICK_LOCAL std::string BuildGetRequest();
-  TARNWICK_LOCAL std::string BuildFormPost(const std::string& content) const;
-  TARNWICK_LOCAL std::string BuildSoapPost(const std::string& body);
-  TARNWICK_LOCAL int WriteSoapPost(const std::string& request);
-  TARNWICK_LOCAL int ReadSoapResponse(int length, std::string* response);
-  TARNWICK_LOCAL std::string BuildUploadHead() const;
   TARNWICK_LOCAL int ReadBodyFor(const char* operation, std::string* body);
-  TARNWICK_LOCAL bool ReadChunks(std::string* body);
-  TARNWICK_LOCAL bool ReadChunk(uint32_t size, std::string* body);
-  TARNWICK_LOCAL int AppendRead(int len, std::string* body);
-  TARNWICK_LOCAL void SkipChunkCrlf();
-  TARNWICK_LOCAL bool ReadUntilClose(std::string* body);
-
-  TARNWICK_LOCAL bool SetCurlOutput(tarnwick::CurlRequest* curl);
-  TARNWICK_LOCAL bool SetCurlRequest(tarnwick::CurlRequest* curl, TW_HTTP_METHOD method,
-                                     int timeout);
-  TARNWICK_LOCAL bool SetCurlHeaders(tarnwick::CurlRequest* curl, TW_HTTP_METHOD method);
-  TARNWICK_LOCAL std::string PlainHostUrl() const;
-  TARNWICK_LOCAL bool SetCurlCredentials(tarnwick::CurlRequest* curl);
-  TARNWICK_LOCAL bool SetCurlVersion(tarnwick::CurlRequest* curl);
-  TARNWICK_LOCAL int PerformByCurl(tarnwick::CurlRequest* curl);
-  TARNWICK_LOCAL bool SetXmlUrl(tarnwick::CurlRequest* curl);
-  TARNWICK_LOCAL bool SetXmlHeaders(tarnwick::CurlRequest* curl, bool forUpload);
-  TARNWICK_LOCAL bool SetXmlWriter(tarnwick::CurlRequest* curl);
-  TARNWICK_LOCAL bool SetXmlOutput(tarnwick::CurlRequest* curl, const char* message);
-  TARNWICK_LOCAL bool SetCurlPut(tarnwick::CurlRequest* curl);
-  TARNWICK_LOCAL int PutXmlFile(tarnwick::CurlRequest* curl, xmlDoc* doc, FILE* file);
 };
 
 // Fetches `path` from a JSON service over HTTP and parses the response into `result`. The request
