@@ -2,6 +2,7 @@
 // and simple, so that it costs all contenders the same.
 #include "bench/server.h"
 
+#include <netinet/in.h>
 #include <sys/prctl.h>
 #include <sys/socket.h>
 #include <unistd.h>
@@ -15,7 +16,6 @@
 
 #include "bench/contender.h"
 #include "bench/exchange.h"
-#include "bench/listen.h"
 #include "bench/server_stream.h"
 #include "bench/texts.h"
 
@@ -182,6 +182,21 @@ const std::string Server::m_refusal = Response("400 Bad Request", "Content-Lengt
     ServerStream stream(connection, identity);
     server.Serve(&stream);
   }
+}
+
+// A socket that listens on 127.0.0.1 and that started programs do not get.
+int ListenOnLoopback(int* port) {
+  const int listener = socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0);
+  struct sockaddr_in address = {};
+  socklen_t size = sizeof(address);
+  address.sin_family = AF_INET;
+  address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
+  auto* const general = reinterpret_cast<struct sockaddr*>(&address);
+  Expect(bind(listener, general, size) == 0 && listen(listener, 64) == 0, "server",
+         "cannot listen");
+  Expect(getsockname(listener, general, &size) == 0, "server", "has no port");
+  *port = ntohs(address.sin_port);
+  return listener;
 }
 
 // Results: its port.

@@ -22,7 +22,7 @@ WORKS = {
     "digest_get": "GET with Digest credentials after a challenge",
     "form_post": "POST of a form",
     "soap_post_4k": "POST of a SOAP envelope of 4 KiB, with another as the response",
-    "soap_xml": "the same with 512 bytes, and the response parsed as XML",
+    "soap_xml": "POST of a SOAP envelope of 512 bytes, the response parsed as XML",
     "head_30": "a response's head of 30 lines",
     "lines": "lines of 58 bytes",
     "chunked_64": "a body of 1 MiB in chunks of 64 bytes",
