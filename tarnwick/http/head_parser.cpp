@@ -22,14 +22,19 @@ std::string_view NextToken(std::string_view* rest, const char* delimiters) {
   return token;
 }
 
-// The last letter is compared first: that rejects most other names without a call of strncasecmp.
+bool EqualLetters(char a, char b) {
+  return (a | 0x20) == (b | 0x20);
+}
+
+// The first and the last letter come first: they reject most other names without a call of
+// strncasecmp. REQUIRES: `text` is not empty.
 bool BeginsWith(std::string_view text, std::string_view name) {
-  const size_t last = name.size() - 1;
-  return text.size() > last && (text[last] | 0x20) == (name[last] | 0x20) &&
+  return EqualLetters(text[0], name[0]) && text.size() >= name.size() &&
+         EqualLetters(text[name.size() - 1], name.back()) &&
          strncasecmp(text.data(), name.data(), name.size()) == 0;
 }
 
-// REQUIRES: `text` starts at the field's name.
+// REQUIRES: `text` starts at the field's name, and is not empty.
 const KeptField* FindKeptField(std::string_view text) {
   for (const KeptField& field : kKeptFields) {
     if (BeginsWith(text, field.name)) return &field;
