@@ -127,7 +127,7 @@ TEST_P(Certificates, DoNotMatterToTheClientsOwnSocket) {
     outcome.text = ReadBody(client);
   });
   const Outcome refused = {HTTP_RET_IO_ERROR, HTTP_RET_NOT_READY, 0, ""};
-  const Outcome served = {HTTP_RET_OK, HTTP_RET_OK, 200, "{\"success\":true}"};
+  const Outcome served = Success("{\"success\":true}");
   EXPECT_EQ(outcome, accepted ? served : refused);
 }
 

@@ -11,6 +11,8 @@
 #include <utility>
 #include <vector>
 
+#include "tarnwick/http/twhttp.h"
+
 // A reply as far as it comes, and whether a reset ends it or a close.
 struct Cut {
   std::string bytes;
@@ -72,12 +74,12 @@ class CutReader {
 // The words of a status line that counts.
 inline int ModelStatusLine(const std::string& line, int* status) {
   const size_t blank = line.find(' ');
-  if (line.empty()) return 3;
-  if (line.compare(0, 8, "HTTP/1.1") != 0) return 5;
-  if (blank == std::string::npos || blank + 1 == line.size()) return 3;
+  if (line.empty()) return HTTP_RET_IO_ERROR;
+  if (line.compare(0, 8, "HTTP/1.1") != 0) return HTTP_RET_BAD_RESPONSE;
+  if (blank == std::string::npos || blank + 1 == line.size()) return HTTP_RET_IO_ERROR;
   *status = atoi(line.c_str() + blank + 1);
-  if (*status >= 200 && *status <= 299) return 0;
-  return *status == 401 ? 4 : 5;
+  if (*status >= 200 && *status <= 299) return HTTP_RET_OK;
+  return *status == 401 ? HTTP_RET_UNAUTHORIZED : HTTP_RET_BAD_RESPONSE;
 }
 
 // A header line "Name: value"; false when a known name has nothing behind it.
@@ -100,19 +102,19 @@ inline bool ModelHeaderLine(const std::string& line, ModelHead* head) {
 inline ModelHead ReadModelHead(CutReader& reader, std::vector<std::string>* log) {
   ModelHead head;
   std::string line;
-  head.response = 3;
+  head.response = HTTP_RET_IO_ERROR;
   if (!reader.ReadLine(&line)) return head;
   head.response = ModelStatusLine(line, &head.status);
   if (head.status == 0) return head;
   for (;;) {
     if (!reader.ReadLine(&line)) {
       log->push_back("CheckContentType: Connect failed!\n\n");
-      head.response = 3;
+      head.response = HTTP_RET_IO_ERROR;
       return head;
     }
     if (line.empty()) break;
     if (!ModelHeaderLine(line, &head)) {
-      head.response = 1;
+      head.response = HTTP_RET_NOT_READY;
       return head;
     }
   }

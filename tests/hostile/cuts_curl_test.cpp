@@ -39,7 +39,7 @@ Outcome LoginByCurl(ClientProbe& client) {
 Outcome HttpsJson(ClientProbe& client) {
   Json::Value value = "untouched";
   const int result = SendHttpsGet("127.0.0.1", client.m_port, "a.cgi", value, 5);
-  return {result, 0, 0, result == 0 && value.isObject() ? value["id"].asString() : "none"};
+  return OneCall(result, result == 0 && value.isObject() ? value["id"].asString() : "none");
 }
 
 // The outcome of an XML request, with what was collected for a document.
@@ -110,7 +110,7 @@ using Rule = std::function<Expected(const std::vector<Cut>&, bool)>;
 Rule CurlRule(const std::string& function, const std::string& whole, bool to_file = false) {
   return [=](const std::vector<Cut>& replies, bool) {
     const CurlProgress progress = FollowCurl(whole, replies[0]);
-    const int result = progress.succeeds ? 0 : 3;
+    const int result = progress.succeeds ? HTTP_RET_OK : HTTP_RET_IO_ERROR;
     Expected expected = {{result, result, 0, progress.body}, {}};
     if (to_file) {
       std::string lines = progress.lines;
@@ -126,17 +126,17 @@ Rule CurlRule(const std::string& function, const std::string& whole, bool to_fil
 // An empty text counts as a success.
 Expected HttpsJsonRule(const std::vector<Cut>& replies, bool /*buffered*/) {
   const CurlProgress progress = FollowCurl(Ok("", kJson), replies[0]);
-  if (!progress.succeeds) return {{-1, 0, 0, "none"}, {FailedIn("SendRequestByCurl")}};
-  if (progress.body.empty()) return {{0, 0, 0, "none"}, {}};
-  if (progress.body == kJson) return {{0, 0, 0, "7"}, {}};
-  return {{-3, 0, 0, "none"},
+  if (!progress.succeeds) return {OneCall(-1, "none"), {FailedIn("SendRequestByCurl")}};
+  if (progress.body.empty()) return {OneCall(0, "none"), {}};
+  if (progress.body == kJson) return {OneCall(0, "7"), {}};
+  return {OneCall(-3, "none"),
           {"SendHttpsGet: Failed to parse json. Result is [" + progress.body + "]\n"}};
 }
 
 // What libcurl makes of half a refusal is its own matter: the first reply comes whole.
 Expected CurlLoginRule(const std::vector<Cut>& replies, bool /*buffered*/) {
   const CurlProgress progress = FollowCurl(kOfALength, replies[1]);
-  const int result = progress.succeeds ? 0 : 3;
+  const int result = progress.succeeds ? HTTP_RET_OK : HTTP_RET_IO_ERROR;
   Expected expected = {{result, result, 0, ""}, {}, 2};
   if (!progress.succeeds) expected.log = {FailedIn("SendRequestByPost")};
   return expected;

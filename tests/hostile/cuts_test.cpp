@@ -67,7 +67,7 @@ Outcome JsonGet(ClientProbe& client) {
   Json::Value value = "untouched";
   const int result = SendHttpGet("127.0.0.1", client.m_port, "a.cgi", value, 5, true);
   // A part of a document may leave a part of its values.
-  return {result, 0, 0, result == 0 ? value["id"].asString() : "none"};
+  return OneCall(result, result == 0 ? value["id"].asString() : "none");
 }
 
 Outcome OneCallPost(ClientProbe& client) {
@@ -88,7 +88,7 @@ Expected HeadAndBody(const Cut& reply, bool buffered, std::vector<std::string> l
   std::string body;
   const bool read = ReadModelBody(reader, head, &body);
   for (const std::string& line : ReadBodyLog(read)) log.push_back(line);
-  return {{read ? 0 : 3, head.response, head.status, body}, log};
+  return {{read ? HTTP_RET_OK : HTTP_RET_IO_ERROR, head.response, head.status, body}, log};
 }
 
 Expected GetRule(const std::vector<Cut>& replies, bool buffered) {
@@ -97,8 +97,9 @@ Expected GetRule(const std::vector<Cut>& replies, bool buffered) {
 
 // A challenge that names a scheme is answered, and its reply counts.
 bool AsksForLogin(const ModelHead& head) {
-  return head.response == 4 && (head.challenge.find("Digest") != std::string::npos ||
-                                head.challenge.find("Basic") != std::string::npos);
+  return head.response == HTTP_RET_UNAUTHORIZED &&
+         (head.challenge.find("Digest") != std::string::npos ||
+          head.challenge.find("Basic") != std::string::npos);
 }
 
 Expected LoginRule(const std::vector<Cut>& replies, bool buffered) {
@@ -117,39 +118,39 @@ int ReadSoap(const Cut& reply, bool buffered, ModelHead* head, Expected* expecte
   expected->outcome.response = head->response;
   expected->outcome.status = head->status;
   const size_t length = head->complete ? strtoul(head->length.c_str(), nullptr, 10) : 0;
-  if (length == 0) return 3;
+  if (length == 0) return HTTP_RET_IO_ERROR;
   std::string text;
   if (reader.Read(length, &text) > 0) {
     expected->outcome.text = text;
-    return 0;
+    return HTTP_RET_OK;
   }
   expected->log.push_back("SendReqBySocketPost: Read data faild.\n");
-  return 3;
+  return HTTP_RET_IO_ERROR;
 }
 
 Expected SoapRule(const std::vector<Cut>& replies, bool buffered) {
-  Expected expected = {{0, 0, 0, "untouched"}, {}};
+  Expected expected = {{HTTP_RET_OK, HTTP_RET_OK, 0, "untouched"}, {}};
   ModelHead head;
   expected.outcome.result = ReadSoap(replies[0], buffered, &head, &expected);
   return expected;
 }
 
 Expected SoapLoginRule(const std::vector<Cut>& replies, bool buffered) {
-  Expected expected = {{0, 0, 0, "untouched"}, {}};
+  Expected expected = {{HTTP_RET_OK, HTTP_RET_OK, 0, "untouched"}, {}};
   ModelHead head;
   int result = ReadSoap(replies[0], buffered, &head, &expected);
   if (AsksForLogin(head)) {
     result = ReadSoap(replies[1], buffered, &head, &expected);
     expected.connections = 2;
   }
-  expected.outcome.result = result != 0 ? result : head.response;
+  expected.outcome.result = result != HTTP_RET_OK ? result : head.response;
   return expected;
 }
 
 // Half a document is none.
 Expected XmlSoapRule(const std::vector<Cut>& replies, bool buffered) {
   Expected expected = SoapRule(replies, buffered);
-  if (expected.outcome.result != 0) return expected;
+  if (expected.outcome.result != HTTP_RET_OK) return expected;
   expected.outcome.text = expected.outcome.text == kXml ? "a document" : "none";
   return expected;
 }
@@ -160,21 +161,21 @@ Expected UploadRule(const std::vector<Cut>& replies, bool buffered) {
   CutReader reader(replies[0], buffered);
   const ModelHead head = ReadModelHead(reader, &expected.log);
   std::string body;
-  const bool success = head.response == 0;
+  const bool success = head.response == HTTP_RET_OK;
   const bool read = success && ReadModelBody(reader, head, &body);
   if (!read) {
     expected.log.push_back(success ? "GetResp: Read data error\n" : "GetResp: Http Resp error\n");
   }
-  expected.outcome = {0, head.response, head.status, read ? body : error};
+  expected.outcome = Sent(head.response, head.status, read ? body : error);
   return expected;
 }
 
 Expected JsonRule(const std::vector<Cut>& replies, bool /*buffered*/) {
-  Expected expected = {{-1, 0, 0, "none"}, {}};
+  Expected expected = {OneCall(-1, "none"), {}};
   CutReader reader(replies[0], true);
   const ModelHead head = ReadModelHead(reader, &expected.log);
   std::string body;
-  if (head.response != 0) {
+  if (head.response != HTTP_RET_OK) {
     expected.log.push_back("SendHttpGet: Failed to check response[N]: N\n");
   } else if (!ReadModelBody(reader, head, &body)) {
     expected.log.push_back("SendHttpGet: Failed to read data: N\n");
@@ -184,14 +185,14 @@ Expected JsonRule(const std::vector<Cut>& replies, bool /*buffered*/) {
     expected.log.push_back("SendHttpGet: Failed to parse json [" + body + "].\n");
     expected.outcome.result = -2;
   } else {
-    expected.outcome = {0, 0, 0, "7"};
+    expected.outcome = OneCall(0, "7");
   }
   return expected;
 }
 
 // The answer's outcome does not count.
 Expected OneCallPostRule(const std::vector<Cut>& replies, bool /*buffered*/) {
-  Expected expected = {{0, 0, 0, ""}, {}};
+  Expected expected = {OneCall(0, ""), {}};
   CutReader reader(replies[0], true);
   ReadModelHead(reader, &expected.log);
   return expected;

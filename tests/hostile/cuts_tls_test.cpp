@@ -180,14 +180,14 @@ void PlayRuns(const TlsCutCase& test, std::vector<TlsRun>* runs) {
 void ExpectOutcome(const TlsRun& run) {
   const bool connects = run.limit >= run.marks.handshake;
   const bool replies = run.limit >= run.marks.reply;
-  Outcome outcome = {3, 1, 0, "not sent"};
+  Outcome outcome = {HTTP_RET_IO_ERROR, HTTP_RET_NOT_READY, 0, "not sent"};
   std::vector<std::string> log = {"SendRequestByGet: Connection failed!\n"};
   if (connects) {
-    outcome = {3, 3, 0, ""};
+    outcome = NoResponse();
     log = {"ReadBody: Read data error\n"};
   }
   if (replies) {
-    outcome = {0, 0, 200, "body"};
+    outcome = Success("body");
     log.clear();
   }
   EXPECT_EQ(run.outcome, outcome) << "cut at " << run.limit;
@@ -198,7 +198,7 @@ void ExpectOutcome(const TlsRun& run) {
 size_t BytesOf(const TlsCutCase& test) {
   std::vector<TlsRun> runs(1);
   PlayRuns(test, &runs);
-  EXPECT_EQ(runs[0].outcome, (Outcome{0, 0, 200, "body"}));
+  EXPECT_EQ(runs[0].outcome, Success("body"));
   return runs[0].marks.all;
 }
 

@@ -33,13 +33,40 @@ inline std::string Repeated(int count, const std::string& text) {
   return all;
 }
 
-// What an operation gave.
+// What an operation returned and left.
 struct Outcome {
-  int result = 0;    // what it returned
-  int response = 0;  // what CheckResponse returns afterwards
-  int status = 0;    // and the status that it tells
-  std::string text;  // the body, or what else the operation gives
+  int result = HTTP_RET_OK;    // what it returned
+  int response = HTTP_RET_OK;  // what CheckResponse returns afterwards
+  int status = 0;              // and the status that it stores
+  std::string text;            // the body, or what else the operation returns
 };
+
+// The outcomes that most rows expect.
+
+// A response of status 200 was read to its end.
+inline Outcome Success(const std::string& text) {
+  return {HTTP_RET_OK, HTTP_RET_OK, 200, text};
+}
+
+// The operation succeeded, whatever the response was.
+inline Outcome Sent(int response, int status, const std::string& text) {
+  return {HTTP_RET_OK, response, status, text};
+}
+
+// No status line was read, or libcurl's transfer failed.
+inline Outcome NoResponse(const std::string& text = "") {
+  return {HTTP_RET_IO_ERROR, HTTP_RET_IO_ERROR, 0, text};
+}
+
+// The head was read, its status is 200, and the body failed after `text`.
+inline Outcome BodyFailed(const std::string& text) {
+  return {HTTP_RET_IO_ERROR, HTTP_RET_OK, 200, text};
+}
+
+// A one-call function leaves no client whose response could be asked for.
+inline Outcome OneCall(int result, const std::string& text) {
+  return {result, 0, 0, text};
+}
 
 inline bool operator==(const Outcome& a, const Outcome& b) {
   return a.result == b.result && a.response == b.response && a.status == b.status &&

@@ -53,7 +53,7 @@ std::string Beside(const std::string& value) {
   return "{\"success\":true,\"x\":" + value + "}";
 }
 
-std::string Success(const std::string& value) {
+std::string SuccessIs(const std::string& value) {
   return "{\"success\":" + value + "}";
 }
 
@@ -73,21 +73,21 @@ std::vector<JsonCase> DepthTable() {
       {"100000InAString", Beside("\"" + Repeated(100000, "[") + "\""), kTrue},
       {"100000BehindAnEscapedQuote", Beside("\"\\\"" + Repeated(100000, "[") + "\""), kTrue},
       {"100000BehindTwoBackslashes", "[\"\\\\\"," + Repeated(100000, "["), kNoJson},
-      {"100000InAComment", "/*" + Repeated(100000, "[") + "*/" + Success("true"), kTrue},
-      {"100000InALineComment", "//" + Repeated(100000, "[") + "\n" + Success("true"), kTrue},
+      {"100000InAComment", "/*" + Repeated(100000, "[") + "*/" + SuccessIs("true"), kTrue},
+      {"100000InALineComment", "//" + Repeated(100000, "[") + "\n" + SuccessIs("true"), kTrue},
       {"100000BehindALineComment", "//\r" + Repeated(100000, "["), kNoJson},
       {"100000BehindASlash", "/" + Repeated(100000, "["), kNoJson},
       {"100000BehindAnOpenString", "\"" + Repeated(100000, "["), kNoJson},
       {"100000BehindAZeroByte", std::string(1, '\0') + Repeated(100000, "["), kNoJson},
-      {"100000BehindTheRoot", Success("true") + Repeated(100000, "["), kNoJson},
+      {"100000BehindTheRoot", SuccessIs("true") + Repeated(100000, "["), kNoJson},
       {"100000Commas", "[" + Repeated(100000, ",") + "]", kNoJson},
       {"100000Colons", "{" + Repeated(100000, ":") + "}", kNoJson},
-      {"100000Comments", Repeated(100000, "/**/") + Success("true"), kTrue},
+      {"100000Comments", Repeated(100000, "/**/") + SuccessIs("true"), kTrue},
   };
 }
 
 std::vector<JsonCase> ShapeTable() {
-  const std::string sound = Success("true");
+  const std::string sound = SuccessIs("true");
   const std::string zero(1, '\0');
   return {
       {"Sound", sound, kTrue},
@@ -192,25 +192,25 @@ std::vector<JsonCase> NumberTable() {
 
 std::vector<JsonCase> SuccessTable() {
   return {
-      {"True", Success("true"), kTrue},
-      {"False", Success("false"), kNotTrue},
-      {"InCapitals", Success("TRUE"), kNoJson},
+      {"True", SuccessIs("true"), kTrue},
+      {"False", SuccessIs("false"), kNotTrue},
+      {"InCapitals", SuccessIs("TRUE"), kNoJson},
       {"OfAnotherCase", "{\"Success\":true}", kNotTrue},
-      {"Null", Success("null"), kNotTrue},
-      {"AString", Success("\"true\""), kNotTrue},
-      {"AnEmptyString", Success("\"\""), kNotTrue},
-      {"AnArray", Success("[true]"), kNotTrue},
-      {"AnEmptyArray", Success("[]"), kNotTrue},
-      {"AnObject", Success("{\"success\":true}"), kNotTrue},
-      {"Zero", Success("0"), kNotTrue},
-      {"MinusZero", Success("-0"), kNotTrue},
-      {"MinusZeroPointZero", Success("-0.0"), kNotTrue},
-      {"One", Success("1"), kTrue},
-      {"MinusOne", Success("-1"), kTrue},
-      {"ASmallFraction", Success("1e-300"), kTrue},
-      {"TooSmallAFraction", Success("1e-999"), kNotTrue},
-      {"BeyondAllNumbers", Success("1e999"), kNoJson},
-      {"TheLargestNumber", Success("18446744073709551615"), kTrue},
+      {"Null", SuccessIs("null"), kNotTrue},
+      {"AString", SuccessIs("\"true\""), kNotTrue},
+      {"AnEmptyString", SuccessIs("\"\""), kNotTrue},
+      {"AnArray", SuccessIs("[true]"), kNotTrue},
+      {"AnEmptyArray", SuccessIs("[]"), kNotTrue},
+      {"AnObject", SuccessIs("{\"success\":true}"), kNotTrue},
+      {"Zero", SuccessIs("0"), kNotTrue},
+      {"MinusZero", SuccessIs("-0"), kNotTrue},
+      {"MinusZeroPointZero", SuccessIs("-0.0"), kNotTrue},
+      {"One", SuccessIs("1"), kTrue},
+      {"MinusOne", SuccessIs("-1"), kTrue},
+      {"ASmallFraction", SuccessIs("1e-300"), kTrue},
+      {"TooSmallAFraction", SuccessIs("1e-999"), kNotTrue},
+      {"BeyondAllNumbers", SuccessIs("1e999"), kNoJson},
+      {"TheLargestNumber", SuccessIs("18446744073709551615"), kTrue},
       {"Twice", "{\"success\":false,\"success\":true}", kTrue},
       {"TwiceTheOtherWay", "{\"success\":true,\"success\":false}", kNotTrue},
       {"AHundredThousandTimes", "{" + Repeated(100000, "\"success\":true,") + "\"success\":false}",

@@ -403,8 +403,8 @@ std::ostream& operator<<(std::ostream& out, const TrafficCase& test) {
 
 const std::string kHead = "HTTP/1.0 200 OK\r\nX: y\r\n\r\n";
 const std::string kReply = kHead + "body";
-const Outcome kWhole = {HTTP_RET_OK, HTTP_RET_OK, 200, "body"};
-const Outcome kNoBody = {HTTP_RET_OK, HTTP_RET_OK, 200, ""};
+const Outcome kWhole = Success("body");
+const Outcome kNoBody = Success("");
 const Outcome kUnread = {HTTP_RET_OK, HTTP_RET_IO_ERROR, 0, "|"};
 const Outcome kBodyUnread = {HTTP_RET_OK, HTTP_RET_OK, 200, "|"};
 
@@ -508,12 +508,13 @@ const std::vector<TrafficCase> kRecords = {
         },
         kBodyUnread, kFailed),
     ServesRecords("TwelveThousandEmptyRecordsAmongTheBytes", ReplyAmongEmptyRecords,
-                  {HTTP_RET_OK, HTTP_RET_OK, 200, std::string(400, 'b')}),
-    ServesRecords("ARecordOf16384Bytes",
-                  [](ServerTls& tls) {
-                    return InOrder({Data(tls, kHead), Data(tls, std::string(16384, 'b'))});
-                  },
-                  {HTTP_RET_OK, HTTP_RET_OK, 200, std::string(16384, 'b')}),
+                  Success(std::string(400, 'b'))),
+    ServesRecords(
+        "ARecordOf16384Bytes",
+        [](ServerTls& tls) {
+          return InOrder({Data(tls, kHead), Data(tls, std::string(16384, 'b'))});
+        },
+        Success(std::string(16384, 'b'))),
     ServesRecords(
         "ARecordOf16385Bytes",
         [](ServerTls& tls) {
@@ -539,7 +540,7 @@ const std::vector<TrafficCase> kRecords = {
                     const std::string record = Data(tls, kReply);
                     return record + record;
                   },
-                  {HTTP_RET_OK, HTTP_RET_OK, 200, "body|"},
+                  Success("body|"),
                   {ReadFailure(kProtocol), ReadFailure(kSystem), ReadFailure(kSystem)}),
     ServesRecords(
         "ARecordOfAnUnknownType",
@@ -574,7 +575,7 @@ const std::vector<TrafficCase> kRecords = {
         [](ServerTls& tls) {
           return InOrder({Data(tls, kHead), Alerts(tls, 1, {2, 80})});
         },
-        {HTTP_RET_OK, HTTP_RET_OK, 200, ""}, kFailed),
+        Success(""), kFailed),
     ServesRecords(
         "AnEmptyAlert",
         [](ServerTls& tls) {
@@ -660,11 +661,12 @@ std::vector<TrafficCase> ProtocolTable() {
       Serves(
           "Tls13RecordByteByByte", TLS1_3_VERSION,
           [](const SharedTls& tls) { return Script{SendMadeByteByByte(tls, kReply)}; }, kWhole),
-      Serves("Tls13FullRecordByteByByte", TLS1_3_VERSION,
-             [](const SharedTls& tls) {
-               return Script{SendTls(tls, kHead), SendMadeByteByByte(tls, std::string(16384, 'b'))};
-             },
-             {HTTP_RET_OK, HTTP_RET_OK, 200, std::string(16384, 'b')}),
+      Serves(
+          "Tls13FullRecordByteByByte", TLS1_3_VERSION,
+          [](const SharedTls& tls) {
+            return Script{SendTls(tls, kHead), SendMadeByteByByte(tls, std::string(16384, 'b'))};
+          },
+          Success(std::string(16384, 'b'))),
       Renews("ANewKey", 1, NewKey),
       Renews("TenThousandNewKeys", 10000, NewKey),
       Renews("NewKeysOfBothSides", 1, NewKeys),
@@ -705,10 +707,10 @@ const std::vector<TrafficCase> kEnds = {
     Ends("WithANoticeInAHeader", "HTTP/1.0 200 OK\r\nX: ", kNoBody),
     Ends("WithANoticeBehindACarriageReturn", "HTTP/1.0 200 OK\r", kUnread),
     Ends("WithANoticeBehindTheHead", kHead, kNoBody),
-    Ends("WithANoticeInTheBody", kHead + "bo", {HTTP_RET_OK, HTTP_RET_OK, 200, "bo"}),
-    Serves("WithoutANoticeInTheBody", TLS1_3_VERSION,
-           [](const SharedTls& tls) { return Script{SendTls(tls, kHead + "bo")}; },
-           {HTTP_RET_OK, HTTP_RET_OK, 200, "bo"}),
+    Ends("WithANoticeInTheBody", kHead + "bo", Success("bo")),
+    Serves(
+        "WithoutANoticeInTheBody", TLS1_3_VERSION,
+        [](const SharedTls& tls) { return Script{SendTls(tls, kHead + "bo")}; }, Success("bo")),
     ServesRecords(
         "WithinARecord",
         [](ServerTls& tls) {

@@ -116,9 +116,15 @@ TEST(CheckContentType, After29LinesTheBodyFollowsTheEmptyLine) {
 
 TEST(CheckHttpResponse, EachStatusHasItsResult) {
   const std::pair<int, int> table[] = {
-      {100, 5}, {199, 5}, {200, 0}, {201, 0}, {206, 0}, {299, 0}, {300, 5}, {301, 5}, {302, 7},
-      {303, 5}, {304, 5}, {307, 5}, {400, 5}, {401, 4}, {402, 5}, {403, 5}, {404, 5}, {413, 5},
-      {414, 8}, {415, 5}, {500, 5}, {503, 5}, {599, 5}, {0, 5},   {20, 5},  {-200, 5}};
+      {100, HTTP_RET_BAD_RESPONSE}, {199, HTTP_RET_BAD_RESPONSE}, {200, HTTP_RET_OK},
+      {201, HTTP_RET_OK},           {206, HTTP_RET_OK},           {299, HTTP_RET_OK},
+      {300, HTTP_RET_BAD_RESPONSE}, {301, HTTP_RET_BAD_RESPONSE}, {302, HTTP_RET_REDIRECT},
+      {303, HTTP_RET_BAD_RESPONSE}, {304, HTTP_RET_BAD_RESPONSE}, {307, HTTP_RET_BAD_RESPONSE},
+      {400, HTTP_RET_BAD_RESPONSE}, {401, HTTP_RET_UNAUTHORIZED}, {402, HTTP_RET_BAD_RESPONSE},
+      {403, HTTP_RET_BAD_RESPONSE}, {404, HTTP_RET_BAD_RESPONSE}, {413, HTTP_RET_BAD_RESPONSE},
+      {414, HTTP_RET_URI_TOO_LONG}, {415, HTTP_RET_BAD_RESPONSE}, {500, HTTP_RET_BAD_RESPONSE},
+      {503, HTTP_RET_BAD_RESPONSE}, {599, HTTP_RET_BAD_RESPONSE}, {0, HTTP_RET_BAD_RESPONSE},
+      {20, HTTP_RET_BAD_RESPONSE},  {-200, HTTP_RET_BAD_RESPONSE}};
   for (const auto& [status, result] : table) {
     const auto client = ClientAfter(WithStatus(std::to_string(status)));
     EXPECT_EQ(client->m_result, result) << status;
