@@ -66,7 +66,7 @@ TEST(IdleClient, TakesItsBufferAndLittleElse) {
 }
 
 TEST(IdleClient, TakesNoMoreAfterASmallGet) {
-  ReplyServer server("HTTP/1.1 200 OK\r\nContent-Length: 16\r\n\r\n{\"success\":true}");
+  RepeatingPeer server(Exchange("HTTP/1.1 200 OK\r\nContent-Length: 16\r\n\r\n{\"success\":true}"));
   const Memory memory = PerFurtherClient([&server](Clients* clients) {
     clients->push_back(std::make_unique<ClientProbe>(server.Port()));
     std::string body;

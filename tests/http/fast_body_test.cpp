@@ -288,7 +288,7 @@ TEST(IdleClient, KeepsFewPagesResidentAfterASmallGet) {
 #if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
   GTEST_SKIP() << "the sanitizer's memory is not the library's";
 #endif
-  ReplyServer server("HTTP/1.0 200 OK\r\nContent-Type: text/plain\r\n\r\nsmall");
+  RepeatingPeer server(Exchange("HTTP/1.0 200 OK\r\nContent-Type: text/plain\r\n\r\nsmall"));
   std::vector<std::unique_ptr<ClientProbe>> clients;
   malloc_trim(0);
   const size_t before = ResidentKilobytes();

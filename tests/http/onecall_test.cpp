@@ -90,12 +90,13 @@ TEST(SendHttpGet, WithEncodingLineFeedsStayAndTheValuesAreEncoded) {
 }
 
 TEST(SendHttpsGet, AServerWithASelfSignedCertificateGivesMinusTwo) {
-  const SelfSignedServer server;
-  const SelfSignedCertificate other;
-  const TrustedAuthority trusted(other.File());
+  TlsOptions tls;
+  tls.self_signed = true;
+  TlsScriptedPeer peer({{ExpectRefusedHandshake()}}, tls);
+  const TrustedAuthority trusted(peer.CaFile());
   Json::Value result;
   LogCapture log;
-  EXPECT_EQ(SendHttpsGet("127.0.0.1", server.Port(), "api", result, 10), -2);
+  EXPECT_EQ(SendHttpsGet("127.0.0.1", peer.Port(), "api", result, 10), -2);
   EXPECT_THAT(log.Lines(),
               ElementsAre(IsHttpLog("debug", "SendRequestByCurl",
                                     "Failed to make http connection, return value=60\n")));
@@ -307,7 +308,7 @@ TEST(SendHttpsGet, AMissingHandleGivesMinusOne) {
 
 TEST(SendHttpGetFaults, WhicheverSystemCallFailsTheResultIsDocumentedAndNothingIsLeft) {
   const DescriptorGuard guard;
-  ReplyServer server(Ok("{\"success\":true}"));
+  RepeatingPeer server(Exchange(Ok("{\"success\":true}")));
   const Call calls[] = {Call::kSocket, Call::kGetaddrinfo, Call::kFcntl,         Call::kConnect,
                         Call::kSelect, Call::kGetsockopt,  Call::kSetsockopt,    Call::kIoctl,
                         Call::kWrite,  Call::kRead,        Call::kPthreadSigmask};
@@ -322,7 +323,7 @@ TEST(SendHttpGetFaults, WhicheverSystemCallFailsTheResultIsDocumentedAndNothingI
 }
 
 TEST(SendHttpGetFaults, AFailingSocketLookupConnectWriteOrReadFailsTheCall) {
-  ReplyServer server(Ok("{\"success\":true}"));
+  RepeatingPeer server(Exchange(Ok("{\"success\":true}")));
   for (const Call call :
        {Call::kSocket, Call::kGetaddrinfo, Call::kConnect, Call::kWrite, Call::kRead}) {
     Faults faults;
@@ -335,7 +336,7 @@ TEST(SendHttpGetFaults, AFailingSocketLookupConnectWriteOrReadFailsTheCall) {
 
 TEST(SendHttpGetFaults, WhicheverAllocationFailsTheResultIsDocumentedAndNothingIsThrown) {
   const DescriptorGuard guard;
-  ReplyServer server(Ok("{\"success\":true}"));
+  RepeatingPeer server(Exchange(Ok("{\"success\":true}")));
   for (const Call call : {Call::kMalloc, Call::kCalloc, Call::kRealloc, Call::kStrdup}) {
     ForEachFailingCall(call, [&](Faults& faults) {
       Json::Value result;
@@ -347,7 +348,7 @@ TEST(SendHttpGetFaults, WhicheverAllocationFailsTheResultIsDocumentedAndNothingI
 }
 
 TEST(SendHttpGetFaults, WhicheverCallOfTheLogFailsTheResultIsTheSame) {
-  ReplyServer server(Ok("{\"success\":true}"));
+  RepeatingPeer server(Exchange(Ok("{\"success\":true}")));
   const LogCapture log;
   for (const Call call : {Call::kOpen, Call::kFopen, Call::kFlock, Call::kLocaltimeR}) {
     Faults faults;

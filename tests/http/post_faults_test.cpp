@@ -3,6 +3,8 @@
 #include <gtest/gtest.h>
 #include <libxml/parser.h>
 #include <libxml/tree.h>
+#include <poll.h>
+#include <sys/socket.h>
 
 #include <cstdint>
 

@@ -217,7 +217,7 @@ TEST(SendRequestByCurl, BelowDebugOnlyRefusedOptionsAreLogged) {
 
 TEST(SendRequestByCurl, EachFailingCallOfLibcurlIsAnIoErrorAndReleasesTheHandle) {
   const DescriptorGuard guard;
-  ReplyServer server(kOk);
+  RepeatingPeer server(Exchange(kOk));
   for (const Call call : {Call::kCurlEasySetopt, Call::kCurlEasyPerform, Call::kCurlEasyGetinfo}) {
     for (const TW_HTTP_METHOD method : {HTTP_METHOD_GET, HTTP_METHOD_POST}) {
       ForEachFailingCall(call, [&](Faults& faults) {

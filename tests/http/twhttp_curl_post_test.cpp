@@ -278,7 +278,7 @@ TEST(SendRequestByPost, TheBodyOfTheReplyIsThrownAway) {
 
 TEST(SendRequestByPost, EachFailingCallOfLibcurlIsAnIoErrorAndReleasesTheHandle) {
   const DescriptorGuard guard;
-  ReplyServer server(kOk);
+  RepeatingPeer server(Exchange(kOk));
   for (const Call call : {Call::kCurlEasySetopt, Call::kCurlEasyPerform, Call::kCurlEasyGetinfo}) {
     ForEachFailingCall(call, [&](Faults& faults) {
       ClientProbe client(server.Port(), {"x"});

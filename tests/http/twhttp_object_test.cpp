@@ -1,6 +1,7 @@
 // The client object: construction, settings, accessors, the forwards to its socket.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <netinet/in.h>
 
 #include <cstdlib>
 #include <type_traits>
