@@ -104,6 +104,14 @@ inline std::ostream& operator<<(std::ostream& out, const Scenario& scenario) {
   return out << scenario.name;
 }
 
+// A row in which the peer plays one connection, or none.
+inline Scenario Meets(const std::string& name, const Script& peer,
+                      const std::function<Outcome(int port)>& operation, const Outcome& expected,
+                      const std::vector<std::string>& log = {}, bool tls = false) {
+  const std::vector<Script> connections(peer.empty() ? 0 : 1, peer);
+  return {name, connections, operation, expected, log, tls};
+}
+
 inline std::string ScenarioName(const ::testing::TestParamInfo<Scenario>& info) {
   return info.param.name;
 }

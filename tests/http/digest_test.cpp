@@ -1,11 +1,8 @@
 // Basic and Digest authorization lines.
-#define OPENSSL_SUPPRESS_DEPRECATED
 #include "tarnwick/http/digest.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <openssl/evp.h>
-#include <openssl/md5.h>
 #include <sys/time.h>
 #include <unistd.h>
 
@@ -13,6 +10,7 @@
 #include <stdexcept>
 
 #include "tests/http/http_test_util.h"
+#include "tests/model/digest.h"
 #include "tests/support/faults.h"
 
 using namespace tarnwick;
@@ -23,36 +21,6 @@ using ::testing::EndsWith;
 using ::testing::HasSubstr;
 using ::testing::MatchesRegex;
 using ::testing::Not;
-
-std::string Hex(const unsigned char* digest) {
-  static const char digits[] = "0123456789abcdef";
-  std::string hex;
-  for (int i = 0; i < 16; ++i) {
-    hex += digits[digest[i] >> 4];
-    hex += digits[digest[i] & 15];
-  }
-  return hex;
-}
-
-std::string Md5(const std::string& text) {
-  unsigned char digest[EVP_MAX_MD_SIZE];
-  EXPECT_EQ(EVP_Digest(text.data(), text.size(), digest, nullptr, EVP_md5(), nullptr), 1);
-  return Hex(digest);
-}
-
-// The chain of qop "auth-int": a finished context that is fed its own digest and finished again.
-std::string AuthIntHa2(const std::string& method, const std::string& uri) {
-  MD5_CTX context;
-  unsigned char digest[MD5_DIGEST_LENGTH];
-  const std::string start = method + ":" + uri;
-  MD5_Init(&context);
-  MD5_Update(&context, start.data(), start.size());
-  MD5_Final(digest, &context);
-  const std::string more = ":" + Hex(digest);
-  MD5_Update(&context, more.data(), more.size());
-  MD5_Final(digest, &context);
-  return Hex(digest);
-}
 
 DIGEST_ACCESS_AUTH SampleLogin() {
   DIGEST_ACCESS_AUTH login;
@@ -323,7 +291,7 @@ TEST(MakeClientNonce, ItIsSixteenBytesFromTheProcessIdAndTheTime) {
   unsigned int seed = static_cast<unsigned int>(getpid()) * 1234567890u;
   unsigned char bytes[16];
   for (unsigned char& byte : bytes) byte = static_cast<unsigned char>(rand_r(&seed));
-  EXPECT_EQ(MakeClientNonce(), Hex(bytes));
+  EXPECT_EQ(MakeClientNonce(), HexOf(bytes));
 }
 
 TEST(MakeClientNonce, TwoCallsWithinASecondGiveTheSameAndTheNextSecondGivesAnother) {
