@@ -12,8 +12,8 @@
 #include <utility>
 #include <vector>
 
-#include "tests/hostile/cut_model.h"
 #include "tests/hostile/hostile_util.h"
+#include "tests/model/response.h"
 
 // How a connection ends behind the last byte that it carries.
 enum class End { kClose, kReset, kTlsNotice, kTlsNoNotice, kTlsReset };

@@ -1,5 +1,5 @@
 // The socket's exchanges, cut behind every byte of their replies. What a client makes of the rest
-// is worked out by cut_model.h.
+// is worked out by tests/model/response.h.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <json/value.h>

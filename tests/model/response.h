@@ -1,7 +1,7 @@
 // What a client makes of a reply that ends early: a plain reading of the rules, without sockets,
 // for comparison with the library's.
-#ifndef TARNWICK_TESTS_HOSTILE_CUT_MODEL_H_
-#define TARNWICK_TESTS_HOSTILE_CUT_MODEL_H_
+#ifndef TARNWICK_TESTS_MODEL_RESPONSE_H_
+#define TARNWICK_TESTS_MODEL_RESPONSE_H_
 
 #include <strings.h>
 
@@ -148,4 +148,4 @@ inline bool ReadModelBody(CutReader& reader, const ModelHead& head, std::string*
   return count == 0;
 }
 
-#endif  // TARNWICK_TESTS_HOSTILE_CUT_MODEL_H_
+#endif  // TARNWICK_TESTS_MODEL_RESPONSE_H_
