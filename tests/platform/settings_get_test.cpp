@@ -4,7 +4,9 @@
 
 #include <cerrno>
 #include <cstring>
+#include <ostream>
 #include <string>
+#include <vector>
 
 #include "tarnwick/platform/qlibcfile.h"
 #include "tests/support/faults.h"
@@ -35,60 +37,45 @@ void ExpectGot(const std::string& text, const char* key, const std::string& expe
   EXPECT_EQ(got.value, expected);
 }
 
-TEST(GetKeyValue, GivesTheLengthAndTheTextBetweenTheQuotes) {
-  ExpectGot("first=\"1\"\nname=\"value\"\nlast=\"2\"\n", "name", "value");
+// A file, and what it has for the key "name". The first column says why.
+struct NameCase {
+  const char* why;
+  const char* text;
+  const char* value;
+};
+
+std::ostream& operator<<(std::ostream& out, const NameCase& test) {
+  return out << test.why;
 }
 
-TEST(GetKeyValue, AMissingKeyGivesZeroAndAnEmptyText) {
-  ExpectGot("other=\"x\"\n", "name", "");
-  ExpectGot("", "name", "");
+class GetName : public ::testing::TestWithParam<NameCase> {};
+
+TEST_P(GetName, HasTheValueOfTheTable) {
+  ExpectGot(GetParam().text, "name", GetParam().value);
 }
 
-TEST(GetKeyValue, AnEmptyValueGivesZeroAndAnEmptyText) {
-  ExpectGot("name=\"\"\n", "name", "");
-  ExpectGot("name=\n", "name", "");
-}
-
-TEST(GetKeyValue, AKeyThatBeginsOrEndsAnotherIsNotThatKey) {
-  ExpectGot("names=\"x\"\nmy_name=\"y\"\nname=\"z\"\n", "name", "z");
-  ExpectGot("Name=\"x\"\n", "name", "");
-}
-
-TEST(GetKeyValue, TheFirstOfSeveralLinesCounts) {
-  ExpectGot("name=\"1\"\nname=\"2\"\n", "name", "1");
-}
-
-TEST(GetKeyValue, BlanksAroundTheKeyAndTheValueDoNotCount) {
-  ExpectGot(" \tname \t= \"value\" \n", "name", "value");
-}
-
-TEST(GetKeyValue, BlanksInsideTheQuotesCount) {
-  ExpectGot("name=\" a b \"\n", "name", " a b ");
-}
-
-TEST(GetKeyValue, AValueWithoutQuotesIsAccepted) {
-  ExpectGot("name=value\n", "name", "value");
-}
-
-TEST(GetKeyValue, ACarriageReturnBeforeTheLineEndDoesNotCount) {
-  ExpectGot("name=\"value\"\r\n", "name", "value");
-}
-
-TEST(GetKeyValue, AValueMayHoldQuotesAndEqualsSigns) {
-  ExpectGot("name=\"a\"b=c\"\n", "name", "a\"b=c");
-}
-
-TEST(GetKeyValue, ALastLineWithoutItsEndCounts) {
-  ExpectGot("other=\"x\"\nname=\"value\"", "name", "value");
-}
-
-TEST(GetKeyValue, ACommentIsNotAKey) {
-  ExpectGot("#name=\"x\"\n# name=\"y\"\nname=\"z\"\n", "name", "z");
-}
-
-TEST(GetKeyValue, LinesOfAnyOtherShapeAreSkipped) {
-  ExpectGot("name\n\n[section]\n=\"x\"\nname: y\nname=\"z\"\n", "name", "z");
-}
+INSTANTIATE_TEST_SUITE_P(
+    Platform, GetName,
+    ::testing::ValuesIn(std::vector<NameCase>{
+        {"TheValueIsBetweenTheQuotes", "first=\"1\"\nname=\"value\"\nlast=\"2\"\n", "value"},
+        {"AMissingKeyIsEmpty", "other=\"x\"\n", ""},
+        {"AnEmptyFileHasNoKey", "", ""},
+        {"AnEmptyValueIsEmpty", "name=\"\"\n", ""},
+        {"NoValueIsEmpty", "name=\n", ""},
+        {"AKeyThatBeginsOrEndsAnotherIsNotThatKey", "names=\"x\"\nmy_name=\"y\"\nname=\"z\"\n",
+         "z"},
+        {"KeysHaveTheirCase", "Name=\"x\"\n", ""},
+        {"TheFirstOfSeveralLinesIsTaken", "name=\"1\"\nname=\"2\"\n", "1"},
+        {"BlanksAroundTheKeyAndTheValueAreIgnored", " \tname \t= \"value\" \n", "value"},
+        {"BlanksInsideTheQuotesAreKept", "name=\" a b \"\n", " a b "},
+        {"AValueWithoutQuotesIsAccepted", "name=value\n", "value"},
+        {"ACarriageReturnBeforeTheLineFeedIsIgnored", "name=\"value\"\r\n", "value"},
+        {"AValueMayHoldQuotesAndEqualsSigns", "name=\"a\"b=c\"\n", "a\"b=c"},
+        {"ALastLineWithoutALineFeedIsReadToo", "other=\"x\"\nname=\"value\"", "value"},
+        {"ACommentIsNotAKey", "#name=\"x\"\n# name=\"y\"\nname=\"z\"\n", "z"},
+        {"LinesOfAnyOtherShapeAreSkipped", "name\n\n[section]\n=\"x\"\nname: y\nname=\"z\"\n", "z"},
+    }),
+    [](const auto& test) { return std::string(test.param.why); });
 
 TEST(GetKeyValue, ASmallBufferGetsTheStartAndTheWholeLengthIsToldToTheCaller) {
   const Got got = Get("name=\"value\"\n", "name", 4);
