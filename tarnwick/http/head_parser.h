@@ -35,7 +35,7 @@ struct HeaderLine {
 };
 
 // Splits a header line. A name that begins with a known one is taken for that one; pinned by
-// CheckContentType.ALongerNameWithAKnownPrefixCountsAsTheKnownOne.
+// CheckContentType.ALongerNameWithAKnownPrefixIsTakenForTheKnownOne.
 HeaderLine ParseHeaderLine(std::string_view line);
 
 // `text` without the spaces at its ends; tabs stay.

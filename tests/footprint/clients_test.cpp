@@ -34,7 +34,7 @@ Memory MemoryNow() {
 constexpr size_t kFew = 1;
 constexpr size_t kMany = 64;
 
-// What `add` makes a client take, on the average of the 63 behind the first, which also pays for
+// What `add` makes a client take, on the average of the 63 after the first, which also pays for
 // what all of them share.
 template <typename Add>
 Memory PerFurtherClient(Add add) {

@@ -63,13 +63,13 @@ const CertificateCase kCertificates[] = {
     {"With10000Names", {kHost, -kDay, kDay, Alternatives(10000)}, true},
 };
 
-const char kReply[] = "HTTP/1.1 200 OK\r\nConnection: close\r\n\r\n{\"success\":true}";
+const char kResponse[] = "HTTP/1.1 200 OK\r\nConnection: close\r\n\r\n{\"success\":true}";
 
 // Serves a request when the client lets it come to that.
 Script Serve(const CertificateCase& test, bool accepted) {
   const SharedTls tls = TlsWith(test);
   if (accepted)
-    return {FinishHandshake(tls), ExpectTlsRequest(tls), SendTls(tls, kReply),
+    return {FinishHandshake(tls), ExpectTlsRequest(tls), SendTls(tls, kResponse),
             SendTlsCloseNotice(tls), DiscardUntilEnd()};
   return {SendFirstFlight(tls), DiscardUntilEnd()};
 }

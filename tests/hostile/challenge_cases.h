@@ -22,7 +22,7 @@ inline constexpr char kSoapBody[] = "<q/>";
 enum class Scheme { kNone, kBasic, kDigest };
 
 // What the client has to understand of a challenge.
-struct Login {
+struct Credentials {
   Scheme scheme = Scheme::kNone;
   std::string realm = {};
   std::string nonce = {};
@@ -34,8 +34,8 @@ struct Login {
 struct ChallengeCase {
   std::string name;
   std::string lines;                     // the header lines of the 401
-  Login login;                           // of the request that follows; kNone: none follows
-  int response = HTTP_RET_UNAUTHORIZED;  // what CheckResponse gives when none follows
+  Credentials credentials;               // of the request that follows; kNone: none follows
+  int response = HTTP_RET_UNAUTHORIZED;  // what CheckResponse returns when none follows
   std::string cookie = {};               // that the request that follows carries
   std::string user = "user";
   std::string password = "pass";
@@ -56,24 +56,24 @@ inline std::string Ha2(const std::string& method, const std::string& qop) {
 
 inline std::string ResponseOf(const ChallengeCase& test, const std::string& method,
                               const std::string& cnonce) {
-  const Login& login = test.login;
-  const bool counted = login.qop == "auth" || login.qop == "auth-int";
-  return Md5(Md5(test.user + ":" + login.realm + ":" + test.password) + ":" + login.nonce +
-             (counted ? ":00000001:" + cnonce + ":" + login.qop : "") + ":" +
-             Ha2(method, login.qop));
+  const Credentials& credentials = test.credentials;
+  const bool counted = credentials.qop == "auth" || credentials.qop == "auth-int";
+  return Md5(Md5(test.user + ":" + credentials.realm + ":" + test.password) + ":" +
+             credentials.nonce + (counted ? ":00000001:" + cnonce + ":" + credentials.qop : "") +
+             ":" + Ha2(method, credentials.qop));
 }
 
 inline std::string DigestLine(const ChallengeCase& test, const std::string& method,
                               const std::string& cnonce) {
-  const Login& login = test.login;
+  const Credentials& credentials = test.credentials;
   std::string line = "Authorization: Digest username=\"" + test.user + "\", realm=\"" +
-                     login.realm + "\", nonce=\"" + login.nonce + "\", uri=\"/" + kPath +
-                     "\", response=\"" + ResponseOf(test, method, cnonce) + "\"";
-  if (!login.qop.empty()) {
-    line += ", qop=" + login.qop + ", nc=00000001, cnonce=\"" + cnonce + "\"";
+                     credentials.realm + "\", nonce=\"" + credentials.nonce + "\", uri=\"/" +
+                     kPath + "\", response=\"" + ResponseOf(test, method, cnonce) + "\"";
+  if (!credentials.qop.empty()) {
+    line += ", qop=" + credentials.qop + ", nc=00000001, cnonce=\"" + cnonce + "\"";
   }
-  if (!login.algorithm.empty()) line += ", algorithm=\"" + login.algorithm + "\"";
-  if (!login.opaque.empty()) line += ", opaque=\"" + login.opaque + "\"";
+  if (!credentials.algorithm.empty()) line += ", algorithm=\"" + credentials.algorithm + "\"";
+  if (!credentials.opaque.empty()) line += ", opaque=\"" + credentials.opaque + "\"";
   return line + "\r\n";
 }
 
@@ -95,10 +95,10 @@ inline std::string ClientNonce(const std::string& request) {
                                     : request.substr(found + mark.size(), 32);
 }
 
-inline std::string LoginLine(const ChallengeCase& test, const std::string& method,
-                             const std::string& request) {
-  if (test.login.scheme == Scheme::kNone) return "";
-  if (test.login.scheme == Scheme::kBasic) return BasicLine(test);
+inline std::string AuthorizationLine(const ChallengeCase& test, const std::string& method,
+                                     const std::string& request) {
+  if (test.credentials.scheme == Scheme::kNone) return "";
+  if (test.credentials.scheme == Scheme::kBasic) return BasicLine(test);
   return DigestLine(test, method, ClientNonce(request));
 }
 
@@ -107,7 +107,7 @@ inline std::string ExpectedGet(const ChallengeCase& test, const std::string& sen
   const std::string cookie = test.cookie.empty() ? "" : "Cookie: " + test.cookie + "\r\n";
   const std::string request = std::string("GET /") + kPath +
                               " HTTP/1.0\r\nUser-Agent: Quenrith Tarnwick\r\n" + cookie +
-                              LoginLine(test, "GET", sent) + "\r\n";
+                              AuthorizationLine(test, "GET", sent) + "\r\n";
   // A zero byte ends the text that is sent.
   return std::string(request.c_str()).substr(0, kRequestLimit);
 }
@@ -116,7 +116,8 @@ inline std::string ExpectedPost(const ChallengeCase& test, const std::string& se
   std::string request = std::string("POST /") + kPath +
                         " HTTP/1.1\r\nHost: 127.0.0.1\r\n"
                         "Content-Type: application/soap+xml; charset=utf-8\r\n" +
-                        LoginLine(test, "POST", sent) + "Content-Length: 4\r\n\r\n" + kSoapBody;
+                        AuthorizationLine(test, "POST", sent) + "Content-Length: 4\r\n\r\n" +
+                        kSoapBody;
   // The length stays, and zero bytes stand in for what a zero byte has ended.
   std::fill(std::find(request.begin(), request.end(), '\0'), request.end(), '\0');
   return request;

@@ -16,9 +16,9 @@ using ::testing::HasSubstr;
 // Servers that are never content.
 struct LoopCase {
   std::string name;
-  int calls;                         // of SendRequest with one client
-  std::vector<std::string> replies;  // one a connection
-  std::vector<std::string> marks;    // that the request of each connection holds; "": no login
+  int calls;                           // of SendRequest with one client
+  std::vector<std::string> responses;  // one a connection
+  std::vector<std::string> marks;      // that the request of each connection holds; "": no login
   Outcome last;
   bool basic_first = false;
 };
@@ -36,16 +36,16 @@ std::string WithNonce(const std::string& nonce) {
 }
 
 const Outcome kRefused = Sent(HTTP_RET_UNAUTHORIZED, 401, "");
-const std::string kBasicLogin = "Authorization: Basic dXNlcjpwYXNz\r\n";
+const std::string kBasicCredentials = "Authorization: Basic dXNlcjpwYXNz\r\n";
 const std::string kBasicRefusal = Refusal(Line("Basic realm=\"r\""));
 
 const LoopCase kLoops[] = {
     {"DigestForEver", 1, {DigestRefusal("1"), DigestRefusal("1")}, {"", WithNonce("1")}, kRefused},
-    {"BasicForEver", 1, {kBasicRefusal, kBasicRefusal}, {"", kBasicLogin}, kRefused},
+    {"BasicForEver", 1, {kBasicRefusal, kBasicRefusal}, {"", kBasicCredentials}, kRefused},
     {"BasicForEverAlthoughSentAtOnce",
      1,
      {kBasicRefusal, kBasicRefusal},
-     {kBasicLogin, kBasicLogin},
+     {kBasicCredentials, kBasicCredentials},
      kRefused,
      true},
     {"NonceThatIsAlwaysStale",
@@ -62,7 +62,7 @@ const LoopCase kLoops[] = {
     {"SchemeThatChangesEachTime",
      2,
      {kBasicRefusal, DigestRefusal("1"), DigestRefusal("2"), kBasicRefusal},
-     {"", kBasicLogin, "", WithNonce("2")},
+     {"", kBasicCredentials, "", WithNonce("2")},
      kRefused},
     {"A407",
      1,
@@ -72,29 +72,29 @@ const LoopCase kLoops[] = {
     {"A407BehindTheLogin",
      1,
      {kBasicRefusal, "HTTP/1.1 407 Proxy\r\n" + Line("Basic") + "\r\n"},
-     {"", kBasicLogin},
+     {"", kBasicCredentials},
      Sent(HTTP_RET_BAD_RESPONSE, 407, "")},
     {"A401WithinASuccess", 1, {"HTTP/1.1 200 401\r\n" + Line("Basic") + "\r\n"}, {""}, Success("")},
     {"ARedirectBehindTheLogin",
      1,
      {kBasicRefusal, "HTTP/1.1 302 Found\r\nLocation: http://127.0.0.1/\r\n\r\n"},
-     {"", kBasicLogin},
+     {"", kBasicCredentials},
      Sent(HTTP_RET_REDIRECT, 302, "")},
     {"NothingBehindTheLogin",
      1,
      {kBasicRefusal, ""},
-     {"", kBasicLogin},
+     {"", kBasicCredentials},
      Sent(HTTP_RET_IO_ERROR, 0, "")},
     {"ARefusalWithoutAChallengeBehindTheLogin",
      2,
      {kBasicRefusal, Refusal(""), Refusal("")},
-     {"", kBasicLogin, ""},
+     {"", kBasicCredentials, ""},
      kRefused},
 };
 
 std::vector<Script> ExchangesOf(const LoopCase& test) {
   std::vector<Script> scripts;
-  for (const std::string& reply : test.replies) scripts.push_back(Exchange(reply));
+  for (const std::string& response : test.responses) scripts.push_back(Exchange(response));
   return scripts;
 }
 
@@ -105,7 +105,7 @@ class ChallengeLoops : public ::testing::TestWithParam<LoopCase> {};
 
 struct CurlCase {
   std::string name;
-  std::vector<std::string> replies;  // one a request, each on a connection of its own
+  std::vector<std::string> responses;  // one a request, each on a connection of its own
   int result;
 };
 
@@ -157,7 +157,7 @@ class CurlChallenges : public ::testing::TestWithParam<CurlCase> {};
 
 }  // namespace
 
-TEST_P(ChallengeLoops, EndAfterOneLoginACall) {
+TEST_P(ChallengeLoops, EndAfterOneAuthorizationPerCall) {
   const LoopCase& test = GetParam();
   ScriptedPeer peer(ExchangesOf(test));
   Outcome outcome;
@@ -184,7 +184,7 @@ INSTANTIATE_TEST_SUITE_P(Hostile, ChallengeLoops, ::testing::ValuesIn(kLoops), N
 TEST_P(CurlChallenges, EndAsTheTableSays) {
   const CurlCase& test = GetParam();
   std::vector<Script> scripts;
-  for (const std::string& reply : test.replies) scripts.push_back(Exchange(reply));
+  for (const std::string& response : test.responses) scripts.push_back(Exchange(response));
   ScriptedPeer peer(scripts);
   int result = -1;
   RunOnSmallStack(kSmallStack, [&] {
@@ -195,8 +195,8 @@ TEST_P(CurlChallenges, EndAsTheTableSays) {
   });
   EXPECT_EQ(result, test.result);
   peer.Finish();
-  EXPECT_EQ(peer.Connections(), test.replies.size());
-  for (size_t i = 0; i < test.replies.size(); ++i) ExpectOneHead({}, peer.Received(i));
+  EXPECT_EQ(peer.Connections(), test.responses.size());
+  for (size_t i = 0; i < test.responses.size(); ++i) ExpectOneHead({}, peer.Received(i));
 }
 
 INSTANTIATE_TEST_SUITE_P(Hostile, CurlChallenges, ::testing::ValuesIn(CurlTable()),

@@ -13,12 +13,12 @@ namespace {
 
 using ::testing::IsEmpty;
 
-Login Digest(const std::string& realm, const std::string& nonce, const std::string& qop = "",
-             const std::string& opaque = "", const std::string& algorithm = "") {
+Credentials Digest(const std::string& realm, const std::string& nonce, const std::string& qop = "",
+                   const std::string& opaque = "", const std::string& algorithm = "") {
   return {Scheme::kDigest, realm, nonce, qop, opaque, algorithm};
 }
 
-Login Basic() {
+Credentials Basic() {
   return {Scheme::kBasic};
 }
 
@@ -27,7 +27,7 @@ const char kOk[] = "HTTP/1.1 200 OK\r\nContent-Length: 4\r\n\r\ndone";
 // A request is refused with the challenge, and the one that follows, of a known length, is not.
 std::vector<Script> RefuseOnce(const ChallengeCase& test, size_t next_length) {
   std::vector<Script> scripts = {Exchange(Refusal(test.lines))};
-  if (test.login.scheme == Scheme::kNone) return scripts;
+  if (test.credentials.scheme == Scheme::kNone) return scripts;
   scripts.push_back({ExpectBytes(next_length), Send(kOk), Close()});
   return scripts;
 }
@@ -41,7 +41,7 @@ ClientSettings SettingsOf(const ChallengeCase& test) {
 }
 
 Outcome ExpectedOutcome(const ChallengeCase& test, int result, const std::string& text) {
-  if (test.login.scheme != Scheme::kNone) return Success(text);
+  if (test.credentials.scheme != Scheme::kNone) return Success(text);
   return {result, test.response, 401, ""};
 }
 
@@ -57,7 +57,7 @@ void PlayGet(const ChallengeCase& test) {
   });
   EXPECT_EQ(outcome, ExpectedOutcome(test, HTTP_RET_OK, "done"));
   EXPECT_THAT(HttpLog(log), IsEmpty());
-  if (test.login.scheme == Scheme::kNone) return;
+  if (test.credentials.scheme == Scheme::kNone) return;
   const std::string sent = peer.Received(1);
   EXPECT_EQ(sent, ExpectedGet(test, sent));
   ExpectOneHead(test, sent);
@@ -69,13 +69,13 @@ void PlayPost(const ChallengeCase& test) {
   Outcome outcome;
   RunOnSmallStack(kSmallStack, [&] {
     ClientProbe client(peer.Port(), SettingsOf(test));
-    std::string reply;
-    const int result = client.SendAuthReqBySocketPost(kSoapBody, reply);
-    outcome = OutcomeOf(client, result, reply);
+    std::string response;
+    const int result = client.SendAuthReqBySocketPost(kSoapBody, response);
+    outcome = OutcomeOf(client, result, response);
   });
   EXPECT_EQ(outcome, ExpectedOutcome(test, HTTP_RET_IO_ERROR, "done"));
   EXPECT_THAT(HttpLog(log), IsEmpty());
-  if (test.login.scheme == Scheme::kNone) return;
+  if (test.credentials.scheme == Scheme::kNone) return;
   const std::string sent = peer.Received(1);
   EXPECT_EQ(sent, ExpectedPost(test, sent));
   ExpectOneHead(test, sent);
@@ -115,12 +115,12 @@ const Shape kShapes[] = {
      [](const std::string&) { return std::string("    "); }},
 };
 
-void Store(Login* login, const std::string& field, const std::string& value) {
-  if (field == "realm") login->realm = value;
-  if (field == "nonce") login->nonce = value;
-  if (field == "qop") login->qop = value;
-  if (field == "opaque") login->opaque = value;
-  if (field == "algorithm") login->algorithm = value;
+void Store(Credentials* credentials, const std::string& field, const std::string& value) {
+  if (field == "realm") credentials->realm = value;
+  if (field == "nonce") credentials->nonce = value;
+  if (field == "qop") credentials->qop = value;
+  if (field == "opaque") credentials->opaque = value;
+  if (field == "algorithm") credentials->algorithm = value;
 }
 
 std::string CaseName(const std::string& field, const std::string& shape) {
@@ -133,33 +133,33 @@ std::string CaseName(const std::string& field, const std::string& shape) {
 ChallengeCase FieldCase(const std::string& broken, const Shape& shape) {
   ChallengeCase test;
   test.name = CaseName(broken, shape.name);
-  test.login.scheme = Scheme::kDigest;
+  test.credentials.scheme = Scheme::kDigest;
   std::string challenge;
   for (const std::string& field : kFields) {
     const bool sound = field != broken;
     const std::string value = field == "qop" ? "auth" : field + "-value";
     challenge += (challenge.empty() ? "Digest " : ", ");
     challenge += sound ? field + "=\"" + value + "\"" : shape.text(field);
-    Store(&test.login, field, sound ? value : shape.value(field));
+    Store(&test.credentials, field, sound ? value : shape.value(field));
   }
   test.lines = Line(challenge);
   return test;
 }
 
-// A field of 64 KB: the line is read up to its limit, and the fields behind are lost with the rest.
+// A field of 64 KB: the line is read up to its limit, and the fields after it are lost with the rest.
 ChallengeCase LongFieldCase(const std::string& longest) {
   ChallengeCase test;
   test.name = CaseName(longest, "Of64KB");
-  test.login.scheme = Scheme::kDigest;
+  test.credentials.scheme = Scheme::kDigest;
   std::string line = "WWW-Authenticate: Digest ";
   for (const std::string& field : kFields) {
     line += field + "=\"";
     if (field == longest) break;
     const std::string value = field == "qop" ? "auth" : field + "-value";
-    Store(&test.login, field, value);
+    Store(&test.credentials, field, value);
     line += value + "\", ";
   }
-  Store(&test.login, longest, std::string(kLineLimit - line.size(), 'A'));
+  Store(&test.credentials, longest, std::string(kLineLimit - line.size(), 'A'));
   test.lines = line + std::string(kLongest, 'A') + "\", x=\"y\"\r\n";
   return test;
 }
@@ -292,36 +292,36 @@ std::vector<ChallengeCase> ControlByteCases() {
   };
 }
 
-// The daemon's side of a login. What a daemon puts into a user name goes out as it stands.
+// The daemon's own credentials. What a daemon puts into a user name goes out as it stands.
 std::vector<ChallengeCase> CredentialCases() {
   const std::string digest = Line("Digest realm=\"r\", nonce=\"n\", qop=\"auth\"");
-  const Login login = Digest("r", "n", "auth");
+  const Credentials credentials = Digest("r", "n", "auth");
   const std::string basic = Line("Basic");
   const std::string longest(kLongest, 'L');
   const std::string zero("a\0b", 3);
-  const auto with = [](const char* name, const std::string& lines, const Login& expected,
+  const auto with = [](const char* name, const std::string& lines, const Credentials& expected,
                        const std::string& user, const std::string& password) {
     return ChallengeCase{name, lines, expected, HTTP_RET_UNAUTHORIZED, "", user, password};
   };
   return {
-      with("DigestWithoutBoth", digest, login, "", ""),
+      with("DigestWithoutBoth", digest, credentials, "", ""),
       with("BasicWithoutBoth", basic, Basic(), "", ""),
-      with("DigestWithQuotes", digest, login, "a\"b", "\"\"\""),
+      with("DigestWithQuotes", digest, credentials, "a\"b", "\"\"\""),
       with("BasicWithQuotes", basic, Basic(), "a\"b", "\"\"\""),
-      with("DigestWithColons", digest, login, ":a:b:", "::"),
+      with("DigestWithColons", digest, credentials, ":a:b:", "::"),
       with("BasicWithColons", basic, Basic(), ":a:b:", "::"),
-      with("DigestWithBackslashes", digest, login, "a\\\"b\\", "\\"),
-      with("DigestWithControlBytes", digest, login, "\x01\t\x7f\xff", "\x02\x1b"),
+      with("DigestWithBackslashes", digest, credentials, "a\\\"b\\", "\\"),
+      with("DigestWithControlBytes", digest, credentials, "\x01\t\x7f\xff", "\x02\x1b"),
       with("BasicWithControlBytes", basic, Basic(), "\x01\t\x7f\xff", "\x02\r\n\x1b"),
       with("BasicWithALineEndInTheUser", basic, Basic(), "u\r\nX: 1", "p"),
-      with("DigestWithALineEndInThePassword", digest, login, "u", "p\r\n\r\nX: 1"),
-      with("DigestWithALineEndInTheUser", digest, login, "u\r\nX: 1", "p"),
-      with("DigestWithAUserOf64KB", digest, login, longest, "p"),
-      with("DigestWithAPasswordOf64KB", digest, login, "u", longest),
+      with("DigestWithALineEndInThePassword", digest, credentials, "u", "p\r\n\r\nX: 1"),
+      with("DigestWithALineEndInTheUser", digest, credentials, "u\r\nX: 1", "p"),
+      with("DigestWithAUserOf64KB", digest, credentials, longest, "p"),
+      with("DigestWithAPasswordOf64KB", digest, credentials, "u", longest),
       with("BasicWithAUserOf64KB", basic, Basic(), longest, "p"),
       with("BasicWithAPasswordOf64KB", basic, Basic(), "u", longest),
-      with("DigestWithAZeroByteInTheUser", digest, login, zero, "p"),
-      with("DigestWithAZeroByteInThePassword", digest, login, "u", zero),
+      with("DigestWithAZeroByteInTheUser", digest, credentials, zero, "p"),
+      with("DigestWithAZeroByteInThePassword", digest, credentials, "u", zero),
       with("BasicWithAZeroByteInTheUser", basic, Basic(), zero, "p"),
       with("BasicWithAZeroByteInThePassword", basic, Basic(), "u", zero),
   };

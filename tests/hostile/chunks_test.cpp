@@ -63,7 +63,7 @@ const ChunkRow kChunks[] = {
     {"AnExtensionBeyondTheBuffer", "3;" + std::string(9000, 'x') + "\r\nabc\r\n0\r\n\r\n", "xxx",
      CURLE_OK, "abc"},
 
-    // Sizes that lie, and line ends that are none.
+    // Sizes that lie, and other bytes in place of CRLF.
     {"ASizeTooSmall", "3\r\nabcde\r\n0\r\n\r\n", "abc", CURLE_RECV_ERROR, "abc"},
     {"ASizeTooLarge", "8\r\nabcde\r\n0\r\n\r\n", "abcde\r\n0", CURLE_RECV_ERROR, "abcde\r\n0"},
     {"NoLineEndBehindAChunk", "3\r\nabc3\r\ndef\r\n0\r\n\r\n", "abc", CURLE_RECV_ERROR, "abc"},
@@ -93,7 +93,7 @@ const ChunkRow kChunks[] = {
      CURLE_OK, std::string(1000, 'x')},
 };
 
-// A GET, and the whole body behind it.
+// A GET, and the whole body after it.
 Outcome GetAndReadBody(ClientProbe& client) {
   EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
   std::string body;
@@ -110,7 +110,7 @@ Outcome GetResponse(ClientProbe& client) {
   return OutcomeOf(client, 0, text);
 }
 
-// A form, and the whole body behind it.
+// A form, and the whole body after it.
 Outcome PostAndReadBody(ClientProbe& client) {
   EXPECT_EQ(client.SendRequestBySocketPost("a=1"), HTTP_RET_OK);
   std::string body;
@@ -152,8 +152,8 @@ Outcome XmlGet(int port) {
   return OutcomeOf(client, result, text);
 }
 
-std::vector<ReplyScenario> SocketTable(Outcome (*operation)(ClientProbe&)) {
-  std::vector<ReplyScenario> table;
+std::vector<ResponseScenario> SocketTable(Outcome (*operation)(ClientProbe&)) {
+  std::vector<ResponseScenario> table;
   for (const ChunkRow& row : kChunks) {
     table.push_back({row.name, kHead + row.chunks, operation, Success(row.body)});
   }
@@ -171,7 +171,7 @@ std::vector<Scenario> CurlTable(const std::string& function, Outcome (*operation
                     std::to_string(row.curl_code) + "\n");
     }
     table.push_back({row.name,
-                     {{ExpectRequest(), Offer(kHead + row.chunks), Close()}},
+                     {{ExpectRequest(), SendWhileRead(kHead + row.chunks), Close()}},
                      operation,
                      {result, result, 0, text(row)},
                      log});
@@ -188,14 +188,14 @@ std::string FileOf(const ChunkRow& row) {
   return "\r\n" + row.curl_body + row.trailer;
 }
 
-// Replies whose chunks a reader takes for the body itself.
+// Responses whose chunks a reader takes for the body itself.
 const char kChunkedJson[] = "10\r\n{\"success\":true}\r\n0\r\n\r\n";
 
 std::string Under(const std::string& lines, const std::string& body) {
   return "HTTP/1.1 200 OK\r\n" + lines + "\r\n" + body;
 }
 
-const ReplyScenario kUndecoded[] = {
+const ResponseScenario kUndecoded[] = {
     {"ChunkedWithACapital", Under("Transfer-Encoding: Chunked\r\n", "3\r\nabc\r\n0\r\n\r\n"),
      GetAndReadBody, Success("3\r\nabc\r\n0\r\n\r\n")},
     {"ChunkedBehindAnotherCoding",
@@ -231,9 +231,9 @@ Outcome JsonGet(int port) {
 
 Outcome Soap(int port) {
   ClientProbe client(port);
-  std::string reply = "untouched";
-  const int result = client.SendReqBySocketPost("<a/>", reply);
-  return OutcomeOf(client, result, reply);
+  std::string response = "untouched";
+  const int result = client.SendReqBySocketPost("<a/>", response);
+  return OutcomeOf(client, result, response);
 }
 
 Outcome XmlSoap(int port) {
@@ -246,31 +246,31 @@ Outcome XmlSoap(int port) {
   return OutcomeOf(client, result, stays ? "untouched" : doc == nullptr ? "none" : "a document");
 }
 
-Script Reply(const std::string& reply) {
-  return {ExpectRequest(), Offer(reply), Close()};
+Script Response(const std::string& response) {
+  return {ExpectRequest(), SendWhileRead(response), Close()};
 }
 
 const Scenario kOtherReaders[] = {
     {"JsonTakesTheChunksForTheBody",
-     {Reply(std::string(kHead) + kChunkedJson)},
+     {Response(std::string(kHead) + kChunkedJson)},
      JsonGet,
      OneCall(-2, "10\n"),
      {"SendHttpGet: Failed to parse json [" + std::string(kChunkedJson) + "].\n"}},
     {"SoapNeverReadsChunks",
-     {Reply(std::string(kHead) + "4\r\n<a/>\r\n0\r\n\r\n")},
+     {Response(std::string(kHead) + "4\r\n<a/>\r\n0\r\n\r\n")},
      Soap,
      BodyFailed("untouched")},
     {"SoapWithALengthTakesTheChunksForTheBody",
-     {Reply(
+     {Response(
          Under("Transfer-Encoding: chunked\r\nContent-Length: 7\r\n", "4\r\n<a/>\r\n0\r\n\r\n"))},
      Soap,
      Success("4\r\n<a/>")},
     {"XmlSoapNeverReadsChunks",
-     {Reply(std::string(kHead) + "4\r\n<a/>\r\n0\r\n\r\n")},
+     {Response(std::string(kHead) + "4\r\n<a/>\r\n0\r\n\r\n")},
      XmlSoap,
      BodyFailed("untouched")},
     {"XmlSoapWithALengthTakesTheChunksForTheBody",
-     {Reply(
+     {Response(
          Under("Transfer-Encoding: chunked\r\nContent-Length: 7\r\n", "4\r\n<a/>\r\n0\r\n\r\n"))},
      XmlSoap,
      Success("none")},
@@ -278,21 +278,22 @@ const Scenario kOtherReaders[] = {
 
 }  // namespace
 
-class Chunks : public ::testing::TestWithParam<ReplyScenario> {};
+class Chunks : public ::testing::TestWithParam<ResponseScenario> {};
 
 TEST_P(Chunks, EndAsTheTableSays) {
-  PlayReply(GetParam());
+  RunInEachWay(GetParam());
 }
 
 INSTANTIATE_TEST_SUITE_P(ReadBody, Chunks, ::testing::ValuesIn(SocketTable(GetAndReadBody)),
-                         ReplyName);
-INSTANTIATE_TEST_SUITE_P(GetResp, Chunks, ::testing::ValuesIn(SocketTable(GetResponse)), ReplyName);
-INSTANTIATE_TEST_SUITE_P(Codings, Chunks, ::testing::ValuesIn(kUndecoded), ReplyName);
+                         ResponseName);
+INSTANTIATE_TEST_SUITE_P(GetResp, Chunks, ::testing::ValuesIn(SocketTable(GetResponse)),
+                         ResponseName);
+INSTANTIATE_TEST_SUITE_P(Codings, Chunks, ::testing::ValuesIn(kUndecoded), ResponseName);
 
 class ChunkReaders : public ::testing::TestWithParam<Scenario> {};
 
 TEST_P(ChunkReaders, EndAsTheTableSays) {
-  PlayScenario(GetParam());
+  RunScenario(GetParam());
 }
 
 INSTANTIATE_TEST_SUITE_P(Text, ChunkReaders,

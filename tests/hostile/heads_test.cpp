@@ -32,19 +32,19 @@ std::string Kept(const ClientProbe& client) {
   return kept;
 }
 
-// A GET; the text is what its head left behind.
+// A GET; the text is what its head left.
 Outcome Head(ClientProbe& client) {
   const int result = client.SendRequestByGet();
   return OutcomeOf(client, result, Kept(client));
 }
 
-// A GET; the text is what is left on the connection behind the head.
+// A GET; the text is what is left on the connection after the head.
 Outcome Rest(ClientProbe& client) {
   const int result = client.SendRequestByGet();
   return OutcomeOf(client, result, ReadBody(client));
 }
 
-// Status lines, with an empty line behind them: the status that is read, and what comes of it.
+// Status lines, with an empty line after them: the status that is read, and what comes of it.
 struct StatusLineRow {
   const char* name;
   std::string line;
@@ -93,15 +93,15 @@ const StatusLineRow kStatusLines[] = {
     {"AContinue", "HTTP/1.1 100 Continue", HTTP_RET_BAD_RESPONSE, 100},
 };
 
-std::vector<ReplyScenario> StatusLineTable() {
-  std::vector<ReplyScenario> table;
+std::vector<ResponseScenario> StatusLineTable() {
+  std::vector<ResponseScenario> table;
   for (const StatusLineRow& row : kStatusLines) {
     table.push_back({row.name, row.line + "\r\n\r\n", Head, Sent(row.response, row.status, "")});
   }
   return table;
 }
 
-const ReplyScenario kHeadTable[] = {
+const ResponseScenario kHeadTable[] = {
     // Line ends.
     {"NothingAtAll", "", Head, Sent(HTTP_RET_IO_ERROR, 0, "")},
     {"BareLineFeeds", "HTTP/1.1 200 OK\nContent-Type: a\n\n", Head, Success("type=a|")},
@@ -195,7 +195,7 @@ const ReplyScenario kHeadTable[] = {
      Success("length=3|")},
 };
 
-// Heads without an end come over plain connections alone: the bytes behind them are counted, and
+// Heads without an end come over plain connections alone: the bytes after them are counted, and
 // the client may not keep any.
 Outcome GetAndCount(int port) {
   ClientProbe client(port);
@@ -214,16 +214,16 @@ Outcome FormPost(int port) {
 
 Outcome Soap(int port) {
   ClientProbe client(port);
-  std::string reply = "untouched";
-  const int result = client.SendReqBySocketPost("<a/>", reply);
-  return OutcomeOf(client, result, reply);
+  std::string response = "untouched";
+  const int result = client.SendReqBySocketPost("<a/>", response);
+  return OutcomeOf(client, result, response);
 }
 
 Outcome SoapWithLogin(int port) {
   ClientProbe client(port);
-  std::string reply = "untouched";
-  const int result = client.SendAuthReqBySocketPost("<a/>", reply);
-  return OutcomeOf(client, result, reply);
+  std::string response = "untouched";
+  const int result = client.SendAuthReqBySocketPost("<a/>", response);
+  return OutcomeOf(client, result, response);
 }
 
 Outcome CurlGet(int port) {
@@ -333,27 +333,28 @@ const Scenario kEndlessCurlTable[] = {
 
 }  // namespace
 
-class StatusLines : public ::testing::TestWithParam<ReplyScenario> {};
+class StatusLines : public ::testing::TestWithParam<ResponseScenario> {};
 
 TEST_P(StatusLines, EndAsTheTableSays) {
-  PlayReply(GetParam());
+  RunInEachWay(GetParam());
 }
 
-INSTANTIATE_TEST_SUITE_P(Hostile, StatusLines, ::testing::ValuesIn(StatusLineTable()), ReplyName);
+INSTANTIATE_TEST_SUITE_P(Hostile, StatusLines, ::testing::ValuesIn(StatusLineTable()),
+                         ResponseName);
 
-class Heads : public ::testing::TestWithParam<ReplyScenario> {};
+class Heads : public ::testing::TestWithParam<ResponseScenario> {};
 
 TEST_P(Heads, EndAsTheTableSays) {
-  PlayReply(GetParam());
+  RunInEachWay(GetParam());
 }
 
-INSTANTIATE_TEST_SUITE_P(Hostile, Heads, ::testing::ValuesIn(kHeadTable), ReplyName);
+INSTANTIATE_TEST_SUITE_P(Hostile, Heads, ::testing::ValuesIn(kHeadTable), ResponseName);
 
 class EndlessHeads : public ::testing::TestWithParam<Scenario> {};
 
 TEST_P(EndlessHeads, EndAsTheTableSaysInConstantMemory) {
   const PeakMemory memory;
-  PlayScenario(GetParam());
+  RunScenario(GetParam());
   RecordProperty("growth_in_kilobytes", std::to_string(memory.GrowthInKilobytes()));
   EXPECT_LT(memory.GrowthInKilobytes(), kMostGrowthInKilobytes);
 }

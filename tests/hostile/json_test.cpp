@@ -36,11 +36,11 @@ constexpr int kTrueOnALargeStack = kNoJson;
 struct JsonCase {
   JsonCase(std::string called, std::string text, int gives)
       : name(std::move(called)),
-        reply(std::make_shared<const std::string>(std::move(text))),
+        response(std::make_shared<const std::string>(std::move(text))),
         result(gives) {}
 
   std::string name;
-  std::shared_ptr<const std::string> reply;
+  std::shared_ptr<const std::string> response;
   int result;  // of JsonParse
 };
 
@@ -48,7 +48,7 @@ std::ostream& operator<<(std::ostream& out, const JsonCase& test) {
   return out << test.name;
 }
 
-// A reply that succeeds, with `value` beside it.
+// A response that succeeds, with `value` beside it.
 std::string Beside(const std::string& value) {
   return "{\"success\":true,\"x\":" + value + "}";
 }
@@ -235,12 +235,12 @@ MATCHER_P(TellsOf, text, "") {
          ::testing::Value(arg.message, EndsWith("]\n"));
 }
 
-class JsonReplies : public ::testing::TestWithParam<JsonCase> {
+class JsonResponses : public ::testing::TestWithParam<JsonCase> {
  protected:
-  const std::string& Reply() const { return *GetParam().reply; }
+  const std::string& Response() const { return *GetParam().response; }
 
   // As the log shows it: a zero byte ends it.
-  std::string Shown() const { return Reply().c_str(); }
+  std::string Shown() const { return Response().c_str(); }
 };
 
 std::string NameOf(const ::testing::TestParamInfo<JsonCase>& test) {
@@ -253,12 +253,12 @@ std::string Served(const std::string& body) {
 
 }  // namespace
 
-TEST_P(JsonReplies, AreParsedAsTheTableSays) {
+TEST_P(JsonResponses, AreParsedAsTheTableSays) {
   const LogCapture log(3);
   int result = 1;
   RunOnSmallStack(kSmallStack, [&] {
     Json::Value value;
-    EXPECT_NO_THROW(result = JsonParse(Reply(), value));
+    EXPECT_NO_THROW(result = JsonParse(Response(), value));
   });
   EXPECT_EQ(result, GetParam().result);
   if (GetParam().result == kNoJson) {
@@ -268,9 +268,9 @@ TEST_P(JsonReplies, AreParsedAsTheTableSays) {
   }
 }
 
-TEST_P(JsonReplies, EndTheOneCallGetAsTheTableSays) {
+TEST_P(JsonResponses, EndTheOneCallGetAsTheTableSays) {
   const LogCapture log(3);
-  ScriptedPeer peer({Exchange(Served(Reply()))});
+  ScriptedPeer peer({Exchange(Served(Response()))});
   int result = 1;
   RunOnSmallStack(kSmallStack, [&] {
     Json::Value value;
@@ -282,11 +282,11 @@ TEST_P(JsonReplies, EndTheOneCallGetAsTheTableSays) {
                                                      : std::vector<std::string>{failed});
 }
 
-INSTANTIATE_TEST_SUITE_P(OfManyLevels, JsonReplies, ::testing::ValuesIn(DepthTable()), NameOf);
-INSTANTIATE_TEST_SUITE_P(OfOddShapes, JsonReplies, ::testing::ValuesIn(ShapeTable()), NameOf);
-INSTANTIATE_TEST_SUITE_P(WithOddStrings, JsonReplies, ::testing::ValuesIn(StringTable()), NameOf);
-INSTANTIATE_TEST_SUITE_P(WithOddNumbers, JsonReplies, ::testing::ValuesIn(NumberTable()), NameOf);
-INSTANTIATE_TEST_SUITE_P(WithSuccess, JsonReplies, ::testing::ValuesIn(SuccessTable()), NameOf);
+INSTANTIATE_TEST_SUITE_P(OfManyLevels, JsonResponses, ::testing::ValuesIn(DepthTable()), NameOf);
+INSTANTIATE_TEST_SUITE_P(OfOddShapes, JsonResponses, ::testing::ValuesIn(ShapeTable()), NameOf);
+INSTANTIATE_TEST_SUITE_P(WithOddStrings, JsonResponses, ::testing::ValuesIn(StringTable()), NameOf);
+INSTANTIATE_TEST_SUITE_P(WithOddNumbers, JsonResponses, ::testing::ValuesIn(NumberTable()), NameOf);
+INSTANTIATE_TEST_SUITE_P(WithSuccess, JsonResponses, ::testing::ValuesIn(SuccessTable()), NameOf);
 
 // A thread with a usual stack takes as many levels as the parser does.
 TEST(JsonLevels, OfAThousandAreTakenOnAUsualStack) {

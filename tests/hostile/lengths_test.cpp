@@ -12,14 +12,14 @@ namespace {
 
 constexpr char kReadFailed[] = "SendReqBySocketPost: Read data faild.\n";
 
-// The body of a reply, of which a SOAP request reads as much as the reply announces and anything
+// The body of a response, of which a SOAP request reads as much as the response announces and anything
 // else all of it, and libcurl what it makes of the length.
 struct LengthRow {
   const char* name;
   std::string lines;  // of the head
   std::string body;
-  std::string kept;  // what GetHttpContent gives
-  std::string soap;  // the reply; kFails when there is none
+  std::string kept;  // what GetHttpContent returns
+  std::string soap;  // the response; kFails when there is none
   CURLcode curl_code;
   std::string curl;
 };
@@ -105,9 +105,9 @@ Outcome GetAndReadBody(ClientProbe& client) {
 }
 
 Outcome Soap(ClientProbe& client) {
-  std::string reply = kFails;
-  const int result = client.SendReqBySocketPost("<a/>", reply);
-  return OutcomeOf(client, result, reply);
+  std::string response = kFails;
+  const int result = client.SendReqBySocketPost("<a/>", response);
+  return OutcomeOf(client, result, response);
 }
 
 // The text tells whether there is a document.
@@ -127,25 +127,25 @@ Outcome CurlGet(int port) {
   return OutcomeOf(client, result, client.m_strCurlText);
 }
 
-std::string Reply(const std::string& lines, const std::string& body) {
+std::string Response(const std::string& lines, const std::string& body) {
   return "HTTP/1.1 200 OK\r\n" + lines + "\r\n" + body;
 }
 
-std::vector<ReplyScenario> BodyTable() {
-  std::vector<ReplyScenario> table;
+std::vector<ResponseScenario> BodyTable() {
+  std::vector<ResponseScenario> table;
   for (const LengthRow& row : kLengths) {
-    table.push_back({row.name, Reply(row.lines, row.body), GetAndReadBody,
+    table.push_back({row.name, Response(row.lines, row.body), GetAndReadBody,
                      Success(row.kept + ": " + row.body)});
   }
   return table;
 }
 
-std::vector<ReplyScenario> SoapTable() {
-  std::vector<ReplyScenario> table;
+std::vector<ResponseScenario> SoapTable() {
+  std::vector<ResponseScenario> table;
   for (const LengthRow& row : kLengths) {
     const int result = row.soap == kFails ? HTTP_RET_IO_ERROR : HTTP_RET_OK;
     table.push_back({row.name,
-                     Reply(row.lines, row.body),
+                     Response(row.lines, row.body),
                      Soap,
                      {result, HTTP_RET_OK, 200, row.soap},
                      {},
@@ -163,51 +163,52 @@ std::vector<Scenario> CurlTable() {
       log.push_back("SendRequestByCurl: Failed to make http connection, return value=" +
                     std::to_string(row.curl_code) + "\n");
     }
-    const Script script = {ExpectRequest(), Offer(Reply(row.lines, row.body)), Close()};
+    const Script script = {ExpectRequest(), SendWhileRead(Response(row.lines, row.body)), Close()};
     table.push_back({row.name, {script}, CurlGet, {result, result, 0, row.curl}, log});
   }
   return table;
 }
 
 // Heads that end the reading, and bodies that end before they begin.
-const ReplyScenario kOthers[] = {
+const ResponseScenario kOthers[] = {
     {"NoValueForABody",
-     Reply("Content-Length:\r\n", "<a/>"),
+     Response("Content-Length:\r\n", "<a/>"),
      GetAndReadBody,
      {HTTP_RET_IO_ERROR, HTTP_RET_NOT_READY, 200, "(none): "},
      {"ReadBody: Read data error\n"}},
     {"NoValueForSoap",
-     Reply("Content-Length:\r\n", "<a/>"),
+     Response("Content-Length:\r\n", "<a/>"),
      Soap,
      {HTTP_RET_IO_ERROR, HTTP_RET_NOT_READY, 200, kFails}},
     {"AFoldedValueForSoap",
-     Reply("Content-Length:\r\n 4\r\n", "<a/>"),
+     Response("Content-Length:\r\n 4\r\n", "<a/>"),
      Soap,
      {HTTP_RET_IO_ERROR, HTTP_RET_NOT_READY, 200, kFails}},
-    {"BeyondTheLastLineForSoap", Reply(Lines(30) + Length("4"), "<a/>"), Soap, BodyFailed(kFails)},
-    {"BeyondTheLastLineForABody", Reply(Lines(30) + Length("4"), "<a/>"), GetAndReadBody,
+    {"BeyondTheLastLineForSoap", Response(Lines(30) + Length("4"), "<a/>"), Soap,
+     BodyFailed(kFails)},
+    {"BeyondTheLastLineForABody", Response(Lines(30) + Length("4"), "<a/>"), GetAndReadBody,
      Success("(none): Content-Length: 4\r\n\r\n<a/>")},
-    {"NoBodyForSoap", Reply(Length("4"), ""), Soap, BodyFailed(kFails), {kReadFailed}},
+    {"NoBodyForSoap", Response(Length("4"), ""), Soap, BodyFailed(kFails), {kReadFailed}},
     {"NoBodyOf2GibibytesForSoap",
-     Reply(Length("2147483646"), ""),
+     Response(Length("2147483646"), ""),
      Soap,
      BodyFailed(kFails),
      {kReadFailed}},
-    {"ABodyOfAZeroByteForSoap", Reply(Length("1"), "\0"s), Soap, Success("")},
+    {"ABodyOfAZeroByteForSoap", Response(Length("1"), "\0"s), Soap, Success("")},
     {"AnErrorsBodyForSoap",
      "HTTP/1.1 500 No\r\nContent-Length: 4\r\n\r\n<a/>",
      Soap,
      Sent(HTTP_RET_BAD_RESPONSE, 500, "<a/>"),
      {},
      true},
-    {"TheRightOneForXml", Reply(Length("4"), "<a/>"), XmlSoap, Success("a document"), {}, true},
+    {"TheRightOneForXml", Response(Length("4"), "<a/>"), XmlSoap, Success("a document"), {}, true},
     {"SmallerThanTheBodyForXml",
-     Reply(Length("3"), "<a/>"),
+     Response(Length("3"), "<a/>"),
      XmlSoap,
      Success("no document"),
      {},
      true},
-    {"NegativeForXml", Reply(Length("-4"), "<a/>"), XmlSoap, BodyFailed(kFails)},
+    {"NegativeForXml", Response(Length("-4"), "<a/>"), XmlSoap, BodyFailed(kFails)},
 };
 
 Outcome JsonGet(int port) {
@@ -216,8 +217,8 @@ Outcome JsonGet(int port) {
   return OneCall(result, value.toStyledString());
 }
 
-Script Answer(const std::string& reply) {
-  return {ExpectRequest(), Offer(reply), Close()};
+Script Answer(const std::string& response) {
+  return {ExpectRequest(), SendWhileRead(response), Close()};
 }
 
 const char kJson[] = "{\"success\":true}";
@@ -225,27 +226,27 @@ const char kJsonShown[] = "{\n\t\"success\" : true\n}\n";
 
 const Scenario kJsonTable[] = {
     {"SmallerThanTheBodyForJson",
-     {Answer(Reply(Length("2"), kJson))},
+     {Answer(Response(Length("2"), kJson))},
      JsonGet,
      OneCall(0, kJsonShown)},
     {"LargerThanTheBodyForJson",
-     {Answer(Reply(Length("2000"), kJson))},
+     {Answer(Response(Length("2000"), kJson))},
      JsonGet,
      OneCall(0, kJsonShown)},
-    {"NegativeForJson", {Answer(Reply(Length("-1"), kJson))}, JsonGet, OneCall(0, kJsonShown)},
+    {"NegativeForJson", {Answer(Response(Length("-1"), kJson))}, JsonGet, OneCall(0, kJsonShown)},
     {"NoValueForJson",
-     {Answer(Reply("Content-Length:\r\n", kJson))},
+     {Answer(Response("Content-Length:\r\n", kJson))},
      JsonGet,
      OneCall(-1, "\"untouched\"\n"),
      {"SendHttpGet: Failed to check response[200]: 1\n"}},
     {"NoBodyForJson",
-     {Answer(Reply(Length("16"), ""))},
+     {Answer(Response(Length("16"), ""))},
      JsonGet,
      OneCall(-1, "\"untouched\"\n"),
      {"SendHttpGet: Read Buffer Error\n"}},
 };
 
-// A SOAP reply of more than a mebibyte is read as it comes, and whole.
+// A SOAP response of more than a mebibyte is read as it comes, and whole.
 Outcome SoapOfAnySize(int port) {
   ClientProbe client(port);
   return Soap(client);
@@ -255,35 +256,35 @@ const std::string kLarge(3 << 20, 'x');
 
 const Scenario kLargeTable[] = {
     {"ALargeBodyForSoap",
-     {Answer(Reply(Length(std::to_string(kLarge.size())), kLarge))},
+     {Answer(Response(Length(std::to_string(kLarge.size())), kLarge))},
      SoapOfAnySize,
      Success(kLarge)},
     {"HalfOfALargeBodyForSoap",
-     {Answer(Reply(Length(std::to_string(2 * kLarge.size())), kLarge))},
+     {Answer(Response(Length(std::to_string(2 * kLarge.size())), kLarge))},
      SoapOfAnySize,
      Success(kLarge)},
     {"MuchMoreThanALargeBodyForSoap",
-     {Answer(Reply(Length("2147483646"), kLarge))},
+     {Answer(Response(Length("2147483646"), kLarge))},
      SoapOfAnySize,
      Success(kLarge)},
 };
 
 }  // namespace
 
-class Lengths : public ::testing::TestWithParam<ReplyScenario> {};
+class Lengths : public ::testing::TestWithParam<ResponseScenario> {};
 
 TEST_P(Lengths, EndAsTheTableSays) {
-  PlayReply(GetParam());
+  RunInEachWay(GetParam());
 }
 
-INSTANTIATE_TEST_SUITE_P(ReadBody, Lengths, ::testing::ValuesIn(BodyTable()), ReplyName);
-INSTANTIATE_TEST_SUITE_P(Soap, Lengths, ::testing::ValuesIn(SoapTable()), ReplyName);
-INSTANTIATE_TEST_SUITE_P(Others, Lengths, ::testing::ValuesIn(kOthers), ReplyName);
+INSTANTIATE_TEST_SUITE_P(ReadBody, Lengths, ::testing::ValuesIn(BodyTable()), ResponseName);
+INSTANTIATE_TEST_SUITE_P(Soap, Lengths, ::testing::ValuesIn(SoapTable()), ResponseName);
+INSTANTIATE_TEST_SUITE_P(Others, Lengths, ::testing::ValuesIn(kOthers), ResponseName);
 
 class LengthReaders : public ::testing::TestWithParam<Scenario> {};
 
 TEST_P(LengthReaders, EndAsTheTableSays) {
-  PlayScenario(GetParam());
+  RunScenario(GetParam());
 }
 
 INSTANTIATE_TEST_SUITE_P(Curl, LengthReaders, ::testing::ValuesIn(CurlTable()), ScenarioName);

@@ -53,11 +53,11 @@ Script StallBehind(const std::string& bytes) {
 }
 
 Script PauseBetween(const std::string& before, const std::string& behind) {
-  return {ExpectRequest(), Send(before), Pause(kLong), Offer(behind), Close()};
+  return {ExpectRequest(), Send(before), Pause(kLong), SendWhileRead(behind), Close()};
 }
 
-Script Slowly(const std::string& reply) {
-  return {ExpectRequest(), SendSlowly(reply), Close()};
+Script Slowly(const std::string& response) {
+  return {ExpectRequest(), SendSlowly(response), Close()};
 }
 
 ClientSettings Settings(bool buffered, bool https = false) {
@@ -97,9 +97,9 @@ Outcome WithoutATimeout(int port) {
 
 Outcome SoapOf(int port, size_t size) {
   ClientProbe client(port, Settings(true));
-  std::string reply = "untouched";
-  const int result = client.SendReqBySocketPost(std::string(size, 'x'), reply);
-  return OutcomeOf(client, result, reply);
+  std::string response = "untouched";
+  const int result = client.SendReqBySocketPost(std::string(size, 'x'), response);
+  return OutcomeOf(client, result, response);
 }
 
 Outcome Soap(int port) {
@@ -204,7 +204,7 @@ const Scenario kTimings[] = {
     Meets("AStallInABodyRead", StallBehind(kHead + "abc"s), Direct, BodyFailed("abc"),
           {kBodyFailed}),
 
-    // In place of a chunk's size it counts as the last chunk.
+    // In place of a chunk's size it is taken for the last chunk.
     Meets("AStallBeforeAChunkSize", StallBehind(kChunkedHead), Buffered, Success("")),
     Meets("AStallInAChunkSize", StallBehind(kChunkedHead + "3\r\nabc\r\n5"s), Buffered,
           Success("abc")),
@@ -344,9 +344,9 @@ TEST_P(Timing, EndsAsTheTableSays) {
   const Scenario& scenario = GetParam();
   const Played& played = played_[scenario.name];
   std::vector<std::string> log;
-  for (const std::string& line : played.log) log.push_back(WithoutNumbers(line));
+  for (const std::string& line : played.log) log.push_back(MaskNumbers(line));
   std::vector<std::string> expected;
-  for (const std::string& line : scenario.log) expected.push_back(WithoutNumbers(line));
+  for (const std::string& line : scenario.log) expected.push_back(MaskNumbers(line));
   EXPECT_EQ(played.outcome, scenario.expected);
   EXPECT_EQ(log, expected);
 }

@@ -22,7 +22,7 @@ inline SharedTls TlsOf(int version) {
   return std::make_shared<ServerTls>(version);
 }
 
-inline Script Joined(Script script, const Script& more) {
+inline Script Concat(Script script, const Script& more) {
   script.insert(script.end(), more.begin(), more.end());
   return script;
 }

@@ -53,7 +53,7 @@ void ExpectHandshake(const HandshakeCase& test) {
   }
 }
 
-// The ways in which a peer gives up behind a number of its records.
+// The ways in which a peer gives up after a number of its records.
 struct Ending {
   const char* name;
   std::function<Script(const SharedTls&)> steps;
@@ -65,25 +65,25 @@ const std::vector<Ending>& Endings() {
       {"Ends", [](const SharedTls&) { return EndOfStream(); }, kEnd},
       {"Resets", [](const SharedTls&) { return Script{Reset()}; }, kSystem},
       {"EndsWithinARecord",
-       [](const SharedTls& tls) { return Joined({SendHalfARecord(tls)}, EndOfStream()); }, kEnd},
+       [](const SharedTls& tls) { return Concat({SendHalfARecord(tls)}, EndOfStream()); }, kEnd},
       {"SaysGarbage",
-       [](const SharedTls&) { return Joined({SendRaw("not a record")}, EndOfStream()); },
+       [](const SharedTls&) { return Concat({SendRaw("not a record")}, EndOfStream()); },
        kProtocol},
       {"SaysAnAlert",
        [](const SharedTls&) {
-         return Joined({SendRaw(RawRecord(kAlertRecord, {2, 40}))}, EndOfStream());
+         return Concat({SendRaw(RawRecord(kAlertRecord, {2, 40}))}, EndOfStream());
        },
        kProtocol},
       {"SaysAnOversizedRecord",
        [](const SharedTls&) {
-         return Joined({SendRaw("\x16\x03\x03\xff\xff" + std::string(65535, 'x'))}, EndOfStream());
+         return Concat({SendRaw("\x16\x03\x03\xff\xff" + std::string(65535, 'x'))}, EndOfStream());
        },
        kProtocol},
   };
   return endings;
 }
 
-// Every ending behind every record that the client waits for.
+// Every ending after every record that the client waits for.
 std::vector<HandshakeCase> StageTable() {
   std::vector<HandshakeCase> table;
   const struct {
@@ -96,7 +96,7 @@ std::vector<HandshakeCase> StageTable() {
       for (const Ending& ending : Endings()) {
         const auto peer = [version = protocol.version, sent, steps = ending.steps] {
           const SharedTls tls = TlsOf(version);
-          return Joined({AwaitHello(tls), SendRecords(tls, sent)}, steps(tls));
+          return Concat({AwaitHello(tls), SendRecords(tls, sent)}, steps(tls));
         };
         table.push_back(
             {std::string(protocol.name) + ending.name + "Behind" + std::to_string(sent) + "Records",
@@ -108,7 +108,7 @@ std::vector<HandshakeCase> StageTable() {
 }
 
 HandshakeCase Says(const std::string& name, const std::string& bytes, int error = kProtocol) {
-  return {name, [bytes] { return Joined({SendRaw(bytes)}, EndOfStream()); }, error};
+  return {name, [bytes] { return Concat({SendRaw(bytes)}, EndOfStream()); }, error};
 }
 
 std::string ServerHello(const std::string& content) {
@@ -173,7 +173,7 @@ const std::vector<HandshakeCase> kGarbage = {
          std::string bytes;
          return peer.ReadRaw(&bytes) == PeerConnection::Read::kData && peer.SendRaw(bytes);
        });
-       return Joined({echo}, EndOfStream());
+       return Concat({echo}, EndOfStream());
      },
      kProtocol},
 };
@@ -219,10 +219,10 @@ std::vector<HandshakeCase> ChangeTable() {
   for (const auto& [name, change] : kChanges) {
     for (const size_t record : {0, 1, 2}) {
       const auto peer12 = [record, change = change] {
-        return Joined({SendFlightWith(Tls12(), record, change)}, EndOfStream());
+        return Concat({SendFlightWith(Tls12(), record, change)}, EndOfStream());
       };
       const auto peer13 = [record, change = change] {
-        return Joined({SendFlightWith(Tls13(), record + 2, change)}, EndOfStream());
+        return Concat({SendFlightWith(Tls13(), record + 2, change)}, EndOfStream());
       };
       const std::string name12 = "Tls12Record" + std::to_string(record) + name;
       // Nobody checks the signature of the certificate.
@@ -240,7 +240,7 @@ Step SendHandshakeByteByByte(const SharedTls& tls) {
       made = tls->MakeRecords();
       for (const std::string& record : tls->Queue()) {
         for (const char byte : record) {
-          // Behind the handshake come tickets, which the client need not wait for.
+          // After the handshake come tickets, which the client need not wait for.
           if (!peer.SendRaw(std::string(1, byte))) return made == 1;
         }
       }
@@ -257,7 +257,7 @@ std::vector<HandshakeCase> SoundTable() {
     return HandshakeCase{name,
                          [=] {
                            const Script rest = {FinishHandshake(TlsOf(version)), DiscardUntilEnd()};
-                           return Joined(before, rest);
+                           return Concat(before, rest);
                          },
                          kNoError};
   };

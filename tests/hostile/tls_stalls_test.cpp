@@ -60,7 +60,7 @@ Script StallingPeer(const StallCase& test, const Flag& stalled, const Flag& go_o
   script.push_back(SetFlag(stalled));
   script.push_back(WaitFor(go_on));
   if (test.resumes) script.push_back(FinishHandshake(tls));
-  return Joined(script, EndOfStream());
+  return Concat(script, EndOfStream());
 }
 
 const StallCase kLibcurlStalls[] = {

@@ -12,7 +12,7 @@
 
 namespace {
 
-// Behind the handshake.
+// After the handshake.
 
 struct TrafficCase {
   std::string name;
@@ -27,7 +27,7 @@ std::ostream& operator<<(std::ostream& out, const TrafficCase& test) {
 }
 
 const std::string kHead = "HTTP/1.0 200 OK\r\nX: y\r\n\r\n";
-const std::string kReply = kHead + "body";
+const std::string kResponse = kHead + "body";
 const Outcome kWhole = Success("body");
 const Outcome kNoBody = Success("");
 const Outcome kUnread = {HTTP_RET_OK, HTTP_RET_IO_ERROR, 0, "|"};
@@ -52,14 +52,14 @@ Outcome GetOverTls(int port, int timeout) {
   return outcome;
 }
 
-// Serves a request by `reply`, then ends the stream.
+// Serves a request by `response`, then ends the stream.
 TrafficCase Serves(const std::string& name, int version,
-                   const std::function<Script(const SharedTls&)>& reply, const Outcome& expected,
+                   const std::function<Script(const SharedTls&)>& response, const Outcome& expected,
                    const std::vector<std::string>& log = {}) {
-  const auto peer = [version, reply] {
+  const auto peer = [version, response] {
     const SharedTls tls = TlsOf(version);
     const Script begin = {FinishHandshake(tls), ExpectTlsRequest(tls)};
-    return Joined(Joined(begin, reply(tls)), EndOfStream());
+    return Concat(Concat(begin, response(tls)), EndOfStream());
   };
   return {name, peer, expected, log};
 }
@@ -73,8 +73,8 @@ TrafficCase ServesRecords(const std::string& name,
       expected, log);
 }
 
-// More than 10,000 empty records between the bytes of a reply.
-std::string ReplyAmongEmptyRecords(ServerTls& tls) {
+// More than 10,000 empty records between the bytes of a response.
+std::string ResponseAmongEmptyRecords(ServerTls& tls) {
   std::string records;
   for (const char byte : kHead + std::string(400, 'b')) {
     records += InOrder({EmptyRecords(tls, 30), Data(tls, std::string(1, byte))});
@@ -85,22 +85,22 @@ std::string ReplyAmongEmptyRecords(ServerTls& tls) {
 const std::string kNoRenegotiation = {1, 90};  // a warning
 const std::vector<std::string> kFailed = {ReadFailure(kProtocol)};
 
-// A fatal alert reads as the end of the stream: OpenSSL gives 0 for it.
+// A fatal alert reads as the end of the stream: OpenSSL returns 0 for it.
 const std::vector<TrafficCase> kRecords = {
     ServesRecords(
-        "OneRecord", [](ServerTls& tls) { return Data(tls, kReply); }, kWhole),
+        "OneRecord", [](ServerTls& tls) { return Data(tls, kResponse); }, kWhole),
     ServesRecords(
         "ARecordAByte",
         [](ServerTls& tls) {
           std::string records;
-          for (const char byte : kReply) records += Data(tls, std::string(1, byte));
+          for (const char byte : kResponse) records += Data(tls, std::string(1, byte));
           return records;
         },
         kWhole),
     ServesRecords(
         "TenThousandEmptyRecords",
         [](ServerTls& tls) {
-          return InOrder({EmptyRecords(tls, 10000), Data(tls, kReply)});
+          return InOrder({EmptyRecords(tls, 10000), Data(tls, kResponse)});
         },
         kUnread, kFailed),
     ServesRecords(
@@ -109,7 +109,7 @@ const std::vector<TrafficCase> kRecords = {
           return InOrder({Data(tls, kHead), EmptyRecords(tls, 10000)});
         },
         kBodyUnread, kFailed),
-    ServesRecords("TwelveThousandEmptyRecordsAmongTheBytes", ReplyAmongEmptyRecords,
+    ServesRecords("TwelveThousandEmptyRecordsAmongTheBytes", ResponseAmongEmptyRecords,
                   Success(std::string(400, 'b'))),
     ServesRecords(
         "ARecordOf16384Bytes",
@@ -126,20 +126,20 @@ const std::vector<TrafficCase> kRecords = {
     ServesRecords(
         "AHeaderOf65535Bytes",
         [](ServerTls& tls) {
-          return InOrder({Data(tls, kHead), "\x17\x03\x03\xff\xff", kReply});
+          return InOrder({Data(tls, kHead), "\x17\x03\x03\xff\xff", kResponse});
         },
         kBodyUnread, kFailed),
     ServesRecords(
         "ARecordOfNoKey",
         [](ServerTls& tls) {
-          return InOrder({Data(tls, kHead), RawRecord(kDataRecord, kReply)});
+          return InOrder({Data(tls, kHead), RawRecord(kDataRecord, kResponse)});
         },
         kBodyUnread, kFailed),
     ServesRecords(
-        "PlainText", [](ServerTls&) { return kReply; }, kUnread, kFailed),
+        "PlainText", [](ServerTls&) { return kResponse; }, kUnread, kFailed),
     ServesRecords("ARecordThatCameBefore",
                   [](ServerTls& tls) {
-                    const std::string record = Data(tls, kReply);
+                    const std::string record = Data(tls, kResponse);
                     return record + record;
                   },
                   Success("body|"),
@@ -157,19 +157,19 @@ const std::vector<TrafficCase> kRecords = {
     ServesRecords(
         "AHeartbeat",
         [](ServerTls& tls) {
-          return InOrder({tls.Encrypted(24, {1, 64, 0}), Data(tls, kReply)});
+          return InOrder({tls.Encrypted(24, {1, 64, 0}), Data(tls, kResponse)});
         },
         kUnread, kFailed),
     ServesRecords(
         "ThreeWarnings",
         [](ServerTls& tls) {
-          return InOrder({Alerts(tls, 3, kNoRenegotiation), Data(tls, kReply)});
+          return InOrder({Alerts(tls, 3, kNoRenegotiation), Data(tls, kResponse)});
         },
         kWhole),
     ServesRecords(
         "TenThousandWarnings",
         [](ServerTls& tls) {
-          return InOrder({Alerts(tls, 10000, kNoRenegotiation), Data(tls, kReply)});
+          return InOrder({Alerts(tls, 10000, kNoRenegotiation), Data(tls, kResponse)});
         },
         kUnread, kFailed),
     ServesRecords(
@@ -194,12 +194,12 @@ const std::vector<TrafficCase> kRecords = {
         "AHandshakeMessageOfNoUse",
         [](ServerTls& tls) {
           return InOrder({tls.Encrypted(kHandshakeRecord, HandshakeMessage(20, 12, "finished....")),
-                          Data(tls, kReply)});
+                          Data(tls, kResponse)});
         },
         kUnread, kFailed),
 };
 
-// Sends what `make` gives, one raw byte at a time.
+// Sends what `make` returns, one raw byte at a time.
 Step SendMadeByteByByte(const SharedTls& tls, const std::string& bytes) {
   return RawStep("SendMadeByteByByte()", [=](PeerConnection& peer, std::string*) {
     SSL_write(tls->Ssl(), bytes.data(), static_cast<int>(bytes.size()));
@@ -233,7 +233,7 @@ TrafficCase Renews(const std::string& name, int count, int (*renew)(SSL*)) {
       name, TLS1_3_VERSION,
       [=](const SharedTls& tls) {
         const auto make = [=](ServerTls& server) { return Renewals(server, count, renew); };
-        return Script{SendMade(tls, make), SendTls(tls, kReply)};
+        return Script{SendMade(tls, make), SendTls(tls, kResponse)};
       },
       kWhole);
 }
@@ -259,10 +259,10 @@ std::vector<TrafficCase> ProtocolTable() {
   return {
       Serves(
           "Tls12RecordByteByByte", TLS1_2_VERSION,
-          [](const SharedTls& tls) { return Script{SendMadeByteByByte(tls, kReply)}; }, kWhole),
+          [](const SharedTls& tls) { return Script{SendMadeByteByByte(tls, kResponse)}; }, kWhole),
       Serves(
           "Tls13RecordByteByByte", TLS1_3_VERSION,
-          [](const SharedTls& tls) { return Script{SendMadeByteByByte(tls, kReply)}; }, kWhole),
+          [](const SharedTls& tls) { return Script{SendMadeByteByByte(tls, kResponse)}; }, kWhole),
       Serves(
           "Tls13FullRecordByteByByte", TLS1_3_VERSION,
           [](const SharedTls& tls) {
@@ -277,7 +277,7 @@ std::vector<TrafficCase> ProtocolTable() {
       Serves(
           "ASecondHandshake", TLS1_2_VERSION,
           [](const SharedTls& tls) {
-            return Script{Renegotiate(tls), SendTls(tls, kReply)};
+            return Script{Renegotiate(tls), SendTls(tls, kResponse)};
           },
           kWhole),
       Serves(
@@ -291,10 +291,10 @@ std::vector<TrafficCase> ProtocolTable() {
 
 // Sends `bytes` and a close notice.
 TrafficCase Ends(const std::string& name, const std::string& bytes, const Outcome& expected) {
-  const auto reply = [bytes](const SharedTls& tls) {
+  const auto response = [bytes](const SharedTls& tls) {
     return Script{SendTls(tls, bytes), SendTlsCloseNotice(tls)};
   };
-  return Serves(name, TLS1_3_VERSION, reply, expected);
+  return Serves(name, TLS1_3_VERSION, response, expected);
 }
 
 // The ends of a connection. An end is an end, with a close notice and without, also inside a
@@ -328,20 +328,20 @@ const std::vector<TrafficCase> kEnds = {
     ServesRecords(
         "WithDataBehindTheNotice",
         [](ServerTls& tls) {
-          return InOrder({Data(tls, kReply), tls.Encrypted(kAlertRecord, std::string("\1\0", 2)),
+          return InOrder({Data(tls, kResponse), tls.Encrypted(kAlertRecord, std::string("\1\0", 2)),
                           Data(tls, "more")});
         },
         kWhole),
     ServesRecords(
         "WithTenThousandNotices",
         [](ServerTls& tls) {
-          return InOrder({Data(tls, kReply), Alerts(tls, 10000, std::string("\1\0", 2))});
+          return InOrder({Data(tls, kResponse), Alerts(tls, 10000, std::string("\1\0", 2))});
         },
         kWhole),
     {"WithANoticeAndAnOpenConnection",
      [] {
        const SharedTls tls = Tls13();
-       return Script{FinishHandshake(tls), ExpectTlsRequest(tls), SendTls(tls, kReply),
+       return Script{FinishHandshake(tls), ExpectTlsRequest(tls), SendTls(tls, kResponse),
                      SendTlsCloseNotice(tls), DiscardUntilEnd()};
      },
      kWhole,

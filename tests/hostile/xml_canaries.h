@@ -65,7 +65,7 @@ class Canaries {
  public:
   Canaries() : watch_(inotify_init1(IN_NONBLOCK | IN_CLOEXEC)), listener_(BindLoopback(&port_)) {
     WriteFile(File(), "<!ENTITY canary 'sang'><!ELEMENT a ANY>");
-    EXPECT_GE(inotify_add_watch(watch_, folder_.Path().c_str(), IN_OPEN | IN_ACCESS), 0);
+    EXPECT_GE(inotify_add_watch(watch_, directory_.Path().c_str(), IN_OPEN | IN_ACCESS), 0);
     EXPECT_EQ(listen(listener_, 16), 0);
   }
 
@@ -77,7 +77,7 @@ class Canaries {
   Canaries(const Canaries&) = delete;
   Canaries& operator=(const Canaries&) = delete;
 
-  std::string File() const { return folder_.File("canary.dtd"); }
+  std::string File() const { return directory_.File("canary.dtd"); }
   std::string Url() const { return "http://127.0.0.1:" + std::to_string(port_) + "/canary.dtd"; }
 
   bool FileWasOpened() const { return IsReadable(watch_); }
@@ -108,7 +108,7 @@ class Canaries {
     for (size_t i; (i = text->find(mark)) != std::string::npos;) text->replace(i, mark.size(), by);
   }
 
-  TempDir folder_;
+  TempDir directory_;
   int port_ = 0;
   int watch_;
   int listener_;

@@ -315,7 +315,7 @@ class Xml : public ::testing::TestWithParam<XmlCase> {
     EXPECT_LE(held - before_, 65536) << "what libxml2 keeps for its next document";
   }
 
-  std::string Reply() const {
+  std::string Response() const {
     return "HTTP/1.1 200 OK\r\nContent-Length: " + std::to_string(document_.size()) + "\r\n\r\n" +
            document_;
   }
@@ -341,8 +341,8 @@ std::string NameOf(const ::testing::TestParamInfo<XmlCase>& test) {
 
 }  // namespace
 
-TEST_P(Xml, OfASoapReplyIsParsedOrNotAsTheTableSays) {
-  ScriptedPeer peer({Exchange(Reply())});
+TEST_P(Xml, OfASoapResponseIsParsedOrNotAsTheTableSays) {
+  ScriptedPeer peer({Exchange(Response())});
   RunOnSmallStack(kSmallStack, [&] {
     xmlSetGenericErrorFunc(nullptr, SayNothing);
     xmlDoc* doc = nullptr;
@@ -353,11 +353,11 @@ TEST_P(Xml, OfASoapReplyIsParsedOrNotAsTheTableSays) {
   });
 }
 
-TEST_P(Xml, OfAReplyToAnXmlGetIsParsedOrNotAsTheTableSays) {
+TEST_P(Xml, OfAResponseToAnXmlGetIsParsedOrNotAsTheTableSays) {
   const LogCapture log(5);
   const bool parsed =
       GetParam().parsed == Parsed::kByBoth || GetParam().parsed == Parsed::kByRestAlone;
-  ScriptedPeer peer({Exchange(Reply())});
+  ScriptedPeer peer({Exchange(Response())});
   RunOnSmallStack(kSmallStack, [&] {
     xmlSetGenericErrorFunc(nullptr, SayNothing);
     xmlDoc* doc = nullptr;

@@ -59,12 +59,12 @@ std::string Ha2() {
 
 }  // namespace
 
-TEST(GenBasicAccessAuth, TheLineIsTheBase64OfUserColonPasswordWithoutALineEnd) {
+TEST(GenBasicAccessAuth, TheLineIsTheBase64OfUserColonPasswordWithoutACrlf) {
   ClientProbe client(80, {"", HTTP_VERSION_NONE, "u", "p"});
   EXPECT_EQ(client.GenBasicAccessAuth(), "Authorization: Basic dTpw");
 }
 
-TEST(GenDigestAccessAuth, WithoutQopTheLineEndsBehindTheResponseOfHa1NonceAndHa2) {
+TEST(GenDigestAccessAuth, WithoutQopTheLineEndsAfterTheResponseOfHa1NonceAndHa2) {
   Challenged client(" Digest realm=\"r\", nonce=\"n\"");
   EXPECT_EQ(client.Answer(),
             "Authorization: Digest username=\"u\", realm=\"r\", nonce=\"n\", uri=\"/cgi/a?x=1\", "
@@ -98,14 +98,14 @@ TEST(GenDigestAccessAuth, ValuesSeparatedByCommaAndBlanksComeWithoutBlanksOrQuot
   EXPECT_EQ(values.at("algorithm"), "MD5");
 }
 
-TEST(GenDigestAccessAuth, AnEmptyPathGivesTheUriOfASlash) {
+TEST(GenDigestAccessAuth, AnEmptyPathHasTheUriOfASlash) {
   Challenged client("Digest realm=\"r\", nonce=\"n\"", "");
   const std::string line = client.Answer();
   EXPECT_EQ(ParameterOf(line, "uri"), "/");
   EXPECT_EQ(ParameterOf(line, "response"), Md5(Ha1() + ":n:" + Md5("GET:/")));
 }
 
-TEST(GenBasicAccessAuth, LongAndEmptyLoginsAreEncodedWhole) {
+TEST(GenBasicAccessAuth, LongAndEmptyCredentialsAreEncodedWhole) {
   ClientProbe client(80);
   EXPECT_EQ(client.GenBasicAccessAuth(), "Authorization: Basic Og==");
   client.m_strUser = "Aladdin";
@@ -145,7 +145,7 @@ TEST(DigestResponse, TheExampleOfRfc2069HasItsPublishedResponse) {
             "1949323746fe6a43ef61f9606e7febea");
 }
 
-TEST(DigestResponse, TheMethodCounts) {
+TEST(DigestResponse, TheMethodIsPartOfIt) {
   DIGEST_ACCESS_AUTH login = SampleLogin();
   const std::string ha1 = Md5("Mufasa:testrealm@host.com:w");
   EXPECT_EQ(DigestResponse(login, "w", "POST"),
@@ -184,7 +184,7 @@ TEST(DigestResponse, AnyOtherQopIsLeftOut) {
   }
 }
 
-TEST(DigestResponse, TheAlgorithmDoesNotCount) {
+TEST(DigestResponse, TheAlgorithmIsIgnored) {
   DIGEST_ACCESS_AUTH login = SampleLogin();
   login.algorithm = "MD5-sess";
   EXPECT_EQ(DigestResponse(login, "w", "GET"), DigestResponse(SampleLogin(), "w", "GET"));
@@ -222,7 +222,7 @@ TEST(GenDigestAccessAuth, AnMd5SessChallengeIsComputedAsPlainMd5) {
   EXPECT_THAT(line, EndsWith(", algorithm=\"MD5-sess\""));
 }
 
-TEST(GenDigestAccessAuth, AChallengeWithoutRealmAndNonceGivesEmptyValues) {
+TEST(GenDigestAccessAuth, ForAChallengeWithoutRealmAndNonceTheirValuesAreEmpty) {
   Challenged client("Digest");
   EXPECT_EQ(client.Answer(),
             "Authorization: Digest username=\"u\", realm=\"\", nonce=\"\", uri=\"/cgi/a?x=1\", "
@@ -267,7 +267,7 @@ TEST(ParseChallenge, ANameWithoutAnEqualsSignHasNoValue) {
   EXPECT_EQ(ParseChallenge("Digest qop=auth, stale").at("stale"), "");
 }
 
-TEST(ParseChallenge, BlanksAreStrippedBeforeQuotesAndNotAgainBehindThem) {
+TEST(ParseChallenge, BlanksAreStrippedBeforeQuotesAndNotAgainAfterThem) {
   EXPECT_EQ(ParseChallenge("Digest realm=  \" a \"  ,").at("realm"), " a ");
   EXPECT_EQ(ParseChallenge("Digest realm=\"\"a\"\"").at("realm"), "a");
   EXPECT_EQ(ParseChallenge("Digest realm=\"\t").at("realm"), "\t");
@@ -294,7 +294,7 @@ TEST(MakeClientNonce, ItIsSixteenBytesFromTheProcessIdAndTheTime) {
   EXPECT_EQ(MakeClientNonce(), HexOf(bytes));
 }
 
-TEST(MakeClientNonce, TwoCallsWithinASecondGiveTheSameAndTheNextSecondGivesAnother) {
+TEST(MakeClientNonce, TwoCallsWithinASecondReturnTheSameAndTheNextSecondReturnsAnother) {
   Faults faults;
   time_t now = 2000000000;  // the product wraps
   faults.Clock([&now] { return timeval{now, 999999}; });

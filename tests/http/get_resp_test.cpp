@@ -21,8 +21,8 @@ void WriteOwnRequest(ClientProbe& client) {
             static_cast<int>(request.size()));
 }
 
-std::string GetRespOf(const std::string& reply, const Transport& transport = {false, true}) {
-  const auto peer = NewPeer(transport, {Exchange(reply)});
+std::string GetRespOf(const std::string& response, const Transport& transport = {false, true}) {
+  const auto peer = NewPeer(transport, {Exchange(response)});
   ClientProbe client(peer->Port(), SettingsOf(transport));
   WriteOwnRequest(client);
   return client.GetResp();
@@ -42,7 +42,7 @@ TEST(GetResp, AChunkedBodyIsDecoded) {
   EXPECT_EQ(GetRespOf(Chunked(kWikipedia)), "Wikipedia");
 }
 
-TEST(GetResp, AChunkExtensionDoesNotCount) {
+TEST(GetResp, AChunkExtensionIsIgnored) {
   EXPECT_EQ(GetRespOf(Chunked("1A;ext=1\r\nabcdefghijklmnopqrstuvwxyz\r\n0\r\n\r\n")),
             "abcdefghijklmnopqrstuvwxyz");
 }
@@ -52,7 +52,7 @@ TEST(GetResp, ChunkedWithACapitalIsNotDecoded) {
             kWikipedia);
 }
 
-TEST(GetResp, AStatusThatIsNo2xxGivesTheErrorTextAndLeavesTheBody) {
+TEST(GetResp, AStatusThatIsNo2xxReturnsTheErrorTextAndLeavesTheBody) {
   for (const char* status : {"404 No", "302 Found", "401 No", "414 Long", "500 Oops", "199 x"}) {
     ScriptedPeer peer({Exchange("HTTP/1.1 "s + status + "\r\n\r\nunread")});
     ClientProbe client(peer.Port());
@@ -62,7 +62,7 @@ TEST(GetResp, AStatusThatIsNo2xxGivesTheErrorTextAndLeavesTheBody) {
   }
 }
 
-TEST(GetResp, AServerThatClosesInTheMiddleOfAChunkGivesTheBytesThatCame) {
+TEST(GetResp, AServerThatClosesInTheMiddleOfAChunkReturnsTheBytesThatCame) {
   ForEachTransport([](const Transport& transport) {
     EXPECT_EQ(GetRespOf(Chunked("4\r\nWiki\r\n9\r\npedi"), transport), "Wikipedi");
     EXPECT_EQ(GetRespOf(Chunked("ffff\r\n"), transport), "");
@@ -87,7 +87,7 @@ TEST(GetResp, ItServesAfterAnUpload) {
   });
 }
 
-TEST(GetResp, AfterASenderThatHasReadTheHeadItGivesTheErrorText) {
+TEST(GetResp, AfterASenderThatHasReadTheHeadItReturnsTheErrorText) {
   ForEachTransport([](const Transport& transport) {
     const auto peer = NewPeer(transport, {Exchange(Plain("body")), Exchange(Plain("body"))});
     ClientProbe client(peer->Port(), SettingsOf(transport));
@@ -98,7 +98,7 @@ TEST(GetResp, AfterASenderThatHasReadTheHeadItGivesTheErrorText) {
   });
 }
 
-TEST(GetResp, WithoutAConnectionItGivesTheErrorText) {
+TEST(GetResp, WithoutAConnectionItReturnsTheErrorText) {
   ClientProbe without_socket;
   EXPECT_EQ(without_socket.GetResp(), kErrorText);
   ClientProbe unconnected(1);
@@ -116,10 +116,11 @@ TEST(GetResp, TheHeadIsKeptAsAfterASender) {
 }
 
 TEST(GetResp, AHeadThatCannotBeReadIsLoggedAtDebug) {
-  for (const char* reply : {"", "HTTP/1.1\r\n\r\n", "HTTP/2 200\r\n\r\n", "HTTP/1.1 404 No\r\n\r\n",
-                            "HTTP/1.1 200 OK\r\nContent-Type:\r\n\r\n"}) {
+  for (const char* response :
+       {"", "HTTP/1.1\r\n\r\n", "HTTP/2 200\r\n\r\n", "HTTP/1.1 404 No\r\n\r\n",
+        "HTTP/1.1 200 OK\r\nContent-Type:\r\n\r\n"}) {
     LogCapture log;
-    EXPECT_EQ(GetRespOf(reply), kErrorText);
+    EXPECT_EQ(GetRespOf(response), kErrorText);
     EXPECT_THAT(LinesOf(log, "GetResp"),
                 ElementsAre(IsHttpLog("debug", "GetResp", "Http Resp error\n")));
   }
@@ -138,18 +139,18 @@ TEST(GetResp, TheBodyIsLoggedAtDebug2) {
   EXPECT_THAT(log.Lines("http"), IsEmpty());
 }
 
-TEST(GetResp, AReadErrorGivesTheErrorTextAndALine) {
+TEST(GetResp, AReadErrorReturnsTheErrorTextAndALine) {
   const std::string head = Plain("");
   const int head_size = static_cast<int>(head.size());
-  for (const std::string& reply : {Plain("part"), Chunked("9\r\npart")}) {
-    ScriptedPeer peer({Exchange(reply)});
+  for (const std::string& response : {Plain("part"), Chunked("9\r\npart")}) {
+    ScriptedPeer peer({Exchange(response)});
     ClientProbe client(peer.Port(), SettingsOf({false, false}));
     WriteOwnRequest(client);
     LogCapture log;
     log.SetLevel(kHttpCategory, 6);
     {
       Faults faults;  // a direct client reads the head byte by byte, then "part" at once
-      faults.FailFrom(Call::kRead, static_cast<int>(reply.size()) - 4 + 2);
+      faults.FailFrom(Call::kRead, static_cast<int>(response.size()) - 4 + 2);
       EXPECT_EQ(client.GetResp(), kErrorText);
       EXPECT_GT(faults.Count(Call::kRead), head_size);
     }

@@ -21,7 +21,7 @@ using ::testing::IsEmpty;
 // Sends GETs that collect these bodies.
 void Collect(ClientProbe& client, const std::vector<std::string>& bodies) {
   for (const std::string& body : bodies) {
-    ScriptedPeer peer({Exchange(Reply(body))});
+    ScriptedPeer peer({Exchange(Response(body))});
     client.m_port = peer.Port();
     EXPECT_EQ(client.SendReqByXMLGet(7), HTTP_RET_OK);
   }
@@ -46,46 +46,46 @@ TEST(GetResponseXML, TwoGetsInARowLeaveBothBodiesWhichTogetherAreNoDocument) {
 TEST(GetResponseXML, ASecondCallFindsNothingAndLeavesTheDocument) {
   ClientProbe client(80);
   Collect(client, {"<a>text</a>"});
-  OwnedDoc reply;
+  OwnedDoc response;
   LogCapture log;
-  EXPECT_TRUE(client.GetResponseXML(reply.doc));
-  ASSERT_NE(reply.doc, nullptr);
-  EXPECT_STREQ(reinterpret_cast<const char*>(xmlDocGetRootElement(reply.doc)->name), "a");
+  EXPECT_TRUE(client.GetResponseXML(response.doc));
+  ASSERT_NE(response.doc, nullptr);
+  EXPECT_STREQ(reinterpret_cast<const char*>(xmlDocGetRootElement(response.doc)->name), "a");
   EXPECT_EQ(client.m_pRespBuf, nullptr);
   EXPECT_EQ(client.m_respLen, 0u);
   EXPECT_THAT(log.Lines(), IsEmpty());
-  xmlDoc* const first = reply.doc;
-  EXPECT_FALSE(client.GetResponseXML(reply.doc));
-  EXPECT_EQ(reply.doc, first);
+  xmlDoc* const first = response.doc;
+  EXPECT_FALSE(client.GetResponseXML(response.doc));
+  EXPECT_EQ(response.doc, first);
   EXPECT_THAT(log.Lines(),
               ElementsAre(IsHttpLog("debug", "GetResponseXML", "Empty xml response\n")));
 }
 
 // The collected answers.
 
-TEST(GetResponseXML, EachSendersAnswerIsCollected) {
+TEST(GetResponseXML, EachSendersResponseIsCollected) {
   for (const Sender& sender : Senders()) {
-    ScriptedPeer peer({Exchange(Reply("<of>" + std::string(sender.name) + "</of>"))});
-    ClientProbe client(peer.Port(), WithLogin("127.0.0.1"));
+    ScriptedPeer peer({Exchange(Response("<of>" + std::string(sender.name) + "</of>"))});
+    ClientProbe client(peer.Port(), WithCredentials("127.0.0.1"));
     EXPECT_EQ(Send(sender, client), HTTP_RET_OK);
-    OwnedDoc reply;
-    EXPECT_TRUE(client.GetResponseXML(reply.doc));
-    xmlChar* content = xmlNodeGetContent(xmlDocGetRootElement(reply.doc));
+    OwnedDoc response;
+    EXPECT_TRUE(client.GetResponseXML(response.doc));
+    xmlChar* content = xmlNodeGetContent(xmlDocGetRootElement(response.doc));
     EXPECT_STREQ(reinterpret_cast<char*>(content), sender.name);
     xmlFree(content);
   }
 }
 
-TEST(GetResponseXML, AnAnswerOfManyPiecesIsCollectedWhole) {
+TEST(GetResponseXML, AResponseOfManyPiecesIsCollectedWhole) {
   ClientProbe client(80);
   const std::string body = DocumentOf(300000);
   Collect(client, {body});
   EXPECT_TRUE(Collected(client) == body);
-  OwnedDoc reply;
-  EXPECT_TRUE(client.GetResponseXML(reply.doc));
+  OwnedDoc response;
+  EXPECT_TRUE(client.GetResponseXML(response.doc));
 }
 
-TEST(GetResponseXML, ABodyThatIsNoXmlGivesANullDocumentAndIsEmptied) {
+TEST(GetResponseXML, ABodyThatIsNoXmlIsANullDocumentAndIsEmptied) {
   ClientProbe client(80);
   Collect(client, {"no xml"});
   OwnedDoc earlier("<e/>");
@@ -97,7 +97,7 @@ TEST(GetResponseXML, ABodyThatIsNoXmlGivesANullDocumentAndIsEmptied) {
   EXPECT_EQ(Collected(client), "<next/>");
 }
 
-TEST(GetResponseXML, AnAnswerThatNobodyFetchesGoesWithTheClient) {
+TEST(GetResponseXML, AResponseThatNobodyFetchesIsFreedWithTheClient) {
   ClientProbe client(80);
   Collect(client, {"<a/>"});
   EXPECT_EQ(Collected(client), "<a/>");
@@ -130,7 +130,7 @@ TEST(GetResponseXML, AfterAnAllocationFailedThereIsNothingToParse) {
               ElementsAre(IsHttpLog("debug", "GetResponseXML", "Empty xml response\n")));
 }
 
-TEST(GetResponseXML, AfterALostAnswerTheNextParseSeesNoUnsetByte) {
+TEST(GetResponseXML, AfterALostResponseTheNextParseSeesNoUnsetByte) {
   ClientProbe client(80);
   Collect(client, {"<a/>"});
   const std::unique_ptr<char, decltype(&free)> lost(client.m_pRespBuf, &free);

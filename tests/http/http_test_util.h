@@ -65,9 +65,9 @@ class ClientProbe : public TWHttpClient {
   using TWHttpClient::m_strUser;
 };
 
-// A client that has sent a GET to a peer which answered with `reply` and closed.
-inline std::unique_ptr<ClientProbe> ClientAfter(const std::string& reply) {
-  ScriptedPeer peer({Exchange(reply)});
+// A client that has sent a GET to a peer which answered with `response` and closed.
+inline std::unique_ptr<ClientProbe> ClientAfter(const std::string& response) {
+  ScriptedPeer peer({Exchange(response)});
   auto client = std::make_unique<ClientProbe>(peer.Port());
   EXPECT_EQ(client->SendRequestByGet(), HTTP_RET_OK);
   return client;
@@ -94,31 +94,31 @@ MATCHER_P3(IsHttpLog, level, function, message, "") {
          arg.function == function && arg.message == message;
 }
 
-// Makes libcurl trust one authority and no other: covers the system's certificate folder, inside
+// Makes libcurl trust one authority and no other: covers the system's certificate directory, inside
 // the sandbox, for as long as it lives.
 class TrustedAuthority {
  public:
   explicit TrustedAuthority(const std::string& ca_file) {
     const char* bundle = curl_version_info(CURLVERSION_NOW)->cainfo;
     const std::string path = bundle != nullptr ? bundle : "/etc/ssl/certs/ca-certificates.crt";
-    folder_ = path.substr(0, path.rfind('/'));
-    if (mount("tmpfs", folder_.c_str(), "tmpfs", 0, "mode=755") != 0) {
-      ADD_FAILURE() << "cannot cover " << folder_ << " (the package openssl makes it)";
-      folder_.clear();
+    directory_ = path.substr(0, path.rfind('/'));
+    if (mount("tmpfs", directory_.c_str(), "tmpfs", 0, "mode=755") != 0) {
+      ADD_FAILURE() << "cannot cover " << directory_ << " (the package openssl makes it)";
+      directory_.clear();
       return;
     }
     WriteFile(path, ReadFile(ca_file));
   }
 
   ~TrustedAuthority() {
-    if (!folder_.empty()) umount2(folder_.c_str(), MNT_DETACH);
+    if (!directory_.empty()) umount2(directory_.c_str(), MNT_DETACH);
   }
 
   TrustedAuthority(const TrustedAuthority&) = delete;
   TrustedAuthority& operator=(const TrustedAuthority&) = delete;
 
  private:
-  std::string folder_;
+  std::string directory_;
 };
 
 // Over TLS: the client breaks the handshake off.

@@ -17,16 +17,16 @@ std::string Ok(const std::string& body) {
   return "HTTP/1.1 200 OK\r\nContent-Length: " + std::to_string(body.size()) + "\r\n\r\n" + body;
 }
 
-// The result of SendHttpGet when the server answers with `reply`.
-int GetOf(const std::string& reply) {
-  ScriptedPeer peer({Exchange(reply)});
+// The result of SendHttpGet when the server answers with `response`.
+int GetOf(const std::string& response) {
+  ScriptedPeer peer({Exchange(response)});
   Json::Value result;
   return SendHttpGet("127.0.0.1", peer.Port(), "api", result, 5, false);
 }
 
-// The result of SendHttpsGet when the server answers with `reply`.
-int HttpsGetOf(const std::string& reply) {
-  TlsScriptedPeer peer({Exchange(reply)});
+// The result of SendHttpsGet when the server answers with `response`.
+int HttpsGetOf(const std::string& response) {
+  TlsScriptedPeer peer({Exchange(response)});
   const TrustedAuthority trusted(peer.CaFile());
   Json::Value result;
   return SendHttpsGet("127.0.0.1", peer.Port(), "api", result, 10);
@@ -89,7 +89,7 @@ TEST(SendHttpGet, WithEncodingLineFeedsStayAndTheValuesAreEncoded) {
   EXPECT_EQ(TargetOf("a\nb?x=\n1 2/", true), "/a\nb?x=%201%202%2F");
 }
 
-TEST(SendHttpsGet, AServerWithASelfSignedCertificateGivesMinusTwo) {
+TEST(SendHttpsGet, AServerWithASelfSignedCertificateIsMinusTwo) {
   TlsOptions tls;
   tls.self_signed = true;
   TlsScriptedPeer peer({{ExpectRefusedHandshake()}}, tls);
@@ -102,7 +102,7 @@ TEST(SendHttpsGet, AServerWithASelfSignedCertificateGivesMinusTwo) {
                                     "Failed to make http connection, return value=60\n")));
 }
 
-TEST(SendHttpGet, TheReplyIsHandedOver) {
+TEST(SendHttpGet, TheResponseIsHandedOver) {
   ScriptedPeer peer({Exchange(Ok("{\"success\":true,\"data\":[1,\"\xc3\xa4\"]}"))});
   Json::Value result;
   EXPECT_EQ(SendHttpGet("127.0.0.1", peer.Port(), "/api?x=1", result, 5, false), 0);
@@ -120,12 +120,12 @@ TEST(SendHttpGet, ABodyOfManyPiecesIsReadToItsEnd) {
   EXPECT_EQ(result["x"].asString().size(), 300000u);
 }
 
-TEST(SendHttpGet, AReplyCutAtEveryByteHasADocumentedResult) {
-  const std::string reply = "HTTP/1.1 200 OK\r\nA: b\r\n\r\n{\"success\":true}";
-  const size_t body_at = reply.find('{');
-  for (size_t n = 0; n <= reply.size(); ++n) {
-    const int expected = n == reply.size() ? 0 : n > body_at ? -2 : -1;
-    EXPECT_EQ(GetOf(reply.substr(0, n)), expected) << n;
+TEST(SendHttpGet, AResponseCutAtEveryByteHasADocumentedResult) {
+  const std::string response = "HTTP/1.1 200 OK\r\nA: b\r\n\r\n{\"success\":true}";
+  const size_t body_at = response.find('{');
+  for (size_t n = 0; n <= response.size(); ++n) {
+    const int expected = n == response.size() ? 0 : n > body_at ? -2 : -1;
+    EXPECT_EQ(GetOf(response.substr(0, n)), expected) << n;
   }
 }
 
@@ -137,7 +137,7 @@ TEST(SendHttpGet, ItReadsAhead) {
   EXPECT_EQ(faults.Sizes(Call::kRead).front(), 64512u);
 }
 
-TEST(SendHttpGet, AReplyByteByByteIsReadWhole) {
+TEST(SendHttpGet, AResponseByteByByteIsReadWhole) {
   ScriptedPeer peer({ExchangeByteByByte(Ok("{\"success\":true}"))});
   Json::Value result;
   EXPECT_EQ(SendHttpGet("127.0.0.1", peer.Port(), "api", result, 5, false), 0);
@@ -162,9 +162,9 @@ TEST(SendHttpGet, AnotherStatusIsLoggedAtInfoWithStatusAndResult) {
       {"HTTP/1.1 401 No\r\n\r\n", "Failed to check response[401]: 4\n"},
       {"HTTP/1.1 200 OK\r\n:\r\n\r\n", "Failed to check response[200]: 1\n"},
       {"HTTP/1.1\r\n\r\n", "Failed to check response[0]: 3\n"}};
-  for (const auto& [reply, message] : table) {
+  for (const auto& [response, message] : table) {
     LogCapture log;
-    EXPECT_EQ(GetOf(reply), -1);
+    EXPECT_EQ(GetOf(response), -1);
     EXPECT_THAT(LinesOf(log, "SendHttpGet"),
                 ElementsAre(IsHttpLog("info", "SendHttpGet", message)));
   }
@@ -184,7 +184,7 @@ TEST(SendHttpGet, AFailedReadIsLoggedAtInfoWithErrno) {
               ElementsAre(IsHttpLog("info", "SendHttpGet", "Failed to read data: 104\n")));
 }
 
-TEST(SendHttpGet, AReadThatFailsBehindAPartOfTheBodyFailsTheCall) {
+TEST(SendHttpGet, AReadThatFailsAfterAPartOfTheBodyFailsTheCall) {
   const std::string start = "HTTP/1.1 200 OK\r\n\r\n{\"success\"";
   ScriptedPeer peer({{ExpectRequest(), Send(start + ":true}"), DiscardUntilEnd()}});
   Json::Value result = "kept";
@@ -221,7 +221,7 @@ TEST(SendHttpGet, ABodyThatIsNoJsonIsLoggedByTheParserAndAtError) {
   EXPECT_THAT(log.Text(), HasSubstr(":JsonParse(): Failed to parse json: [%s no json] with error"));
 }
 
-TEST(SendHttpGet, AMissingSuccessLeavesTheParsedReply) {
+TEST(SendHttpGet, AMissingSuccessLeavesTheParsedResponse) {
   ScriptedPeer peer({Exchange(Ok("{\"error\":7}"))});
   Json::Value result;
   EXPECT_EQ(SendHttpGet("127.0.0.1", peer.Port(), "api", result, 5, false), -2);
@@ -263,7 +263,7 @@ TEST(SendHttpGet, DeepNestingPassesOnASmallStack) {
   });
 }
 
-TEST(SendHttpsGet, TheRequestGoesOutAsAGetWithTheEmptyLogin) {
+TEST(SendHttpsGet, TheRequestIsAGetWithEmptyCredentials) {
   TlsScriptedPeer peer({Exchange(Ok("{\"success\":true,\"d\":5}"))});
   const TrustedAuthority trusted(peer.CaFile());
   Json::Value result;
@@ -278,7 +278,7 @@ TEST(SendHttpsGet, TheRequestGoesOutAsAGetWithTheEmptyLogin) {
   EXPECT_FALSE(faults.HasOption(CURLOPT_SSL_VERIFYHOST));
 }
 
-TEST(SendHttpsGet, AnyOtherFailureGivesMinusOneAndNoLineOfItsOwn) {
+TEST(SendHttpsGet, AnyOtherFailureIsMinusOneWithoutALineOfItsOwn) {
   const ClosedPort port;
   LogCapture log;
   Json::Value result = "kept";
@@ -297,7 +297,7 @@ TEST(SendHttpsGet, ABodyWithoutSuccessIsLoggedAtError) {
                                     "Failed to parse json. Result is [{\"data\":1}]\n")));
 }
 
-TEST(SendHttpsGet, AMissingHandleGivesMinusOne) {
+TEST(SendHttpsGet, AMissingHandleIsMinusOne) {
   Faults faults;
   faults.FailNth(Call::kCurlEasyInit, 1);
   Json::Value result;

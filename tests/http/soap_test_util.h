@@ -11,7 +11,7 @@ inline constexpr char kSoapType[] = "Content-Type: application/soap+xml; charset
 inline constexpr char kDigest[] = "Digest realm=\"r\", nonce=\"n\"";
 inline constexpr int kMebibyte = 1 << 20;
 
-// A reply that announces `announced` bytes.
+// A response that announces `announced` bytes.
 inline std::string Announcing(const std::string& announced, const std::string& body,
                               const std::string& status = "200 OK") {
   return "HTTP/1.1 " + status + "\r\nContent-Length: " + announced + "\r\n\r\n" + body;
@@ -30,7 +30,7 @@ inline std::string RequestText(const std::string& authorization, const std::stri
          "Content-Length: " + std::to_string(body.size()) + "\r\n\r\n" + body;
 }
 
-inline ClientSettings WithLogin() {
+inline ClientSettings WithCredentials() {
   ClientSettings settings;
   settings.user = "u";
   settings.password = "p";
@@ -39,31 +39,31 @@ inline ClientSettings WithLogin() {
 
 struct SoapOutcome {
   int result = -1;
-  std::string reply = "old";
+  std::string response = "old";
   int kept = -1;  // the client's m_result
 };
 
 inline bool operator==(const SoapOutcome& a, const SoapOutcome& b) {
-  return a.result == b.result && a.reply == b.reply && a.kept == b.kept;
+  return a.result == b.result && a.response == b.response && a.kept == b.kept;
 }
 
 inline std::ostream& operator<<(std::ostream& out, const SoapOutcome& outcome) {
-  return out << outcome.result << ", reply [" << outcome.reply.substr(0, 200) << "] of "
-             << outcome.reply.size() << " bytes, kept " << outcome.kept;
+  return out << outcome.result << ", response [" << outcome.response.substr(0, 200) << "] of "
+             << outcome.response.size() << " bytes, kept " << outcome.kept;
 }
 
-inline SoapOutcome SoapOf(const std::string& reply, const ClientSettings& settings = {}) {
-  ScriptedPeer peer({Exchange(reply)});
+inline SoapOutcome SoapOf(const std::string& response, const ClientSettings& settings = {}) {
+  ScriptedPeer peer({Exchange(response)});
   ClientProbe client(peer.Port(), settings);
   SoapOutcome outcome;
-  outcome.result = client.SendReqBySocketPost("x", outcome.reply);
+  outcome.result = client.SendReqBySocketPost("x", outcome.response);
   outcome.kept = client.m_result;
   return outcome;
 }
 
 inline SoapOutcome AuthOf(ClientProbe& client) {
   SoapOutcome outcome;
-  outcome.result = client.SendAuthReqBySocketPost("x", outcome.reply);
+  outcome.result = client.SendAuthReqBySocketPost("x", outcome.response);
   outcome.kept = client.m_result;
   return outcome;
 }

@@ -9,7 +9,7 @@ using namespace tarnwick;
 
 namespace {
 
-constexpr char kPlainReply[] = "HTTP/1.1 200 OK\r\nContent-Length: 4\r\n\r\nbody";
+constexpr char kPlainResponse[] = "HTTP/1.1 200 OK\r\nContent-Length: 4\r\n\r\nbody";
 
 }  // namespace
 
@@ -63,7 +63,7 @@ TEST(TWHttpClientBeforeInit, TheAccessorsWork) {
 }
 
 TEST(TWHttpClientBadInput, NullAndNegativeArgumentsAreRefused) {
-  const auto client = ClientAfter(kPlainReply);
+  const auto client = ClientAfter(kPlainResponse);
   char buf[8] = "kept";
   EXPECT_EQ(client->ReadData(nullptr, 4), -1);
   EXPECT_EQ(client->ReadData(buf, -1), -1);
@@ -78,7 +78,7 @@ TEST(TWHttpClientBadInput, NullAndNegativeArgumentsAreRefused) {
 }
 
 TEST(TWHttpClientBadInput, RestoreDataBeyondTheBufferIsRefusedAndLosesNothing) {
-  const auto client = ClientAfter(kPlainReply);
+  const auto client = ClientAfter(kPlainResponse);
   std::string large(65536, 'x');
   EXPECT_EQ(client->RestoreData(large.data(), 65536), -1);
   EXPECT_EQ(client->RestoreData(large.data(), 65532), 0);

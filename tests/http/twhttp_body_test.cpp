@@ -35,15 +35,15 @@ Body BodyOf(TWHttpClient& client) {
   return body;
 }
 
-// The body that ReadBody gives after a GET.
-Body BodyOfReply(const std::string& reply, const Transport& transport = {false, true}) {
-  const auto peer = NewPeer(transport, {Exchange(reply)});
+// The body that ReadBody returns after a GET.
+Body BodyOfResponse(const std::string& response, const Transport& transport = {false, true}) {
+  const auto peer = NewPeer(transport, {Exchange(response)});
   ClientProbe client(peer->Port(), SettingsOf(transport));
   EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
   return BodyOf(client);
 }
 
-// Makes every read of the body fail once the bytes right behind the head have come. A
+// Makes every read of the body fail once the bytes right after the head have come. A
 // buffered client has it already; a direct one has read just the head.
 void FailReadsBehind(Faults& faults, const Transport& transport) {
   faults.FailFrom(transport.tls ? Call::kSslRead : Call::kRead, transport.buffered ? 1 : 2);
@@ -55,9 +55,9 @@ void FailReadsBehind(Faults& faults, const Transport& transport) {
 
 TEST(ReadBody, ItServesAfterEachSenderThatReadsTheHead) {
   ForEachTransport([](const Transport& transport) {
-    for (const std::string& reply : {Plain("Wikipedia"), Chunked(kWikipedia)}) {
-      EXPECT_EQ(BodyOfReply(reply, transport), (Body{HTTP_RET_OK, "Wikipedia"}));
-      const auto peer = NewPeer(transport, {Exchange(reply), Exchange(reply)});
+    for (const std::string& response : {Plain("Wikipedia"), Chunked(kWikipedia)}) {
+      EXPECT_EQ(BodyOfResponse(response, transport), (Body{HTTP_RET_OK, "Wikipedia"}));
+      const auto peer = NewPeer(transport, {Exchange(response), Exchange(response)});
       ClientProbe client(peer->Port(), SettingsOf(transport));
       EXPECT_EQ(client.SendRequest(HTTP_METHOD_GET, "?"), HTTP_RET_OK);
       EXPECT_EQ(BodyOf(client), (Body{HTTP_RET_OK, "Wikipedia"}));
@@ -74,7 +74,7 @@ TEST(ReadBody, WhatTheStringHeldBeforeIsReplaced) {
   EXPECT_EQ(body, "new");
 }
 
-TEST(ReadBody, AfterALoginItGivesTheSecondBody) {
+TEST(ReadBody, AfterAChallengeItReturnsTheSecondBody) {
   ScriptedPeer peer(
       {{ExpectRequest(), Send("HTTP/1.1 401 No\r\nWWW-Authenticate: Basic x\r\n\r\nfirst"),
         DiscardUntilEnd()},
@@ -85,7 +85,7 @@ TEST(ReadBody, AfterALoginItGivesTheSecondBody) {
 }
 
 TEST(ReadBody, TheBodyOfAFailureIsReadAsWell) {
-  EXPECT_EQ(BodyOfReply("HTTP/1.1 500 Oops\r\n\r\nreason"), (Body{HTTP_RET_OK, "reason"}));
+  EXPECT_EQ(BodyOfResponse("HTTP/1.1 500 Oops\r\n\r\nreason"), (Body{HTTP_RET_OK, "reason"}));
 }
 
 TEST(ReadBody, WithoutAHeadItIsAnIoError) {
@@ -93,11 +93,11 @@ TEST(ReadBody, WithoutAHeadItIsAnIoError) {
   EXPECT_EQ(BodyOf(without_socket), (Body{HTTP_RET_IO_ERROR, ""}));
   ClientProbe unconnected(1);
   EXPECT_EQ(BodyOf(unconnected), (Body{HTTP_RET_IO_ERROR, ""}));
-  EXPECT_EQ(BodyOfReply("HTTP/1.1 200 OK\r\nContent-Type:\r\n\r\nbody"),
+  EXPECT_EQ(BodyOfResponse("HTTP/1.1 200 OK\r\nContent-Type:\r\n\r\nbody"),
             (Body{HTTP_RET_IO_ERROR, ""}));
 }
 
-TEST(ReadBody, WithoutAHeadAnEarlierRepliesChunkedCodingDoesNotMakeItSucceed) {
+TEST(ReadBody, WithoutAHeadTheChunkedCodingOfAnEarlierResponseDoesNotMakeItSucceed) {
   ScriptedPeer peer({Exchange(Chunked(kWikipedia)), RequestThenClose()});
   ClientProbe client(peer.Port());
   EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
@@ -109,17 +109,18 @@ TEST(ReadBody, WithoutAHeadAnEarlierRepliesChunkedCodingDoesNotMakeItSucceed) {
 // A body without chunks.
 
 TEST(ReadBody, ItEndsWhereTheServerClosesWhateverTheLength) {
-  EXPECT_EQ(BodyOfReply("HTTP/1.1 200 OK\r\nContent-Length: 2\r\n\r\nlonger"),
+  EXPECT_EQ(BodyOfResponse("HTTP/1.1 200 OK\r\nContent-Length: 2\r\n\r\nlonger"),
             (Body{HTTP_RET_OK, "longer"}));
-  EXPECT_EQ(BodyOfReply("HTTP/1.1 200 OK\r\nContent-Length: 99\r\n\r\nshort"),
+  EXPECT_EQ(BodyOfResponse("HTTP/1.1 200 OK\r\nContent-Length: 99\r\n\r\nshort"),
             (Body{HTTP_RET_OK, "short"}));
-  EXPECT_EQ(BodyOfReply("HTTP/1.1 200 OK\r\nContent-Length: 0\r\n\r\n"), (Body{HTTP_RET_OK, ""}));
+  EXPECT_EQ(BodyOfResponse("HTTP/1.1 200 OK\r\nContent-Length: 0\r\n\r\n"),
+            (Body{HTTP_RET_OK, ""}));
 }
 
 TEST(ReadBody, ZeroBytesAreKept) {
   ForEachTransport([](const Transport& transport) {
-    EXPECT_EQ(BodyOfReply(Plain("a\0b\0"s), transport), (Body{HTTP_RET_OK, "a\0b\0"s}));
-    EXPECT_EQ(BodyOfReply(Chunked("4\r\na\0b\0\r\n0\r\n\r\n"s), transport),
+    EXPECT_EQ(BodyOfResponse(Plain("a\0b\0"s), transport), (Body{HTTP_RET_OK, "a\0b\0"s}));
+    EXPECT_EQ(BodyOfResponse(Chunked("4\r\na\0b\0\r\n0\r\n\r\n"s), transport),
               (Body{HTTP_RET_OK, "a\0b\0"s}));
   });
 }
@@ -129,11 +130,11 @@ TEST(ReadBody, BodiesAroundThePieceOf8192BytesArriveWhole) {
     for (const size_t size : {8191, 8192, 8193, 100000}) {
       std::string body(size, '.');
       for (size_t i = 0; i < size; ++i) body[i] = static_cast<char>(i * 7);
-      EXPECT_TRUE(BodyOfReply(Plain(body), transport) == (Body{HTTP_RET_OK, body})) << size;
+      EXPECT_TRUE(BodyOfResponse(Plain(body), transport) == (Body{HTTP_RET_OK, body})) << size;
       char line[16];
       snprintf(line, sizeof(line), "%zx\r\n", size);
       const std::string chunks = line + body + "\r\n3\r\nend\r\n0\r\n\r\n";
-      EXPECT_TRUE(BodyOfReply(Chunked(chunks), transport) == (Body{HTTP_RET_OK, body + "end"}))
+      EXPECT_TRUE(BodyOfResponse(Chunked(chunks), transport) == (Body{HTTP_RET_OK, body + "end"}))
           << size;
     }
   });
@@ -161,20 +162,20 @@ TEST(ReadBody, ATransferEncodingOfExactlyChunkedIsDecodedAndNoOther) {
   for (const char* value : {"CHUNKED", "gzip, chunked", "chunked, gzip", "chunked;q=1", "chunke",
                             "chunkedd", "identity"}) {
     EXPECT_EQ(
-        BodyOfReply("HTTP/1.1 200 OK\r\nTransfer-Encoding: "s + value + "\r\n\r\n" + kWikipedia),
+        BodyOfResponse("HTTP/1.1 200 OK\r\nTransfer-Encoding: "s + value + "\r\n\r\n" + kWikipedia),
         (Body{HTTP_RET_OK, kWikipedia}))
         << value;
   }
-  EXPECT_EQ(BodyOfReply("HTTP/1.1 200 OK\r\ntransfer-encoding:  chunked \r\n\r\n"s + kWikipedia),
+  EXPECT_EQ(BodyOfResponse("HTTP/1.1 200 OK\r\ntransfer-encoding:  chunked \r\n\r\n"s + kWikipedia),
             (Body{HTTP_RET_OK, "Wikipedia"}));
 }
 
-TEST(ReadBody, AChunkedReplySplitAtAnyByteGivesTheSameBody) {
-  const std::string reply = Chunked(kWikipedia);
-  const size_t first = reply.size() - strlen(kWikipedia) - 2;
-  for (size_t split = first; split < reply.size(); ++split) {
+TEST(ReadBody, AChunkedResponseSplitAtAnyByteHasTheSameBody) {
+  const std::string response = Chunked(kWikipedia);
+  const size_t first = response.size() - strlen(kWikipedia) - 2;
+  for (size_t split = first; split < response.size(); ++split) {
     for (const bool buffered : {false, true}) {
-      ScriptedPeer peer({ExchangeInPieces({reply.substr(0, split), reply.substr(split)})});
+      ScriptedPeer peer({ExchangeInPieces({response.substr(0, split), response.substr(split)})});
       ClientProbe client(peer.Port(), SettingsOf({false, buffered}));
       EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
       EXPECT_EQ(BodyOf(client), (Body{HTTP_RET_OK, "Wikipedia"})) << split;
@@ -183,16 +184,16 @@ TEST(ReadBody, AChunkedReplySplitAtAnyByteGivesTheSameBody) {
   }
 }
 
-TEST(ReadBody, AChunkedReplyReadInPiecesOfAnySizeGivesTheSameBody) {
-  const std::string reply = Chunked(kWikipedia);
-  for (size_t size = 1; size <= reply.size(); ++size) {
+TEST(ReadBody, AChunkedResponseReadInPiecesOfAnySizeHasTheSameBody) {
+  const std::string response = Chunked(kWikipedia);
+  for (size_t size = 1; size <= response.size(); ++size) {
     Faults faults;
     faults.Limit(Call::kRead, size);
-    EXPECT_EQ(BodyOfReply(reply), (Body{HTTP_RET_OK, "Wikipedia"})) << size;
+    EXPECT_EQ(BodyOfResponse(response), (Body{HTTP_RET_OK, "Wikipedia"})) << size;
   }
 }
 
-TEST(ReadBody, AChunkedReplyThatComesByteByByteGivesTheSameBody) {
+TEST(ReadBody, AChunkedResponseThatComesByteByByteHasTheSameBody) {
   ForEachTransport([](const Transport& transport) {
     const auto peer = NewPeer(transport, {ExchangeByteByByte(Chunked(kWikipedia))});
     ClientProbe client(peer->Port(), SettingsOf(transport));
@@ -203,42 +204,42 @@ TEST(ReadBody, AChunkedReplyThatComesByteByByteGivesTheSameBody) {
 }
 
 TEST(ReadBody, AChunkSizeWith0xInFrontEndsTheBody) {
-  EXPECT_EQ(BodyOfReply(Chunked("0x4\r\nWiki\r\n0\r\n\r\n")), (Body{HTTP_RET_OK, ""}));
+  EXPECT_EQ(BodyOfResponse(Chunked("0x4\r\nWiki\r\n0\r\n\r\n")), (Body{HTTP_RET_OK, ""}));
 }
 
 TEST(ReadBody, AChunkSizeOfTheHighestBitsIsReadUntilTheServerCloses) {
   ForEachTransport([](const Transport& transport) {
     for (const char* size : {"80000000", "ffffffff", "7FFFFFFF"}) {
-      EXPECT_EQ(BodyOfReply(Chunked(size + "\r\nWiki"s), transport), (Body{HTTP_RET_OK, "Wiki"}))
+      EXPECT_EQ(BodyOfResponse(Chunked(size + "\r\nWiki"s), transport), (Body{HTTP_RET_OK, "Wiki"}))
           << size;
     }
   });
 }
 
-TEST(ReadBody, OfAChunkSizeTheLast32BitsCount) {
-  EXPECT_EQ(BodyOfReply(Chunked("100000001\r\nW\r\n0\r\n\r\n")), (Body{HTTP_RET_OK, "W"}));
-  EXPECT_EQ(BodyOfReply(Chunked("100000000\r\nW\r\n0\r\n\r\n")), (Body{HTTP_RET_OK, ""}));
+TEST(ReadBody, OfAChunkSizeTheLast32BitsAreTaken) {
+  EXPECT_EQ(BodyOfResponse(Chunked("100000001\r\nW\r\n0\r\n\r\n")), (Body{HTTP_RET_OK, "W"}));
+  EXPECT_EQ(BodyOfResponse(Chunked("100000000\r\nW\r\n0\r\n\r\n")), (Body{HTTP_RET_OK, ""}));
 }
 
 TEST(ReadBody, AnEmptyOrSpacedChunkSizeLineEndsTheBody) {
-  EXPECT_EQ(BodyOfReply(Chunked("1\r\nW\r\n\r\n4\r\nikip\r\n")), (Body{HTTP_RET_OK, "W"}));
-  EXPECT_EQ(BodyOfReply(Chunked("1\r\nW\r\n 4\r\nikip\r\n")), (Body{HTTP_RET_OK, "W"}));
-  EXPECT_EQ(BodyOfReply(Chunked("1\r\nW\r\n")), (Body{HTTP_RET_OK, "W"}));
-  EXPECT_EQ(BodyOfReply(Chunked("")), (Body{HTTP_RET_OK, ""}));
+  EXPECT_EQ(BodyOfResponse(Chunked("1\r\nW\r\n\r\n4\r\nikip\r\n")), (Body{HTTP_RET_OK, "W"}));
+  EXPECT_EQ(BodyOfResponse(Chunked("1\r\nW\r\n 4\r\nikip\r\n")), (Body{HTTP_RET_OK, "W"}));
+  EXPECT_EQ(BodyOfResponse(Chunked("1\r\nW\r\n")), (Body{HTTP_RET_OK, "W"}));
+  EXPECT_EQ(BodyOfResponse(Chunked("")), (Body{HTTP_RET_OK, ""}));
 }
 
 TEST(ReadBody, LineFeedsAloneEndChunkSizeLines) {
-  EXPECT_EQ(BodyOfReply(Chunked("4\nWiki\r\n1\nx\r\n0\n")), (Body{HTTP_RET_OK, "Wikix"}));
+  EXPECT_EQ(BodyOfResponse(Chunked("4\nWiki\r\n1\nx\r\n0\n")), (Body{HTTP_RET_OK, "Wikix"}));
 }
 
-TEST(ReadBody, TheTwoBytesBehindAChunkAreDroppedWhateverTheyAre) {
-  EXPECT_EQ(BodyOfReply(Chunked("4\r\nWikiXY5\r\npediaZZ0\r\n\r\n")),
+TEST(ReadBody, TheTwoBytesAfterAChunkAreDroppedWhateverTheyAre) {
+  EXPECT_EQ(BodyOfResponse(Chunked("4\r\nWikiXY5\r\npediaZZ0\r\n\r\n")),
             (Body{HTTP_RET_OK, "Wikipedia"}));
 }
 
 TEST(ReadBody, AChunkSizeLineEndsAfter8192Bytes) {
   const std::string line = "5;" + std::string(8190, 'x');  // the last byte is lost
-  EXPECT_EQ(BodyOfReply(Chunked(line + "pedia\r\n0\r\n\r\n")), (Body{HTTP_RET_OK, "pedia"}));
+  EXPECT_EQ(BodyOfResponse(Chunked(line + "pedia\r\n0\r\n\r\n")), (Body{HTTP_RET_OK, "pedia"}));
 }
 
 TEST(ReadBody, TrailerLinesAreLeftOnTheConnection) {
@@ -251,7 +252,7 @@ TEST(ReadBody, TrailerLinesAreLeftOnTheConnection) {
   });
 }
 
-TEST(ReadBody, ATransferEncodingStaysForALaterReplyWithoutOne) {
+TEST(ReadBody, ATransferEncodingStaysForALaterResponseWithoutOne) {
   ScriptedPeer peer({Exchange(Chunked(kWikipedia)), Exchange(Plain("3\r\nabc\r\n0\r\n\r\n")),
                      Exchange(Plain("hello"))});
   ClientProbe client(peer.Port());
@@ -281,7 +282,7 @@ TEST(ReadBody, AReadErrorInTheMiddleOfAChunkIsAnIoErrorWithWhatCameBefore) {
   });
 }
 
-TEST(ReadBody, AReadErrorInPlaceOfAChunkSizeEndsTheBodyAsItStands) {
+TEST(ReadBody, AReadErrorInPlaceOfAChunkSizeEndsTheBodyWithSuccess) {
   ForEachTransport([](const Transport& transport) {
     const auto peer = NewPeer(transport, {Exchange(Chunked("4\r\nWiki\r\n"))});
     ClientProbe client(peer->Port(), SettingsOf(transport));
@@ -289,7 +290,7 @@ TEST(ReadBody, AReadErrorInPlaceOfAChunkSizeEndsTheBodyAsItStands) {
     LogCapture log;
     log.SetLevel(kHttpCategory, 5);
     Faults faults;
-    // A direct client: three reads of a line, one of the data, one of the two bytes behind it.
+    // A direct client: three reads of a line, one of the data, one of the two bytes after it.
     faults.FailFrom(transport.tls ? Call::kSslRead : Call::kRead, transport.buffered ? 1 : 6);
     EXPECT_EQ(BodyOf(client), (Body{HTTP_RET_OK, "Wiki"}));
     EXPECT_THAT(log.Lines("http"), IsEmpty());

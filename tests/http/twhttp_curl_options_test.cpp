@@ -94,7 +94,7 @@ TEST(SendRequestByCurl, APostToAnEmptyHostHasTheUrlOfTheSchemeAlone) {
   EXPECT_EQ(faults.OptionGiven(CURLOPT_URL).text, "http://");
 }
 
-TEST(SendRequestByCurl, NoVersionAndNoLoginSchemeIsSet) {
+TEST(SendRequestByCurl, NoVersionAndNoAuthenticationSchemeIsSet) {
   ClientProbe client(80, {"a", HTTP_VERSION_1_0});
   Faults faults;
   faults.FailFrom(Call::kCurlEasyPerform, 1);

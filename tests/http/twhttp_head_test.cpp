@@ -14,8 +14,8 @@ using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 
 // The result code of a response's head.
-int ResultOf(const std::string& reply) {
-  return ClientAfter(reply)->m_result;
+int ResultOf(const std::string& response) {
+  return ClientAfter(response)->m_result;
 }
 
 std::string WithStatus(const std::string& status) {
@@ -62,12 +62,12 @@ TEST(CheckContentType, AContentTypeIsStoredWithItsParameters) {
   EXPECT_EQ(Content(*client, HTTP_CONTENT_TYPE), "text/html; charset=utf-8");
 }
 
-TEST(CheckContentType, ACookieEndsBehindItsFirstSemicolonAndWithoutOneIsEmpty) {
+TEST(CheckContentType, ACookieEndsAfterItsFirstSemicolonAndWithoutOneIsEmpty) {
   EXPECT_EQ(AfterHeader("Set-Cookie: id=42; Path=/")->m_strCookie, "id=42;");
   EXPECT_EQ(AfterHeader("Set-Cookie: id=42")->m_strCookie, "");
 }
 
-TEST(CheckContentType, AChallengeKeepsTheSpaceBehindTheColon) {
+TEST(CheckContentType, AChallengeKeepsTheSpaceAfterTheColon) {
   const auto client = AfterHeader("WWW-Authenticate: Digest realm=\"r\", nonce=\"n\"  ");
   EXPECT_EQ(client->m_strAuthenticate, " Digest realm=\"r\", nonce=\"n\"  ");
 }
@@ -216,7 +216,7 @@ TEST(CheckContentType, ARepeatedMapHeaderKeepsItsFirstValueEvenAnEmptyOne) {
   EXPECT_EQ(Content(*client, HTTP_CONTENT_RANGE), "1");
 }
 
-TEST(CheckContentType, ALongerNameWithAKnownPrefixCountsAsTheKnownOne) {
+TEST(CheckContentType, ALongerNameWithAKnownPrefixIsTakenForTheKnownOne) {
   const auto client = AfterHeader("Content-Type-Options: nosniff\r\nSet-Cookie2: x=1;");
   EXPECT_EQ(Content(*client, HTTP_CONTENT_TYPE), "nosniff");
   EXPECT_EQ(client->m_strCookie, "x=1;");
@@ -245,7 +245,7 @@ TEST(CheckContentType, EachKnownNameWithoutAValueIsNotReady) {
   EXPECT_EQ(AfterHeader("Server:")->m_result, HTTP_RET_OK);
 }
 
-// A server may cut its answer anywhere.
+// A server may cut its response anywhere.
 
 namespace {
 
@@ -274,9 +274,9 @@ TEST(ResponseHead, CutAtEveryByteItHasTheDocumentedResult) {
 }
 
 TEST(ResponseHead, InTwoPiecesItIsReadAsInOne) {
-  const std::string reply = std::string(kWholeHead) + "12345";
-  for (size_t n = 1; n < reply.size(); ++n) {
-    ScriptedPeer peer({ExchangeInPieces({reply.substr(0, n), reply.substr(n)})});
+  const std::string response = std::string(kWholeHead) + "12345";
+  for (size_t n = 1; n < response.size(); ++n) {
+    ScriptedPeer peer({ExchangeInPieces({response.substr(0, n), response.substr(n)})});
     ClientProbe client(peer.Port());
     client.SendRequestByGet();
     EXPECT_EQ(client.m_result, HTTP_RET_OK) << n;

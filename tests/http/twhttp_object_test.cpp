@@ -17,7 +17,7 @@ namespace {
 
 using ::testing::IsEmpty;
 
-constexpr char kPlainReply[] = "HTTP/1.1 200 OK\r\nContent-Length: 4\r\n\r\nbody";
+constexpr char kPlainResponse[] = "HTTP/1.1 200 OK\r\nContent-Length: 4\r\n\r\nbody";
 
 // The shape that other programs are compiled against.
 static_assert(std::has_virtual_destructor_v<TWHttpClient>);
@@ -93,7 +93,7 @@ TEST(TWHttpClientObject, KeyThreeIsABadKeyAndKeyZeroIsNotReadyBeforeAnyRequest) 
 }
 
 TEST(TWHttpClientObject, AHeaderThatTheResponseDidNotHaveIsNoContentAndLeavesOutUntouched) {
-  const auto client = ClientAfter(kPlainReply);
+  const auto client = ClientAfter(kPlainResponse);
   std::string out = "kept";
   EXPECT_EQ(client->GetHttpContent(HTTP_CONTENT_RANGE, out), HTTP_RET_NO_CONTENT);
   EXPECT_EQ(out, "kept");
@@ -109,7 +109,7 @@ TEST(TWHttpClientObject, CheckResponseOfANewObjectIsNotReadyWithStatusZero) {
 }
 
 TEST(TWHttpClientObject, WithHttpsTheSocketIsTlsAndTheSourceAddressIsBoundBeneathIt) {
-  TlsScriptedPeer peer({Exchange(kPlainReply)});
+  TlsScriptedPeer peer({Exchange(kPlainResponse)});
   ClientSettings settings;
   settings.https = true;
   ClientProbe client(peer.Port(), settings);
@@ -219,7 +219,7 @@ TEST(TWHttpClientObject, CookieAndTransferEncodingAreReadBack) {
   EXPECT_EQ(client.GetTransferEncoding(), "chunked");
 }
 
-TEST(TWHttpClientObject, CheckResponseGivesTheLastResultAndStatus) {
+TEST(TWHttpClientObject, CheckResponseReturnsTheLastResultAndStatus) {
   ClientProbe client(80);
   client.m_result = HTTP_RET_REDIRECT;
   client.m_statusCode = 302;
@@ -229,7 +229,7 @@ TEST(TWHttpClientObject, CheckResponseGivesTheLastResultAndStatus) {
 }
 
 TEST(TWHttpClientObject, ANegativeKeyIsABadKey) {
-  const auto client = ClientAfter(kPlainReply);
+  const auto client = ClientAfter(kPlainResponse);
   std::string out = "kept";
   EXPECT_EQ(client->GetHttpContent(static_cast<HTTP_MAP_KEY>(-1), out), HTTP_RET_BAD_KEY);
   EXPECT_EQ(client->GetHttpContent(static_cast<HTTP_MAP_KEY>(INT_MIN), out), HTTP_RET_BAD_KEY);

@@ -23,22 +23,22 @@ TEST(SendReqBySocketPost, AFailedConnectIsLoggedAndChangesNoField) {
   ClientProbe client(port.Port());
   client.m_strAuthorization = "Authorization: X";
   client.m_result = HTTP_RET_REDIRECT;
-  std::string reply = "old";
+  std::string response = "old";
   LogCapture log;
-  EXPECT_EQ(client.SendReqBySocketPost("x", reply), HTTP_RET_IO_ERROR);
+  EXPECT_EQ(client.SendReqBySocketPost("x", response), HTTP_RET_IO_ERROR);
   EXPECT_EQ(client.m_strAuthorization, "Authorization: X");
   EXPECT_EQ(client.m_result, HTTP_RET_REDIRECT);
   EXPECT_EQ(client.m_connState, 0);
-  EXPECT_EQ(reply, "old");
+  EXPECT_EQ(response, "old");
   EXPECT_THAT(log.Lines("http"),
               ElementsAre(IsHttpLog("debug", "SendReqBySocketPost", "Connection failed!\n\n")));
 }
 
 TEST(SendReqBySocketPost, AClientWithoutASocketCannotConnect) {
   ClientProbe client;
-  std::string reply = "old";
-  EXPECT_EQ(client.SendReqBySocketPost("x", reply), HTTP_RET_IO_ERROR);
-  EXPECT_EQ(reply, "old");
+  std::string response = "old";
+  EXPECT_EQ(client.SendReqBySocketPost("x", response), HTTP_RET_IO_ERROR);
+  EXPECT_EQ(response, "old");
 }
 
 TEST(SendReqBySocketPost, AWriteThatFailsOrTakesNothingIsLogged) {
@@ -47,32 +47,32 @@ TEST(SendReqBySocketPost, AWriteThatFailsOrTakesNothingIsLogged) {
     ClientProbe client(peer.Port());
     client.m_strAuthorization = "Authorization: X";
     client.m_result = HTTP_RET_REDIRECT;
-    std::string reply = "old";
+    std::string response = "old";
     LogCapture log;
     {
       Faults faults;
       faults.FailFrom(Call::kWrite, 1, EPIPE, written);
-      EXPECT_EQ(client.SendReqBySocketPost("x", reply), HTTP_RET_IO_ERROR);
+      EXPECT_EQ(client.SendReqBySocketPost("x", response), HTTP_RET_IO_ERROR);
     }
     client.m_pSocket->Disconnect();
     EXPECT_EQ(client.m_strAuthorization, "");
     EXPECT_EQ(client.m_result, HTTP_RET_REDIRECT);
-    EXPECT_EQ(reply, "old");
+    EXPECT_EQ(response, "old");
     EXPECT_THAT(log.Lines("http"),
                 ElementsAre(IsHttpLog("debug", "SendReqBySocketPost", "Write data faild.\n")));
   }
 }
 
-TEST(SendReqBySocketPost, AReadThatFailsOrGivesNothingIsLogged) {
+TEST(SendReqBySocketPost, AReadThatFailsOrDeliversNothingIsLogged) {
   for (const bool buffered : {false, true}) {
     ScriptedPeer peer({Exchange(Announcing("9", ""))});
     ClientSettings settings;
     settings.buffered = buffered;
     ClientProbe client(peer.Port(), settings);
-    std::string reply = "old";
+    std::string response = "old";
     LogCapture log;
-    EXPECT_EQ(client.SendReqBySocketPost("x", reply), HTTP_RET_IO_ERROR);
-    EXPECT_EQ(reply, "old");
+    EXPECT_EQ(client.SendReqBySocketPost("x", response), HTTP_RET_IO_ERROR);
+    EXPECT_EQ(response, "old");
     EXPECT_EQ(client.m_result, HTTP_RET_OK);
     EXPECT_THAT(LinesOf(log, "SendReqBySocketPost"),
                 ElementsAre(IsHttpLog("debug", "SendReqBySocketPost", "Read data faild.\n")));
@@ -85,15 +85,15 @@ TEST(SendReqBySocketPost, AReadErrorInPlaceOfTheBodyIsLogged) {
   ClientSettings settings;
   settings.buffered = false;  // a read for each byte of the head, so the next one is the body's
   ClientProbe client(peer.Port(), settings);
-  std::string reply = "old";
+  std::string response = "old";
   LogCapture log;
   {
     Faults faults;
     faults.FailFrom(Call::kRead, static_cast<int>(head.size()) + 1, ECONNRESET);
-    EXPECT_EQ(client.SendReqBySocketPost("x", reply), HTTP_RET_IO_ERROR);
+    EXPECT_EQ(client.SendReqBySocketPost("x", response), HTTP_RET_IO_ERROR);
   }
   client.m_pSocket->Disconnect();
-  EXPECT_EQ(reply, "old");
+  EXPECT_EQ(response, "old");
   EXPECT_THAT(LinesOf(log, "SendReqBySocketPost"),
               ElementsAre(IsHttpLog("debug", "SendReqBySocketPost", "Read data faild.\n")));
 }
@@ -101,43 +101,43 @@ TEST(SendReqBySocketPost, AReadErrorInPlaceOfTheBodyIsLogged) {
 TEST(SendReqBySocketPost, WithoutMemoryForTheRequestALineNamesItsLengthAndOne) {
   ScriptedPeer peer({{ExpectEof()}});
   ClientProbe client(peer.Port());
-  std::string reply = "old";
+  std::string response = "old";
   LogCapture log(3);
   {
     Faults faults;
     faults.FailFrom(Call::kMalloc, 1);
-    EXPECT_EQ(client.SendReqBySocketPost("x", reply), HTTP_RET_IO_ERROR);
+    EXPECT_EQ(client.SendReqBySocketPost("x", response), HTTP_RET_IO_ERROR);
   }
   client.m_pSocket->Disconnect();
-  EXPECT_EQ(reply, "old");
+  EXPECT_EQ(response, "old");
   const size_t needed = RequestText("", "x").size() + 1;
   EXPECT_THAT(log.Lines("http"), ElementsAre(IsHttpLog("error", "SendReqBySocketPost",
                                                        "Out of memory. Need " +
                                                            std::to_string(needed) + " bytes.\n")));
 }
 
-TEST(SendReqBySocketPost, WithoutMemoryForTheReplyALineNamesItsLengthAndOne) {
+TEST(SendReqBySocketPost, WithoutMemoryForTheResponseALineNamesItsLengthAndOne) {
   LogCapture log(3);
   Faults faults;
   faults.FailFrom(Call::kMalloc, 2).FailFrom(Call::kRealloc, 1);
-  EXPECT_EQ(SoapOf(Soap("reply")), kNothingRead);
+  EXPECT_EQ(SoapOf(Soap("words")), kNothingRead);
   EXPECT_THAT(log.Lines("http"), ElementsAre(IsHttpLog("error", "SendReqBySocketPost",
                                                        "Out of memory. Need 6 bytes.\n")));
 }
 
-TEST(SendReqBySocketPost, WithoutMemoryForTheRestOfTheReplyNothingOfItIsShown) {
+TEST(SendReqBySocketPost, WithoutMemoryForTheRestOfTheResponseNoneOfItIsReturned) {
   const std::string body(3 * kMebibyte, 'b');
   LogCapture log(3);
   for (const Call call : {Call::kMalloc, Call::kRealloc}) {
     ForEachFailingCall(call, [&](Faults& faults) {
       ScriptedPeer peer({{SendEndlessly(Soap(body), body.size())}});
       ClientProbe client(peer.Port());
-      std::string reply = "old";
+      std::string response = "old";
       log.Clear();
-      const int result = client.SendReqBySocketPost("x", reply);
+      const int result = client.SendReqBySocketPost("x", response);
       client.m_pSocket->Disconnect();
       EXPECT_EQ(result, faults.Struck() ? HTTP_RET_IO_ERROR : HTTP_RET_OK);
-      EXPECT_EQ(reply == "old", faults.Struck());
+      EXPECT_EQ(response == "old", faults.Struck());
       EXPECT_EQ(log.Lines("http").size(), faults.Struck() ? 1u : 0u);
     });
   }
@@ -146,15 +146,15 @@ TEST(SendReqBySocketPost, WithoutMemoryForTheRestOfTheReplyNothingOfItIsShown) {
 TEST(SendReqBySocketPost, TheLineOfALaterPieceNamesTheAnnouncedLengthAndOne) {
   ScriptedPeer peer({{ExpectRequest(), SendEndlessly(Soap(std::string(3 * kMebibyte, 'b')), 1)}});
   ClientProbe client(peer.Port());
-  std::string reply = "old";
+  std::string response = "old";
   LogCapture log(3);
   {
     Faults faults;
     faults.FailFrom(Call::kRealloc, 1).FailFrom(Call::kMalloc, 3);
-    EXPECT_EQ(client.SendReqBySocketPost("x", reply), HTTP_RET_IO_ERROR);
+    EXPECT_EQ(client.SendReqBySocketPost("x", response), HTTP_RET_IO_ERROR);
   }
   client.m_pSocket->Disconnect();
-  EXPECT_EQ(reply, "old");
+  EXPECT_EQ(response, "old");
   EXPECT_THAT(log.Lines("http"), ElementsAre(IsHttpLog("error", "SendReqBySocketPost",
                                                        "Out of memory. Need 3145729 bytes.\n")));
 }

@@ -15,11 +15,11 @@ using ::testing::IsEmpty;
 
 }  // namespace
 
-TEST(SendAuthReqBySocketPost, AChallengeOfDigestIsAnsweredWithDigestBehindTheType) {
+TEST(SendAuthReqBySocketPost, AChallengeOfDigestIsAnsweredWithDigestAfterTheType) {
   ScriptedPeer peer({Exchange(Unauthorized(kDigest, "no")), Exchange(Soap("second"))});
-  ClientProbe client(peer.Port(), WithLogin());
+  ClientProbe client(peer.Port(), WithCredentials());
   EXPECT_EQ(AuthOf(client), (SoapOutcome{HTTP_RET_OK, "second", HTTP_RET_OK}));
-  ClientProbe same(1, WithLogin());
+  ClientProbe same(1, WithCredentials());
   same.m_strAuthenticate = kDigest;
   EXPECT_EQ(peer.Received(0), RequestText("", "x"));
   EXPECT_EQ(peer.Received(1), RequestText(same.GenDigestAccessAuth("POST", "") + "\r\n", "x"));
@@ -28,15 +28,15 @@ TEST(SendAuthReqBySocketPost, AChallengeOfDigestIsAnsweredWithDigestBehindTheTyp
 
 TEST(SendAuthReqBySocketPost, ARetryThatCannotConnectLeavesTheBodyOfThe401) {
   ScriptedPeer peer({Exchange(Unauthorized(kDigest, "denied"))});
-  ClientProbe client(peer.Port(), WithLogin());
+  ClientProbe client(peer.Port(), WithCredentials());
   Faults faults;
   faults.FailFrom(Call::kConnect, 2);
   EXPECT_EQ(AuthOf(client), (SoapOutcome{HTTP_RET_IO_ERROR, "denied", HTTP_RET_UNAUTHORIZED}));
 }
 
-// The login.
+// The credentials.
 
-TEST(SendAuthReqBySocketPost, AReplyThatIsNo401EndsIt) {
+TEST(SendAuthReqBySocketPost, AResponseThatIsNo401EndsIt) {
   const std::pair<const char*, int> table[] = {{"200 OK", HTTP_RET_OK},
                                                {"302 Found", HTTP_RET_REDIRECT},
                                                {"403 No", HTTP_RET_BAD_RESPONSE},
@@ -44,7 +44,7 @@ TEST(SendAuthReqBySocketPost, AReplyThatIsNo401EndsIt) {
   for (const auto& [status, expected] : table) {
     ScriptedPeer peer(
         {Exchange(Soap("body", std::string(status) + "\r\nWWW-Authenticate: " + kDigest))});
-    ClientSettings settings = WithLogin();
+    ClientSettings settings = WithCredentials();
     settings.basic_auth = true;  // plays no part here
     ClientProbe client(peer.Port(), settings);
     EXPECT_EQ(AuthOf(client), (SoapOutcome{expected, "body", expected}));
@@ -55,7 +55,7 @@ TEST(SendAuthReqBySocketPost, AReplyThatIsNo401EndsIt) {
 TEST(SendAuthReqBySocketPost, AChallengeOfBasicInAnyCaseIsAnsweredWithBasic) {
   for (const char* challenge : {"Basic realm=\"r\"", "BASIC", "x bAsIc"}) {
     ScriptedPeer peer({Exchange(Unauthorized(challenge, "no")), Exchange(Soap("second"))});
-    ClientProbe client(peer.Port(), WithLogin());
+    ClientProbe client(peer.Port(), WithCredentials());
     EXPECT_EQ(AuthOf(client), (SoapOutcome{HTTP_RET_OK, "second", HTTP_RET_OK}));
     EXPECT_EQ(peer.Received(1), RequestText("Authorization: Basic dTpw\r\n", "x"));
   }
@@ -64,7 +64,7 @@ TEST(SendAuthReqBySocketPost, AChallengeOfBasicInAnyCaseIsAnsweredWithBasic) {
 TEST(SendAuthReqBySocketPost, DigestIsTestedBeforeBasicAndAnywhereInTheChallenge) {
   for (const char* challenge : {"Digest realm=\"basic\"", "Basic realm=\"dIgEsT\""}) {
     ScriptedPeer peer({Exchange(Unauthorized(challenge, "no")), Exchange(Soap("second"))});
-    ClientProbe client(peer.Port(), WithLogin());
+    ClientProbe client(peer.Port(), WithCredentials());
     EXPECT_EQ(AuthOf(client).result, HTTP_RET_OK);
     EXPECT_THAT(peer.Received(1), HasSubstr("utf-8\r\nAuthorization: Digest username=\"u\""));
   }
@@ -72,7 +72,7 @@ TEST(SendAuthReqBySocketPost, DigestIsTestedBeforeBasicAndAnywhereInTheChallenge
 
 TEST(SendAuthReqBySocketPost, AChallengeOfNeitherGetsNoSecondRequest) {
   ScriptedPeer peer({Exchange(Unauthorized("Bearer x", "no"))});
-  ClientProbe client(peer.Port(), WithLogin());
+  ClientProbe client(peer.Port(), WithCredentials());
   EXPECT_EQ(AuthOf(client), (SoapOutcome{HTTP_RET_UNAUTHORIZED, "no", HTTP_RET_UNAUTHORIZED}));
   peer.Finish();
   EXPECT_EQ(peer.Connections(), 1u);
@@ -81,7 +81,7 @@ TEST(SendAuthReqBySocketPost, AChallengeOfNeitherGetsNoSecondRequest) {
 TEST(SendAuthReqBySocketPost, A401WithoutABodyIsAnsweredToo) {
   for (const char* challenge : {kDigest, "Basic x"}) {
     ScriptedPeer peer({Exchange(Unauthorized(challenge, "")), Exchange(Soap("second"))});
-    ClientProbe client(peer.Port(), WithLogin());
+    ClientProbe client(peer.Port(), WithCredentials());
     EXPECT_EQ(AuthOf(client), (SoapOutcome{HTTP_RET_OK, "second", HTTP_RET_OK}));
     EXPECT_EQ(peer.Connections(), 2u);
   }
@@ -89,14 +89,14 @@ TEST(SendAuthReqBySocketPost, A401WithoutABodyIsAnsweredToo) {
 
 TEST(SendAuthReqBySocketPost, A401WithoutABodyAndWithoutAKnownSchemeIsAnIoError) {
   ScriptedPeer peer({Exchange(Unauthorized("Bearer x", ""))});
-  ClientProbe client(peer.Port(), WithLogin());
+  ClientProbe client(peer.Port(), WithCredentials());
   EXPECT_EQ(AuthOf(client), (SoapOutcome{HTTP_RET_IO_ERROR, "old", HTTP_RET_UNAUTHORIZED}));
 }
 
 TEST(SendAuthReqBySocketPost, ASecond401GoesBackToTheCaller) {
   ScriptedPeer peer(
       {Exchange(Unauthorized(kDigest, "first")), Exchange(Unauthorized(kDigest, "second"))});
-  ClientProbe client(peer.Port(), WithLogin());
+  ClientProbe client(peer.Port(), WithCredentials());
   EXPECT_EQ(AuthOf(client), (SoapOutcome{HTTP_RET_UNAUTHORIZED, "second", HTTP_RET_UNAUTHORIZED}));
   peer.Finish();
   EXPECT_EQ(peer.Connections(), 2u);
@@ -107,13 +107,13 @@ TEST(SendAuthReqBySocketPost, AnUnreadFirstBodyIsClosedWithItsConnection) {
       {{ExpectRequest(), Send("HTTP/1.1 401 No\r\nWWW-Authenticate: Basic x\r\n\r\nunread"),
         DiscardUntilEnd()},
        Exchange(Soap("second"))});
-  ClientProbe client(peer.Port(), WithLogin());
+  ClientProbe client(peer.Port(), WithCredentials());
   EXPECT_EQ(AuthOf(client), (SoapOutcome{HTTP_RET_OK, "second", HTTP_RET_OK}));
 }
 
-TEST(SendAuthReqBySocketPost, AfterAnEarlier401AFailedConnectIsRetriedWithTheLogin) {
+TEST(SendAuthReqBySocketPost, AfterAnEarlier401AFailedConnectIsRetriedWithTheCredentials) {
   ScriptedPeer peer({Exchange(Soap("late"))});
-  ClientProbe client(peer.Port(), WithLogin());
+  ClientProbe client(peer.Port(), WithCredentials());
   client.m_result = HTTP_RET_UNAUTHORIZED;
   client.m_strAuthenticate = " Basic x";
   Faults faults;
@@ -123,23 +123,23 @@ TEST(SendAuthReqBySocketPost, AfterAnEarlier401AFailedConnectIsRetriedWithTheLog
 }
 
 TEST(SendAuthReqBySocketPost, AnEmptyBodyIsAnErrorBeforeAndAfterA401) {
-  ClientProbe client(1, WithLogin());
-  std::string reply = "old";
+  ClientProbe client(1, WithCredentials());
+  std::string response = "old";
   LogCapture log;
   Faults faults;
-  EXPECT_EQ(client.SendAuthReqBySocketPost("", reply), HTTP_RET_IO_ERROR);
+  EXPECT_EQ(client.SendAuthReqBySocketPost("", response), HTTP_RET_IO_ERROR);
   client.m_result = HTTP_RET_UNAUTHORIZED;
   client.m_strAuthenticate = " Basic x";
-  EXPECT_EQ(client.SendAuthReqBySocketPost("", reply), HTTP_RET_IO_ERROR);
+  EXPECT_EQ(client.SendAuthReqBySocketPost("", response), HTTP_RET_IO_ERROR);
   EXPECT_EQ(faults.Count(Call::kConnect), 0);
-  EXPECT_EQ(reply, "old");
+  EXPECT_EQ(response, "old");
   EXPECT_EQ(client.m_strAuthorization, "Authorization: Basic dTpw");
   EXPECT_EQ(log.Messages().size(), 3u);  // the retry says it once more
 }
 
 TEST(SendAuthReqBySocketPost, ItLogsNothingOfItsOwn) {
   ScriptedPeer peer({Exchange(Unauthorized(kDigest, "")), Exchange(Unauthorized(kDigest, ""))});
-  ClientProbe client(peer.Port(), WithLogin());
+  ClientProbe client(peer.Port(), WithCredentials());
   LogCapture log;
   log.SetLevel(kHttpCategory, 6);
   AuthOf(client);

@@ -46,42 +46,42 @@ int InLittleMemory(const std::function<int()>& exchange) {
 
 }  // namespace
 
-TEST(SendReqBySocketPost, TheAuthorizationStandsBetweenTypeAndLengthAndIsSentOnce) {
+TEST(SendReqBySocketPost, TheAuthorizationIsBetweenTypeAndLengthAndIsSentOnce) {
   ScriptedPeer peer({Exchange(Soap("ok"))});
   ClientSettings settings;
   settings.path = "soap/svc";
   ClientProbe client(peer.Port(), settings);
   client.m_strHost = "cam";
   client.m_strAuthorization = "Authorization: X";
-  std::string reply = "old";
-  EXPECT_EQ(client.SendReqBySocketPost("x", reply), HTTP_RET_OK);
+  std::string response = "old";
+  EXPECT_EQ(client.SendReqBySocketPost("x", response), HTTP_RET_OK);
   EXPECT_EQ(peer.Received(0),
             "POST /soap/svc HTTP/1.1\r\nHost: cam\r\n"
             "Content-Type: application/soap+xml; charset=utf-8\r\nAuthorization: X\r\n"
             "Content-Length: 1\r\n\r\nx");
   EXPECT_EQ(client.m_strAuthorization, "");
-  EXPECT_EQ(reply, "ok");
+  EXPECT_EQ(response, "ok");
 }
 
 TEST(SendReqBySocketPost, AnEmptyBodyIsAnErrorAndOpensNoConnection) {
   ScriptedPeer peer({});
   ClientProbe client(peer.Port());
-  std::string reply = "old";
+  std::string response = "old";
   LogCapture log;
   Faults faults;
-  EXPECT_EQ(client.SendReqBySocketPost("", reply), HTTP_RET_IO_ERROR);
+  EXPECT_EQ(client.SendReqBySocketPost("", response), HTTP_RET_IO_ERROR);
   EXPECT_EQ(faults.Count(Call::kConnect), 0);
-  EXPECT_EQ(reply, "old");
+  EXPECT_EQ(response, "old");
   EXPECT_EQ(client.m_result, HTTP_RET_NOT_READY);
   EXPECT_THAT(log.Lines(), ElementsAre(IsHttpLog("debug", "SendReqBySocketPost", "Empty msg.\n")));
 }
 
-TEST(SendReqBySocketPost, AReplyWithALengthOfZeroOrNoneIsAnErrorWithTheResultOk) {
+TEST(SendReqBySocketPost, AResponseWithALengthOfZeroOrNoneIsAnErrorWithTheResultOk) {
   EXPECT_EQ(SoapOf("HTTP/1.1 200 OK\r\nContent-Length: 0\r\n\r\n"), kNothingRead);
   EXPECT_EQ(SoapOf("HTTP/1.1 200 OK\r\n\r\nbody"), kNothingRead);
 }
 
-TEST(SendReqBySocketPost, TheBodyOfA500IsReadAndOnlyTheLoginVariantTellsTheStatus) {
+TEST(SendReqBySocketPost, TheBodyOfA500IsReadAndOnlyTheVariantWithCredentialsReturnsTheStatus) {
   const std::string body(120, 'f');
   EXPECT_EQ(SoapOf(Soap(body, "500 Oops")),
             (SoapOutcome{HTTP_RET_OK, body, HTTP_RET_BAD_RESPONSE}));
@@ -92,16 +92,16 @@ TEST(SendReqBySocketPost, TheBodyOfA500IsReadAndOnlyTheLoginVariantTellsTheStatu
 
 // The request.
 
-TEST(SendReqBySocketPost, Http11IsSentWhateverTheVersionAndNeitherCookieNorLogin) {
+TEST(SendReqBySocketPost, Http11IsSentWhateverTheVersionAndNeitherCookieNorCredentials) {
   for (const int version : {0, 1, 2, 3}) {
     ScriptedPeer peer({Exchange(Soap("ok"))});
-    ClientSettings settings = WithLogin();
+    ClientSettings settings = WithCredentials();
     settings.version = static_cast<HTTP_VERSION>(version);
     settings.basic_auth = true;
     ClientProbe client(peer.Port(), settings);
     client.SetCookie("s=1");
-    std::string reply;
-    EXPECT_EQ(client.SendReqBySocketPost("<e/>", reply), HTTP_RET_OK);
+    std::string response;
+    EXPECT_EQ(client.SendReqBySocketPost("<e/>", response), HTTP_RET_OK);
     EXPECT_EQ(peer.Received(0), RequestText("", "<e/>"));
   }
 }
@@ -110,8 +110,8 @@ TEST(SendReqBySocketPost, AnEnvelopeOfSeveralMebibytesIsSentWhole) {
   const std::string body(3 * kMebibyte, 'e');
   ScriptedPeer peer({Exchange(Soap("ok"))});
   ClientProbe client(peer.Port());
-  std::string reply;
-  EXPECT_EQ(client.SendReqBySocketPost(body, reply), HTTP_RET_OK);
+  std::string response;
+  EXPECT_EQ(client.SendReqBySocketPost(body, response), HTTP_RET_OK);
   EXPECT_TRUE(peer.Received(0) == RequestText("", body));
 }
 
@@ -121,8 +121,8 @@ TEST(SendReqBySocketPost, AfterAZeroByteNothingOfTheBodyIsSent) {
   ScriptedPeer peer({{ExpectUntil("\r\n\r\nab"), Send(Soap("ok")), DiscardUntilEnd()}});
   {
     ClientProbe client(peer.Port());
-    std::string reply;
-    client.SendReqBySocketPost("ab\0c"s, reply);
+    std::string response;
+    client.SendReqBySocketPost("ab\0c"s, response);
   }
   // The request's whole length is written; only what stands before the zero byte is text.
   EXPECT_THAT(peer.Received(0), StartsWith(sent));
@@ -130,52 +130,52 @@ TEST(SendReqBySocketPost, AfterAZeroByteNothingOfTheBodyIsSent) {
   EXPECT_NE(peer.Received(0).back(), 'c');
 }
 
-TEST(SendReqBySocketPost, AShortWriteCountsAsSuccess) {
+TEST(SendReqBySocketPost, AShortWriteIsSuccess) {
   ScriptedPeer peer({{ExpectBytes(10), Send(Soap("ok")), DiscardUntilEnd()}});
   ClientProbe client(peer.Port());
-  std::string reply;
+  std::string response;
   {
     Faults faults;
     faults.Limit(Call::kWrite, 10).FailRange(Call::kWrite, 2, 2, EIO);
-    EXPECT_EQ(client.SendReqBySocketPost("x", reply), HTTP_RET_OK);
+    EXPECT_EQ(client.SendReqBySocketPost("x", response), HTTP_RET_OK);
   }
   client.m_pSocket->Disconnect();
-  EXPECT_EQ(reply, "ok");
+  EXPECT_EQ(response, "ok");
 }
 
 TEST(SendReqBySocketPost, EveryTransportCarriesTheSameExchange) {
   for (const bool buffered : {false, true}) {
     ClientSettings settings;
     settings.buffered = buffered;
-    EXPECT_EQ(SoapOf(Soap("reply"), settings), (SoapOutcome{HTTP_RET_OK, "reply", HTTP_RET_OK}));
-    TlsScriptedPeer peer({Exchange(Soap("reply"))});
+    EXPECT_EQ(SoapOf(Soap("words"), settings), (SoapOutcome{HTTP_RET_OK, "words", HTTP_RET_OK}));
+    TlsScriptedPeer peer({Exchange(Soap("words"))});
     settings.https = true;
     ClientProbe client(peer.Port(), settings);
-    std::string reply;
-    EXPECT_EQ(client.SendReqBySocketPost("x", reply), HTTP_RET_OK);
-    EXPECT_EQ(reply, "reply");
+    std::string response;
+    EXPECT_EQ(client.SendReqBySocketPost("x", response), HTTP_RET_OK);
+    EXPECT_EQ(response, "words");
     EXPECT_EQ(peer.Received(0), RequestText("", "x"));
   }
 }
 
-// The reply.
+// The response.
 
 TEST(SendReqBySocketPost, TheStateAndTheResultAreThoseOfTheHead) {
   ScriptedPeer peer({Exchange(Soap("ok", "302 Found"))});
   ClientProbe client(peer.Port());
-  std::string reply;
-  EXPECT_EQ(client.SendReqBySocketPost("x", reply), HTTP_RET_OK);
+  std::string response;
+  EXPECT_EQ(client.SendReqBySocketPost("x", response), HTTP_RET_OK);
   EXPECT_EQ(client.m_connState, 2);
   EXPECT_EQ(client.m_result, HTTP_RET_REDIRECT);
   EXPECT_EQ(client.m_statusCode, 302);
 }
 
-TEST(SendReqBySocketPost, BytesBehindTheAnnouncedLengthStayUnread) {
+TEST(SendReqBySocketPost, BytesAfterTheAnnouncedLengthStayUnread) {
   ScriptedPeer peer({Exchange(Announcing("3", "abcdef"))});
   ClientProbe client(peer.Port());
-  std::string reply = "a longer text than the new one";
-  EXPECT_EQ(client.SendReqBySocketPost("x", reply), HTTP_RET_OK);
-  EXPECT_EQ(reply, "abc");
+  std::string response = "a longer text than the new one";
+  EXPECT_EQ(client.SendReqBySocketPost("x", response), HTTP_RET_OK);
+  EXPECT_EQ(response, "abc");
   EXPECT_EQ(ReadBody(client), "def");
 }
 
@@ -194,17 +194,17 @@ TEST(SendReqBySocketPost, ALengthThatIsNegativeOrNoNumberIsAnErrorWithoutALine) 
   }
 }
 
-TEST(SendReqBySocketPost, TheFirstOfSeveralLengthsCounts) {
+TEST(SendReqBySocketPost, TheFirstOfSeveralLengthsIsTaken) {
   EXPECT_EQ(SoapOf(Announcing("2\r\nContent-Length: 4", "body")),
             (SoapOutcome{HTTP_RET_OK, "bo", HTTP_RET_OK}));
 }
 
-TEST(SendReqBySocketPost, AChunkedReplyWithoutALengthIsNeverRead) {
+TEST(SendReqBySocketPost, AChunkedResponseWithoutALengthIsNeverRead) {
   EXPECT_EQ(SoapOf("HTTP/1.1 200 OK\r\nTransfer-Encoding: chunked\r\n\r\n2\r\nok\r\n0\r\n\r\n"),
             kNothingRead);
 }
 
-TEST(SendReqBySocketPost, AHeadThatIsNoHttpHeadGivesItsResultAndNoBody) {
+TEST(SendReqBySocketPost, AHeadThatIsNoHttpHeadHasItsResultAndNoBody) {
   EXPECT_EQ(SoapOf("nonsense\r\n"), (SoapOutcome{HTTP_RET_IO_ERROR, "old", HTTP_RET_BAD_RESPONSE}));
   EXPECT_EQ(SoapOf("HTTP/1.1 200 OK\r\nContent-Length:\r\n\r\n"),
             (SoapOutcome{HTTP_RET_IO_ERROR, "old", HTTP_RET_NOT_READY}));
@@ -220,7 +220,7 @@ TEST(SendReqBySocketPost, AShortReadKeepsTheBytesThatCame) {
   }
 }
 
-TEST(SendReqBySocketPost, TheReplyEndsAtItsFirstZeroByte) {
+TEST(SendReqBySocketPost, TheResponseEndsAtItsFirstZeroByte) {
   EXPECT_EQ(SoapOf(Soap("ab\0cd"s)), (SoapOutcome{HTTP_RET_OK, "ab", HTTP_RET_OK}));
   EXPECT_EQ(SoapOf(Announcing("100", "ab\0cd"s)), (SoapOutcome{HTTP_RET_OK, "ab", HTTP_RET_OK}));
   EXPECT_EQ(SoapOf(Soap("\0cd"s)), (SoapOutcome{HTTP_RET_OK, "", HTTP_RET_OK}));
@@ -232,47 +232,47 @@ TEST(SendReqBySocketPost, ADirectReadIsNotRepeated) {
   ClientSettings settings;
   settings.buffered = false;
   ClientProbe client(peer.Port(), settings);
-  std::string reply;
+  std::string response;
   {
     Faults faults;
-    EXPECT_EQ(client.SendReqBySocketPost("x", reply), HTTP_RET_OK);
+    EXPECT_EQ(client.SendReqBySocketPost("x", response), HTTP_RET_OK);
     EXPECT_EQ(faults.Count(Call::kRead), static_cast<int>(head.size()) + 1);
   }
-  EXPECT_EQ(reply, "abc");
+  EXPECT_EQ(response, "abc");
   client.m_pSocket->Disconnect();
 }
 
-TEST(SendReqBySocketPost, ABufferedReplyInPiecesArrivesWhole) {
+TEST(SendReqBySocketPost, ABufferedResponseInPiecesArrivesWhole) {
   ScriptedPeer peer({ExchangeByteByByte(Soap("in pieces"))});
   ClientProbe client(peer.Port());
-  std::string reply;
-  EXPECT_EQ(client.SendReqBySocketPost("x", reply), HTTP_RET_OK);
-  EXPECT_EQ(reply, "in pieces");
+  std::string response;
+  EXPECT_EQ(client.SendReqBySocketPost("x", response), HTTP_RET_OK);
+  EXPECT_EQ(response, "in pieces");
 }
 
-TEST(SendReqBySocketPost, ABufferedReplyOfFiveMebibytesArrivesWhole) {
+TEST(SendReqBySocketPost, ABufferedResponseOfFiveMebibytesArrivesWhole) {
   std::string body;
   for (int i = 0; body.size() < 5 * kMebibyte; ++i) body += std::to_string(i) + " ";
   const SoapOutcome outcome = SoapOf(Soap(body));
   EXPECT_EQ(outcome.result, HTTP_RET_OK);
-  EXPECT_EQ(outcome.reply.size(), body.size());
-  EXPECT_TRUE(outcome.reply == body);
+  EXPECT_EQ(outcome.response.size(), body.size());
+  EXPECT_TRUE(outcome.response == body);
 }
 
-TEST(SendReqBySocketPost, RepliesAroundOneMebibyteArriveWhole) {
+TEST(SendReqBySocketPost, ResponsesAroundOneMebibyteArriveWhole) {
   for (const int extra : {-1, 0, 1}) {
     const std::string body(static_cast<size_t>(kMebibyte + extra), 'b');
     const SoapOutcome outcome = SoapOf(Soap(body));
     EXPECT_EQ(outcome.result, HTTP_RET_OK);
-    EXPECT_TRUE(outcome.reply == body) << outcome.reply.size();
+    EXPECT_TRUE(outcome.response == body) << outcome.response.size();
   }
 }
 
-TEST(SendReqBySocketPost, AnErrorBehindTheFirstMebibyteKeepsWhatCame) {
+TEST(SendReqBySocketPost, AnErrorAfterTheFirstMebibyteKeepsWhatCame) {
   const std::string body(kMebibyte + 500, 'b');
   const SoapOutcome outcome = SoapOf(Announcing(std::to_string(3 * kMebibyte), body));
   EXPECT_EQ(outcome.result, HTTP_RET_OK);
-  EXPECT_TRUE(outcome.reply == body) << outcome.reply.size();
+  EXPECT_TRUE(outcome.response == body) << outcome.response.size();
 }
 
 TEST(SendReqBySocketPost, ALengthThatDoesNotFitIsAnErrorAndTakesNoMemory) {
@@ -282,9 +282,9 @@ TEST(SendReqBySocketPost, ALengthThatDoesNotFitIsAnErrorAndTakesNoMemory) {
     ScriptedPeer peer({Exchange(Announcing(length, "body"))});
     EXPECT_EQ(InLittleMemory([&] {
                 ClientProbe client(peer.Port());
-                std::string reply = "old";
-                const int result = client.SendReqBySocketPost("x", reply);
-                EXPECT_EQ(reply, "old");
+                std::string response = "old";
+                const int result = client.SendReqBySocketPost("x", response);
+                EXPECT_EQ(response, "old");
                 EXPECT_EQ(client.m_result, HTTP_RET_OK);
                 return result;
               }),
@@ -299,9 +299,9 @@ TEST(SendReqBySocketPost, MemoryGrowsWithWhatArrivesAndNotWithWhatIsAnnounced) {
     ScriptedPeer peer({Exchange(Announcing(announced, body))});
     EXPECT_EQ(InLittleMemory([&] {
                 ClientProbe client(peer.Port());
-                std::string reply;
-                const int result = client.SendReqBySocketPost("x", reply);
-                EXPECT_TRUE(reply == body) << reply.size();
+                std::string response;
+                const int result = client.SendReqBySocketPost("x", response);
+                EXPECT_TRUE(response == body) << response.size();
                 return result;
               }),
               HTTP_RET_OK)

@@ -24,18 +24,18 @@ struct OwnedDoc {
   xmlDoc* doc = nullptr;
 };
 
-// The text of the document that a reply's body gives; "(null)" for no document.
+// The text of the document that a response's body returns; "(null)" for no document.
 std::string XmlTextOf(const std::string& body) {
   ScriptedPeer peer({Exchange(Soap(body))});
   ClientProbe client(peer.Port());
-  OwnedDoc reply;
-  EXPECT_EQ(client.SendReqByXMLSocketPost("x", reply.doc), HTTP_RET_OK);
-  return reply.doc != nullptr ? reply.Text() : "(null)";
+  OwnedDoc response;
+  EXPECT_EQ(client.SendReqByXMLSocketPost("x", response.doc), HTTP_RET_OK);
+  return response.doc != nullptr ? response.Text() : "(null)";
 }
 
 }  // namespace
 
-TEST(SendReqByXMLSocketPost, ABodyThatIsNoXmlGivesANullDocumentAndOk) {
+TEST(SendReqByXMLSocketPost, ABodyThatIsNoXmlIsANullDocumentAndOk) {
   ScriptedPeer peer({Exchange(Soap("<a>no end"))});
   ClientProbe client(peer.Port());
   OwnedDoc earlier;
@@ -49,7 +49,7 @@ TEST(SendReqByXMLSocketPost, TextOfTwoLinesIsJoinedWithNothingBetween) {
   EXPECT_EQ(XmlTextOf("<a>one\r\ntwo</a>"), "onetwo");
 }
 
-// The XML reply.
+// The XML response.
 
 TEST(SendReqByXMLSocketPost, CarriageReturnsAndLineFeedsAreRemovedEverywhere) {
   EXPECT_EQ(XmlTextOf("\n\r<?xml version=\"1.0\"?>\r\n<a\n>\rone\n\ntwo \r\n three</a>\n"),
@@ -59,11 +59,11 @@ TEST(SendReqByXMLSocketPost, CarriageReturnsAndLineFeedsAreRemovedEverywhere) {
 TEST(SendReqByXMLSocketPost, AFaultWithStatus500IsADocument) {
   ScriptedPeer peer({Exchange(Soap("<fault>f</fault>", "500 Oops"))});
   ClientProbe client(peer.Port());
-  OwnedDoc reply;
-  EXPECT_EQ(client.SendReqByXMLSocketPost("x", reply.doc), HTTP_RET_OK);
+  OwnedDoc response;
+  EXPECT_EQ(client.SendReqByXMLSocketPost("x", response.doc), HTTP_RET_OK);
   EXPECT_EQ(client.m_result, HTTP_RET_BAD_RESPONSE);
-  ASSERT_NE(reply.doc, nullptr);
-  EXPECT_EQ(reply.Text(), "f");
+  ASSERT_NE(response.doc, nullptr);
+  EXPECT_EQ(response.Text(), "f");
   EXPECT_EQ(peer.Received(0), RequestText("", "x"));
 }
 
@@ -81,16 +81,16 @@ TEST(SendReqByXMLSocketPost, AFailureLeavesTheDocument) {
 
 TEST(SendReqByXMLSocketPost, A401IsNotAnswered) {
   ScriptedPeer peer({Exchange(Unauthorized(kDigest, "<no/>"))});
-  ClientProbe client(peer.Port(), WithLogin());
-  OwnedDoc reply;
-  EXPECT_EQ(client.SendReqByXMLSocketPost("x", reply.doc), HTTP_RET_OK);
+  ClientProbe client(peer.Port(), WithCredentials());
+  OwnedDoc response;
+  EXPECT_EQ(client.SendReqByXMLSocketPost("x", response.doc), HTTP_RET_OK);
   EXPECT_EQ(client.m_result, HTTP_RET_UNAUTHORIZED);
-  EXPECT_NE(reply.doc, nullptr);
+  EXPECT_NE(response.doc, nullptr);
   peer.Finish();
   EXPECT_EQ(peer.Connections(), 1u);
 }
 
-TEST(SendReqByXMLSocketPost, ABodyOfLineEndsAloneIsNoDocument) {
+TEST(SendReqByXMLSocketPost, ABodyOfCrAndLfAloneIsNoDocument) {
   EXPECT_EQ(XmlTextOf("\r\n\r\n"), "(null)");
 }
 

@@ -50,10 +50,10 @@ std::string RefusalOf(const Sender& sender, CURLoption option) {
   return messages.at(option) + code;
 }
 
-// What a peer that answers with `reply` receives.
-std::string RequestOf(const Sender& sender, const std::string& reply = Reply("<ok/>")) {
-  ScriptedPeer peer({Exchange(reply)});
-  ClientProbe client(peer.Port(), WithLogin("127.0.0.1"));
+// What a peer that answers with `response` receives.
+std::string RequestOf(const Sender& sender, const std::string& response = Response("<ok/>")) {
+  ScriptedPeer peer({Exchange(response)});
+  ClientProbe client(peer.Port(), WithCredentials("127.0.0.1"));
   EXPECT_EQ(Send(sender, client), HTTP_RET_OK);
   EXPECT_EQ(client.m_result, HTTP_RET_OK);
   EXPECT_EQ(client.m_connState, 1);
@@ -62,7 +62,7 @@ std::string RequestOf(const Sender& sender, const std::string& reply = Reply("<o
 
 // The fields of a POST whose document has this text.
 std::string PostFieldsOf(const std::string& text) {
-  ClientProbe client(80, WithLogin());
+  ClientProbe client(80, WithCredentials());
   OwnedDoc document(text);
   Faults faults;
   faults.FailFrom(Call::kCurlEasyPerform, 1);
@@ -72,9 +72,9 @@ std::string PostFieldsOf(const std::string& text) {
 
 }  // namespace
 
-TEST(XmlSenders, AnEmptyHostGivesTheSchemeAloneAsTheUrl) {
+TEST(XmlSenders, WithAnEmptyHostTheUrlIsTheSchemeAlone) {
   for (const Sender& sender : Senders()) {
-    ClientProbe client(80, WithLogin(""));
+    ClientProbe client(80, WithCredentials(""));
     Faults faults;
     faults.FailFrom(Call::kCurlEasyPerform, 1);
     Send(sender, client);
@@ -114,8 +114,8 @@ TEST(SendReqByXMLPut, WithANullDocumentEveryOptionIsSetBeforeTheErrorIsStored) {
 
 TEST(SendReqByXMLPost, OfADocumentOf10000BytesTheFirst8191AreSent) {
   const std::string text = DocumentOf(10000);
-  ScriptedPeer peer({Exchange(Reply("<ok/>"))});
-  ClientProbe client(peer.Port(), WithLogin("127.0.0.1"));
+  ScriptedPeer peer({Exchange(Response("<ok/>"))});
+  ClientProbe client(peer.Port(), WithCredentials("127.0.0.1"));
   OwnedDoc document(text);
   EXPECT_EQ(client.SendReqByXMLPost(document.doc), HTTP_RET_OK);
   const std::string request = peer.Received(0);
@@ -126,7 +126,7 @@ TEST(SendReqByXMLPost, OfADocumentOf10000BytesTheFirst8191AreSent) {
 TEST(XmlSenders, A204WithoutABodyIsSuccessAndNothingToParse) {
   for (const Sender& sender : Senders()) {
     ScriptedPeer peer({Exchange("HTTP/1.1 204 No Content\r\n\r\n")});
-    ClientProbe client(peer.Port(), WithLogin("127.0.0.1"));
+    ClientProbe client(peer.Port(), WithCredentials("127.0.0.1"));
     EXPECT_EQ(Send(sender, client), HTTP_RET_OK) << sender.name;
     xmlDoc* doc = nullptr;
     EXPECT_FALSE(client.GetResponseXML(doc));
@@ -137,7 +137,7 @@ TEST(XmlSenders, A204WithoutABodyIsSuccessAndNothingToParse) {
 
 TEST(XmlSenders, TheOptionsAreSetInOrder) {
   for (const Sender& sender : Senders()) {
-    ClientProbe client(80, WithLogin());
+    ClientProbe client(80, WithCredentials());
     Faults faults;
     faults.FailFrom(Call::kCurlEasyPerform, 1);
     Send(sender, client);
@@ -145,10 +145,10 @@ TEST(XmlSenders, TheOptionsAreSetInOrder) {
   }
 }
 
-TEST(XmlSenders, LoginUrlAndCollectionAreTheSameForAll) {
+TEST(XmlSenders, CredentialsUrlAndCollectionAreTheSameForAll) {
   for (const Sender& sender : Senders()) {
-    ClientSettings settings = WithLogin();
-    settings.https = true;  // does not count here
+    ClientSettings settings = WithCredentials();
+    settings.https = true;  // is ignored here
     settings.version = HTTP_VERSION_1_0;
     ClientProbe client(443, settings);
     Faults faults;
@@ -164,8 +164,8 @@ TEST(XmlSenders, LoginUrlAndCollectionAreTheSameForAll) {
   }
 }
 
-TEST(SendReqByXMLGet, TheTimeoutAndBothLoginsAreHandedOn) {
-  ClientProbe client(80, WithLogin());
+TEST(SendReqByXMLGet, TheTimeoutAndBothSchemesAreSet) {
+  ClientProbe client(80, WithCredentials());
   Faults faults;
   faults.FailFrom(Call::kCurlEasyPerform, 1);
   client.SendReqByXMLGet(7);
@@ -174,7 +174,7 @@ TEST(SendReqByXMLGet, TheTimeoutAndBothLoginsAreHandedOn) {
 }
 
 TEST(SendReqByXMLPost, TheDocumentIsHandedOnIndentedWithTwoHeaders) {
-  ClientProbe client(80, WithLogin());
+  ClientProbe client(80, WithCredentials());
   Faults faults;
   faults.FailFrom(Call::kCurlEasyPerform, 1);
   Send(kPost, client);
@@ -191,7 +191,7 @@ TEST(SendReqByXMLPost, DocumentsAroundTheLimitAreSentWholeOrCutAt8191) {
 }
 
 TEST(SendReqByXMLPut, TheFileHoldsTheDocumentAndItsSizeIsHandedOn) {
-  ClientProbe client(80, WithLogin());
+  ClientProbe client(80, WithCredentials());
   std::string content;
   Faults faults;
   faults.FailFrom(Call::kCurlEasyPerform, 1).Before(Call::kCurlEasyPerform, [&](int) {
@@ -212,7 +212,7 @@ TEST(SendReqByXMLPut, TheFileHoldsTheDocumentAndItsSizeIsHandedOn) {
 }
 
 TEST(SendReqByXMLDelete, TheMethodIsHandedOn) {
-  ClientProbe client(80, WithLogin());
+  ClientProbe client(80, WithCredentials());
   Faults faults;
   faults.FailFrom(Call::kCurlEasyPerform, 1);
   client.SendReqByXMLDelete();
@@ -223,7 +223,7 @@ TEST(XmlSenders, EachRefusedOptionHasItsLineAndEndsTheRequest) {
   for (const Sender& sender : Senders()) {
     for (const CURLoption option : sender.options) {
       const DescriptorGuard guard;
-      ClientProbe client(80, WithLogin());
+      ClientProbe client(80, WithCredentials());
       LogCapture log;
       Faults faults;
       faults.FailCurlOption(option, CURLE_OUT_OF_MEMORY);
@@ -243,13 +243,13 @@ TEST(XmlSenders, EachRefusedOptionHasItsLineAndEndsTheRequest) {
 
 // The requests on the wire.
 
-TEST(SendReqByXMLGet, TheRequestAsksWithoutALoginFirst) {
+TEST(SendReqByXMLGet, TheFirstRequestHasNoCredentials) {
   EXPECT_THAT(RequestOf(kGet), AllOf(StartsWith("GET /x/y?z HTTP/1.1\r\nHost: 127.0.0.1:"),
                                      EndsWith("\r\nAccept: */*\r\n\r\n"),
                                      Not(HasSubstr("Authorization")), Not(HasSubstr("Tarnwick"))));
 }
 
-TEST(SendReqByXMLPost, TheRequestCarriesTheLoginTheTypeAndTheDocument) {
+TEST(SendReqByXMLPost, TheRequestCarriesTheCredentialsTheTypeAndTheDocument) {
   EXPECT_THAT(RequestOf(kPost),
               AllOf(StartsWith("POST /x/y?z HTTP/1.1\r\nHost: 127.0.0.1:"),
                     HasSubstr("\r\nAuthorization: Basic dTpzZWNyZXQ=\r\n"),
@@ -273,8 +273,8 @@ TEST(SendReqByXMLDelete, TheRequestHasNoBody) {
 }
 
 TEST(SendReqByXMLPut, ADocumentOfSeveralMebibytesIsSentWhole) {
-  ScriptedPeer peer({Exchange(Reply("<ok/>"))});
-  ClientProbe client(peer.Port(), WithLogin("127.0.0.1"));
+  ScriptedPeer peer({Exchange(Response("<ok/>"))});
+  ClientProbe client(peer.Port(), WithCredentials("127.0.0.1"));
   const std::string text = DocumentOf(3 << 20);
   OwnedDoc document(text);
   EXPECT_EQ(client.SendReqByXMLPut(document.doc), HTTP_RET_OK);
@@ -302,8 +302,8 @@ TEST(SendReqByXMLGet, AChallengeOfDigestOrBasicIsAnswered) {
   for (const auto& [challenge, authorization] : table) {
     ScriptedPeer peer({Exchange("HTTP/1.1 401 No\r\nConnection: close\r\nWWW-Authenticate: "s +
                                 challenge + "\r\nContent-Length: 0\r\n\r\n"),
-                       Exchange(Reply("<ok/>"))});
-    ClientProbe client(peer.Port(), WithLogin("127.0.0.1"));
+                       Exchange(Response("<ok/>"))});
+    ClientProbe client(peer.Port(), WithCredentials("127.0.0.1"));
     EXPECT_EQ(client.SendReqByXMLGet(7), HTTP_RET_OK);
     EXPECT_THAT(peer.Received(1), HasSubstr(authorization));
     EXPECT_EQ(Collected(client), "<ok/>");
@@ -312,7 +312,7 @@ TEST(SendReqByXMLGet, AChallengeOfDigestOrBasicIsAnswered) {
 
 TEST(SendReqByXMLGet, TheTimeoutEndsATransferThatStalls) {
   ScriptedPeer peer({{ExpectRequest(), StallUntilFinish()}});
-  ClientProbe client(peer.Port(), WithLogin("127.0.0.1"));
+  ClientProbe client(peer.Port(), WithCredentials("127.0.0.1"));
   LogCapture log;
   EXPECT_EQ(client.SendReqByXMLGet(1), HTTP_RET_IO_ERROR);
   EXPECT_THAT(log.Messages(), ElementsAre("Failed to make http connection, return value=28\n"));
@@ -320,8 +320,8 @@ TEST(SendReqByXMLGet, TheTimeoutEndsATransferThatStalls) {
 
 TEST(XmlSenders, TheDocumentIsOnlyRead) {
   for (const Sender* sender : {&kPost, &kPut}) {
-    ScriptedPeer peer({Exchange(Reply("<ok/>"))});
-    ClientProbe client(peer.Port(), WithLogin("127.0.0.1"));
+    ScriptedPeer peer({Exchange(Response("<ok/>"))});
+    ClientProbe client(peer.Port(), WithCredentials("127.0.0.1"));
     OwnedDoc document("<r><a>1</a></r>");
     xmlDoc* doc = document.doc;
     EXPECT_EQ(sender->send(client, doc), HTTP_RET_OK);

@@ -65,7 +65,7 @@ inline const Sender& kPost = Senders()[1];
 inline const Sender& kPut = Senders()[2];
 inline const Sender& kDelete = Senders()[3];
 
-inline ClientSettings WithLogin(const std::string& host = "h") {
+inline ClientSettings WithCredentials(const std::string& host = "h") {
   ClientSettings settings;
   settings.path = "x/y?z";
   settings.host = host;
@@ -74,7 +74,7 @@ inline ClientSettings WithLogin(const std::string& host = "h") {
   return settings;
 }
 
-inline std::string Reply(const std::string& body, const std::string& status = "200 OK") {
+inline std::string Response(const std::string& body, const std::string& status = "200 OK") {
   return "HTTP/1.1 " + status + "\r\nContent-Length: " + std::to_string(body.size()) + "\r\n\r\n" +
          body;
 }

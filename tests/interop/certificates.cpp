@@ -16,6 +16,6 @@ CertificateFolder::CertificateFolder() {
 }
 
 const CertificateFolder& Certificates() {
-  static const CertificateFolder folder;
-  return folder;
+  static const CertificateFolder directory;
+  return directory;
 }

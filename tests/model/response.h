@@ -1,4 +1,4 @@
-// What a client makes of a reply that ends early: a plain reading of the rules, without sockets,
+// What a client makes of a response that ends early: a plain reading of the rules, without sockets,
 // for comparison with the library's.
 #ifndef TARNWICK_TESTS_MODEL_RESPONSE_H_
 #define TARNWICK_TESTS_MODEL_RESPONSE_H_
@@ -13,7 +13,7 @@
 
 #include "tarnwick/http/twhttp.h"
 
-// A reply as far as it comes, and whether a reset ends it or a close.
+// A response as far as it comes, and whether a reset ends it or a close.
 struct Cut {
   std::string bytes;
   bool reset = false;
@@ -32,7 +32,7 @@ class CutReader {
  public:
   CutReader(Cut cut, bool buffered) : cut_(std::move(cut)), buffered_(buffered) {}
 
-  // The count as TWSocket::ReadData gives it. A reset makes one read fail; behind that the stream
+  // The count that TWSocket::ReadData returns. A reset makes one read fail; after that the stream
   // has ended.
   int Read(size_t wanted, std::string* bytes) {
     eof_ = false;
@@ -44,7 +44,7 @@ class CutReader {
     eof_ = !cut_.reset;
     if (!std::exchange(cut_.reset, false)) return count;
     if (taken == 0) return -1;
-    eof_ = wanted - taken >= 1024;  // a large read looks once more behind the failure
+    eof_ = wanted - taken >= 1024;  // a large read looks once more after the failure
     return count;
   }
 
@@ -82,7 +82,7 @@ inline int ModelStatusLine(const std::string& line, int* status) {
   return *status == 401 ? HTTP_RET_UNAUTHORIZED : HTTP_RET_BAD_RESPONSE;
 }
 
-// A header line "Name: value"; false when a known name has nothing behind it.
+// A header line "Name: value"; false when a known name has nothing after it.
 inline bool ModelHeaderLine(const std::string& line, ModelHead* head) {
   const std::pair<const char*, std::string*> known[] = {{"Content-Length", &head->length},
                                                         {"WWW-Authenticate", &head->challenge},

@@ -17,7 +17,7 @@ using ::testing::StartsWith;
 
 // The same object connects again, however the last connection ended.
 
-void ExpectDialog(TlsSocket& socket) {
+void ExpectDialog(ExposedTlsSocket& socket) {
   ASSERT_EQ(socket.Connect(), 0);
   EXPECT_EQ(socket.WriteData("ping\n", 5), 5);
   EXPECT_EQ(ReadLine(socket), (Delivered{4, "pong"}));
@@ -40,12 +40,12 @@ class TlsWithoutObjects : public ::testing::TestWithParam<Call> {
     faults.FailNth(GetParam(), 1);
     listener_ = BindLoopback(&port_);
     listen(listener_, 8);
-    socket_ = std::make_unique<TlsSocket>(kLoopback, port_, 1, true);
+    socket_ = std::make_unique<ExposedTlsSocket>(kLoopback, port_, 1, true);
   }
   ~TlsWithoutObjects() override { close(listener_); }
 
   LogCapture log_;
-  std::unique_ptr<TlsSocket> socket_;
+  std::unique_ptr<ExposedTlsSocket> socket_;
 
  private:
   int listener_;
@@ -63,7 +63,7 @@ INSTANTIATE_TEST_SUITE_P(Tls, TlsReconnect, ::testing::Bool());
 
 TEST(TlsDisconnect, SendsTheCloseNoticeAndDoesNotWaitForThePeers) {
   TlsScriptedPeer peer({{Handshake(), ExpectCloseNotice(), StallUntilFinish()}});
-  TlsSocket socket(kLoopback, peer.Port(), 5, true);
+  ExposedTlsSocket socket(kLoopback, peer.Port(), 5, true);
   ASSERT_EQ(socket.Connect(), 0);
   Faults faults;
   const Stopwatch watch;
@@ -76,7 +76,7 @@ TEST(TlsDisconnect, SendsTheCloseNoticeAndDoesNotWaitForThePeers) {
 
 TEST(TlsDisconnect, WithoutAConnectionTheBaseAloneRuns) {
   TlsScriptedPeer peer({{Handshake(), DiscardUntilEnd()}});
-  TlsSocket socket(kLoopback, peer.Port(), 5, true);
+  ExposedTlsSocket socket(kLoopback, peer.Port(), 5, true);
   ASSERT_EQ(socket.Connect(), 0);
   socket.m_bConnected = false;
   socket.Buffer("old", 3);
@@ -90,7 +90,7 @@ TEST(TlsDisconnect, WithoutAConnectionTheBaseAloneRuns) {
 
 TEST(TlsDisconnect, TheDestructorClosesWithoutANotice) {
   TlsScriptedPeer peer({{Handshake(), DiscardUntilEnd()}});
-  auto socket = std::make_unique<TlsSocket>(kLoopback, peer.Port(), 5, true);
+  auto socket = std::make_unique<ExposedTlsSocket>(kLoopback, peer.Port(), 5, true);
   ASSERT_EQ(socket->Connect(), 0);
   const int fd = socket->m_sockFd;
   Faults faults;
@@ -102,13 +102,13 @@ TEST(TlsDisconnect, TheDestructorClosesWithoutANotice) {
 
 TEST_P(TlsReconnect, WorksAfterADisconnect) {
   TlsScriptedPeer peer({Dialog(), Dialog(), Dialog()});
-  TlsSocket socket(kLoopback, peer.Port(), 5, GetParam());
+  ExposedTlsSocket socket(kLoopback, peer.Port(), 5, GetParam());
   for (int i = 0; i < 3; ++i) ExpectDialog(socket);
 }
 
 TEST_P(TlsReconnect, ShutsDownAnOpenConnectionFirst) {
   TlsScriptedPeer peer({{Handshake(), ExpectCloseNotice()}, Dialog()});
-  TlsSocket socket(kLoopback, peer.Port(), 5, GetParam());
+  ExposedTlsSocket socket(kLoopback, peer.Port(), 5, GetParam());
   ASSERT_EQ(socket.Connect(), 0);
   ExpectDialog(socket);
 }
@@ -117,7 +117,7 @@ TEST_P(TlsReconnect, WorksAfterAFailedRead) {
   for (const Step& end : {SendRaw("no TLS record at all"), Reset(), CloseWithoutNotice()}) {
     SCOPED_TRACE(end.name);
     TlsScriptedPeer peer({{Handshake(), end}, Dialog()});
-    TlsSocket socket(kLoopback, peer.Port(), 5, GetParam());
+    ExposedTlsSocket socket(kLoopback, peer.Port(), 5, GetParam());
     ASSERT_EQ(socket.Connect(), 0);
     EXPECT_LE(ReadSome(socket, 10).result, 0);
     ExpectDialog(socket);
@@ -126,7 +126,7 @@ TEST_P(TlsReconnect, WorksAfterAFailedRead) {
 
 TEST_P(TlsReconnect, WorksAfterAFailedHandshake) {
   TlsScriptedPeer peer({{SendRaw("this is not TLS\r\n")}, Dialog()});
-  TlsSocket socket(kLoopback, peer.Port(), 5, GetParam());
+  ExposedTlsSocket socket(kLoopback, peer.Port(), 5, GetParam());
   EXPECT_EQ(socket.Connect(), -1);
   ExpectDialog(socket);
 }
@@ -134,7 +134,7 @@ TEST_P(TlsReconnect, WorksAfterAFailedHandshake) {
 TEST_P(TlsReconnect, WorksAfterNewSettings) {
   TlsScriptedPeer first({{Handshake(), DiscardUntilEnd()}});
   TlsScriptedPeer second({Dialog()});
-  TlsSocket socket(kLoopback, first.Port(), 5, GetParam());
+  ExposedTlsSocket socket(kLoopback, first.Port(), 5, GetParam());
   ASSERT_EQ(socket.Connect(), 0);
   socket.SetSocketInfo(kLoopback, second.Port(), 5, GetParam());
   ExpectDialog(socket);
@@ -143,7 +143,7 @@ TEST_P(TlsReconnect, WorksAfterNewSettings) {
 TEST_P(TlsReconnect, WorksAfterARefusedConnection) {
   const ClosedPort port;
   TlsScriptedPeer peer({Dialog()});
-  TlsSocket socket(kLoopback, port.Port(), 5, GetParam());
+  ExposedTlsSocket socket(kLoopback, port.Port(), 5, GetParam());
   EXPECT_EQ(socket.Connect(), -1);
   socket.SetSocketInfo(kLoopback, peer.Port(), 5, GetParam());
   ExpectDialog(socket);
@@ -151,7 +151,7 @@ TEST_P(TlsReconnect, WorksAfterARefusedConnection) {
 
 TEST_P(TlsReconnect, WorksAfterATimeOut) {
   TlsScriptedPeer peer({{Handshake(), DiscardUntilEnd()}, Dialog()});
-  TlsSocket socket(kLoopback, peer.Port(), 0, GetParam());
+  ExposedTlsSocket socket(kLoopback, peer.Port(), 0, GetParam());
   ASSERT_EQ(socket.Connect(), 0);
   EXPECT_EQ(ReadSome(socket, 10).result, -1);
   socket.m_timeout = 5;
@@ -216,21 +216,21 @@ TEST_P(TlsWithoutObjects, EveryOtherCallFailsWithoutACrash) {
 }
 
 TEST(TlsObject, StartsAsThePlainSocketDoes) {
-  TlsSocket socket("host", 443, 9, true);
+  ExposedTlsSocket socket("host", 443, 9, true);
   EXPECT_EQ(socket.m_sockFd, -1);
   EXPECT_EQ(socket.m_strHost, "host");
   EXPECT_EQ(socket.m_port, 443);
   EXPECT_EQ(socket.m_timeout, 9);
   EXPECT_TRUE(socket.m_bBuffered);
-  TlsSocket bare;
+  ExposedTlsSocket bare;
   EXPECT_EQ(bare.m_port, -1);
   EXPECT_EQ(bare.m_timeout, -1);
 }
 
-TEST(TlsObject, LeavesNoDescriptorBehind) {
+TEST(TlsObject, LeavesNoDescriptorOpen) {
   const DescriptorGuard guard;
   TlsScriptedPeer peer({Dialog(), {SendRaw("garbage, not TLS")}, Dialog()});
-  TlsSocket socket(kLoopback, peer.Port(), 5, true);
+  ExposedTlsSocket socket(kLoopback, peer.Port(), 5, true);
   ExpectDialog(socket);
   EXPECT_EQ(socket.Connect(), -1);
   ExpectDialog(socket);
@@ -238,7 +238,7 @@ TEST(TlsObject, LeavesNoDescriptorBehind) {
 
 TEST(TlsObject, ItsDescriptorIsClosedByExec) {
   TlsScriptedPeer peer({{Handshake(), DiscardUntilEnd()}});
-  TlsSocket socket(kLoopback, peer.Port(), 5, true);
+  ExposedTlsSocket socket(kLoopback, peer.Port(), 5, true);
   ASSERT_EQ(socket.Connect(), 0);
   EXPECT_NE(fcntl(socket.m_sockFd, F_GETFD) & FD_CLOEXEC, 0);
   socket.Disconnect();

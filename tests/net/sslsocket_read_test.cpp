@@ -163,16 +163,16 @@ TEST(TlsRead, WaitingBytesAreNoReasonToBeWritable) {
   EXPECT_EQ(faults.Count(Call::kSelect), 1);
 }
 
-TEST(TlsRead, WithoutASocketTheWaitGivesMinusOneSilently) {
+TEST(TlsRead, WithoutASocketTheWaitReturnsMinusOneSilently) {
   LogCapture log;
-  TlsSocket socket;
+  ExposedTlsSocket socket;
   EXPECT_EQ(socket.DoSelect(TWSocket::SELECT_READ), -1);
   EXPECT_EQ(socket.DoSelect(TWSocket::SELECT_WRITE), -1);
   EXPECT_THAT(log.Lines(), IsEmpty());
 }
 
 TEST(TlsRead, BeforeAConnectionFails) {
-  TlsSocket socket(kLoopback, 1, 5, true);
+  ExposedTlsSocket socket(kLoopback, 1, 5, true);
   EXPECT_EQ(ReadSome(socket, 10).result, -1);
   EXPECT_EQ(socket.WriteData("hello", 5), -1);
   EXPECT_EQ(ReadLine(socket).result, -1);
@@ -191,7 +191,7 @@ TEST(TlsRead, ALargeRecordThatComesByteByByteFitsASmallStack) {
   });
 }
 
-TEST(TlsRead, ATimeOutGivesMinusOneWithEagainAndIsLogged) {
+TEST(TlsRead, ATimeOutReturnsMinusOneWithEagainAndIsLogged) {
   LogCapture log;
   TlsPair tls({ExpectEof()}, 0, false);
   EXPECT_EQ(ReadSome(tls.socket, 10), (Delivered{-1, ""}));
@@ -300,7 +300,7 @@ TEST(TlsRead, AFailedWaitEndsTheRead) {
       ElementsAre("Select Fd [" + Fd(tls.socket) + "] failed with errno [12]\n", kReadWaitFailed));
 }
 
-TEST(TlsRead, BehindADisconnectItFailsAndReadsFromNoOtherFile) {
+TEST(TlsRead, AfterADisconnectItFailsAndReadsFromNoOtherFile) {
   TlsPair tls({Send("bye"), StallUntilFinish()}, 5, false);
   tls.socket.Disconnect();
   LogCapture log;

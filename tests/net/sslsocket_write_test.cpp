@@ -141,7 +141,7 @@ TEST(TlsWrite, AnErrorIsLoggedAndClearsConnected) {
                                                "Write error [5] [" + EmptyQueueText() + "].\n")));
 }
 
-TEST(TlsWrite, AnErrorAfterTheFirstPieceGivesMinusOneToo) {
+TEST(TlsWrite, AnErrorAfterTheFirstPieceReturnsMinusOneToo) {
   const std::string bytes = Pattern(40000);
   TlsPair tls({DiscardUntilEnd()}, -1, true);
   Faults faults;
@@ -154,7 +154,7 @@ TEST(TlsGonePeer, AWriteFails) {
   TlsScriptedPeer peer({{Handshake(), CloseWithoutNotice()}});
   const ChildResult child = RunInChild([&] {
     DefaultSigpipe();
-    TlsSocket socket(kLoopback, peer.Port(), 5, true);
+    ExposedTlsSocket socket(kLoopback, peer.Port(), 5, true);
     EXPECT_EQ(socket.Connect(), 0);
     EXPECT_EQ(ReadSome(socket, 1).result, 0);  // the peer has closed now
     int result = 5;
@@ -179,7 +179,7 @@ TEST(TlsGonePeer, ADisconnectReturns) {
   TlsScriptedPeer peer({{Handshake(), DiscardUntilEnd()}});
   const ChildResult child = RunInChild([&] {
     DefaultSigpipe();
-    TlsSocket socket(kLoopback, peer.Port(), 5, true);
+    ExposedTlsSocket socket(kLoopback, peer.Port(), 5, true);
     EXPECT_EQ(socket.Connect(), 0);
     shutdown(socket.m_sockFd, SHUT_RDWR);  // the close notice meets a broken pipe
     socket.Disconnect();
@@ -193,7 +193,7 @@ TEST(TlsGonePeer, AHandshakeFails) {
   ScriptedPeer peer({{ExpectEof()}});
   const ChildResult child = RunInChild([&] {
     DefaultSigpipe();
-    TlsSocket socket(kLoopback, peer.Port(), 5, true);
+    ExposedTlsSocket socket(kLoopback, peer.Port(), 5, true);
     Faults faults;
     faults.Before(Call::kSslConnect, [&](int) { shutdown(socket.m_sockFd, SHUT_RDWR); });
     EXPECT_EQ(socket.Connect(), -1);
@@ -207,7 +207,7 @@ TEST(TlsGonePeer, AReadFailsOrEnds) {
   TlsScriptedPeer peer({{Handshake(), DiscardUntilEnd()}});
   const ChildResult child = RunInChild([&] {
     DefaultSigpipe();
-    TlsSocket socket(kLoopback, peer.Port(), 5, false);
+    ExposedTlsSocket socket(kLoopback, peer.Port(), 5, false);
     EXPECT_EQ(socket.Connect(), 0);
     shutdown(socket.m_sockFd, SHUT_RDWR);
     EXPECT_LE(ReadSome(socket, 10).result, 0);

@@ -38,7 +38,7 @@ struct TlsPair {
   }
 
   TlsScriptedPeer peer;
-  TlsSocket socket;
+  ExposedTlsSocket socket;
 };
 
 inline std::string EmptyQueueText() {

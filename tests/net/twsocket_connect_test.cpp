@@ -25,13 +25,13 @@ class BothWays : public ::testing::TestWithParam<int> {};
 class HostsFile {
  public:
   explicit HostsFile(const std::string& content) {
-    WriteFile(folder_.File("hosts"), content);
-    EXPECT_EQ(mount(folder_.File("hosts").c_str(), "/etc/hosts", nullptr, MS_BIND, nullptr), 0);
+    WriteFile(directory_.File("hosts"), content);
+    EXPECT_EQ(mount(directory_.File("hosts").c_str(), "/etc/hosts", nullptr, MS_BIND, nullptr), 0);
   }
   ~HostsFile() { umount("/etc/hosts"); }
 
  private:
-  TempDir folder_;
+  TempDir directory_;
 };
 
 size_t CountAddresses(const char* name) {
@@ -47,16 +47,16 @@ size_t CountAddresses(const char* name) {
 }
 
 // The steps that a derived socket sees.
-class WatchedSocket : public PlainSocket {
+class WatchedSocket : public ExposedSocket {
  public:
-  using PlainSocket::PlainSocket;
+  using ExposedSocket::ExposedSocket;
   int PostConnect() override {
     steps.emplace_back("PostConnect");
     return -5;
   }
   void Disconnect() override {
     steps.emplace_back("Disconnect");
-    PlainSocket::Disconnect();
+    ExposedSocket::Disconnect();
   }
   std::vector<std::string> steps;
 };
@@ -66,7 +66,7 @@ INSTANTIATE_TEST_SUITE_P(Connect, BothWays, ::testing::Values(5, -1));
 TEST_P(BothWays, ReachesTheHostAndThePort) {
   LogCapture log;
   ScriptedPeer peer({{ExpectExactly("hello"), ExpectEof()}});
-  PlainSocket socket(kLoopback, peer.Port(), GetParam(), true);
+  ExposedSocket socket(kLoopback, peer.Port(), GetParam(), true);
   EXPECT_EQ(socket.Connect(), 0);
   EXPECT_TRUE(socket.IsConnected());
   EXPECT_EQ(socket.WriteData("hello", 5), 5);
@@ -77,14 +77,14 @@ TEST_P(BothWays, ReachesTheHostAndThePort) {
 
 TEST_P(BothWays, ResolvesAName) {
   ScriptedPeer peer({{ExpectEof()}});
-  PlainSocket socket("localhost", peer.Port(), GetParam(), true);
+  ExposedSocket socket("localhost", peer.Port(), GetParam(), true);
   EXPECT_EQ(socket.Connect(), 0);
   socket.Disconnect();
 }
 
 TEST_P(BothWays, SetsTheModeOfTheTimeOut) {
   ScriptedPeer peer({{ExpectEof()}});
-  PlainSocket socket(kLoopback, peer.Port(), GetParam(), true);
+  ExposedSocket socket(kLoopback, peer.Port(), GetParam(), true);
   ASSERT_EQ(socket.Connect(), 0);
   EXPECT_EQ(IsNonBlocking(socket.m_sockFd), GetParam() >= 0);
   socket.Disconnect();
@@ -92,7 +92,7 @@ TEST_P(BothWays, SetsTheModeOfTheTimeOut) {
 
 TEST_P(BothWays, ConnectSocketAloneLeavesTheDescriptorBlocking) {
   ScriptedPeer peer({{ExpectEof()}});
-  PlainSocket socket(kLoopback, peer.Port(), GetParam(), true);
+  ExposedSocket socket(kLoopback, peer.Port(), GetParam(), true);
   Faults faults;
   ASSERT_EQ(socket.ConnectSocket(), 0);
   EXPECT_EQ(faults.Count(Call::kIoctl), 0);
@@ -103,7 +103,7 @@ TEST_P(BothWays, ConnectSocketAloneLeavesTheDescriptorBlocking) {
 
 TEST_P(BothWays, OpensADescriptorThatExecCloses) {
   ScriptedPeer peer({{ExpectEof()}});
-  PlainSocket socket(kLoopback, peer.Port(), GetParam(), true);
+  ExposedSocket socket(kLoopback, peer.Port(), GetParam(), true);
   ASSERT_EQ(socket.Connect(), 0);
   EXPECT_NE(fcntl(socket.m_sockFd, F_GETFD) & FD_CLOEXEC, 0);
   socket.Disconnect();
@@ -111,7 +111,7 @@ TEST_P(BothWays, OpensADescriptorThatExecCloses) {
 
 TEST_P(BothWays, FailsWithoutASocket) {
   LogCapture log;
-  PlainSocket socket(kLoopback, 80, GetParam(), true);
+  ExposedSocket socket(kLoopback, 80, GetParam(), true);
   Faults faults;
   faults.FailNth(Call::kSocket, 1, EMFILE);
   EXPECT_EQ(socket.Connect(), -1);
@@ -124,7 +124,7 @@ TEST_P(BothWays, FailsWithoutASocket) {
 
 TEST_P(BothWays, ANameThatIsNotResolvedLeavesTheDescriptorOpenUntilDisconnect) {
   LogCapture log;
-  PlainSocket socket(kLoopback, 80, GetParam(), true);
+  ExposedSocket socket(kLoopback, 80, GetParam(), true);
   {
     Faults faults;
     faults.FailNth(Call::kGetaddrinfo, 1, Faults::kUsual, EAI_AGAIN);
@@ -142,14 +142,14 @@ TEST_P(BothWays, ANameThatIsNotResolvedLeavesTheDescriptorOpenUntilDisconnect) {
 
 TEST_P(BothWays, KnowsIpv4Only) {
   LogCapture log;
-  PlainSocket socket("::1", 80, GetParam(), true);
+  ExposedSocket socket("::1", 80, GetParam(), true);
   EXPECT_EQ(socket.Connect(), -1);
   EXPECT_THAT(log.Messages(), ElementsAre("Scoket getaddrinfo incomplete.\n"));
 }
 
 TEST_P(BothWays, ARefusalLeavesTheDescriptorOpenAndUnconnected) {
   const ClosedPort port;
-  PlainSocket socket(kLoopback, port.Port(), GetParam(), true);
+  ExposedSocket socket(kLoopback, port.Port(), GetParam(), true);
   EXPECT_EQ(socket.Connect(), -1);
   EXPECT_FALSE(socket.IsConnected());
   EXPECT_TRUE(IsOpenFd(socket.m_sockFd));
@@ -159,7 +159,7 @@ TEST_P(BothWays, ARefusalLeavesTheDescriptorOpenAndUnconnected) {
 TEST_P(BothWays, TheDescriptorOfARefusalIsClosedByTheNextConnect) {
   const ClosedPort port;
   const DescriptorGuard guard;
-  PlainSocket socket(kLoopback, port.Port(), GetParam(), true);
+  ExposedSocket socket(kLoopback, port.Port(), GetParam(), true);
   for (int i = 0; i < 5; ++i) EXPECT_EQ(socket.Connect(), -1);
   const size_t open = OpenDescriptors().size();
   EXPECT_EQ(socket.Connect(), -1);
@@ -171,14 +171,14 @@ TEST_P(BothWays, TheDescriptorOfARefusalIsClosedByTheNextConnect) {
 TEST_P(BothWays, TheDescriptorOfARefusalIsClosedByTheDestructor) {
   const ClosedPort port;
   const DescriptorGuard guard;
-  PlainSocket socket(kLoopback, port.Port(), GetParam(), true);
+  ExposedSocket socket(kLoopback, port.Port(), GetParam(), true);
   EXPECT_EQ(socket.Connect(), -1);
 }
 
 TEST_P(BothWays, ConnectsAgainAfterARefusal) {
   const ClosedPort port;
   ScriptedPeer peer({{ExpectEof()}});
-  PlainSocket socket(kLoopback, port.Port(), GetParam(), true);
+  ExposedSocket socket(kLoopback, port.Port(), GetParam(), true);
   EXPECT_EQ(socket.Connect(), -1);
   socket.SetSocketInfo(kLoopback, peer.Port(), GetParam(), true);
   EXPECT_EQ(socket.Connect(), 0);
@@ -190,7 +190,7 @@ TEST_P(BothWays, TriesTheFirstAddressAlone) {
   const ClosedPort port;
   const HostsFile hosts("127.0.0.1 twin.test\n127.0.0.2 twin.test\n");
   ASSERT_EQ(CountAddresses("twin.test"), 2u);
-  PlainSocket socket("twin.test", port.Port(), GetParam(), true);
+  ExposedSocket socket("twin.test", port.Port(), GetParam(), true);
   Faults faults;
   EXPECT_EQ(socket.Connect(), -1);
   EXPECT_EQ(faults.Count(Call::kConnect), 1);
@@ -199,7 +199,7 @@ TEST_P(BothWays, TriesTheFirstAddressAlone) {
 TEST_P(BothWays, BindsTheSourceAddress) {
   LogCapture log;
   ScriptedPeer peer({{ExpectEof()}});
-  PlainSocket socket(kLoopback, peer.Port(), GetParam(), true);
+  ExposedSocket socket(kLoopback, peer.Port(), GetParam(), true);
   socket.SetRemoteAddr(inet_addr("127.0.0.9"));
   ASSERT_EQ(socket.Connect(), 0);
   sockaddr_in local = {};
@@ -213,7 +213,7 @@ TEST_P(BothWays, BindsTheSourceAddress) {
 
 TEST_P(BothWays, BindsNothingForASourceAddressOfZero) {
   ScriptedPeer peer({{ExpectEof()}});
-  PlainSocket socket(kLoopback, peer.Port(), GetParam(), true);
+  ExposedSocket socket(kLoopback, peer.Port(), GetParam(), true);
   socket.SetRemoteAddr(inet_addr("127.0.0.9"));
   socket.SetRemoteAddr(0);
   Faults faults;
@@ -223,7 +223,7 @@ TEST_P(BothWays, BindsNothingForASourceAddressOfZero) {
 }
 
 TEST_P(BothWays, AnEmptyAddressListIsAFailure) {
-  PlainSocket socket(kLoopback, 80, GetParam(), true);
+  ExposedSocket socket(kLoopback, 80, GetParam(), true);
   Faults faults;
   faults.Return(Call::kGetaddrinfo, 1, 1, 0);
   EXPECT_EQ(socket.Connect(), -1);
@@ -248,7 +248,7 @@ TEST_P(BothWays, DoesNotCallPostConnectAfterAFailure) {
 
 TEST_P(BothWays, KeepsEndOfFileOfTheConnectionBefore) {
   ScriptedPeer peer({{ExpectEof()}});
-  PlainSocket socket(kLoopback, peer.Port(), GetParam(), true);
+  ExposedSocket socket(kLoopback, peer.Port(), GetParam(), true);
   socket.m_bEOF = true;
   EXPECT_EQ(socket.Connect(), 0);
   EXPECT_TRUE(socket.IsEOF());
@@ -257,7 +257,7 @@ TEST_P(BothWays, KeepsEndOfFileOfTheConnectionBefore) {
 
 TEST(Connect, ASocketWithoutAHostIsNotResolved) {
   LogCapture log;
-  PlainSocket socket;
+  ExposedSocket socket;
   EXPECT_EQ(socket.Connect(), -1);
   EXPECT_THAT(log.Messages(), ElementsAre("Scoket getaddrinfo incomplete.\n"));
 }

@@ -15,7 +15,7 @@ using ::testing::IsEmpty;
 
 constexpr char kLoopback[] = "127.0.0.1";
 
-// The failures of the way with a time-out: the step's own line, and the summary behind it.
+// The failures of the way with a time-out: the step's own line, and the summary after it.
 auto StepAndSummary(const char* level, const std::string& message, int timeout) {
   return ElementsAre(SocketLine(level, "ConnectWithTimeout", message),
                      SocketLine("info", "ConnectSocket",
@@ -24,7 +24,7 @@ auto StepAndSummary(const char* level, const std::string& message, int timeout) 
 
 TEST(ConnectBlocking, WaitsInConnectAndNotInSelect) {
   ScriptedPeer peer({{ExpectEof()}});
-  PlainSocket socket(kLoopback, peer.Port(), -1, true);
+  ExposedSocket socket(kLoopback, peer.Port(), -1, true);
   Faults faults;
   EXPECT_EQ(socket.Connect(), 0);
   EXPECT_EQ(faults.Count(Call::kSelect), 0);
@@ -35,7 +35,7 @@ TEST(ConnectBlocking, WaitsInConnectAndNotInSelect) {
 TEST(ConnectBlocking, LogsOneLineForARefusal) {
   LogCapture log;
   const ClosedPort port;
-  PlainSocket socket(kLoopback, port.Port(), -1, true);
+  ExposedSocket socket(kLoopback, port.Port(), -1, true);
   EXPECT_EQ(socket.Connect(), -1);
   EXPECT_EQ(errno, ECONNREFUSED);
   EXPECT_THAT(log.Lines(),
@@ -45,7 +45,7 @@ TEST(ConnectBlocking, LogsOneLineForARefusal) {
 TEST(ConnectWithTimeout, GivesUpAfterTheTimeOut) {
   LogCapture log;
   const BlackHolePort hole;
-  PlainSocket socket(kLoopback, hole.Port(), 1, true);
+  ExposedSocket socket(kLoopback, hole.Port(), 1, true);
   const Stopwatch watch;
   EXPECT_EQ(socket.Connect(), -1);
   EXPECT_EQ(errno, ETIMEDOUT);
@@ -61,7 +61,7 @@ TEST(ConnectWithTimeout, SignalsNeitherEndNorProlongTheWait) {
   if (IsEmulated()) GTEST_SKIP() << kNoCountdown;
   LogCapture log;
   const BlackHolePort hole;
-  PlainSocket socket(kLoopback, hole.Port(), 1, true);
+  ExposedSocket socket(kLoopback, hole.Port(), 1, true);
   Faults faults;
   const SignalStorm storm;
   const Stopwatch watch;
@@ -76,7 +76,7 @@ TEST(ConnectWithTimeout, SignalsNeitherEndNorProlongTheWait) {
 TEST(ConnectWithTimeout, AnInterruptedWaitIsRepeatedSilently) {
   LogCapture log;
   ScriptedPeer peer({{ExpectEof()}});
-  PlainSocket socket(kLoopback, peer.Port(), 5, true);
+  ExposedSocket socket(kLoopback, peer.Port(), 5, true);
   Faults faults;
   faults.FailRange(Call::kSelect, 1, 3, EINTR);
   EXPECT_EQ(socket.Connect(), 0);
@@ -87,7 +87,7 @@ TEST(ConnectWithTimeout, AnInterruptedWaitIsRepeatedSilently) {
 
 TEST(ConnectWithTimeout, AConnectionThatSucceedsAtOnceNeedsNoWait) {
   LogCapture log;
-  PlainSocket socket(kLoopback, 80, 5, true);
+  ExposedSocket socket(kLoopback, 80, 5, true);
   Faults faults;
   faults.Return(Call::kConnect, 1, 1, 0);
   EXPECT_EQ(socket.Connect(), 0);
@@ -99,7 +99,7 @@ TEST(ConnectWithTimeout, AConnectionThatSucceedsAtOnceNeedsNoWait) {
 
 TEST(ConnectWithTimeout, AnUnreachableNetworkIsLoggedAsConnected) {
   LogCapture log;
-  PlainSocket socket("192.0.2.1", 80, 3, true);
+  ExposedSocket socket("192.0.2.1", 80, 3, true);
   EXPECT_EQ(socket.Connect(), -1);
   EXPECT_FALSE(IsNonBlocking(socket.m_sockFd));
   EXPECT_THAT(log.Lines(), StepAndSummary("info", "Socket connected.\n", 3));
@@ -108,7 +108,7 @@ TEST(ConnectWithTimeout, AnUnreachableNetworkIsLoggedAsConnected) {
 TEST(ConnectWithTimeout, AFailedSelectIsAFailure) {
   LogCapture log;
   ScriptedPeer peer({{ExpectEof()}});
-  PlainSocket socket(kLoopback, peer.Port(), 5, true);
+  ExposedSocket socket(kLoopback, peer.Port(), 5, true);
   {
     Faults faults;
     faults.FailNth(Call::kSelect, 1, ENOMEM);
@@ -120,10 +120,10 @@ TEST(ConnectWithTimeout, AFailedSelectIsAFailure) {
   socket.Disconnect();
 }
 
-TEST(ConnectWithTimeout, ASelectThatFindsNothingIsAFailure) {
+TEST(ConnectWithTimeout, ASelectWithoutAReadyDescriptorIsAFailure) {
   LogCapture log;
   ScriptedPeer peer({{ExpectEof()}});
-  PlainSocket socket(kLoopback, peer.Port(), 5, true);
+  ExposedSocket socket(kLoopback, peer.Port(), 5, true);
   {
     Faults faults;
     faults.Return(Call::kSelect, 1, 1, 1);
@@ -137,7 +137,7 @@ TEST(ConnectWithTimeout, ASelectThatFindsNothingIsAFailure) {
 TEST(ConnectWithTimeout, AnErrorThatCannotBeAskedForIsAFailure) {
   LogCapture log;
   ScriptedPeer peer({{ExpectEof()}});
-  PlainSocket socket(kLoopback, peer.Port(), 5, true);
+  ExposedSocket socket(kLoopback, peer.Port(), 5, true);
   {
     Faults faults;
     faults.FailNth(Call::kGetsockopt, 1);
@@ -151,7 +151,7 @@ TEST(ConnectWithTimeout, AnErrorThatCannotBeAskedForIsAFailure) {
 TEST(ConnectWithTimeout, APendingErrorIsAFailure) {
   LogCapture log;
   ScriptedPeer peer({{ExpectEof()}});
-  PlainSocket socket(kLoopback, peer.Port(), 5, true);
+  ExposedSocket socket(kLoopback, peer.Port(), 5, true);
   {
     Faults faults;
     faults.SocketError(EHOSTUNREACH);
@@ -165,7 +165,7 @@ TEST(ConnectWithTimeout, APendingErrorIsAFailure) {
 
 TEST(ConnectWithTimeout, AnEmptyAddressListIsAnInvalidParameter) {
   LogCapture log;
-  PlainSocket socket(kLoopback, 80, 5, true);
+  ExposedSocket socket(kLoopback, 80, 5, true);
   Faults faults;
   faults.Return(Call::kGetaddrinfo, 1, 1, 0);
   EXPECT_EQ(socket.Connect(), -1);
@@ -176,7 +176,7 @@ TEST(ConnectWithTimeout, AnEmptyAddressListIsAnInvalidParameter) {
 TEST(ConnectWithTimeout, CarriesOnWhenNonBlockingModeCannotBeSet) {
   LogCapture log;
   ScriptedPeer peer({{ExpectEof()}});
-  PlainSocket socket(kLoopback, peer.Port(), 5, true);
+  ExposedSocket socket(kLoopback, peer.Port(), 5, true);
   Faults faults;
   faults.FailNth(Call::kFcntl, 2);
   EXPECT_EQ(socket.Connect(), 0);
@@ -189,7 +189,7 @@ TEST(ConnectWithTimeout, CarriesOnWhenNonBlockingModeCannotBeSet) {
 TEST(ConnectWithTimeout, CarriesOnWhenBlockingModeCannotBeSetBack) {
   LogCapture log;
   ScriptedPeer peer({{ExpectEof()}});
-  PlainSocket socket(kLoopback, peer.Port(), 5, true);
+  ExposedSocket socket(kLoopback, peer.Port(), 5, true);
   Faults faults;
   faults.FailNth(Call::kFcntl, 3);
   EXPECT_EQ(socket.Connect(), 0);
@@ -202,7 +202,7 @@ TEST(ConnectWithTimeout, CarriesOnWhenBlockingModeCannotBeSetBack) {
 TEST(ConnectWithTimeout, TimesOutWithTheErrnoOfATimeOutWhenBlockingModeCannotBeSetBack) {
   LogCapture log;
   const BlackHolePort hole;
-  PlainSocket socket(kLoopback, hole.Port(), 0, true);
+  ExposedSocket socket(kLoopback, hole.Port(), 0, true);
   Faults faults;
   faults.FailNth(Call::kFcntl, 3);
   EXPECT_EQ(socket.Connect(), -1);
@@ -212,9 +212,9 @@ TEST(ConnectWithTimeout, TimesOutWithTheErrnoOfATimeOutWhenBlockingModeCannotBeS
                           "Socket connect timeout (0)\n"));
 }
 
-TEST(ConnectWithTimeout, LogsItsErrorsAtTheDefaultLevelAndItsInformationNot) {
+TEST(ConnectWithTimeout, LogsErrorsButNoInformationAtTheDefaultLevel) {
   LogCapture log(LOG_LEVEL_NOTICE);
-  PlainSocket socket(kLoopback, 80, 5, true);
+  ExposedSocket socket(kLoopback, 80, 5, true);
   Faults faults;
   faults.Return(Call::kGetaddrinfo, 1, 1, 0);
   EXPECT_EQ(socket.Connect(), -1);

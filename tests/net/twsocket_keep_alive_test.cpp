@@ -11,7 +11,7 @@ using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 
 // A TCP socket that is not connected: options can be set on it as well.
-class TcpSocket : public PlainSocket {
+class TcpSocket : public ExposedSocket {
  public:
   TcpSocket() { m_sockFd = socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0); }
 };
@@ -58,7 +58,7 @@ TEST(SetKeepAliveOpt, ValuesThatTheSystemRefusesEndTheCall) {
 
 TEST(SetKeepAliveOpt, WithoutASocketIsRefused) {
   LogCapture log;
-  PlainSocket socket;
+  ExposedSocket socket;
   EXPECT_EQ(socket.SetKeepAliveOpt(1, 31, 32, 33), -1);
   EXPECT_EQ(socket.SetKeepAliveOpt(0, 0, 0, 0), -1);
   EXPECT_THAT(log.Messages(), ElementsAre("Failed to set keepalive option.\n",

@@ -54,7 +54,7 @@ TEST(ReadBuffered, IsServedFromTheBufferWhenItHoldsEnough) {
 
 TEST(ReadBuffered, ASmallReadFillsTheBuffer) {
   LogCapture log;
-  ScriptedSocket socket(true, {Gives(Pattern(100))});
+  ScriptedSocket socket(true, {Returns(Pattern(100))});
   EXPECT_EQ(ReadSome(socket, 30), (Delivered{30, Pattern(30)}));
   EXPECT_THAT(socket.calls, ElementsAre("wait to read", "read 64512"));
   EXPECT_EQ(socket.m_readPos, 30);
@@ -63,21 +63,21 @@ TEST(ReadBuffered, ASmallReadFillsTheBuffer) {
 }
 
 TEST(ReadBuffered, AFullFillIsKeptWhole) {
-  ScriptedSocket socket(true, {Gives(Pattern(64512))});
+  ScriptedSocket socket(true, {Returns(Pattern(64512))});
   EXPECT_EQ(ReadSome(socket, 1), (Delivered{1, Pattern(1)}));
   EXPECT_EQ(ReadSome(socket, 64511), (Delivered{64511, Pattern(64511, 1)}));
   EXPECT_TRUE(socket.ScriptEnded());
 }
 
 TEST(ReadBuffered, AReadOf1023BytesGoesThroughTheBuffer) {
-  ScriptedSocket socket(true, {Gives(Pattern(1023))});
+  ScriptedSocket socket(true, {Returns(Pattern(1023))});
   EXPECT_EQ(ReadSome(socket, 1023), (Delivered{1023, Pattern(1023)}));
   EXPECT_THAT(socket.calls, ElementsAre("wait to read", "read 64512"));
 }
 
 TEST(ReadBuffered, AReadOf1024BytesGoesStraightToTheCaller) {
   LogCapture log;
-  ScriptedSocket socket(true, {Gives(Pattern(1024))});
+  ScriptedSocket socket(true, {Returns(Pattern(1024))});
   EXPECT_EQ(ReadSome(socket, 1024), (Delivered{1024, Pattern(1024)}));
   EXPECT_THAT(socket.calls, ElementsAre("wait to read", "read 1024"));
   EXPECT_THAT(log.Lines(),
@@ -85,11 +85,11 @@ TEST(ReadBuffered, AReadOf1024BytesGoesStraightToTheCaller) {
 }
 
 TEST(ReadBuffered, WhatIsBufferedComesFirstAndDecidesAboutTheWay) {
-  ScriptedSocket small(true, {Gives(Pattern(1023, 1))});
+  ScriptedSocket small(true, {Returns(Pattern(1023, 1))});
   small.Buffer(Pattern(1), 9);
   EXPECT_EQ(ReadSome(small, 1024), (Delivered{1024, Pattern(1024)}));
   EXPECT_THAT(small.calls, ElementsAre("wait to read", "read 64512"));
-  ScriptedSocket large(true, {Gives(Pattern(1024, 1))});
+  ScriptedSocket large(true, {Returns(Pattern(1024, 1))});
   large.Buffer(Pattern(1), 9);
   EXPECT_EQ(ReadSome(large, 1025), (Delivered{1025, Pattern(1025)}));
   EXPECT_THAT(large.calls, ElementsAre("wait to read", "read 1024"));
@@ -99,8 +99,8 @@ TEST(ReadBuffered, WhatIsBufferedComesFirstAndDecidesAboutTheWay) {
 
 TEST(ReadBuffered, ALargeReadGoesOnUntilFewerThan1024BytesAreMissing) {
   LogCapture log;
-  ScriptedSocket socket(true,
-                        {Gives(Pattern(500)), Gives(Pattern(477, 500)), Gives(Pattern(1500, 977))});
+  ScriptedSocket socket(
+      true, {Returns(Pattern(500)), Returns(Pattern(477, 500)), Returns(Pattern(1500, 977))});
   EXPECT_EQ(ReadSome(socket, 2000), (Delivered{2000, Pattern(2000)}));
   EXPECT_THAT(socket.calls, ElementsAre("wait to read", "read 2000", "wait to read", "read 1500",
                                         "wait to read", "read 64512"));
@@ -109,7 +109,7 @@ TEST(ReadBuffered, ALargeReadGoesOnUntilFewerThan1024BytesAreMissing) {
 }
 
 TEST(ReadBuffered, SmallPiecesAreCollected) {
-  ScriptedSocket socket(true, {Gives("ab"), Gives("c"), Gives("defgh")});
+  ScriptedSocket socket(true, {Returns("ab"), Returns("c"), Returns("defgh")});
   EXPECT_EQ(ReadSome(socket, 5), (Delivered{5, "abcde"}));
   EXPECT_EQ(socket.Unread(), "fgh");
   EXPECT_THAT(socket.calls, ElementsAre("wait to read", "read 64512", "wait to read", "read 64512",
@@ -117,7 +117,7 @@ TEST(ReadBuffered, SmallPiecesAreCollected) {
 }
 
 TEST(ReadBuffered, AVeryLargeReadIsNotCutToTheBuffer) {
-  ScriptedSocket socket(true, {Gives(Pattern(200000))});
+  ScriptedSocket socket(true, {Returns(Pattern(200000))});
   EXPECT_EQ(ReadSome(socket, 200000), (Delivered{200000, Pattern(200000)}));
   EXPECT_THAT(socket.calls, ElementsAre("wait to read", "read 200000"));
 }
@@ -127,7 +127,7 @@ TEST(ReadBuffered, AVeryLargeReadIsNotCutToTheBuffer) {
 TEST(ReadBuffered, TriesASmallReadAgainAfterEagainAndEintr) {
   LogCapture log;
   ScriptedSocket socket(true, {Fails(EAGAIN), Fails(EINTR), Fails(EAGAIN), Fails(EINTR),
-                               Fails(EAGAIN), Fails(EAGAIN), Gives("abc")});
+                               Fails(EAGAIN), Fails(EAGAIN), Returns("abc")});
   EXPECT_EQ(ReadSome(socket, 3), (Delivered{3, "abc"}));
   EXPECT_EQ(socket.calls.size(), 14u);  // a wait before each of the seven reads
   EXPECT_TRUE(socket.IsConnected());
@@ -158,18 +158,18 @@ TEST(ReadBuffered, AnyOtherErrorOfASmallReadFailsAtOnce) {
 }
 
 TEST(ReadBuffered, TheAttemptsOfTheNextReadAreCountedAnew) {
-  std::vector<IoAnswer> reads = Times(6, Fails(EAGAIN));
-  reads.push_back(Gives("a"));
-  for (const IoAnswer& again : Times(6, Fails(EAGAIN))) reads.push_back(again);
-  reads.push_back(Gives("b"));
+  std::vector<IoResult> reads = Times(6, Fails(EAGAIN));
+  reads.push_back(Returns("a"));
+  for (const IoResult& again : Times(6, Fails(EAGAIN))) reads.push_back(again);
+  reads.push_back(Returns("b"));
   ScriptedSocket socket(true, reads);
   EXPECT_EQ(ReadSome(socket, 1), (Delivered{1, "a"}));
   EXPECT_EQ(ReadSome(socket, 1), (Delivered{1, "b"}));
 }
 
-TEST(ReadBuffered, AnErrorAfterSomeBytesGivesTheShortCountAndStaysConnected) {
+TEST(ReadBuffered, AnErrorAfterSomeBytesReturnsTheShortCountAndStaysConnected) {
   LogCapture log;
-  ScriptedSocket socket(true, {Gives("ab"), Fails(ECONNRESET)});
+  ScriptedSocket socket(true, {Returns("ab"), Fails(ECONNRESET)});
   EXPECT_EQ(ReadSome(socket, 5), (Delivered{2, "ab"}));
   EXPECT_TRUE(socket.IsConnected());
   EXPECT_FALSE(socket.IsEOF());
@@ -185,16 +185,16 @@ TEST(ReadBuffered, EagainAfterSomeBytesIsNotTriedAgain) {
   EXPECT_TRUE(socket.ScriptEnded());
 }
 
-TEST(ReadBuffered, TheEndOfTheStreamAfterSomeBytesGivesTheShortCount) {
+TEST(ReadBuffered, TheEndOfTheStreamAfterSomeBytesReturnsTheShortCount) {
   LogCapture log;
-  ScriptedSocket socket(true, {Gives("ab"), Ends()});
+  ScriptedSocket socket(true, {Returns("ab"), Ends()});
   EXPECT_EQ(ReadSome(socket, 5), (Delivered{2, "ab"}));
   EXPECT_TRUE(socket.IsEOF());
   EXPECT_TRUE(socket.IsConnected());
   EXPECT_THAT(log.Lines(), ElementsAre(SocketLine("info", "ReadData", kEof)));
 }
 
-TEST(ReadBuffered, TheEndOfTheStreamBeforeAnyByteGivesZero) {
+TEST(ReadBuffered, TheEndOfTheStreamBeforeAnyByteReturnsZero) {
   ScriptedSocket socket(true, {Ends(), Ends()});
   EXPECT_EQ(ReadSome(socket, 5), (Delivered{0, ""}));
   EXPECT_TRUE(socket.IsEOF());
@@ -205,7 +205,7 @@ TEST(ReadBuffered, TheEndOfTheStreamBeforeAnyByteGivesZero) {
 
 TEST(ReadBuffered, ALargeReadThatMeetsTheEndLooksOnceMore) {
   LogCapture log;
-  ScriptedSocket socket(true, {Gives(Pattern(300)), Ends(), Ends()});
+  ScriptedSocket socket(true, {Returns(Pattern(300)), Ends(), Ends()});
   EXPECT_EQ(ReadSome(socket, 2000), (Delivered{300, Pattern(300)}));
   EXPECT_TRUE(socket.IsEOF());
   EXPECT_THAT(socket.calls, ElementsAre("wait to read", "read 2000", "wait to read", "read 1700",
@@ -213,7 +213,7 @@ TEST(ReadBuffered, ALargeReadThatMeetsTheEndLooksOnceMore) {
   EXPECT_THAT(log.Messages(), ElementsAre("Have read 300 bytes.\n", kEof, kEof));
 }
 
-TEST(ReadBuffered, ALargeReadThatMeetsTheEndAtOnceGivesZero) {
+TEST(ReadBuffered, ALargeReadThatMeetsTheEndAtOnceReturnsZero) {
   ScriptedSocket socket(true, {Ends(), Ends()});
   EXPECT_EQ(ReadSome(socket, 2000), (Delivered{0, ""}));
   EXPECT_TRUE(socket.IsEOF());
@@ -222,7 +222,7 @@ TEST(ReadBuffered, ALargeReadThatMeetsTheEndAtOnceGivesZero) {
 
 TEST(ReadBuffered, ALargeReadThatFailsAfterSomeBytesLooksOnceMoreThroughTheBuffer) {
   LogCapture log;
-  ScriptedSocket socket(true, {Gives(Pattern(300)), Fails(EAGAIN), Fails(ECONNRESET)});
+  ScriptedSocket socket(true, {Returns(Pattern(300)), Fails(EAGAIN), Fails(ECONNRESET)});
   EXPECT_EQ(ReadSome(socket, 2000), (Delivered{300, Pattern(300)}));
   EXPECT_TRUE(socket.IsConnected());
   EXPECT_THAT(socket.calls, ElementsAre("wait to read", "read 2000", "wait to read", "read 1700",
@@ -233,8 +233,8 @@ TEST(ReadBuffered, ALargeReadThatFailsAfterSomeBytesLooksOnceMoreThroughTheBuffe
 }
 
 TEST(ReadBuffered, ALargeReadGoesOnWhenTheLookThroughTheBufferFindsBytes) {
-  ScriptedSocket socket(true, {Gives(Pattern(300)), Fails(EAGAIN), Gives(Pattern(400, 300)),
-                               Gives(Pattern(1300, 700))});
+  ScriptedSocket socket(true, {Returns(Pattern(300)), Fails(EAGAIN), Returns(Pattern(400, 300)),
+                               Returns(Pattern(1300, 700))});
   EXPECT_EQ(ReadSome(socket, 2000), (Delivered{2000, Pattern(2000)}));
   EXPECT_THAT(socket.calls, ElementsAre("wait to read", "read 2000", "wait to read", "read 1700",
                                         "wait to read", "read 64512", "wait to read", "read 1300"));
@@ -260,7 +260,7 @@ TEST(ReadBuffered, ALargeReadThatFailsBeforeAnyByteLosesTheConnection) {
 
 TEST(ReadBuffered, AFailedWaitEndsASmallReadAndLeavesConnected) {
   LogCapture log;
-  ScriptedSocket socket(true, {Gives("ab")});
+  ScriptedSocket socket(true, {Returns("ab")});
   socket.AnswerWait(2, -1);
   EXPECT_EQ(ReadSome(socket, 5), (Delivered{-1, ""}));
   EXPECT_TRUE(socket.IsConnected());
@@ -269,7 +269,7 @@ TEST(ReadBuffered, AFailedWaitEndsASmallReadAndLeavesConnected) {
 
 TEST(ReadBuffered, AFailedWaitEndsALargeReadAndLeavesConnected) {
   LogCapture log;
-  ScriptedSocket socket(true, {Gives(Pattern(10))});
+  ScriptedSocket socket(true, {Returns(Pattern(10))});
   socket.AnswerWait(2, -1);
   EXPECT_EQ(ReadSome(socket, 5000), (Delivered{-1, ""}));
   EXPECT_TRUE(socket.IsConnected());
@@ -310,7 +310,7 @@ TEST(ReadBuffered, AllocatesNothing) {
   EXPECT_EQ(faults.Count(Call::kMalloc) + faults.Count(Call::kCalloc), 0);
 }
 
-TEST_P(RandomStream, GivesTheBytesOfTheStream) {
+TEST_P(RandomStream, ReturnsTheBytesOfTheStream) {
   for (unsigned seed = 1; seed <= 5; ++seed) {
     SCOPED_TRACE(seed);
     const std::string stream = Pattern(300000 + seed);
@@ -329,7 +329,7 @@ TEST_P(RandomStream, GivesTheBytesOfTheStream) {
   }
 }
 
-TEST(ReadBuffered, RandomPushBackGivesTheBytesOfTheStream) {
+TEST(ReadBuffered, RandomPushBackReturnsTheBytesOfTheStream) {
   for (unsigned seed = 1; seed <= 5; ++seed) {
     SCOPED_TRACE(seed);
     const std::string stream = Pattern(200000 + seed);

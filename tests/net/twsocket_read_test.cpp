@@ -42,7 +42,7 @@ TEST(RawRead, DoesNotRepeatAnInterruptedRead) {
 
 TEST(ReadDirect, WaitsAndThenReadsOnce) {
   LogCapture log;
-  ScriptedSocket socket(false, {Gives("abc")});
+  ScriptedSocket socket(false, {Returns("abc")});
   EXPECT_EQ(ReadSome(socket, 4096), (Delivered{3, "abc"}));
   EXPECT_THAT(socket.calls, ElementsAre("wait to read", "read 4096"));
   EXPECT_THAT(log.Lines(), IsEmpty());
@@ -87,21 +87,21 @@ TEST(ReadDirect, AFailedWaitEndsTheRead) {
 
 TEST(ReadDirect, WithoutASocketFails) {
   LogCapture log;
-  PlainSocket socket("host", 1, 5, false);
+  ExposedSocket socket("host", 1, 5, false);
   EXPECT_EQ(ReadSome(socket, 10), (Delivered{-1, ""}));
   EXPECT_THAT(log.Lines(),
               ElementsAre(SocketLine("error", "ReadData", "Failed to select socket [-1]\n")));
 }
 
 TEST(ReadDirect, DoesNotTouchTheReadAheadBuffer) {
-  ScriptedSocket socket(false, {Gives("new")});
+  ScriptedSocket socket(false, {Returns("new")});
   socket.Buffer("old");
   EXPECT_EQ(ReadSome(socket, 3), (Delivered{3, "new"}));
   EXPECT_EQ(socket.Unread(), "old");
 }
 
 TEST_P(BothModes, ClearsEndOfFileFirst) {
-  ScriptedSocket socket(GetParam(), {Gives("abc")});
+  ScriptedSocket socket(GetParam(), {Returns("abc")});
   socket.m_bEOF = true;
   EXPECT_EQ(ReadSome(socket, 3).result, 3);
   EXPECT_FALSE(socket.IsEOF());
@@ -117,7 +117,7 @@ TEST_P(BothModes, ANullBufferOrANegativeLengthIsRefused) {
 }
 
 TEST_P(BothModes, WithoutASocketReadingAndLineReadingFail) {
-  PlainSocket socket("host", 1, GetParam() ? 5 : -1, GetParam());
+  ExposedSocket socket("host", 1, GetParam() ? 5 : -1, GetParam());
   EXPECT_EQ(ReadSome(socket, 10).result, -1);
   EXPECT_EQ(ReadSome(socket, 4096).result, -1);
   EXPECT_EQ(ReadLine(socket).result, -1);

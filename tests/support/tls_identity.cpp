@@ -87,7 +87,7 @@ int TakeHttp2(SSL*, const unsigned char** taken, unsigned char* length,
 }  // namespace
 
 TlsIdentity::TlsIdentity(const TlsOptions& options)
-    : ca_file_(folder_.File("ca.pem")),
+    : ca_file_(directory_.File("ca.pem")),
       options_(options),
       authority_(AuthorityOptions(options.authority)),
       certificate_(ServerOptions(options), options.self_signed ? nullptr : &authority_) {

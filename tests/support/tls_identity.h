@@ -77,7 +77,7 @@ class TlsIdentity {
   SSL_CTX* NewServerContext() const;
 
  private:
-  TempDir folder_;
+  TempDir directory_;
   std::string ca_file_;
   TlsOptions options_;
   Certificate authority_;
