@@ -4,7 +4,10 @@
 
 #include <cstring>
 
+#include "tarnwick/http/kept_fields.h"
 #include "tests/attack/operation_parts.h"
+
+using namespace tarnwick;
 
 namespace {
 
@@ -40,9 +43,10 @@ std::unique_ptr<TWHttpClient> NewAttackedClient(const Target& target) {
 
 void AskForHead(TWHttpClient& client, OperationOutcome* outcome) {
   outcome->response = client.CheckResponse(outcome->status);
-  for (const HTTP_MAP_KEY key : {HTTP_CONTENT_TYPE, HTTP_CONTENT_LENGTH, HTTP_CONTENT_RANGE}) {
+  for (const KeptField& field : kKeptFields) {
+    if (field.as != KeptAs::kContent) continue;
     std::string value = "untouched";
-    const int result = client.GetHttpContent(key, value);
+    const int result = client.GetHttpContent(field.key, value);
     if (result == HTTP_RET_OK) continue;
     if (result != HTTP_RET_NOT_READY && result != HTTP_RET_NO_CONTENT) {
       outcome->mistake = "GetHttpContent: " + std::to_string(result);

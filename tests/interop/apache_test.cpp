@@ -179,8 +179,8 @@ TEST_P(ApacheTest, ReadsTheEnvelopeOfAFault) {
 }
 
 TEST_P(ApacheTest, CannotReadAnEnvelopeWithoutALength) {
-  AddRow({"SendReqBySocketPost (chunked response)", kApache, "none", GetParam().tls ? "TLS" : "plain",
-          GetParam().buffered ? "buffered" : "direct",
+  AddRow({"SendReqBySocketPost (chunked response)", kApache, "none",
+          GetParam().tls ? "TLS" : "plain", GetParam().buffered ? "buffered" : "direct",
           "not possible: the response must announce its Content-Length"});
   auto client = Client("cgi/stream.cgi");
   std::string response = "old";
