@@ -22,7 +22,7 @@ inline constexpr char kSoapBody[] = "<q/>";
 enum class Scheme { kNone, kBasic, kDigest };
 
 // What the client has to understand of a challenge.
-struct Credentials {
+struct Challenge {
   Scheme scheme = Scheme::kNone;
   std::string realm = {};
   std::string nonce = {};
@@ -34,7 +34,7 @@ struct Credentials {
 struct ChallengeCase {
   std::string name;
   std::string lines;                     // the header lines of the 401
-  Credentials credentials;               // of the request that follows; kNone: none follows
+  Challenge challenge;                   // as the client must take it; kNone: no request follows
   int response = HTTP_RET_UNAUTHORIZED;  // what CheckResponse returns when none follows
   std::string cookie = {};               // that the request that follows carries
   std::string user = "user";
@@ -56,24 +56,24 @@ inline std::string Ha2(const std::string& method, const std::string& qop) {
 
 inline std::string ResponseOf(const ChallengeCase& test, const std::string& method,
                               const std::string& cnonce) {
-  const Credentials& credentials = test.credentials;
-  const bool counted = credentials.qop == "auth" || credentials.qop == "auth-int";
-  return Md5(Md5(test.user + ":" + credentials.realm + ":" + test.password) + ":" +
-             credentials.nonce + (counted ? ":00000001:" + cnonce + ":" + credentials.qop : "") +
-             ":" + Ha2(method, credentials.qop));
+  const Challenge& challenge = test.challenge;
+  const bool counted = challenge.qop == "auth" || challenge.qop == "auth-int";
+  return Md5(Md5(test.user + ":" + challenge.realm + ":" + test.password) + ":" + challenge.nonce +
+             (counted ? ":00000001:" + cnonce + ":" + challenge.qop : "") + ":" +
+             Ha2(method, challenge.qop));
 }
 
 inline std::string DigestLine(const ChallengeCase& test, const std::string& method,
                               const std::string& cnonce) {
-  const Credentials& credentials = test.credentials;
+  const Challenge& challenge = test.challenge;
   std::string line = "Authorization: Digest username=\"" + test.user + "\", realm=\"" +
-                     credentials.realm + "\", nonce=\"" + credentials.nonce + "\", uri=\"/" +
-                     kPath + "\", response=\"" + ResponseOf(test, method, cnonce) + "\"";
-  if (!credentials.qop.empty()) {
-    line += ", qop=" + credentials.qop + ", nc=00000001, cnonce=\"" + cnonce + "\"";
+                     challenge.realm + "\", nonce=\"" + challenge.nonce + "\", uri=\"/" + kPath +
+                     "\", response=\"" + ResponseOf(test, method, cnonce) + "\"";
+  if (!challenge.qop.empty()) {
+    line += ", qop=" + challenge.qop + ", nc=00000001, cnonce=\"" + cnonce + "\"";
   }
-  if (!credentials.algorithm.empty()) line += ", algorithm=\"" + credentials.algorithm + "\"";
-  if (!credentials.opaque.empty()) line += ", opaque=\"" + credentials.opaque + "\"";
+  if (!challenge.algorithm.empty()) line += ", algorithm=\"" + challenge.algorithm + "\"";
+  if (!challenge.opaque.empty()) line += ", opaque=\"" + challenge.opaque + "\"";
   return line + "\r\n";
 }
 
@@ -97,8 +97,8 @@ inline std::string ClientNonce(const std::string& request) {
 
 inline std::string AuthorizationLine(const ChallengeCase& test, const std::string& method,
                                      const std::string& request) {
-  if (test.credentials.scheme == Scheme::kNone) return "";
-  if (test.credentials.scheme == Scheme::kBasic) return BasicLine(test);
+  if (test.challenge.scheme == Scheme::kNone) return "";
+  if (test.challenge.scheme == Scheme::kBasic) return BasicLine(test);
   return DigestLine(test, method, ClientNonce(request));
 }
 

@@ -13,12 +13,12 @@ namespace {
 
 using ::testing::IsEmpty;
 
-Credentials Digest(const std::string& realm, const std::string& nonce, const std::string& qop = "",
-                   const std::string& opaque = "", const std::string& algorithm = "") {
+Challenge Digest(const std::string& realm, const std::string& nonce, const std::string& qop = "",
+                 const std::string& opaque = "", const std::string& algorithm = "") {
   return {Scheme::kDigest, realm, nonce, qop, opaque, algorithm};
 }
 
-Credentials Basic() {
+Challenge Basic() {
   return {Scheme::kBasic};
 }
 
@@ -27,7 +27,7 @@ const char kOk[] = "HTTP/1.1 200 OK\r\nContent-Length: 4\r\n\r\ndone";
 // A request is refused with the challenge, and the one that follows, of a known length, is not.
 std::vector<Script> RefuseOnce(const ChallengeCase& test, size_t next_length) {
   std::vector<Script> scripts = {Exchange(Refusal(test.lines))};
-  if (test.credentials.scheme == Scheme::kNone) return scripts;
+  if (test.challenge.scheme == Scheme::kNone) return scripts;
   scripts.push_back({ExpectBytes(next_length), Send(kOk), Close()});
   return scripts;
 }
@@ -41,7 +41,7 @@ ClientSettings SettingsOf(const ChallengeCase& test) {
 }
 
 Outcome ExpectedOutcome(const ChallengeCase& test, int result, const std::string& text) {
-  if (test.credentials.scheme != Scheme::kNone) return Success(text);
+  if (test.challenge.scheme != Scheme::kNone) return Success(text);
   return {result, test.response, 401, ""};
 }
 
@@ -57,7 +57,7 @@ void PlayGet(const ChallengeCase& test) {
   });
   EXPECT_EQ(outcome, ExpectedOutcome(test, HTTP_RET_OK, "done"));
   EXPECT_THAT(HttpLog(log), IsEmpty());
-  if (test.credentials.scheme == Scheme::kNone) return;
+  if (test.challenge.scheme == Scheme::kNone) return;
   const std::string sent = peer.Received(1);
   EXPECT_EQ(sent, ExpectedGet(test, sent));
   ExpectOneHead(test, sent);
@@ -75,7 +75,7 @@ void PlayPost(const ChallengeCase& test) {
   });
   EXPECT_EQ(outcome, ExpectedOutcome(test, HTTP_RET_IO_ERROR, "done"));
   EXPECT_THAT(HttpLog(log), IsEmpty());
-  if (test.credentials.scheme == Scheme::kNone) return;
+  if (test.challenge.scheme == Scheme::kNone) return;
   const std::string sent = peer.Received(1);
   EXPECT_EQ(sent, ExpectedPost(test, sent));
   ExpectOneHead(test, sent);
@@ -115,12 +115,12 @@ const Shape kShapes[] = {
      [](const std::string&) { return std::string("    "); }},
 };
 
-void Store(Credentials* credentials, const std::string& field, const std::string& value) {
-  if (field == "realm") credentials->realm = value;
-  if (field == "nonce") credentials->nonce = value;
-  if (field == "qop") credentials->qop = value;
-  if (field == "opaque") credentials->opaque = value;
-  if (field == "algorithm") credentials->algorithm = value;
+void Store(Challenge* challenge, const std::string& field, const std::string& value) {
+  if (field == "realm") challenge->realm = value;
+  if (field == "nonce") challenge->nonce = value;
+  if (field == "qop") challenge->qop = value;
+  if (field == "opaque") challenge->opaque = value;
+  if (field == "algorithm") challenge->algorithm = value;
 }
 
 std::string CaseName(const std::string& field, const std::string& shape) {
@@ -133,14 +133,14 @@ std::string CaseName(const std::string& field, const std::string& shape) {
 ChallengeCase FieldCase(const std::string& broken, const Shape& shape) {
   ChallengeCase test;
   test.name = CaseName(broken, shape.name);
-  test.credentials.scheme = Scheme::kDigest;
+  test.challenge.scheme = Scheme::kDigest;
   std::string challenge;
   for (const std::string& field : kFields) {
     const bool sound = field != broken;
     const std::string value = field == "qop" ? "auth" : field + "-value";
     challenge += (challenge.empty() ? "Digest " : ", ");
     challenge += sound ? field + "=\"" + value + "\"" : shape.text(field);
-    Store(&test.credentials, field, sound ? value : shape.value(field));
+    Store(&test.challenge, field, sound ? value : shape.value(field));
   }
   test.lines = Line(challenge);
   return test;
@@ -150,16 +150,16 @@ ChallengeCase FieldCase(const std::string& broken, const Shape& shape) {
 ChallengeCase LongFieldCase(const std::string& longest) {
   ChallengeCase test;
   test.name = CaseName(longest, "Of64KB");
-  test.credentials.scheme = Scheme::kDigest;
+  test.challenge.scheme = Scheme::kDigest;
   std::string line = "WWW-Authenticate: Digest ";
   for (const std::string& field : kFields) {
     line += field + "=\"";
     if (field == longest) break;
     const std::string value = field == "qop" ? "auth" : field + "-value";
-    Store(&test.credentials, field, value);
+    Store(&test.challenge, field, value);
     line += value + "\", ";
   }
-  Store(&test.credentials, longest, std::string(kLineLimit - line.size(), 'A'));
+  Store(&test.challenge, longest, std::string(kLineLimit - line.size(), 'A'));
   test.lines = line + std::string(kLongest, 'A') + "\", x=\"y\"\r\n";
   return test;
 }
@@ -295,33 +295,33 @@ std::vector<ChallengeCase> ControlByteCases() {
 // The daemon's own credentials. What a daemon puts into a user name goes out as it stands.
 std::vector<ChallengeCase> CredentialCases() {
   const std::string digest = Line("Digest realm=\"r\", nonce=\"n\", qop=\"auth\"");
-  const Credentials credentials = Digest("r", "n", "auth");
+  const Challenge challenge = Digest("r", "n", "auth");
   const std::string basic = Line("Basic");
   const std::string longest(kLongest, 'L');
   const std::string zero("a\0b", 3);
-  const auto with = [](const char* name, const std::string& lines, const Credentials& expected,
+  const auto with = [](const char* name, const std::string& lines, const Challenge& expected,
                        const std::string& user, const std::string& password) {
     return ChallengeCase{name, lines, expected, HTTP_RET_UNAUTHORIZED, "", user, password};
   };
   return {
-      with("DigestWithoutBoth", digest, credentials, "", ""),
+      with("DigestWithoutBoth", digest, challenge, "", ""),
       with("BasicWithoutBoth", basic, Basic(), "", ""),
-      with("DigestWithQuotes", digest, credentials, "a\"b", "\"\"\""),
+      with("DigestWithQuotes", digest, challenge, "a\"b", "\"\"\""),
       with("BasicWithQuotes", basic, Basic(), "a\"b", "\"\"\""),
-      with("DigestWithColons", digest, credentials, ":a:b:", "::"),
+      with("DigestWithColons", digest, challenge, ":a:b:", "::"),
       with("BasicWithColons", basic, Basic(), ":a:b:", "::"),
-      with("DigestWithBackslashes", digest, credentials, "a\\\"b\\", "\\"),
-      with("DigestWithControlBytes", digest, credentials, "\x01\t\x7f\xff", "\x02\x1b"),
+      with("DigestWithBackslashes", digest, challenge, "a\\\"b\\", "\\"),
+      with("DigestWithControlBytes", digest, challenge, "\x01\t\x7f\xff", "\x02\x1b"),
       with("BasicWithControlBytes", basic, Basic(), "\x01\t\x7f\xff", "\x02\r\n\x1b"),
       with("BasicWithALineEndInTheUser", basic, Basic(), "u\r\nX: 1", "p"),
-      with("DigestWithALineEndInThePassword", digest, credentials, "u", "p\r\n\r\nX: 1"),
-      with("DigestWithALineEndInTheUser", digest, credentials, "u\r\nX: 1", "p"),
-      with("DigestWithAUserOf64KB", digest, credentials, longest, "p"),
-      with("DigestWithAPasswordOf64KB", digest, credentials, "u", longest),
+      with("DigestWithALineEndInThePassword", digest, challenge, "u", "p\r\n\r\nX: 1"),
+      with("DigestWithALineEndInTheUser", digest, challenge, "u\r\nX: 1", "p"),
+      with("DigestWithAUserOf64KB", digest, challenge, longest, "p"),
+      with("DigestWithAPasswordOf64KB", digest, challenge, "u", longest),
       with("BasicWithAUserOf64KB", basic, Basic(), longest, "p"),
       with("BasicWithAPasswordOf64KB", basic, Basic(), "u", longest),
-      with("DigestWithAZeroByteInTheUser", digest, credentials, zero, "p"),
-      with("DigestWithAZeroByteInThePassword", digest, credentials, "u", zero),
+      with("DigestWithAZeroByteInTheUser", digest, challenge, zero, "p"),
+      with("DigestWithAZeroByteInThePassword", digest, challenge, "u", zero),
       with("BasicWithAZeroByteInTheUser", basic, Basic(), zero, "p"),
       with("BasicWithAZeroByteInThePassword", basic, Basic(), "u", zero),
   };

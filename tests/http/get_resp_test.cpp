@@ -28,14 +28,6 @@ std::string GetRespOf(const std::string& response, const Transport& transport = 
   return client.GetResp();
 }
 
-std::vector<LogLine> LinesOf(const LogCapture& log, const std::string& function) {
-  std::vector<LogLine> lines;
-  for (const LogLine& line : log.Lines("http")) {
-    if (line.function == function) lines.push_back(line);
-  }
-  return lines;
-}
-
 }  // namespace
 
 TEST(GetResp, AChunkedBodyIsDecoded) {

@@ -89,6 +89,15 @@ inline std::string Content(const TWHttpClient& client, HTTP_MAP_KEY key) {
   return client.GetHttpContent(key, value) == HTTP_RET_OK ? value : "(none)";
 }
 
+// What one function of the client has logged, without the lines of others.
+inline std::vector<LogLine> LinesOf(const LogCapture& log, const std::string& function) {
+  std::vector<LogLine> lines;
+  for (const LogLine& line : log.Lines("http")) {
+    if (line.function == function) lines.push_back(line);
+  }
+  return lines;
+}
+
 MATCHER_P3(IsHttpLog, level, function, message, "") {
   return arg.category == "http" && arg.level == level && arg.source == "twhttp" &&
          arg.function == function && arg.message == message;

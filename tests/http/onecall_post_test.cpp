@@ -24,14 +24,6 @@ int PostOf(const std::string& response) {
   return PostTo(peer.Port());
 }
 
-std::vector<LogLine> LinesOf(const LogCapture& log, const std::string& function) {
-  std::vector<LogLine> lines;
-  for (const LogLine& line : log.Lines("http")) {
-    if (line.function == function) lines.push_back(line);
-  }
-  return lines;
-}
-
 }  // namespace
 
 TEST(SendHttpPost, WithAnEmptyCookieTheRequestIsSentAfterOneWarning) {

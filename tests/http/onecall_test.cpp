@@ -41,15 +41,6 @@ std::string TargetOf(const std::string& path, bool encode_query) {
   return request.substr(4, request.find(" HTTP/1.0\r\n") - 4);
 }
 
-// A line of SendHttpGet or SendHttpsGet alone, the parser's and the socket's left out.
-std::vector<LogLine> LinesOf(const LogCapture& log, const std::string& function) {
-  std::vector<LogLine> lines;
-  for (const LogLine& line : log.Lines("http")) {
-    if (line.function == function) lines.push_back(line);
-  }
-  return lines;
-}
-
 }  // namespace
 
 TEST(SendHttpGet, SuccessTrueFalseMissingAndNoJson) {

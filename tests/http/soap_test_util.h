@@ -68,12 +68,4 @@ inline SoapOutcome AuthOf(ClientProbe& client) {
   return outcome;
 }
 
-inline std::vector<LogLine> LinesOf(const LogCapture& log, const std::string& function) {
-  std::vector<LogLine> lines;
-  for (const LogLine& line : log.Lines("http")) {
-    if (line.function == function) lines.push_back(line);
-  }
-  return lines;
-}
-
 #endif  // TARNWICK_TESTS_HTTP_SOAP_TEST_UTIL_H_

@@ -9,11 +9,9 @@
 
 #include "tests/http/http_test_util.h"
 
-using namespace tarnwick;
-
 inline constexpr char kType[] = "Content-Type: application/xml; charset=UTF-8";
-inline constexpr auto kPutOption =
-    static_cast<CURLoption>(54);  // CURLOPT_PUT, which libcurl deprecates
+// CURLOPT_PUT, which libcurl deprecates.
+inline constexpr auto kPutOption = static_cast<CURLoption>(54);
 
 // A document that is freed at the end.
 struct OwnedDoc {
