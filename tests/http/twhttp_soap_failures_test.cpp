@@ -6,8 +6,6 @@
 #include "tests/http/soap_test_util.h"
 #include "tests/support/faults.h"
 
-using namespace std::string_literals;
-
 namespace {
 
 using ::testing::ElementsAre;

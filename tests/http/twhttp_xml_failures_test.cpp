@@ -6,10 +6,6 @@
 #include "tests/http/xml_senders.h"
 #include "tests/support/faults.h"
 
-using namespace tarnwick;
-
-using namespace std::string_literals;
-
 namespace {
 
 using ::testing::ElementsAre;
