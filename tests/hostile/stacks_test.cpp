@@ -133,8 +133,8 @@ const StackCase kStacks[] = {
      32,
      {Exchange(kRefusal), Exchange(kOk)},
      [](int port) {
-       std::string reply;
-       ClientProbe(port).SendAuthReqBySocketPost("<a/>", reply);
+       std::string response;
+       ClientProbe(port).SendAuthReqBySocketPost("<a/>", response);
      }},
     {"SendReqByXMLSocketPost",
      32,

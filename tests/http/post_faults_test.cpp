@@ -3,6 +3,8 @@
 #include <gtest/gtest.h>
 #include <libxml/parser.h>
 #include <libxml/tree.h>
+#include <poll.h>
+#include <sys/socket.h>
 
 #include <cstdint>
 
@@ -56,11 +58,11 @@ struct OwnedDoc {
 };
 
 // A server in a process of its own, so that its descriptors are not this one's: answers each
-// request with `reply` and waits for the client to close.
+// request with `response` and waits for the client to close.
 class RequestServer {
  public:
-  explicit RequestServer(const std::string& reply)
-      : listener_(Listener(&port_)), child_([this, reply] { return Run(reply); }) {
+  explicit RequestServer(const std::string& response)
+      : listener_(Listener(&port_)), child_([this, response] { return Run(response); }) {
     close(listener_);
   }
 
@@ -75,11 +77,11 @@ class RequestServer {
     return fd;
   }
 
-  int Run(const std::string& reply) const {
+  int Run(const std::string& response) const {
     while (Readable(listener_, 60000)) {
       const int fd = accept4(listener_, nullptr, nullptr, SOCK_CLOEXEC);
       if (ReadRequest(fd)) {
-        send(fd, reply.data(), reply.size(), MSG_NOSIGNAL);
+        send(fd, response.data(), response.size(), MSG_NOSIGNAL);
         char rest[256];
         while (Readable(fd, 2000) && recv(fd, rest, sizeof(rest), 0) > 0) continue;
       }
@@ -119,7 +121,7 @@ class RequestServer {
   Child child_;
 };
 
-// An XML request and the parse of its answer.
+// An XML request and the parse of its response.
 struct XmlRun {
   int result;
   bool parsed;
@@ -178,10 +180,10 @@ TEST(SoapPostFaults, WhicheverCallFailsTheReplyIsWholeOrUntouched) {
   RequestServer server(kXmlReply);
   const auto post = [&](Faults& faults) {
     ClientProbe client(server.Port());
-    std::string reply = "old";
-    const int result = client.SendReqBySocketPost("x", reply);
+    std::string response = "old";
+    const int result = client.SendReqBySocketPost("x", response);
     ExpectOneOf<int>(result, HTTP_RET_OK, HTTP_RET_IO_ERROR, faults);
-    EXPECT_EQ(reply, result == HTTP_RET_OK ? "<a>text</a>" : "old");
+    EXPECT_EQ(response, result == HTTP_RET_OK ? "<a>text</a>" : "old");
   };
   ForEachFailing(kSystemCalls, post);
   ForEachFailing(kAllocations, post);
@@ -191,11 +193,11 @@ TEST(SoapPostFaults, WithoutAVitalCallItIsAnIoError) {
   RequestServer server(kXmlReply);
   for (const Call call : kVital) {
     ClientProbe client(server.Port());
-    std::string reply = "old";
+    std::string response = "old";
     Faults faults;
     faults.FailFrom(call, 1);
-    EXPECT_EQ(client.SendReqBySocketPost("x", reply), HTTP_RET_IO_ERROR) << CallName(call);
-    EXPECT_EQ(reply, "old");
+    EXPECT_EQ(client.SendReqBySocketPost("x", response), HTTP_RET_IO_ERROR) << CallName(call);
+    EXPECT_EQ(response, "old");
   }
 }
 
@@ -205,12 +207,12 @@ TEST(SoapLoginFaults, WhicheverCallFailsTheResultIsThatOfTheLastExchange) {
                          "\r\nContent-Length: 2\r\n\r\nno");
     const auto post = [&](Faults& faults) {
       ClientProbe client(server.Port(), WithLogin());
-      std::string reply = "old";
+      std::string response = "old";
       int result = -1;
-      EXPECT_NO_THROW(result = client.SendAuthReqBySocketPost("x", reply));
+      EXPECT_NO_THROW(result = client.SendAuthReqBySocketPost("x", response));
       EXPECT_TRUE(result == HTTP_RET_UNAUTHORIZED || faults.Struck()) << result;
       EXPECT_TRUE(result == HTTP_RET_UNAUTHORIZED || result == HTTP_RET_IO_ERROR) << result;
-      EXPECT_TRUE(reply == "no" || (reply == "old" && faults.Struck())) << reply;
+      EXPECT_TRUE(response == "no" || (response == "old" && faults.Struck())) << response;
     };
     ForEachFailing(kSystemCalls, post);
     ForEachFailing(kAllocations, post);
@@ -323,10 +325,10 @@ TEST(PostFaults, WhicheverCallOfTheLogFailsTheResultsAreTheSame) {
     Faults faults;
     faults.FailFrom(call, 1);
     ClientProbe client(server.Port());
-    std::string reply;
-    EXPECT_EQ(client.SendReqBySocketPost("x", reply), HTTP_RET_OK) << CallName(call);
-    EXPECT_EQ(reply, "<a>text</a>");
-    EXPECT_EQ(client.SendReqBySocketPost("", reply), HTTP_RET_IO_ERROR);
+    std::string response;
+    EXPECT_EQ(client.SendReqBySocketPost("x", response), HTTP_RET_OK) << CallName(call);
+    EXPECT_EQ(response, "<a>text</a>");
+    EXPECT_EQ(client.SendReqBySocketPost("", response), HTTP_RET_IO_ERROR);
     client.m_pSocket->Disconnect();  // the server takes one connection after the other
     EXPECT_EQ(SendHttpPost("127.0.0.1", server.Port(), "x", "a=1", "", 5), 0);
   }

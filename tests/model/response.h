@@ -1,7 +1,7 @@
-// What a client makes of a reply that ends early: a plain reading of the rules, without sockets,
+// What a client makes of a response that ends early: a plain reading of the rules, without sockets,
 // for comparison with the library's.
-#ifndef TARNWICK_TESTS_HOSTILE_CUT_MODEL_H_
-#define TARNWICK_TESTS_HOSTILE_CUT_MODEL_H_
+#ifndef TARNWICK_TESTS_MODEL_RESPONSE_H_
+#define TARNWICK_TESTS_MODEL_RESPONSE_H_
 
 #include <strings.h>
 
@@ -11,7 +11,9 @@
 #include <utility>
 #include <vector>
 
-// A reply as far as it comes, and whether a reset ends it or a close.
+#include "tarnwick/http/twhttp.h"
+
+// A response as far as it comes, and whether a reset ends it or a close.
 struct Cut {
   std::string bytes;
   bool reset = false;
@@ -30,7 +32,7 @@ class CutReader {
  public:
   CutReader(Cut cut, bool buffered) : cut_(std::move(cut)), buffered_(buffered) {}
 
-  // The count as TWSocket::ReadData gives it. A reset makes one read fail; behind that the stream
+  // The count that TWSocket::ReadData returns. A reset makes one read fail; after that the stream
   // has ended.
   int Read(size_t wanted, std::string* bytes) {
     eof_ = false;
@@ -42,7 +44,7 @@ class CutReader {
     eof_ = !cut_.reset;
     if (!std::exchange(cut_.reset, false)) return count;
     if (taken == 0) return -1;
-    eof_ = wanted - taken >= 1024;  // a large read looks once more behind the failure
+    eof_ = wanted - taken >= 1024;  // a large read looks once more after the failure
     return count;
   }
 
@@ -72,15 +74,15 @@ class CutReader {
 // The words of a status line that counts.
 inline int ModelStatusLine(const std::string& line, int* status) {
   const size_t blank = line.find(' ');
-  if (line.empty()) return 3;
-  if (line.compare(0, 8, "HTTP/1.1") != 0) return 5;
-  if (blank == std::string::npos || blank + 1 == line.size()) return 3;
+  if (line.empty()) return HTTP_RET_IO_ERROR;
+  if (line.compare(0, 8, "HTTP/1.1") != 0) return HTTP_RET_BAD_RESPONSE;
+  if (blank == std::string::npos || blank + 1 == line.size()) return HTTP_RET_IO_ERROR;
   *status = atoi(line.c_str() + blank + 1);
-  if (*status >= 200 && *status <= 299) return 0;
-  return *status == 401 ? 4 : 5;
+  if (*status >= 200 && *status <= 299) return HTTP_RET_OK;
+  return *status == 401 ? HTTP_RET_UNAUTHORIZED : HTTP_RET_BAD_RESPONSE;
 }
 
-// A header line "Name: value"; false when a known name has nothing behind it.
+// A header line "Name: value"; false when a known name has nothing after it.
 inline bool ModelHeaderLine(const std::string& line, ModelHead* head) {
   const std::pair<const char*, std::string*> known[] = {{"Content-Length", &head->length},
                                                         {"WWW-Authenticate", &head->challenge},
@@ -100,19 +102,19 @@ inline bool ModelHeaderLine(const std::string& line, ModelHead* head) {
 inline ModelHead ReadModelHead(CutReader& reader, std::vector<std::string>* log) {
   ModelHead head;
   std::string line;
-  head.response = 3;
+  head.response = HTTP_RET_IO_ERROR;
   if (!reader.ReadLine(&line)) return head;
   head.response = ModelStatusLine(line, &head.status);
   if (head.status == 0) return head;
   for (;;) {
     if (!reader.ReadLine(&line)) {
       log->push_back("CheckContentType: Connect failed!\n\n");
-      head.response = 3;
+      head.response = HTTP_RET_IO_ERROR;
       return head;
     }
     if (line.empty()) break;
     if (!ModelHeaderLine(line, &head)) {
-      head.response = 1;
+      head.response = HTTP_RET_NOT_READY;
       return head;
     }
   }
@@ -146,4 +148,4 @@ inline bool ReadModelBody(CutReader& reader, const ModelHead& head, std::string*
   return count == 0;
 }
 
-#endif  // TARNWICK_TESTS_HOSTILE_CUT_MODEL_H_
+#endif  // TARNWICK_TESTS_MODEL_RESPONSE_H_
