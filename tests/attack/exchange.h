@@ -8,7 +8,7 @@
 #include <vector>
 
 #include "tests/attack/attacks.h"
-#include "tests/attack/operations.h"
+#include "tests/operations/operations.h"
 #include "tests/attack/response.h"
 
 // How the server leaves a connection.

@@ -5,7 +5,7 @@
 
 #include <string>
 
-#include "tests/attack/operations.h"
+#include "tests/operations/operations.h"
 
 // True when `bytes` hold a whole request of the operation; of an upload, a whole head.
 bool IsWholeRequest(const std::string& bytes, const PeerOperation& operation);

@@ -1,7 +1,7 @@
 // Every operation of the HTTP client and of the sockets that reads from a peer: one table, with
 // what the headers and docs/longest-call.md say of each.
-#ifndef TARNWICK_TESTS_ATTACK_OPERATIONS_H_
-#define TARNWICK_TESTS_ATTACK_OPERATIONS_H_
+#ifndef TARNWICK_TESTS_OPERATIONS_OPERATIONS_H_
+#define TARNWICK_TESTS_OPERATIONS_OPERATIONS_H_
 
 #include <string>
 #include <vector>
@@ -71,4 +71,4 @@ inline constexpr char kAttackPath[] = "attack.cgi?a=1";
 inline constexpr char kAttackUser[] = "user";
 inline constexpr char kAttackPassword[] = "pass word";
 
-#endif  // TARNWICK_TESTS_ATTACK_OPERATIONS_H_
+#endif  // TARNWICK_TESTS_OPERATIONS_OPERATIONS_H_

@@ -1,12 +1,12 @@
 // The operations of the table, by the way that their bytes go, and what they share.
-#ifndef TARNWICK_TESTS_ATTACK_OPERATION_PARTS_H_
-#define TARNWICK_TESTS_ATTACK_OPERATION_PARTS_H_
+#ifndef TARNWICK_TESTS_OPERATIONS_PARTS_H_
+#define TARNWICK_TESTS_OPERATIONS_PARTS_H_
 
 #include <algorithm>
 #include <memory>
 #include <string>
 
-#include "tests/attack/operations.h"
+#include "tests/operations/operations.h"
 
 inline constexpr char kPeerHost[] = "127.0.0.1";
 inline constexpr char kForm[] = "pan=3&tilt=-4";
@@ -92,4 +92,4 @@ void ReadLines(Reader& reader, size_t room, OperationOutcome* outcome) {
   }
 }
 
-#endif  // TARNWICK_TESTS_ATTACK_OPERATION_PARTS_H_
+#endif  // TARNWICK_TESTS_OPERATIONS_PARTS_H_

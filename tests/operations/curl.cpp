@@ -6,7 +6,7 @@
 #include <cstring>
 
 #include "tarnwick/http/twcurl.h"
-#include "tests/attack/operation_parts.h"
+#include "tests/operations/parts.h"
 
 OperationOutcome JsonGetOverTls(const Target& target) {
   Json::Value value;

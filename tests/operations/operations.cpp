@@ -1,6 +1,6 @@
-#include "tests/attack/operations.h"
+#include "tests/operations/operations.h"
 
-#include "tests/attack/operation_parts.h"
+#include "tests/operations/parts.h"
 
 namespace {
 

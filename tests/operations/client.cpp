@@ -4,7 +4,7 @@
 
 #include <cstring>
 
-#include "tests/attack/operation_parts.h"
+#include "tests/operations/parts.h"
 
 namespace {
 

@@ -2,7 +2,7 @@
 #include <cstring>
 
 #include "tarnwick/net/sslsocket.h"
-#include "tests/attack/operation_parts.h"
+#include "tests/operations/parts.h"
 
 namespace {
 
