@@ -1,188 +1,263 @@
 // The operations of the client over its own socket.
 #include <json/value.h>
-#include <libxml/tree.h>
 
-#include <cstring>
+#include <cstdlib>
 
 #include "tests/operations/parts.h"
 
 namespace {
 
-constexpr char kUploadEnd[] = "\r\n-------------QUENMULTIPART_BOUNDARY-------------\r\n";
+constexpr char kErrorText[] = "{\"error\":true}";
 
 void ExpectOneOf(int result, std::initializer_list<int> results, const char* call,
-                 OperationOutcome* outcome) {
+                 OperationResult* outcome) {
   if (std::find(results.begin(), results.end(), result) != results.end()) return;
   outcome->mistake = std::string(call) + ": " + std::to_string(result);
 }
 
-void ReadBodyOf(TWHttpClient& client, OperationOutcome* outcome) {
-  const int result = client.ReadBody(outcome->text);
-  ExpectOneOf(result, {HTTP_RET_OK, HTTP_RET_IO_ERROR}, "ReadBody", outcome);
-  outcome->has_text = result == HTTP_RET_OK;
+bool GoesOn(const OperationSettings& settings, const OperationResult& result) {
+  return settings.go_on || (result.result == HTTP_RET_OK && result.response == HTTP_RET_OK);
 }
 
-OperationOutcome BodyAfter(TWHttpClient& client, int result) {
-  OperationOutcome outcome;
-  outcome.result = result;
-  if (result == HTTP_RET_OK) AskForHead(client, &outcome);
-  ReadBodyOf(client, &outcome);
-  return outcome;
+// The client's end is a step as well.
+void Destroy(const OperationSettings& settings, std::shared_ptr<ClientProbe> client) {
+  settings.Step([&] { client.reset(); });
+}
+
+// Sends a request by `send`, and looks at the head of the response.
+template <typename Send>
+OperationResult HeadAfter(const OperationSettings& settings, ClientProbe& client, Send send) {
+  OperationResult result;
+  settings.Step([&] { result.result = send(client); });
+  AskForHead(client, &result);
+  return result;
+}
+
+void ReadWholeBody(const OperationSettings& settings, ClientProbe& client,
+                   OperationResult* result) {
+  settings.Step([&] { result->read = client.ReadBody(result->text); });
+  ExpectOneOf(result->read, {HTTP_RET_OK, HTTP_RET_IO_ERROR}, "ReadBody", result);
+  result->has_text = result->read == HTTP_RET_OK;
+}
+
+template <typename Send>
+OperationResult BodyAfter(const OperationSettings& settings, Send send) {
+  auto client = ClientOf(settings);
+  OperationResult result = HeadAfter(settings, *client, send);
+  if (settings.read_body && GoesOn(settings, result)) ReadWholeBody(settings, *client, &result);
+  Destroy(settings, std::move(client));
+  return result;
+}
+
+int SendGet(TWHttpClient& client) {
+  return client.SendRequestByGet();
+}
+
+// A GET, and what `read` makes of the response.
+template <typename Read>
+OperationResult ReadAfterGet(const OperationSettings& settings, Read read) {
+  auto client = ClientOf(settings);
+  OperationResult result = HeadAfter(settings, *client, SendGet);
+  if (GoesOn(settings, result)) read(*client, &result);
+  Destroy(settings, std::move(client));
+  return result;
 }
 
 }  // namespace
 
-std::unique_ptr<TWHttpClient> NewAttackedClient(const Target& target) {
-  return std::make_unique<TWHttpClient>(kPeerHost, target.port, kAttackPath, kAttackUser,
-                                        kAttackPassword, target.timeout, target.tls,
-                                        target.buffered, false, false, target.version, "");
-}
-
-void AskForHead(TWHttpClient& client, OperationOutcome* outcome) {
-  outcome->response = client.CheckResponse(outcome->status);
-  for (const HTTP_MAP_KEY key : {HTTP_CONTENT_TYPE, HTTP_CONTENT_LENGTH, HTTP_CONTENT_RANGE}) {
-    std::string value = "untouched";
-    const int result = client.GetHttpContent(key, value);
-    if (result == HTTP_RET_OK) continue;
-    if (result != HTTP_RET_NOT_READY && result != HTTP_RET_NO_CONTENT) {
-      outcome->mistake = "GetHttpContent: " + std::to_string(result);
-    }
-    if (value != "untouched") outcome->mistake = "GetHttpContent has changed its output";
+std::shared_ptr<ClientProbe> ClientOf(const OperationSettings& settings) {
+  std::shared_ptr<ClientProbe> client = settings.client;
+  if (client) {
+    client->SetPath(settings.path);
+    return client;
   }
-  std::string cookie;
-  if (client.GetCookie(cookie) != 0) outcome->mistake = "GetCookie";
-  static_cast<void>(client.GetTransferEncoding());
+  client = std::make_shared<ClientProbe>(settings.port, settings);
+  if (!settings.cookie.empty()) client->SetCookie(settings.cookie);
+  return client;
 }
 
-OperationOutcome GetBody(const Target& target) {
-  const auto client = NewAttackedClient(target);
-  client->SetCookie("id=1;");
-  return BodyAfter(*client, client->SendRequestByGet());
+void AskForHead(ClientProbe& client, OperationResult* result) {
+  result->response = client.CheckResponse(result->status);
+  result->head = client.m_connState == 2;
+  const auto ask = [&](HTTP_MAP_KEY key, std::string* kept) {
+    std::string value = "untouched";
+    const int found = client.GetHttpContent(key, value);
+    if (found == HTTP_RET_OK) {
+      *kept = value;
+      return;
+    }
+    ExpectOneOf(found, {HTTP_RET_NOT_READY, HTTP_RET_NO_CONTENT}, "GetHttpContent", result);
+    if (value != "untouched") result->mistake = "GetHttpContent has changed its output";
+  };
+  ask(HTTP_CONTENT_TYPE, &result->type);
+  ask(HTTP_CONTENT_LENGTH, &result->length);
+  ask(HTTP_CONTENT_RANGE, &result->range);
+  if (client.GetCookie(result->cookie) != 0) result->mistake = "GetCookie";
+  result->encoding = client.GetTransferEncoding();
 }
 
-OperationOutcome GetData(const Target& target) {
-  const auto client = NewAttackedClient(target);
-  OperationOutcome outcome;
-  outcome.result = client->SendRequestByGet();
-  if (outcome.result == HTTP_RET_OK) AskForHead(*client, &outcome);
-  ReadAll(*client, target.piece, &outcome);
-  outcome.has_text = false;  // with its chunk lines
-  return outcome;
+OperationResult GetBody(const OperationSettings& settings) {
+  return BodyAfter(settings, SendGet);
 }
 
-OperationOutcome GetLines(const Target& target) {
-  const auto client = NewAttackedClient(target);
-  OperationOutcome outcome;
-  outcome.result = client->SendRequestByGet();
-  if (outcome.result == HTTP_RET_OK) AskForHead(*client, &outcome);
-  ReadLines(*client, target.piece, &outcome);
-  return outcome;
+OperationResult GetData(const OperationSettings& settings) {
+  return ReadAfterGet(settings, [&](ClientProbe& client, OperationResult* result) {
+    ReadPieces(settings, client, result);
+  });
 }
 
-OperationOutcome LoginGet(const Target& target) {
-  const auto client = NewAttackedClient(target);
-  return BodyAfter(*client, client->SendRequest(HTTP_METHOD_GET, ""));
+OperationResult GetLines(const OperationSettings& settings) {
+  return ReadAfterGet(settings, [&](ClientProbe& client, OperationResult* result) {
+    ReadLines(settings, client, result);
+  });
+}
+
+OperationResult LoginGet(const OperationSettings& settings) {
+  return BodyAfter(settings,
+                   [](TWHttpClient& client) { return client.SendRequest(HTTP_METHOD_GET, ""); });
 }
 
 // One object for two requests: what the first response left must not harm the second.
-OperationOutcome GetTwice(const Target& target) {
-  const auto client = NewAttackedClient(target);
-  BodyAfter(*client, client->SendRequestByGet());
-  OperationOutcome outcome = BodyAfter(*client, client->SendRequestByGet());
-  outcome.has_text = false;  // decoded by the first response's transfer encoding
-  return outcome;
+OperationResult GetTwice(const OperationSettings& settings) {
+  OperationSettings again = settings;
+  again.client = ClientOf(settings);
+  const OperationResult before = BodyAfter(again, SendGet);
+  OperationResult result = BodyAfter(again, SendGet);
+  if (result.mistake.empty()) result.mistake = before.mistake;
+  result.first = before.text;
+  Destroy(settings, std::move(again.client));
+  return result;
 }
 
 // Further header lines, and a head where there is none.
-OperationOutcome GetHeadAgain(const Target& target) {
-  const auto client = NewAttackedClient(target);
-  OperationOutcome outcome;
-  outcome.result = client->SendRequestByGet();
-  if (outcome.result == HTTP_RET_OK) AskForHead(*client, &outcome);
-  ExpectOneOf(client->CheckContentType(), {HTTP_RET_OK, HTTP_RET_NOT_READY, HTTP_RET_IO_ERROR},
-              "CheckContentType", &outcome);
-  const int result = client->CheckHttpResponse();
-  if (result < HTTP_RET_OK || result > HTTP_RET_URI_TOO_LONG) outcome.mistake = "CheckHttpResponse";
-  client->GenBasicAccessAuth();
-  client->GenDigestAccessAuth("GET", "");
-  return outcome;
+OperationResult GetHeadAgain(const OperationSettings& settings) {
+  return ReadAfterGet(settings, [&](ClientProbe& client, OperationResult* result) {
+    int found = HTTP_RET_OK;
+    settings.Step([&] { found = client.CheckContentType(); });
+    ExpectOneOf(found, {HTTP_RET_OK, HTTP_RET_NOT_READY, HTTP_RET_IO_ERROR}, "CheckContentType",
+                result);
+    settings.Step([&] { found = client.CheckHttpResponse(); });
+    if (found < HTTP_RET_OK || found > HTTP_RET_URI_TOO_LONG) result->mistake = "CheckHttpResponse";
+    settings.Step([&] { client.GenBasicAccessAuth(); });
+    settings.Step([&] { client.GenDigestAccessAuth("GET", ""); });
+  });
 }
 
-OperationOutcome FormPost(const Target& target) {
-  const auto client = NewAttackedClient(target);
-  return BodyAfter(*client, client->SendRequestBySocketPost(kForm));
+OperationResult FormPost(const OperationSettings& settings) {
+  std::string body = settings.body;
+  return BodyAfter(settings, [&](TWHttpClient& client) {
+    return client.SendRequestBySocketPost(std::move(body));
+  });
 }
 
-OperationOutcome Soap(const Target& target) {
-  const auto client = NewAttackedClient(target);
-  OperationOutcome outcome;
-  std::string text = "untouched";
-  outcome.result = client->SendReqBySocketPost(kEnvelope, text);
-  AskForHead(*client, &outcome);
-  if (outcome.result != HTTP_RET_OK && text != "untouched") outcome.mistake = "text of a failure";
-  return outcome;
+namespace {
+
+// A SOAP request by one of the two functions, whose response stays untouched after a failure of the
+// first.
+template <typename Send>
+OperationResult SoapBy(const OperationSettings& settings, Send send) {
+  static const std::string kUntouched = "untouched";
+  auto client = ClientOf(settings);
+  std::string response = kUntouched;
+  OperationResult result =
+      HeadAfter(settings, *client, [&](TWHttpClient& sender) { return send(sender, response); });
+  result.has_text = result.result == HTTP_RET_OK;
+  result.untouched = response == kUntouched;
+  if (!result.untouched) result.text = response;
+  Destroy(settings, std::move(client));
+  return result;
 }
 
-OperationOutcome SoapLogin(const Target& target) {
-  const auto client = NewAttackedClient(target);
-  OperationOutcome outcome;
-  std::string text;
-  outcome.result = client->SendAuthReqBySocketPost(kEnvelope, text);
-  AskForHead(*client, &outcome);
-  return outcome;
+}  // namespace
+
+OperationResult Soap(const OperationSettings& settings) {
+  OperationResult result = SoapBy(settings, [&](TWHttpClient& client, std::string& response) {
+    return client.SendReqBySocketPost(settings.body, response);
+  });
+  if (!result.has_text && !result.untouched) result.mistake = "a failure has changed the response";
+  return result;
 }
 
-OperationOutcome SoapXml(const Target& target) {
-  const auto client = NewAttackedClient(target);
-  OperationOutcome outcome;
-  xmlDoc* doc = nullptr;
-  outcome.result = client->SendReqByXMLSocketPost(kEnvelope, doc);
-  AskForHead(*client, &outcome);
-  if (outcome.result != HTTP_RET_OK && doc != nullptr) outcome.mistake = "a failure's document";
-  xmlFreeDoc(doc);
-  return outcome;
+OperationResult SoapLogin(const OperationSettings& settings) {
+  return SoapBy(settings, [&](TWHttpClient& client, std::string& response) {
+    return client.SendAuthReqBySocketPost(settings.body, response);
+  });
 }
 
-OperationOutcome Upload(const Target& target) {
-  const auto client = NewAttackedClient(target);
-  OperationOutcome outcome;
-  outcome.result = client->OpenRawDataUpload();
-  const std::string part(target.piece, 'x');
-  const int size = static_cast<int>(part.size());
-  const int written = client->WriteData(part.data(), size);
-  if (written < -1 || written > size) outcome.mistake = "WriteData";
-  client->WriteData(kUploadEnd, static_cast<int>(strlen(kUploadEnd)));
-  outcome.text = client->GetResp();
-  outcome.has_text = outcome.text != "{\"error\":true}";
-  if (outcome.result == HTTP_RET_OK) AskForHead(*client, &outcome);
-  return outcome;
+OperationResult SoapXml(const OperationSettings& settings) {
+  auto client = ClientOf(settings);
+  std::string body = settings.body;
+  OwnedDocument document;
+  OperationResult result = HeadAfter(settings, *client, [&](TWHttpClient& sender) {
+    return sender.SendReqByXMLSocketPost(std::move(body), document.Get());
+  });
+  result.has_text = document.Get() != nullptr;
+  result.text = document.Text();
+  const bool failed = result.result != HTTP_RET_OK;
+  if (failed && result.has_text) result.mistake = "a failure has left a document";
+  Destroy(settings, std::move(client));
+  return result;
 }
 
-// A request that the caller writes, on the connection of the one before.
-OperationOutcome SecondRequest(const Target& target) {
-  const auto client = NewAttackedClient(target);
-  OperationOutcome outcome;
-  outcome.result = client->SendRequestByGet();
-  char piece[64];
-  client->ReadData(piece, sizeof(piece));
-  client->WriteData(kSocketRequest, static_cast<int>(strlen(kSocketRequest)));
-  client->GetResp();
-  int status = 0;
-  outcome.response = client->CheckResponse(status);
-  return outcome;
+namespace {
+
+void ReadResponse(const OperationSettings& settings, ClientProbe& client, OperationResult* result) {
+  settings.Step([&] { result->text = client.GetResp(); });
+  result->has_text = result->text != kErrorText;
+  result->read = result->has_text ? HTTP_RET_OK : HTTP_RET_IO_ERROR;
+  if (!result->has_text) result->text.clear();
 }
 
-OperationOutcome JsonGet(const Target& target) {
-  Json::Value value;
-  OperationOutcome outcome;
-  outcome.result =
-      SendHttpGet(kPeerHost, target.port, kAttackPath, value, target.timeout, target.buffered);
-  return outcome;
+}  // namespace
+
+OperationResult Upload(const OperationSettings& settings) {
+  auto client = ClientOf(settings);
+  OperationResult result;
+  settings.Step([&] { result.result = client->OpenRawDataUpload(); });
+  const bool opened = result.result == HTTP_RET_OK;
+  const bool written =
+      (opened || settings.go_on) && WritePieces(settings, *client, settings.body, &result);
+  if (written || settings.go_on) {
+    ReadResponse(settings, *client, &result);
+    if (opened) AskForHead(*client, &result);
+  }
+  Destroy(settings, std::move(client));
+  return result;
 }
 
-OperationOutcome JsonPost(const Target& target) {
-  OperationOutcome outcome;
-  outcome.result =
-      SendHttpPost(kPeerHost, target.port, kAttackPath, kForm, "id=1;", target.timeout);
-  return outcome;
+// A request that the caller writes, on the connection of the one before, whose body he has read.
+OperationResult SecondRequest(const OperationSettings& settings) {
+  return ReadAfterGet(settings, [&](ClientProbe& client, OperationResult* result) {
+    const size_t length = strtoul(result->length.c_str(), nullptr, 10);
+    const size_t most = std::min(settings.most, std::max<size_t>(length, 1));
+    std::string& first = result->first;
+    while (first.size() < most &&
+           ReadPiece(settings, client, std::min(settings.piece, most - first.size()), &first,
+                     result)) {
+    }
+    const bool whole = first.size() == length;
+    if ((whole || settings.go_on) && WritePieces(settings, client, settings.second, result)) {
+      ReadResponse(settings, client, result);
+    }
+  });
+}
+
+OperationResult JsonGet(const OperationSettings& settings) {
+  Json::Value value = "untouched";
+  OperationResult result;
+  settings.Step([&] {
+    result.result = SendHttpGet(settings.host, settings.port, settings.path, value,
+                                settings.timeout, settings.encode_query);
+  });
+  TakeValue(value, &result);
+  return result;
+}
+
+OperationResult JsonPost(const OperationSettings& settings) {
+  OperationResult result;
+  settings.Step([&] {
+    result.result = SendHttpPost(settings.host, settings.port, settings.path, settings.body,
+                                 settings.cookie, settings.timeout);
+  });
+  return result;
 }

@@ -1,74 +1,83 @@
-// Every operation of the HTTP client and of the sockets that reads from a peer: one table, with
-// what the headers and docs/longest-call.md say of each.
+// Every operation of the HTTP client and of the sockets that talks with a peer: one table, in which
+// each is entered once. Programs and tests that go through all operations run them from here; what
+// such a program needs beside it, it keys by the operation's name and checks with Unmatched().
 #ifndef TARNWICK_TESTS_OPERATIONS_OPERATIONS_H_
 #define TARNWICK_TESTS_OPERATIONS_OPERATIONS_H_
 
+#include <functional>
+#include <memory>
 #include <string>
 #include <vector>
 
-#include "tarnwick/http/twhttp.h"
+#include "tests/http/http_test_util.h"
 
-// The peer and the client's settings.
-struct Target {
-  int port = 0;  // on 127.0.0.1
-  bool tls = false;
-  bool buffered = true;
-  bool verify = false;  // libcurl verifies the certificate
-  HTTP_VERSION version = HTTP_VERSION_NONE;
-  int timeout = 10;    // seconds
-  size_t piece = 512;  // bytes of the caller's buffer
+// The peer, the client's settings, and what is sent.
+struct OperationSettings : ClientSettings {
+  int port = 0;
+  int limit = 5;             // seconds, of a transfer through libcurl and of HasDataToRead
+  bool verify = true;        // libcurl verifies the certificate
+  unsigned int address = 0;  // of the host, in network order; 0: it is resolved
+  std::string cookie = {};   // "name=value"
+  std::string body = {};     // of a POST, PUT or upload; all that a socket writes
+  std::string second = {};   // a request that follows on the same connection
+  size_t piece = 512;        // bytes of the caller's buffer
+  size_t most = 8 << 20;     // no more reads after so many bytes
+  bool read_body = true;     // not the head alone
+  bool go_on = false;        // goes on after a step that has failed
+  std::shared_ptr<ClientProbe> client = {};  // is used again, with another path
+
+  // Runs one step of the library's, when it is set: the steps are all that a fault may strike.
+  std::function<void(const std::function<void()>&)> run_step = {};
+
+  template <typename Function>
+  void Step(Function function) const {
+    if (run_step) {
+      run_step(std::ref(function));
+    } else {
+      function();
+    }
+  }
 };
 
 // What an operation came to.
-struct OperationOutcome {
-  int result = 0;
-  int response = HTTP_RET_OK;  // of CheckResponse, and its status; -1 when it was not asked for
+struct OperationResult {
+  int result = 0;              // of the call that the operation is named after
+  int response = HTTP_RET_OK;  // of CheckResponse, and its status; -1 where there is none to ask
   int status = -1;
-  bool has_text = false;  // the operation has read a body, which is `text`
-  std::string text;
-  std::string mistake;  // what no contract allows; empty when there is nothing
-};
+  bool head = false;  // a whole head was read
+  std::string type;   // what the client keeps of the head; empty when there was none
+  std::string length;
+  std::string range;
+  std::string cookie;
+  std::string encoding;
 
-// How long a peer that is silent once can hold an operation.
-enum class Limit {
-  kWaits,     // a number of waits of T
-  kTransfer,  // t in all
-  kNone,
-};
-
-// What an operation shows of the response's status.
-enum class Shows {
-  kNothing,
-  kStatus,   // the status itself
-  kSuccess,  // HTTP_RET_OK for those from 200 to 299 alone
-  kJson,     // the same with -1 for all others
+  int read = 0;            // of the last ReadBody, ReadData or ReadToLineEnd
+  bool has_text = false;   // `text` is all that there is to read
+  bool untouched = false;  // a failure has left the caller's output as it was
+  std::string text;        // the body, the document or the value
+  std::string first;       // what came before: a line, another body, a document as it was received
+  bool healthy = true;     // the smaller calls beside it have succeeded as well
+  std::string mistake;     // what no contract allows; empty when there is nothing
 };
 
 enum class OverTls { kNever, kEither, kAlways };
 
 struct PeerOperation {
   const char* name;
-  OperationOutcome (*run)(const Target& target);
-  OverTls tls;
-  bool curl;
-  Limit limit;
-  int waits_buffered;  // of kWaits: with read-ahead and without
-  int waits_direct;
-  std::vector<int> results;  // the documented ones
-  const char* request;       // its first line begins so
-  Shows shows = Shows::kNothing;
-  bool upload = false;  // the request has no end
-  int most_requests = 1;
+  OperationResult (*run)(const OperationSettings& settings);
+  std::vector<int> failures;  // the documented results beside 0
+  OverTls tls = OverTls::kEither;
+  bool curl = false;  // through libcurl
 };
-
-// A server of an attack responds to so many requests of one operation, and closes then.
-inline constexpr int kMostDeliveries = 12;
 
 const std::vector<PeerOperation>& PeerOperations();
 
-// What the requests carry.
-inline constexpr char kAttackPath[] = "attack.cgi?a=1";
-inline constexpr char kAttackUser[] = "user";
-inline constexpr char kAttackPassword[] = "pass word";
+// The one of this name; ends the process when there is none.
+const PeerOperation& OperationNamed(const std::string& name);
+
+// The operations that a program neither lists nor leaves out, and the names that the table does not
+// have, each with a blank in front; empty when all is well.
+std::string Unmatched(const std::vector<std::string>& listed,
+                      const std::vector<std::string>& left_out);
 
 #endif  // TARNWICK_TESTS_OPERATIONS_OPERATIONS_H_

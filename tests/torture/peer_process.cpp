@@ -79,7 +79,7 @@ bool Contains(const std::string& text, const char* part) {
 bool IsWhole(const std::string& request) {
   const size_t head = request.find("\r\n\r\n");
   if (head == std::string::npos) return false;
-  if (Contains(request, "/upload")) return Contains(request, "END OF UPLOAD");
+  if (Contains(request, "/upload")) return Contains(request, kUploadEnd);
   const size_t length = request.find("Content-Length: ");
   if (length > head) return true;
   return request.size() >= head + 4 + strtoul(request.c_str() + length + 16, nullptr, 10);
@@ -123,7 +123,7 @@ std::string ReplyTo(const std::string& request) {
   if (Contains(path, "chunked")) return Chunked();
   if (Contains(path, "json")) return WithLength("application/json", kJsonBody);
   if (Contains(path, "xml")) return WithLength("text/xml", kXmlBody);
-  if (Contains(path, "length")) return WithLength("text/plain", Body());
+  if (Contains(path, "length")) return LengthResponse();
   return "HTTP/1.1 200 OK\r\nContent-Type: text/plain\r\nSet-Cookie: id=42; Path=/\r\n"
          "Content-Range: bytes 0-9/10\r\n\r\n" +
          Body();
@@ -139,6 +139,10 @@ void Answer(Line* line) {
 }
 
 }  // namespace
+
+std::string LengthResponse() {
+  return WithLength("text/plain", Body());
+}
 
 PeerProcess::PeerProcess(Peer kind) {
   if (kind == Peer::kNone) return;

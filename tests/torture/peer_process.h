@@ -16,6 +16,12 @@ const std::string& Body();
 extern const char kJsonBody[];
 extern const char kXmlBody[];
 
+// What ends an upload.
+inline constexpr char kUploadEnd[] = "END OF UPLOAD";
+
+// The whole response at the path "length".
+std::string LengthResponse();
+
 // Takes any number of connections, one after the other, each of which may break off anywhere. A
 // whole request gets the reply that the first word of its path names: "body" a body that ends with
 // the connection, "length" one with a length, "chunked", "json", "xml", or "upload" once the

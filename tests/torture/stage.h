@@ -5,6 +5,7 @@
 #include <pthread.h>
 
 #include <exception>
+#include <functional>
 #include <new>
 #include <string>
 
@@ -82,7 +83,7 @@ enum class Peer { kNone, kPlain, kTls };
 struct Operation {
   const char* name;
   Peer peer;
-  void (*run)(Stage& stage);
+  std::function<void(Stage&)> run;
   bool cold = false;  // tortured as the first operation of a process as well
   bool slow = false;  // makes a TLS handshake, which allocates thousands of times
 };
