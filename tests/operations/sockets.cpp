@@ -94,7 +94,7 @@ OperationResult SocketExchange(const OperationSettings& settings) {
     bool ready = true;
     if (!settings.https) settings.Step([&] { ready = socket.HasDataToRead(settings.limit); });
     result->healthy = result->healthy && ready;
-    std::string line(settings.piece + 1, '\0');
+    std::string line(std::max<size_t>(settings.piece, 64) + 1, '\0');
     const int size = static_cast<int>(line.size());
     settings.Step([&] { result->read = socket.ReadToLineEnd(line.data(), size); });
     if (result->read <= 0) return;

@@ -263,6 +263,10 @@ int main(int argc, char** argv) {
     fprintf(stderr, "%s writes to /var/log and the settings: run it by scripts/sandbox\n", argv[0]);
     return 2;
   }
+  if (!MissedOperations().empty()) {
+    fprintf(stderr, "operations that the soak misses:%s\n", MissedOperations().c_str());
+    return 2;
+  }
   const bool good = Run(options);
   puts(good ? "soak passed" : "soak FAILED");
   return good ? 0 : 1;

@@ -82,11 +82,10 @@ Reply Refusal(const std::string& status, const std::string& more, unsigned id) {
 std::string WrongPart(const Request& request) {
   const Plan& plan = request.plan;
   if (request.body != RequestBodyOf(plan)) return "body";
-  const bool query = plan.operation == Operation::kGet || plan.operation == Operation::kJsonGet;
-  if (query && !Contains(request.head, std::string(kEncodedQuery) + " HTTP/")) return "query";
-  const bool cookie =
-      plan.operation == Operation::kFormPost || plan.operation == Operation::kCurlPost;
-  if (cookie && !Contains(request.head, "Cookie: id=" + std::to_string(plan.id) + "\r\n")) {
+  if (Has(plan, kSendsQuery) && !Contains(request.head, std::string(kEncodedQuery) + " HTTP/"))
+    return "query";
+  if (Has(plan, kSendsCookie) &&
+      !Contains(request.head, "Cookie: id=" + std::to_string(plan.id) + "\r\n")) {
     return "cookie";
   }
   return "";
@@ -94,7 +93,7 @@ std::string WrongPart(const Request& request) {
 
 Reply ReplyTo(const Request& request) {
   const Plan& plan = request.plan;
-  if (plan.operation == Operation::kLines) return {"", AnswerOf(plan) + "\r\n", false};
+  if (Has(plan, kLine)) return {"", AnswerOf(plan) + "\r\n", false};
   if (plan.fault == Fault::kServerError) return Refusal("500 Soak", "", plan.id);
   // Asked for in turns where the plan names none.
   const Login login = plan.login != Login::kNone           ? plan.login
@@ -106,8 +105,7 @@ Reply ReplyTo(const Request& request) {
   }
   const std::string wrong = WrongPart(request);
   if (!wrong.empty()) return Refusal("409 Wrong " + wrong, "", plan.id);
-  const bool first =
-      plan.operation == Operation::kSecondRequest && !Contains(request.head, kSecondMark);
+  const bool first = Has(plan, kTwoRequests) && !Contains(request.head, kSecondMark);
   if (!first) return Success(plan, false);
   Plan healthy = plan;
   healthy.fault = Fault::kNone;

@@ -37,11 +37,11 @@ unsigned AllowedBlindly(const Plan& plan) {
   const bool connected = plan.fault > Fault::kBadCertificate;
   const bool through =
       plan.fault == Fault::kHangUp || plan.fault == Fault::kNoise || plan.fault == Fault::kSilence;
-  if (plan.operation == Operation::kJsonPost && (connected || through)) {
+  if (!UsesCurl(plan) && Has(plan, kReadsNothing) && (connected || through)) {
     return Bit(Outcome::kRight);
   }
   const bool spoilt = plan.fault >= Fault::kCutHead && plan.fault <= Fault::kBadChunk;
-  return plan.operation == Operation::kLoginPost && spoilt ? Bit(Outcome::kRight) : 0;
+  return UsesCurl(plan) && Has(plan, kReadsNothing) && spoilt ? Bit(Outcome::kRight) : 0;
 }
 
 }  // namespace
@@ -68,10 +68,10 @@ void Tally::AddTo(Count* count, const Plan& plan, const Outcome& outcome) {
 void Tally::Add(const Plan& plan, const Outcome& outcome) {
   const std::lock_guard<std::mutex> lock(mutex_);
   AddTo(&total_, plan, outcome);
-  AddTo(&operations_[static_cast<int>(plan.operation)], plan, outcome);
+  AddTo(&operations_[static_cast<size_t>(plan.operation)], plan, outcome);
   AddTo(&faults_[static_cast<int>(plan.fault)], plan, outcome);
   if (IsExpected(plan, outcome) || details_.size() >= kDetailsKept) return;
-  details_.push_back(std::string(NameOf(plan.operation)) + (plan.tls ? ", TLS" : "") +
+  details_.push_back(std::string(OperationOf(plan).title) + (plan.tls ? ", TLS" : "") +
                      ", fault: " + NameOf(plan.fault) + ", " + ToPath(plan) + ": " +
                      kKindNames[outcome.kind] + " " + outcome.detail);
 }
@@ -96,8 +96,8 @@ void Tally::Print() const {
   constexpr char kHead[] = "\n%-28s %9s %9s %8s %8s %8s %8s %10s\n";
   printf(kHead, "operation", "all", "right", "faults", "= failed", "+ cut", "+ right",
          "unexpected");
-  for (int i = 0; i < kOperations; ++i) {
-    PrintRow(NameOf(static_cast<Operation>(i)), operations_[i]);
+  for (size_t i = 0; i < operations_.size(); ++i) {
+    PrintRow(SoakOperations()[i].title, operations_[i]);
   }
   PrintRow("all", total_);
   printf(kHead, "fault", "all", "right", "faults", "= failed", "+ cut", "+ right", "unexpected");

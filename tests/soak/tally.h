@@ -49,7 +49,7 @@ class Tally {
 
   mutable std::mutex mutex_;
   Count total_;
-  Count operations_[kOperations];
+  std::vector<Count> operations_ = std::vector<Count>(SoakOperations().size());
   Count faults_[kFaults];
   std::vector<std::string> details_;  // of the first unexpected ones
 };
