@@ -1,4 +1,4 @@
-// A daemon in small: it takes requests for a camera on its standard input, one a line, and answers
+// A daemon in small: it takes requests for a camera on its standard input, one per line, and answers
 // each with one line on its standard output.
 //
 //   get HOST PORT PATH
@@ -31,7 +31,8 @@ std::string Compact(const Json::Value& value) {
 // Sends nothing before it is asked: the client logs in with what the server's challenge wants.
 void InitClient(const Request& request, TWHttpClient* client) {
   client->Init(request.path, request.host, request.port, request.user, request.password, kTimeout,
-               true, false, false, HTTP_VERSION_1_0, "", false);
+               /*bufferedRead=*/true, /*encodeQuery=*/false, /*basicAuth=*/false, HTTP_VERSION_1_0,
+               /*encodeKeep=*/"", /*https=*/false);
 }
 
 std::string ReadBody(TWHttpClient* client) {
@@ -60,13 +61,13 @@ std::string HttpsGet(const Request& request) {
 std::string Login(const Request& request) {
   TWHttpClient client;
   InitClient(request, &client);
-  std::ostringstream answer;
-  answer << "SendRequest " << client.SendRequest(HTTP_METHOD_GET, "");
+  std::ostringstream result;
+  result << "SendRequest " << client.SendRequest(HTTP_METHOD_GET, "");
   int status = 0;
   const int outcome = client.CheckResponse(status);
-  answer << " CheckResponse " << outcome << " status " << status;
-  if (outcome == HTTP_RET_OK) answer << " " << ReadBody(&client);
-  return answer.str();
+  result << " CheckResponse " << outcome << " status " << status;
+  if (outcome == HTTP_RET_OK) result << " " << ReadBody(&client);
+  return result.str();
 }
 
 std::string Post(const Request& request) {

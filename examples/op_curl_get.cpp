@@ -18,12 +18,12 @@ int main(int argc, char** argv) {
     std::fprintf(stderr, "usage: op_curl_get HOST PORT PATH USER PASSWORD\n");
     return 2;
   }
-  const bool https = true;
-  TWHttpClient client(argv[1], std::atoi(argv[2]), argv[3], argv[4], argv[5], kTimeout, https, true,
-                      false, false, HTTP_VERSION_NONE, "");
+  TWHttpClient client(argv[1], std::atoi(argv[2]), argv[3], argv[4], argv[5], kTimeout,
+                      /*https=*/true,
+                      /*bufferedRead=*/true, /*encodeQuery=*/false, /*basicAuth=*/false,
+                      HTTP_VERSION_NONE, /*encodeKeep=*/"");
 
-  const bool verifyPeer = true;
-  switch (client.SendRequestByCurl(HTTP_METHOD_GET, verifyPeer, kTimeout)) {
+  switch (client.SendRequestByCurl(HTTP_METHOD_GET, /*verifyPeer=*/true, kTimeout)) {
     case HTTP_RET_OK:
       break;
     case HTTP_RET_CERT_ERROR:

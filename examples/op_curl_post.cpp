@@ -19,8 +19,9 @@ int main(int argc, char** argv) {
     std::fprintf(stderr, "usage: op_curl_post HOST PORT FORM\n");
     return 2;
   }
-  TWHttpClient client(argv[1], std::atoi(argv[2]), argv[3], "", "", kTimeout, false, true, false,
-                      false, HTTP_VERSION_NONE, "");
+  TWHttpClient client(argv[1], std::atoi(argv[2]), argv[3], "", "", kTimeout, /*https=*/false,
+                      /*bufferedRead=*/true, /*encodeQuery=*/false, /*basicAuth=*/false,
+                      HTTP_VERSION_NONE, /*encodeKeep=*/"");
   client.SetCookie("session=42");
 
   const int result = client.SendRequestByCurl(HTTP_METHOD_POST, true, kTimeout);

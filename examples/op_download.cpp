@@ -29,8 +29,9 @@ int main(int argc, char** argv) {
     return 1;
   }
 
-  TWHttpClient client(argv[1], std::atoi(argv[2]), argv[3], "", "", kTimeout, false, true, false,
-                      false, HTTP_VERSION_NONE, "");
+  TWHttpClient client(argv[1], std::atoi(argv[2]), argv[3], "", "", kTimeout, /*https=*/false,
+                      /*bufferedRead=*/true, /*encodeQuery=*/false, /*basicAuth=*/false,
+                      HTTP_VERSION_NONE, /*encodeKeep=*/"");
   // The file stays the caller's: it must be open while a request runs.
   client.SetCurlRespFile(file.get());
   const int result = client.SendRequestByCurl(HTTP_METHOD_GET, true, kTimeout);

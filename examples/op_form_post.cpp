@@ -1,4 +1,4 @@
-// Posts a form with a session's cookie and prints the answer: SendRequestBySocketPost, then
+// Posts a form with a session's cookie and prints the response: SendRequestBySocketPost, then
 // ReadBody.
 //
 //   op_form_post HOST PORT PATH FORM COOKIE
@@ -25,20 +25,21 @@ int main(int argc, char** argv) {
     return 2;
   }
   // After a form of HTTP/1.1 many servers keep the connection, and the end of the body is not seen.
-  TWHttpClient client(argv[1], std::atoi(argv[2]), argv[3], "", "", kTimeout, false, true, false,
-                      false, HTTP_VERSION_1_0, "");
+  TWHttpClient client(argv[1], std::atoi(argv[2]), argv[3], "", "", kTimeout, /*https=*/false,
+                      /*bufferedRead=*/true, /*encodeQuery=*/false, /*basicAuth=*/false,
+                      HTTP_VERSION_1_0, /*encodeKeep=*/"");
   client.SetCookie(argv[5]);
 
-  // The form is sent as it stands: its values are encoded already.
+  // The form is sent as it is: its values are encoded already.
   if (client.SendRequestBySocketPost(argv[4]) != HTTP_RET_OK) return Fail("no connection");
   int status = 0;
   if (client.CheckResponse(status) != HTTP_RET_OK) return Fail("the form was not taken");
 
   std::string body;
-  if (client.ReadBody(body) != HTTP_RET_OK) return Fail("the answer broke off");
+  if (client.ReadBody(body) != HTTP_RET_OK) return Fail("the response broke off");
   std::fwrite(body.data(), 1, body.size(), stdout);
 
-  // The head of the answer has replaced the cookie, with its own or with nothing.
+  // The head of the response has replaced the cookie, with its own or with nothing.
   std::string cookie;
   client.GetCookie(cookie);
   if (!cookie.empty()) std::printf("new cookie: %s\n", cookie.c_str());

@@ -34,8 +34,9 @@ int main(int argc, char** argv) {
     std::fprintf(stderr, "usage: op_get HOST PORT PATH\n");
     return 2;
   }
-  TWHttpClient client(argv[1], std::atoi(argv[2]), argv[3], "", "", kTimeout, false, true, false,
-                      false, HTTP_VERSION_1_0, "");
+  TWHttpClient client(argv[1], std::atoi(argv[2]), argv[3], "", "", kTimeout, /*https=*/false,
+                      /*bufferedRead=*/true, /*encodeQuery=*/false, /*basicAuth=*/false,
+                      HTTP_VERSION_1_0, /*encodeKeep=*/"");
 
   // Success means that the request was sent; what came back is CheckResponse's to tell.
   if (client.SendRequestByGet() != HTTP_RET_OK) {

@@ -1,5 +1,5 @@
 // Posts a form to a service in one call: SendHttpPost. Whether the service took it is not known
-// afterwards; SendRequestBySocketPost is for callers who need the answer.
+// afterwards; SendRequestBySocketPost is for callers who need the response.
 //
 //   op_json_post HOST PORT PATH NAME VALUE
 #include <cstdio>

@@ -26,9 +26,11 @@ int main(int argc, char** argv) {
     std::fprintf(stderr, "usage: op_login_get HOST PORT PATH USER PASSWORD\n");
     return 2;
   }
-  // The argument behind encodeQuery, basicAuth, would send the password before it is asked for.
-  TWHttpClient client(argv[1], std::atoi(argv[2]), argv[3], argv[4], argv[5], kTimeout, false, true,
-                      false, false, HTTP_VERSION_1_0, "");
+  // With basicAuth the client would send the password before it is asked for.
+  TWHttpClient client(argv[1], std::atoi(argv[2]), argv[3], argv[4], argv[5], kTimeout,
+                      /*https=*/false,
+                      /*bufferedRead=*/true, /*encodeQuery=*/false, /*basicAuth=*/false,
+                      HTTP_VERSION_1_0, /*encodeKeep=*/"");
 
   if (client.SendRequest(HTTP_METHOD_GET, "") != HTTP_RET_OK) {
     std::fprintf(stderr, "no connection\n");

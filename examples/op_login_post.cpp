@@ -1,5 +1,5 @@
 // Sends a command to a device that wants a login: SendRequest with HTTP_METHOD_POST, which is
-// SendRequestByPost. The answer's body does not matter, so it is thrown away.
+// SendRequestByPost. The response's body does not matter, so it is thrown away.
 //
 //   op_login_post HOST PORT PATH?FORM USER PASSWORD
 #include <cstdio>
@@ -13,10 +13,12 @@ int main(int argc, char** argv) {
     return 2;
   }
   // The socket's timeout does not apply here: the request goes through libcurl, without a limit.
-  TWHttpClient client(argv[1], std::atoi(argv[2]), argv[3], argv[4], argv[5], 5, false, true, false,
-                      false, HTTP_VERSION_NONE, "");
+  TWHttpClient client(argv[1], std::atoi(argv[2]), argv[3], argv[4], argv[5], /*timeout=*/5,
+                      /*https=*/false,
+                      /*bufferedRead=*/true, /*encodeQuery=*/false, /*basicAuth=*/false,
+                      HTTP_VERSION_NONE, /*encodeKeep=*/"");
 
-  // What stands before the "?" is the path, what follows is posted.
+  // What precedes the "?" is the path, what follows is posted.
   switch (client.SendRequest(HTTP_METHOD_POST, "?")) {
     case HTTP_RET_OK:
       std::puts("done");

@@ -31,8 +31,9 @@ int main(int argc, char** argv) {
     std::fprintf(stderr, "usage: op_second_request HOST PORT PATH SECOND_PATH\n");
     return 2;
   }
-  TWHttpClient client(argv[1], std::atoi(argv[2]), argv[3], "", "", 5, false, true, false, false,
-                      HTTP_VERSION_1_1, "");
+  TWHttpClient client(argv[1], std::atoi(argv[2]), argv[3], "", "", /*timeout=*/5, /*https=*/false,
+                      /*bufferedRead=*/true, /*encodeQuery=*/false, /*basicAuth=*/false,
+                      HTTP_VERSION_1_1, /*encodeKeep=*/"");
   if (client.SendRequestByGet() != HTTP_RET_OK || !SkipBody(&client)) {
     std::fprintf(stderr, "no first response\n");
     return 1;

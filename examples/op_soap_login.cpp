@@ -23,10 +23,12 @@ int main(int argc, char** argv) {
     std::fprintf(stderr, "usage: op_soap_login HOST PORT PATH USER PASSWORD\n");
     return 2;
   }
-  TWHttpClient client(argv[1], std::atoi(argv[2]), argv[3], argv[4], argv[5], kTimeout, false, true,
-                      false, false, HTTP_VERSION_1_1, "");
+  TWHttpClient client(argv[1], std::atoi(argv[2]), argv[3], argv[4], argv[5], kTimeout,
+                      /*https=*/false,
+                      /*bufferedRead=*/true, /*encodeQuery=*/false, /*basicAuth=*/false,
+                      HTTP_VERSION_1_1, /*encodeKeep=*/"");
 
-  // Unlike the request without a login, this one gives the outcome of the response.
+  // Unlike the request without a login, this one returns the outcome of the response.
   std::string response;
   switch (client.SendAuthReqBySocketPost(kEnvelope, response)) {
     case HTTP_RET_OK:

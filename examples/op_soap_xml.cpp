@@ -29,8 +29,9 @@ int main(int argc, char** argv) {
     std::fprintf(stderr, "usage: op_soap_xml HOST PORT PATH\n");
     return 2;
   }
-  TWHttpClient client(argv[1], std::atoi(argv[2]), argv[3], "", "", kTimeout, false, true, false,
-                      false, HTTP_VERSION_1_1, "");
+  TWHttpClient client(argv[1], std::atoi(argv[2]), argv[3], "", "", kTimeout, /*https=*/false,
+                      /*bufferedRead=*/true, /*encodeQuery=*/false, /*basicAuth=*/false,
+                      HTTP_VERSION_1_1, /*encodeKeep=*/"");
 
   xmlDoc* response = nullptr;
   if (client.SendReqByXMLSocketPost(kEnvelope, response) != HTTP_RET_OK) {

@@ -1,5 +1,5 @@
 // Streams a file to a device that receives it as a multipart upload: OpenRawDataUpload, WriteData
-// for as long as there is something to send, and GetResp for the answer.
+// for as long as there is something to send, and GetResp for the response.
 //
 //   op_upload HOST PORT PATH FILE
 #include <cstdio>
@@ -42,8 +42,9 @@ int main(int argc, char** argv) {
     std::fprintf(stderr, "usage: op_upload HOST PORT PATH FILE\n");
     return 2;
   }
-  TWHttpClient client(argv[1], std::atoi(argv[2]), argv[3], "", "", 5, false, true, false, false,
-                      HTTP_VERSION_1_1, "");
+  TWHttpClient client(argv[1], std::atoi(argv[2]), argv[3], "", "", /*timeout=*/5, /*https=*/false,
+                      /*bufferedRead=*/true, /*encodeQuery=*/false, /*basicAuth=*/false,
+                      HTTP_VERSION_1_1, /*encodeKeep=*/"");
   if (client.OpenRawDataUpload() != HTTP_RET_OK || !WritePart(&client, file.get())) {
     std::fprintf(stderr, "the upload broke off\n");
     return 1;

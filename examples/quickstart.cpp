@@ -1,4 +1,4 @@
-// Asks a camera who it is and logs the answer.
+// Asks a camera who it is and logs the response.
 #define TW_LOG_SOURCE "quickstart"
 #include <json/json.h>
 
@@ -18,7 +18,7 @@ int main(int argc, char** argv) {
   Json::Value response;
   const int result = SendHttpGet(host, std::atoi(argv[2]), argv[3], response, 5, false);
   if (result != 0) {
-    TW_LOG(LOG_CATEG_CAMERA, LOG_LEVEL_WARN, "%s gives no answer: %d\n", host, result);
+    TW_LOG(LOG_CATEG_CAMERA, LOG_LEVEL_WARN, "%s does not respond: %d\n", host, result);
     return 1;
   }
 

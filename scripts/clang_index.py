@@ -5,7 +5,10 @@ import os
 import shlex
 import sys
 
-from clang import cindex
+try:
+    from clang import cindex
+except ImportError:
+    sys.exit("install python3-clang-14")
 
 ROOT = os.path.dirname(os.path.dirname(os.path.abspath(__file__)))
 

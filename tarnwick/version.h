@@ -20,7 +20,7 @@
 // Threads: any.
 TARNWICK_API int TWVersionNumber();
 
-// The same as text, for example "1.0.0". It lives as long as the library is loaded.
+// The same as a string, for example "1.0.0". It lives as long as the library is loaded.
 // Threads: any.
 TARNWICK_API const char* TWVersion();
 

@@ -6,7 +6,7 @@
 
 #include "tarnwick/http/twcurl.h"
 #include "tarnwick/log/twdebuglog.h"
-#include "tarnwick/platform/sigpipe_guard.h"
+#include "tarnwick/platform/signal_guard.h"
 
 namespace tarnwick {
 
@@ -28,7 +28,7 @@ CurlRequest::CurlRequest(const char* operation)
 
 CurlRequest::~CurlRequest() {
   if (m_curl != nullptr) {
-    SigpipeGuard guard;
+    SignalGuard guard(SIGPIPE);
     curl_easy_cleanup(m_curl);  // says goodbye to a TLS peer, who may be gone
     guard.DiscardPending();
   }
@@ -58,7 +58,7 @@ CURLcode CurlRequest::SetOwnOptions() {
 CURLcode CurlRequest::Perform() {
   CURLcode code = SetOwnOptions();
   if (code == CURLE_OK) {
-    SigpipeGuard guard;
+    SignalGuard guard(SIGPIPE);
     code = curl_easy_perform(m_curl);
     guard.DiscardPending();
   }

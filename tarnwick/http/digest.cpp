@@ -6,12 +6,12 @@
 #include <openssl/md5.h>
 #include <unistd.h>
 
-#include <algorithm>
 #include <cstdlib>
 #include <ctime>
 #include <initializer_list>
 #include <string_view>
 
+#include "tarnwick/platform/text_view.h"
 #include "tarnwick/utils/utils.h"
 
 namespace tarnwick {
@@ -51,12 +51,6 @@ std::string A2Digest(const DIGEST_ACCESS_AUTH& auth, const std::string& method) 
   return Final(&a2);
 }
 
-// `text` without `ch` at its ends.
-std::string_view Trim(std::string_view text, char ch) {
-  const size_t first = std::min(text.find_first_not_of(ch), text.size());
-  return text.substr(first, text.find_last_not_of(ch) + 1 - first);
-}
-
 // Deliberately simple: the name is found wherever it first occurs, also inside another word, and a
 // quoted value is cut at its first comma, so that the first of a list of qops is taken. Kept as it
 // is: callers may depend on it; pinned by the tests of ParseChallenge.
@@ -66,7 +60,7 @@ std::string_view FindParameter(std::string_view challenge, std::string_view name
   const size_t equals = challenge.find('=', found);
   if (equals == std::string_view::npos) return {};
   const std::string_view value = challenge.substr(equals + 1);
-  return Trim(Trim(value.substr(0, value.find(',')), ' '), '"');
+  return Trim(Trim(value.substr(0, value.find(',')), " "), "\"");
 }
 
 }  // namespace

@@ -3,9 +3,9 @@
 #include <strings.h>
 
 #include <algorithm>
-#include <climits>
-#include <cstdlib>
 #include <string>
+
+#include "tarnwick/platform/text_view.h"
 
 namespace tarnwick {
 
@@ -22,38 +22,24 @@ std::string_view NextToken(std::string_view* rest, const char* delimiters) {
   return token;
 }
 
-// A status that does not fit stays out of every range, on every word size.
-int ParseStatus(std::string_view text) {
-  const long value = std::strtol(std::string(text).c_str(), nullptr, 10);
-  return static_cast<int>(std::clamp<long>(value, INT_MIN, INT_MAX));
+bool EqualLetters(char a, char b) {
+  return (a | 0x20) == (b | 0x20);
 }
 
-// The last letter is compared first: that rejects most other names without a call of strncasecmp.
-bool BeginsWith(std::string_view text, std::string_view known) {
-  const size_t last = known.size() - 1;
-  return text.size() > last && (text[last] | 0x20) == (known[last] | 0x20) &&
-         strncasecmp(text.data(), known.data(), known.size()) == 0;
+// The first and the last letter come first: they reject most other names without a call of
+// strncasecmp. REQUIRES: `text` is not empty.
+bool BeginsWith(std::string_view text, std::string_view name) {
+  return EqualLetters(text[0], name[0]) && text.size() >= name.size() &&
+         EqualLetters(text[name.size() - 1], name.back()) &&
+         strncasecmp(text.data(), name.data(), name.size()) == 0;
 }
 
-struct KnownName {
-  std::string_view name;
-  Header header;
-};
-
-// REQUIRES: `text` starts at the name and is not empty. Most names are rejected by their first
-// letter.
-KnownName FindKnown(std::string_view text) {
-  constexpr KnownName kKnown[] = {
-      {"content-type", Header::kContentType},      {"content-length", Header::kContentLength},
-      {"Content-Range", Header::kContentRange},    {"Set-Cookie", Header::kSetCookie},
-      {"WWW-Authenticate", Header::kAuthenticate}, {"Transfer-Encoding", Header::kTransferEncoding},
-  };
-  const int first = text[0] | 0x20;
-  if (first != 'c' && first != 's' && first != 'w' && first != 't') return {{}, Header::kOther};
-  for (const KnownName& known : kKnown) {
-    if (BeginsWith(text, known.name)) return known;
+// REQUIRES: `text` starts at the field's name, and is not empty.
+const KeptField* FindKeptField(std::string_view text) {
+  for (const KeptField& field : kKeptFields) {
+    if (BeginsWith(text, field.name)) return &field;
   }
-  return {{}, Header::kOther};
+  return nullptr;
 }
 
 }  // namespace
@@ -65,7 +51,7 @@ StatusLine ParseStatusLine(std::string_view line, int* status) {
   if (protocol != "HTTP/1.0" && protocol != "HTTP/1.1") return StatusLine::kNotHttp;
   const std::string_view number = NextToken(&line, " ");
   if (number.empty()) return StatusLine::kIncomplete;
-  *status = ParseStatus(number);
+  *status = ToInt(std::string(number));
   return StatusLine::kParsed;
 }
 
@@ -74,25 +60,20 @@ HeaderLine ParseHeaderLine(std::string_view line) {
   const size_t begin = line.find_first_not_of(kNameEnds);
   if (begin == std::string_view::npos) return result;
   result.hasName = true;
-  // No known name holds a character that ends names, so it need not be cut out of the line first.
+  // No kept name holds a character that ends names, so it need not be cut out of the line first.
   line.remove_prefix(begin);
-  const KnownName known = FindKnown(line);
-  result.header = known.header;
-  if (known.header == Header::kOther) return result;
-  const size_t end = std::min(line.find_first_of(kNameEnds, known.name.size()), line.size());
+  result.field = FindKeptField(line);
+  if (result.field == nullptr) return result;
+  const size_t end =
+      std::min(line.find_first_of(kNameEnds, result.field->name.size()), line.size());
   result.value = line.substr(std::min(end + 1, line.size()));
   return result;
-}
-
-std::string_view TrimSpaces(std::string_view text) {
-  const size_t first = std::min(text.find_first_not_of(' '), text.size());
-  return text.substr(first, text.find_last_not_of(' ') + 1 - first);
 }
 
 std::string_view ParseCookie(std::string_view value) {
   const size_t semicolon = value.find(';');
   if (semicolon == std::string_view::npos) return {};
-  return TrimSpaces(value.substr(0, semicolon + 1));
+  return Trim(value.substr(0, semicolon + 1), " ");
 }
 
 }  // namespace tarnwick

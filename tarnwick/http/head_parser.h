@@ -4,6 +4,8 @@
 
 #include <string_view>
 
+#include "tarnwick/http/kept_fields.h"
+
 namespace tarnwick {
 
 enum class StatusLine {
@@ -16,30 +18,15 @@ enum class StatusLine {
 // no number. `status` is stored only for kParsed.
 StatusLine ParseStatusLine(std::string_view line, int* status);
 
-// The headers that the client keeps.
-enum class Header {
-  kContentType,
-  kContentLength,
-  kContentRange,
-  kSetCookie,
-  kAuthenticate,
-  kTransferEncoding,
-  kOther,
-};
-
 struct HeaderLine {
   bool hasName = false;
-  Header header = Header::kOther;
-  // Of a known header, whatever follows the one character after the name; may be empty.
+  const KeptField* field = nullptr;  // nullptr when the client does not keep it
+  // Of a kept field, whatever follows the one character after the name; may be empty.
   std::string_view value;
 };
 
-// Splits a header line. A name that begins with a known one is taken for that one; pinned by
-// CheckContentType.ALongerNameWithAKnownPrefixCountsAsTheKnownOne.
+// Splits a header line.
 HeaderLine ParseHeaderLine(std::string_view line);
-
-// `text` without the spaces at its ends; tabs stay.
-std::string_view TrimSpaces(std::string_view text);
 
 // The cookie of a Set-Cookie value: up to its first ";", which stays, without spaces at the ends.
 // Without a ";" there is no cookie.

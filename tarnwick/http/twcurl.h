@@ -7,11 +7,12 @@
 #include "tarnwick/platform/export.h"
 
 // A new libcurl easy handle; the first call initialises libcurl for the process, which nothing
-// undoes.
+// undoes. The library's own requests go through it as well.
 //
 // Results: the handle, which the caller releases with curl_easy_cleanup; null when libcurl gave
-//   none. A failed initialisation is logged (category http, level error), and the next call tries
-//   again.
+//   none. After a failed initialisation the next call tries again.
+// Logs: a failed initialisation, in category http at error, as source twcurl: "Failed to global
+//   init curl with res [N]."
 // Threads: any; waits while another one initialises.
 TARNWICK_API CURL* TWCurlInit();
 

@@ -1,9 +1,13 @@
 // The client object: its settings, its socket and its accessors.
 #include "tarnwick/http/twhttp.h"
 
+#include <algorithm>
 #include <cstdlib>
+#include <iterator>
 #include <utility>
 
+#include "tarnwick/http/kept_fields.h"
+#include "tarnwick/http/request_parts.h"
 #include "tarnwick/net/socket_access.h"
 #include "tarnwick/net/sslsocket.h"
 
@@ -14,6 +18,12 @@ namespace {
 std::string WithoutLeadingSlashes(std::string path) {
   path.erase(0, path.find_first_not_of('/'));
   return path;
+}
+
+bool IsContentKey(HTTP_MAP_KEY key) {
+  return std::any_of(std::begin(kKeptFields), std::end(kKeptFields), [key](const KeptField& field) {
+    return field.as == KeptAs::kContent && field.key == key;
+  });
 }
 
 }  // namespace
@@ -83,6 +93,12 @@ bool TWHttpClient::Reconnect() {
   return m_pSocket != nullptr && m_pSocket->Connect() == 0;
 }
 
+// What the next request to `path` is made of. REQUIRES: `path` outlives it.
+RequestParts TWHttpClient::Parts(const std::string& path) const {
+  return {m_strHost,          m_port,        path,    m_strUser, m_strPassword, m_strCookie,
+          m_strAuthorization, m_httpVersion, m_bHttps};
+}
+
 void TWHttpClient::SetPath(std::string path) {
   m_strPath = WithoutLeadingSlashes(std::move(path));
 }
@@ -119,7 +135,7 @@ int TWHttpClient::CheckResponse(int& status) {
 }
 
 int TWHttpClient::GetHttpContent(HTTP_MAP_KEY key, std::string& out) const {
-  if (key < HTTP_CONTENT_TYPE || key > HTTP_CONTENT_RANGE) return HTTP_RET_BAD_KEY;
+  if (!IsContentKey(key)) return HTTP_RET_BAD_KEY;
   if (m_connState != 2) return HTTP_RET_NOT_READY;
   const auto found = m_mapContent.find(key);
   if (found == m_mapContent.end()) return HTTP_RET_NO_CONTENT;

@@ -9,8 +9,9 @@
 // A device that asks for a login:
 //
 //   // At most 5 seconds a wait, with read-ahead; the login goes out when the device asks for it.
-//   TWHttpClient client(host, port, "info.cgi", "admin", "secret", 5, false, true, false, false,
-//                       HTTP_VERSION_NONE, "");
+//   TWHttpClient client(host, port, "info.cgi", "admin", "secret", /*timeout=*/5, /*https=*/false,
+//                       /*bufferedRead=*/true, /*encodeQuery=*/false, /*basicAuth=*/false,
+//                       HTTP_VERSION_NONE, /*encodeKeep=*/"");
 //   int status = 0;
 //   std::string body;
 //   if (client.SendRequest(HTTP_METHOD_GET, "") != HTTP_RET_OK) return "";  // not sent
@@ -19,7 +20,15 @@
 //   return body;
 //
 // The message syntax is after RFC 7230, the logins are after RFC 2617; docs/deliberate.md has what
-// differs. Failures are logged in category http.
+// differs.
+//
+// Failures are logged in category http, as source twhttp: at debug what a device may cause, such as
+// "Connection failed!", "Write data faild." and, with libcurl's code or the status, "Failed to make
+// http connection, return value=28"; at error memory that ran out, an option that libcurl refused
+// to SendRequestByCurl, and a response file that was not written ("CURL Error(23): ..."). At debug2
+// ReadBody and GetResp log the body, at debug3 each header line is logged. The socket adds lines of
+// its own (twsocket.h); of a failed write only the line of WriteFd, in category utils, has the
+// error number. At debug two messages show user and password that libcurl refused to take.
 #ifndef TARNWICK_HTTP_TWHTTP_H_
 #define TARNWICK_HTTP_TWHTTP_H_
 
@@ -34,7 +43,7 @@
 #include "tarnwick/platform/export.h"
 
 namespace tarnwick {
-class CurlRequest;
+struct RequestParts;
 }
 typedef struct _xmlDoc xmlDoc;  // libxml2's document
 
@@ -48,7 +57,8 @@ enum HTTP_MAP_KEY : int {
 // The protocol version to send. The values are libcurl's.
 enum HTTP_VERSION : int {
   // HTTP/1.0 on the socket GET, HTTP/1.1 on the form POST, libcurl's default in SendRequestByPost.
-  // The other requests do not look at the version.
+  // The other requests do not look at the version: SOAP and uploads are HTTP/1.1, libcurl chooses
+  // for the rest, over TLS also HTTP/2.
   HTTP_VERSION_NONE = 0,
   HTTP_VERSION_1_0 = 1,  // HTTP/1.0
   HTTP_VERSION_1_1 = 2,  // HTTP/1.1
@@ -69,51 +79,65 @@ enum {
   HTTP_RET_UNAUTHORIZED = 4,  // status 401
   HTTP_RET_BAD_RESPONSE = 5,  // no HTTP/1.0 or HTTP/1.1 response, or a status not listed here
   HTTP_RET_NO_CONTENT = 6,    // the response has no such header
-  HTTP_RET_REDIRECT = 7,      // status 302
+  HTTP_RET_REDIRECT = 7,      // status 302, which is not followed
   HTTP_RET_URI_TOO_LONG = 8,  // status 414
   HTTP_RET_CERT_ERROR = 9,    // libcurl could not verify the server's certificate
 };
 
 // One client for one server, path and login.
 //
-// The socket operations connect anew for each request. Authorization, cookie and other texts go
-// onto the wire as they are: the caller must keep CR and LF out of them.
-// When memory runs out, a request operation returns its failure; constructors, functions that take
-// or return a string by value, GetCookie and GetHttpContent throw std::bad_alloc.
-// Blocks: each operation over the socket for the name resolution, which has no limit, then for the
-// client's time-out at each wait for the peer, of which a slow one may need many; a write, and the
-// TLS handshake, have no limit. docs/longest-call.md tells the sums.
+// The socket operations connect anew for each request. The requests through libcurl have a handle
+// each; they follow http_proxy, https_proxy, all_proxy and no_proxy, as curl(1) does, and those
+// over the socket do not. Over the socket TLS checks no certificate, and Basic logins over plain
+// HTTP can be read on the way.
+// REQUIRES: no CR and LF in authorization, cookie and other strings; they go onto the wire as they
+//   are.
+// Errors: errno is not part of the results. When memory runs out, a request operation returns its
+//   failure; constructors, functions that take or return a string by value, GetCookie and
+//   GetHttpContent throw std::bad_alloc. No other exception leaves the library.
 // Threads: one thread uses an object at a time; separate objects may run in separate threads.
 // Cancellation: a thread may be cancelled (pthread_cancel, the deferred kind) in any operation, of
 //   the one-call functions too. It ends at a wait for the peer, or after a name resolution, a TLS
-//   handshake or a transfer through libcurl, which are not left in the middle. The client may then
-//   be destroyed, or used for another request.
+//   handshake or a transfer through libcurl, which are not left in the middle. Nothing leaks, and
+//   the client may then be destroyed, or used for another request.
+// Blocks: each operation over the socket for the name resolution, which has no limit, then for the
+//   client's time-out T at each wait for the peer, of which a slow one may need many. A write, and
+//   the TLS handshake, have no limit. With read-ahead a silent peer holds an operation for
+//
+//     T       to connect
+//     7 T     for a head, and for the body of a SOAP response after it
+//     14 T    in ReadBody
+//
+// and for the double when it asks for a login. Without read-ahead 7 T is T and 14 T is 2 T; over
+// TLS each is the double. docs/longest-call.md has the sums.
 class TARNWICK_API TWHttpClient {
  public:
-  // A client without a server; Init must follow. Until then every operation fails.
+  // A client without a server. REQUIRES: Init before any other operation, which fails until then.
   TWHttpClient();
 
-  // A client that is ready for use; the arguments are those of Init.
+  // A client that is ready for use. The arguments mean what they mean for Init, in another order.
   TWHttpClient(std::string host, int port, std::string path, std::string user, std::string password,
                int timeout, bool https, bool bufferedRead, bool encodeQuery, bool basicAuth,
                HTTP_VERSION version, std::string encodeKeep);
 
-  // Closes the connection and frees what the client owns; a response file stays open.
+  // Closes the connection and frees what the client owns; a response file stays open. Over TLS with
+  // a negative time-out it waits while the peer does not take the close notice.
   virtual ~TWHttpClient();
 
   TWHttpClient(const TWHttpClient&) = delete;
   TWHttpClient& operator=(const TWHttpClient&) = delete;
 
-  // Sets up the client and its socket. Call it once on an object: a second call makes a second
-  // socket and does not release the first.
+  // Sets up the client and its socket.
   //
+  // REQUIRES: one call for an object; a second one makes a second socket and does not release the
+  //   first.
   // Arguments: `path` with its query, leading "/" are stripped; `host` a name or a dotted IPv4
   //   address; `timeout` in seconds for connecting and each wait of the socket operations, negative
   //   for none; `bufferedRead` reads ahead (wanted for speed; direct reading costs two system calls
-  //   a byte of the head); `encodeQuery` percent-encodes the values of the query on the socket GET,
-  //   but the characters of `encodeKeep`; `basicAuth` sends the login with the first GET instead of
-  //   waiting to be asked; `https` uses TLS, on the socket without a check of the peer, and
-  //   everywhere without a certificate of the client's own.
+  //   per byte of the head); `encodeQuery` percent-encodes the values of the query on the socket
+  //   GET, but the characters of `encodeKeep`; `basicAuth` sends the login with the first GET
+  //   instead of waiting to be asked; `https` uses TLS, on the socket without a check of the peer,
+  //   and everywhere without a certificate of the client's own.
   void Init(std::string path, std::string host, int port, std::string user, std::string password,
             int timeout, bool bufferedRead, bool encodeQuery, bool basicAuth, HTTP_VERSION version,
             std::string encodeKeep, bool https);
@@ -131,13 +155,16 @@ class TARNWICK_API TWHttpClient {
 
   // Writes headers and body of SendRequestByCurl's responses to `file`, from its current position;
   // null collects the body in memory again. Of the head, lines without a colon, as the status line
-  // mostly is, and lines with "Transfer-Encoding:" are left out. The caller keeps the file open
-  // during requests and closes it afterwards. After a success all has been flushed; a write or a
-  // flush that fails makes the request fail, what failed with the stream before does not.
+  // mostly is, and lines with "Transfer-Encoding:" are left out. After a success all has been
+  // flushed; a write or a flush that fails makes the request fail, what failed with the stream
+  // before does not.
+  // REQUIRES: the caller keeps the file open during requests, and closes it afterwards.
   void SetCurlRespFile(FILE* file);
 
   // Sets the cookie to send, as it is. A response's head replaces it: with its last Set-Cookie,
-  // or with nothing, so that the second request of a login has the one that the 401 brought.
+  // or with nothing, so that the second request of a login has the one that the 401 brought. A
+  // transfer through libcurl leaves it. SOAP requests, SendRequestByPost and the XML requests send
+  // no cookie.
   // Results: 0.
   int SetCookie(std::string cookie);
 
@@ -208,7 +235,8 @@ class TARNWICK_API TWHttpClient {
   //   certificate could not be verified; HTTP_RET_IO_ERROR after anything else.
   int SendRequestByCurl(TW_HTTP_METHOD method, bool verifyPeer, int timeout);
 
-  // Posts through libcurl over plain HTTP, logging in by Basic or Digest as the server asks.
+  // Posts through libcurl over plain HTTP, in the client's version of it, logging in by Basic or
+  // Digest as the server asks.
   //
   // The path is split at its first character out of `separators`: what precedes it is the
   // URL's path, what follows is the body; without such a character the body is empty. The
@@ -224,6 +252,7 @@ class TARNWICK_API TWHttpClient {
   //
   // Results: HTTP_RET_OK when the whole request was written, whatever the server responded;
   //   HTTP_RET_IO_ERROR when connecting or writing failed.
+  // Logs: a failed connect at info, with the content; a form that was not written whole at error.
   int SendRequestBySocketPost(std::string content);
 
   // Posts a SOAP envelope over the client's socket and reads the response's body, of the length
@@ -233,7 +262,7 @@ class TARNWICK_API TWHttpClient {
   //   A read that ends early is a success, and `response` holds what came. HTTP_RET_IO_ERROR, with
   //   `response` as it was, for an empty `body`, when connecting, writing or reading failed, and
   //   for a response without a usable Content-Length, in chunks for example; CheckResponse tells
-  //   its status.
+  //   its status, and GetHttpContent returns HTTP_RET_NO_CONTENT for HTTP_CONTENT_LENGTH.
   // Memory grows with what arrives: over 1 MiB, an announced length alone does not take any.
   int SendReqBySocketPost(const std::string& body, std::string& response);
 
@@ -277,10 +306,13 @@ class TARNWICK_API TWHttpClient {
   // until GetResp has read the upload's.
   //
   // The caller then writes the body with WriteData, with lines of the boundary
-  // -----------QUENMULTIPART_BOUNDARY----------- and ends it by destroying the client. No login is
-  // sent. Strict servers refuse the head for its "Cache-Control :no-cache" or its length. GetResp
-  // has a response only of a server that responds before 128 GiB have come, and then closes.
-  // Results: HTTP_RET_OK; HTTP_RET_IO_ERROR when connecting or writing failed.
+  // `-----------QUENMULTIPART_BOUNDARY-----------` and ends it by destroying the client. No login
+  // is sent. Strict servers refuse the head for its "Cache-Control :no-cache" or its length.
+  // GetResp has a response only of a server that responds before 128 GiB have come, and then
+  // closes.
+  // Results: HTTP_RET_OK; HTTP_RET_IO_ERROR when connecting or writing failed, which is logged at
+  //   error.
+  // Blocks for T to connect.
   int OpenRawDataUpload();
 
   // XML REST requests through libcurl over plain HTTP, with the body, where there is one, from
@@ -302,17 +334,18 @@ class TARNWICK_API TWHttpClient {
   //
   // Results: true with a new document in `doc`, which the caller frees with xmlFreeDoc; false when
   //   nothing was collected (`doc` stays) or it is not well-formed (`doc` becomes null).
+  //
   // Here and in SendReqByXMLSocketPost libxml2's error handlers are told what is wrong with a
   // document, when the daemon has set them for the thread. Without one, where libxml2 writes to
   // standard error, nothing is written; stderr given to xmlSetGenericErrorFunc is no handler.
   bool GetResponseXML(xmlDoc*& doc);
 
   // Reads and parses the head of a response, after a request has been written.
-  // Results: the codes of the status, HTTP_RET_OK to HTTP_RET_URI_TOO_LONG; HTTP_RET_NOT_READY
-  //   without a request written, or after a header line without a name, or one of the names that
-  //   are kept without a value; HTTP_RET_IO_ERROR
-  //   after a failed read or half a status line; HTTP_RET_BAD_RESPONSE when it is no HTTP/1.0 or
-  //   HTTP/1.1 response. The result is not kept: CheckResponse does not tell it.
+  // Results: the code of the status: HTTP_RET_OK, HTTP_RET_UNAUTHORIZED, HTTP_RET_BAD_RESPONSE,
+  //   HTTP_RET_REDIRECT or HTTP_RET_URI_TOO_LONG; HTTP_RET_NOT_READY without a request written, or
+  //   after a header line without a name, or one of the names that are kept without a value;
+  //   HTTP_RET_IO_ERROR after a failed read or half a status line; HTTP_RET_BAD_RESPONSE when it is
+  //   no HTTP/1.0 or HTTP/1.1 response. The result is not kept: CheckResponse does not tell it.
   int CheckHttpResponse();
 
   // Reads and parses the header lines, 30 at most; what follows stays unread, in front of the body:
@@ -323,9 +356,9 @@ class TARNWICK_API TWHttpClient {
   int CheckContentType();
 
   // The Authorization header lines for the client's credentials, without the CRLF: Basic, and
-  // Digest (after RFC 2617) for the last response's challenge. `body` is accepted and ignored,
-  // even for qop "auth-int". GenBasicAccessAuth throws std::logic_error when memory for the
-  // encoding runs out.
+  // Digest (after RFC 2617) for the last response's challenge. Digest is MD5 alone; MD5-sess is
+  // computed as MD5. `body` is ignored, even for qop "auth-int". GenBasicAccessAuth throws
+  // std::logic_error when memory for the encoding runs out.
   std::string GenBasicAccessAuth();
   std::string GenDigestAccessAuth(std::string method, std::string body);
 
@@ -359,49 +392,34 @@ class TARNWICK_API TWHttpClient {
 
  private:
   TARNWICK_LOCAL bool Reconnect();
+  TARNWICK_LOCAL tarnwick::RequestParts Parts(const std::string& path) const;
+  TARNWICK_LOCAL bool Authorize(const char* method);
   TARNWICK_LOCAL bool StoreHeader(const char* line);
-  TARNWICK_LOCAL std::string BuildGetRequest();
-  TARNWICK_LOCAL std::string BuildFormPost(const std::string& content) const;
-  TARNWICK_LOCAL std::string BuildSoapPost(const std::string& body);
-  TARNWICK_LOCAL int WriteSoapPost(const std::string& request);
-  TARNWICK_LOCAL int ReadSoapResponse(int length, std::string* response);
-  TARNWICK_LOCAL std::string BuildUploadHead() const;
   TARNWICK_LOCAL int ReadBodyFor(const char* operation, std::string* body);
-  TARNWICK_LOCAL bool ReadChunks(std::string* body);
-  TARNWICK_LOCAL bool ReadChunk(uint32_t size, std::string* body);
-  TARNWICK_LOCAL int AppendRead(int len, std::string* body);
-  TARNWICK_LOCAL void SkipChunkCrlf();
-  TARNWICK_LOCAL bool ReadUntilClose(std::string* body);
-
-  TARNWICK_LOCAL bool SetCurlOutput(tarnwick::CurlRequest* curl);
-  TARNWICK_LOCAL bool SetCurlRequest(tarnwick::CurlRequest* curl, TW_HTTP_METHOD method,
-                                     int timeout);
-  TARNWICK_LOCAL bool SetCurlHeaders(tarnwick::CurlRequest* curl, TW_HTTP_METHOD method);
-  TARNWICK_LOCAL std::string PlainHostUrl() const;
-  TARNWICK_LOCAL bool SetCurlCredentials(tarnwick::CurlRequest* curl);
-  TARNWICK_LOCAL bool SetCurlVersion(tarnwick::CurlRequest* curl);
-  TARNWICK_LOCAL int PerformByCurl(tarnwick::CurlRequest* curl);
-  TARNWICK_LOCAL bool SetXmlUrl(tarnwick::CurlRequest* curl);
-  TARNWICK_LOCAL bool SetXmlHeaders(tarnwick::CurlRequest* curl, bool forUpload);
-  TARNWICK_LOCAL bool SetXmlWriter(tarnwick::CurlRequest* curl);
-  TARNWICK_LOCAL bool SetXmlOutput(tarnwick::CurlRequest* curl, const char* message);
-  TARNWICK_LOCAL bool SetCurlPut(tarnwick::CurlRequest* curl);
-  TARNWICK_LOCAL int PutXmlFile(tarnwick::CurlRequest* curl, xmlDoc* doc, FILE* file);
 };
 
 // Fetches `path` from a JSON service over HTTP and parses the response into `result`. The request
-// is one of HTTP/1.0 and names no host; chunks are not decoded.
+// is one of HTTP/1.0 and names no host, so a server with several sites may respond for another one;
+// chunks are not decoded. There is no argument for a login: here and in SendHttpsGet an empty one
+// is sent by Basic.
 //
 // Arguments: `timeout` in seconds for connecting and each wait; `encodeQuery` percent-encodes the
 //   values of the query; without it, line feeds are removed from the path instead.
 // Results: 0 when the response is JSON whose member "success" is true; -1 when the request, the
 //   status, a read or an empty body made it fail; -2 when the body is no JSON, or "success" is
-//   missing or not true, and `result` may then hold a part of the response.
+//   missing or not true, and `result` may then hold a part of the response. -1 also when memory
+//   runs out: the one-call functions throw nothing.
+//
 // Here and in SendHttpsGet a body that is nested more deeply than the thread's stack has room for
 // is no JSON; a stack that is not the thread's own, a fiber's, is taken for one with room for 77
 // levels.
-// Throws nothing; so the other two.
-// Blocks: as the client's GET, until the server closes.
+// Blocks: as the client's GET, and then until the server closes: a silent one for 3 T, one that
+//   keeps sending without a limit.
+// Logs: at info a failed request, status or read, such as "Failed to check response[404]: 5"; at
+//   error an empty body, and a body that is no such JSON. Here and in SendHttpsGet a body that
+//   cannot be parsed is also logged whole, without category and level, whatever the levels are. Its
+//   CR and LF are those of the log too, so that a device can write a whole forged line; in a scope
+//   of TWRequestScope they are escaped.
 // Threads: any; so the other two.
 TARNWICK_API int SendHttpGet(const std::string& host, int port, std::string path,
                              Json::Value& result, int timeout, bool encodeQuery);
@@ -412,14 +430,16 @@ TARNWICK_API int SendHttpGet(const std::string& host, int port, std::string path
 //   `timeout` in seconds for connecting and each wait.
 // Results: 0 when the request was sent, whatever the server responded; -1 when it was not.
 // Blocks: as the client's socket requests, until the response's head is there.
+// Logs: at warn "[Warning] Cannot set balnk cookie"; at error a form that was not sent.
 TARNWICK_API int SendHttpPost(const std::string& host, int port, const std::string& path,
                               const std::string& body, const std::string& cookie, int timeout);
 
 // As SendHttpGet, over TLS through libcurl, with the certificate and host name verified. The
-// version of HTTP is libcurl's choice, and chunks are decoded.
+// version of HTTP is libcurl's choice, HTTP/2 where the server offers it, and chunks are decoded.
 //
-// Arguments: `timeout` limits the whole transfer, in seconds, as in SendRequestByCurl.
-// Blocks: for that long.
+// Arguments: `timeout` limits the whole transfer, in seconds, as in SendRequestByCurl: 0 does not
+//   limit it, and a negative one fails.
+// Blocks: for that long; the name resolution takes as long as the resolver does.
 // Results: 0; -1 when the transfer failed or the status is not from 200 to 299; -2 when the
 //   certificate could not be verified; -3 when the body is no JSON, or "success" is missing or not
 //   true. An empty body is a success and leaves `result` as it was.

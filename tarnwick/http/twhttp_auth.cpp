@@ -1,4 +1,5 @@
 // The Authorization lines of the client's auth.
+#include "tarnwick/http/challenge_words.h"
 #include "tarnwick/http/digest.h"
 #include "tarnwick/http/twhttp.h"
 #include "tarnwick/platform/unique.h"
@@ -25,4 +26,18 @@ std::string TWHttpClient::GenDigestAccessAuth(std::string method, std::string /*
   auth.opaque = challenge.at("opaque");
   auth.response = DigestResponse(auth, m_strPassword, method);
   return DigestLine(auth);
+}
+
+// Stores the credentials for the next request, as the last response's challenge asks for them.
+// Results: false when it names neither scheme.
+bool TWHttpClient::Authorize(const char* method) {
+  if (ContainsIgnoreCase(m_strAuthenticate, "digest")) {
+    m_strAuthorization = GenDigestAccessAuth(method, "");
+    return true;
+  }
+  if (ContainsIgnoreCase(m_strAuthenticate, "basic")) {
+    m_strAuthorization = GenBasicAccessAuth();
+    return true;
+  }
+  return false;
 }

@@ -75,6 +75,63 @@ void AppendBufferedChunks(TWSocket* socket, std::string* body) {
   }
 }
 
+// Reads `len` bytes at most and adds what came to the body. Results: those of ReadData.
+// REQUIRES: len <= kPieceSize.
+int AppendRead(TWSocket* socket, int len, std::string* body) {
+  const auto size = static_cast<size_t>(len);
+  const std::string_view buffered = SocketAccess::Buffered(socket);
+  if (buffered.size() >= size) {
+    SocketAccess::Take(socket, size);
+    Append(buffered.substr(0, size), body);
+    return len;
+  }
+  char piece[kPieceSize];
+  const int count = socket->ReadData(piece, len);
+  if (count > 0) Append({piece, static_cast<size_t>(count)}, body);
+  return count;
+}
+
+bool ReadChunk(TWSocket* socket, uint32_t size, std::string* body) {
+  while (size > 0) {
+    const int count =
+        AppendRead(socket, static_cast<int>(std::min<uint32_t>(size, kPieceSize)), body);
+    if (count < 0) return false;
+    size -= static_cast<uint32_t>(count);
+    if (socket->IsEOF()) return true;
+  }
+  return true;
+}
+
+// The two bytes after a chunk, whatever they are. Direct reading delivers what has arrived, so one
+// may be missing; through the buffer one is missing where the stream ends or a read failed, and
+// another read would wait once more.
+void SkipChunkCrlf(TWSocket* socket) {
+  char ending[2];
+  const int count = socket->ReadData(ending, 2);
+  if (count == 1 && !SocketAccess::IsBuffered(socket)) socket->ReadData(ending, 1);
+}
+
+// A size line that cannot be read is taken for the last chunk, and trailers stay unread.
+bool ReadChunks(TWSocket* socket, std::string* body) {
+  for (;;) {
+    AppendBufferedChunks(socket, body);
+    char line[kPieceSize];
+    const int length = socket->ReadToLineEnd(line, kPieceSize);
+    const uint32_t size = length < 1 ? 0 : ParseChunkSize({line, static_cast<size_t>(length)});
+    if (size == 0) return true;
+    if (!ReadChunk(socket, size, body)) return false;
+    SkipChunkCrlf(socket);
+  }
+}
+
+// The announced length is ignored: the body ends where the server closes.
+bool ReadUntilClose(TWSocket* socket, std::string* body) {
+  for (;;) {
+    const int count = AppendRead(socket, kPieceSize, body);
+    if (count <= 0) return count == 0;
+  }
+}
+
 }  // namespace
 
 std::string TWHttpClient::GetResp() try {
@@ -101,67 +158,12 @@ int TWHttpClient::ReadBody(std::string& body) try {
 int TWHttpClient::ReadBodyFor(const char* operation, std::string* body) {
   // Only the exact word: a server that writes it otherwise gets its chunk lines handed through.
   const bool chunked = m_strTransferEncoding == "chunked";
-  const bool complete = m_connState == 2 && (chunked ? ReadChunks(body) : ReadUntilClose(body));
-  if (!complete) {
+  const bool hasHead = m_connState == 2 && m_pSocket != nullptr;
+  if (!hasHead || !(chunked ? ReadChunks(m_pSocket, body) : ReadUntilClose(m_pSocket, body))) {
     TW_LOG_AS(operation, LOG_CATEG_HTTP, LOG_LEVEL_DEBUG, "Read data error\n");
     return HTTP_RET_IO_ERROR;
   }
   TW_LOG_AS(operation, LOG_CATEG_HTTP, LOG_LEVEL_DEBUG2, "strRet = %s\n",
             tarnwick::PeerText(body->c_str()).Get());
   return HTTP_RET_OK;
-}
-
-// A size line that cannot be read is taken for the last chunk, and trailers stay unread.
-bool TWHttpClient::ReadChunks(std::string* body) {
-  for (;;) {
-    AppendBufferedChunks(m_pSocket, body);
-    char line[kPieceSize];
-    const int length = ReadToLineEnd(line, kPieceSize);
-    const uint32_t size = length < 1 ? 0 : ParseChunkSize({line, static_cast<size_t>(length)});
-    if (size == 0) return true;
-    if (!ReadChunk(size, body)) return false;
-    SkipChunkCrlf();
-  }
-}
-
-bool TWHttpClient::ReadChunk(uint32_t size, std::string* body) {
-  while (size > 0) {
-    const int count = AppendRead(static_cast<int>(std::min<uint32_t>(size, kPieceSize)), body);
-    if (count < 0) return false;
-    size -= static_cast<uint32_t>(count);
-    if (m_pSocket->IsEOF()) return true;
-  }
-  return true;
-}
-
-// As ReadData, with what came added to the body. REQUIRES: len <= kPieceSize, and the head is read.
-int TWHttpClient::AppendRead(int len, std::string* body) {
-  const auto size = static_cast<size_t>(len);
-  const std::string_view buffered = SocketAccess::Buffered(m_pSocket);
-  if (buffered.size() >= size) {
-    SocketAccess::Take(m_pSocket, size);
-    Append(buffered.substr(0, size), body);
-    return len;
-  }
-  char piece[kPieceSize];
-  const int count = ReadData(piece, len);
-  if (count > 0) Append({piece, static_cast<size_t>(count)}, body);
-  return count;
-}
-
-// The two bytes after a chunk, whatever they are. Direct reading delivers what has arrived, so one
-// may be missing; through the buffer one is missing where the stream ends or a read failed, and
-// another read would wait once more.
-void TWHttpClient::SkipChunkCrlf() {
-  char ending[2];
-  const int count = ReadData(ending, 2);
-  if (count == 1 && !SocketAccess::IsBuffered(m_pSocket)) ReadData(ending, 1);
-}
-
-// The announced length is ignored: the body ends where the server closes.
-bool TWHttpClient::ReadUntilClose(std::string* body) {
-  for (;;) {
-    const int count = AppendRead(kPieceSize, body);
-    if (count <= 0) return count == 0;
-  }
 }

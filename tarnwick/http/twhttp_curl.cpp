@@ -6,7 +6,7 @@
 
 #include "tarnwick/http/curl_callbacks.h"
 #include "tarnwick/http/curl_request.h"
-#include "tarnwick/http/twhttp.h"
+#include "tarnwick/http/request_parts.h"
 #include "tarnwick/log/twdebuglog.h"
 #include "tarnwick/utils/utils.h"
 
@@ -84,6 +84,34 @@ bool AddHeader(CurlRequest* curl, const std::string& line) {
   return Accept(curl->AddHeader(line) ? CURLE_OK : CURLE_OUT_OF_MEMORY);
 }
 
+bool SetOutput(CurlRequest* curl, FILE* file, std::string* text) {
+  return file != nullptr ? SetOutputFile(curl, file) : SetCurlCallbackOpt(curl, text);
+}
+
+// A GET asks for the path; anything else posts the path, which then is no part of the URL.
+bool SetRequest(CurlRequest* curl, const RequestParts& parts, TW_HTTP_METHOD method, int timeout) {
+  const bool get = method == HTTP_METHOD_GET;
+  std::string url = (parts.https ? "https://" : "http://") + parts.host;
+  if (get) url += (parts.host.empty() ? "" : "/") + parts.path;
+  return Accept(curl->Set(CURLOPT_TIMEOUT, static_cast<long>(timeout))) &&
+         Accept(curl->Set(CURLOPT_USERNAME, parts.user.c_str())) &&
+         Accept(curl->Set(CURLOPT_PASSWORD, parts.password.c_str())) &&
+         Accept(get ? curl->Set(CURLOPT_HTTPGET, 1L)
+                    : curl->Set(CURLOPT_POSTFIELDS, parts.path.c_str())) &&
+         Accept(curl->Set(CURLOPT_PORT, static_cast<long>(parts.port))) &&
+         Accept(curl->Set(CURLOPT_URL, url.c_str())) &&
+         Accept(curl->Set(CURLOPT_USERAGENT, "Quenrith Tarnwick"));
+}
+
+bool SetHeaders(CurlRequest* curl, const RequestParts& parts, TW_HTTP_METHOD method) {
+  const std::string length = IntToString(static_cast<int64_t>(parts.path.size()));
+  return AddHeader(curl, "Content-Type: application/x-www-form-urlencoded; charset=utf-8") &&
+         AddHeader(curl, "Connection: close") &&
+         (method != HTTP_METHOD_POST || AddHeader(curl, "Content-Length: " + length)) &&
+         (parts.cookie.empty() || AddHeader(curl, "Cookie: " + parts.cookie)) &&
+         Accept(curl->Set(CURLOPT_HTTPHEADER, curl->Headers()));
+}
+
 }  // namespace
 
 int TWHttpClient::SendRequestByCurl(TW_HTTP_METHOD method, bool verifyPeer, int timeout) try {
@@ -92,8 +120,11 @@ int TWHttpClient::SendRequestByCurl(TW_HTTP_METHOD method, bool verifyPeer, int 
   if (!curl.Valid()) return HTTP_RET_IO_ERROR;
   m_result = HTTP_RET_IO_ERROR;
   if (!verifyPeer && !SetCurlSSLOpt(&curl)) return m_result;
-  if (!SetCurlOutput(&curl) || !SetCurlRequest(&curl, method, timeout)) return m_result;
-  if (!SetCurlHeaders(&curl, method)) return m_result;
+  const RequestParts parts = Parts(m_strPath);
+  if (!SetOutput(&curl, m_pCurlRespFile, &m_strCurlText) ||
+      !SetRequest(&curl, parts, method, timeout) || !SetHeaders(&curl, parts, method)) {
+    return m_result;
+  }
   const FileWrites writes(m_pCurlRespFile);
   const CURLcode code = curl.Perform();
   if (code == kCertificateNotVerified) m_result = HTTP_RET_CERT_ERROR;
@@ -103,33 +134,4 @@ int TWHttpClient::SendRequestByCurl(TW_HTTP_METHOD method, bool verifyPeer, int 
   return m_result;
 } catch (const std::exception&) {  // memory ran out
   return HTTP_RET_IO_ERROR;
-}
-
-bool TWHttpClient::SetCurlOutput(CurlRequest* curl) {
-  if (m_pCurlRespFile != nullptr) return SetOutputFile(curl, m_pCurlRespFile);
-  return SetCurlCallbackOpt(curl, &m_strCurlText);
-}
-
-// A GET asks for the path; anything else posts the path, which then is no part of the URL.
-bool TWHttpClient::SetCurlRequest(CurlRequest* curl, TW_HTTP_METHOD method, int timeout) {
-  const bool get = method == HTTP_METHOD_GET;
-  std::string url = (m_bHttps ? "https://" : "http://") + m_strHost;
-  if (get) url += (m_strHost.empty() ? "" : "/") + m_strPath;
-  return Accept(curl->Set(CURLOPT_TIMEOUT, static_cast<long>(timeout))) &&
-         Accept(curl->Set(CURLOPT_USERNAME, m_strUser.c_str())) &&
-         Accept(curl->Set(CURLOPT_PASSWORD, m_strPassword.c_str())) &&
-         Accept(get ? curl->Set(CURLOPT_HTTPGET, 1L)
-                    : curl->Set(CURLOPT_POSTFIELDS, m_strPath.c_str())) &&
-         Accept(curl->Set(CURLOPT_PORT, static_cast<long>(m_port))) &&
-         Accept(curl->Set(CURLOPT_URL, url.c_str())) &&
-         Accept(curl->Set(CURLOPT_USERAGENT, "Quenrith Tarnwick"));
-}
-
-bool TWHttpClient::SetCurlHeaders(CurlRequest* curl, TW_HTTP_METHOD method) {
-  const std::string length = IntToString(static_cast<int64_t>(m_strPath.size()));
-  return AddHeader(curl, "Content-Type: application/x-www-form-urlencoded; charset=utf-8") &&
-         AddHeader(curl, "Connection: close") &&
-         (method != HTTP_METHOD_POST || AddHeader(curl, "Content-Length: " + length)) &&
-         (m_strCookie.empty() || AddHeader(curl, "Cookie: " + m_strCookie)) &&
-         Accept(curl->Set(CURLOPT_HTTPHEADER, curl->Headers()));
 }

@@ -1,11 +1,11 @@
-// GET over the client's socket, and the choice of the way by method.
+// GET over the client's socket, and SendRequest, which chooses the transport by the method.
 #define TW_LOG_SOURCE "twhttp"
 
 #include <cstring>
 #include <exception>
 
-#include "tarnwick/http/challenge_words.h"
 #include "tarnwick/http/query_encoding.h"
+#include "tarnwick/http/request_text.h"
 #include "tarnwick/http/twhttp.h"
 #include "tarnwick/log/twdebuglog.h"
 
@@ -17,9 +17,6 @@ namespace {
 // SendRequestByGet.ARequestOfMoreThan2047BytesIsCutThereAndCountsAsSent.
 constexpr size_t kMaxRequest = 2047;
 
-// At least what a GET has besides the client's texts.
-constexpr size_t kFixedOverhead = 80;
-
 }  // namespace
 
 int TWHttpClient::SendRequestByGet() try {
@@ -27,7 +24,10 @@ int TWHttpClient::SendRequestByGet() try {
     TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_DEBUG, "Connection failed!\n");
     return HTTP_RET_IO_ERROR;
   }
-  const std::string request = BuildGetRequest();
+  const std::string path =
+      m_bEncodeQuery ? EncodeQueryValues(m_strPath, m_strEncodeKeep) : m_strPath;
+  const std::string request = GetRequest(Parts(path));
+  m_strAuthorization.clear();                                   // it is for one request
   const size_t length = strnlen(request.c_str(), kMaxRequest);  // a zero byte ends it as well
   if (m_pSocket->WriteData(request.c_str(), static_cast<int>(length)) <= 0) {
     TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_DEBUG, "Write data faild.\n");
@@ -40,40 +40,12 @@ int TWHttpClient::SendRequestByGet() try {
   return HTTP_RET_IO_ERROR;
 }
 
-// The stored authorization is for one request and is gone afterwards.
-std::string TWHttpClient::BuildGetRequest() {
-  const std::string path =
-      m_bEncodeQuery ? EncodeQueryValues(m_strPath, m_strEncodeKeep) : m_strPath;
-  // Without a preference the GET speaks HTTP/1.0: a server may not respond to that in chunks, and
-  // closes after the body (RFC 7230, 3.3.1 and 6.3).
-  const bool http11 = m_httpVersion == HTTP_VERSION_1_1;
-  std::string request;
-  request.reserve(path.size() + m_strCookie.size() + m_strAuthorization.size() + m_strHost.size() +
-                  kFixedOverhead);
-  request.append("GET /").append(path).append(http11 ? " HTTP/1.1\r\n" : " HTTP/1.0\r\n");
-  request.append("User-Agent: Quenrith Tarnwick\r\n");
-  if (!m_strCookie.empty()) request.append("Cookie: ").append(m_strCookie).append("\r\n");
-  if (!m_strAuthorization.empty()) request.append(m_strAuthorization).append("\r\n");
-  m_strAuthorization.clear();
-  if (http11) request.append("Host: ").append(m_strHost).append("\r\n");
-  request.append("\r\n");
-  return request;
-}
-
 int TWHttpClient::SendRequest(TW_HTTP_METHOD method, std::string arg) try {
   if (method != HTTP_METHOD_GET) return SendRequestByPost(arg);
   if (m_bBasicAuth) m_strAuthorization = GenBasicAccessAuth();
   const int result = SendRequestByGet();
-  if (m_result != HTTP_RET_UNAUTHORIZED) return result;
-  if (ContainsIgnoreCase(m_strAuthenticate, "digest")) {
-    m_strAuthorization = GenDigestAccessAuth("GET", "");
-    return SendRequestByGet();
-  }
-  if (ContainsIgnoreCase(m_strAuthenticate, "basic")) {
-    m_strAuthorization = GenBasicAccessAuth();
-    return SendRequestByGet();
-  }
-  return result;
+  if (m_result != HTTP_RET_UNAUTHORIZED || !Authorize("GET")) return result;
+  return SendRequestByGet();
 } catch (const std::exception&) {  // memory ran out
   return HTTP_RET_IO_ERROR;
 }

@@ -7,6 +7,7 @@
 #include "tarnwick/http/twhttp.h"
 #include "tarnwick/log/twdebuglog.h"
 #include "tarnwick/net/request_settings.h"
+#include "tarnwick/platform/text_view.h"
 
 using namespace tarnwick;
 
@@ -64,31 +65,24 @@ int TWHttpClient::CheckContentType() try {
   return HTTP_RET_IO_ERROR;
 }
 
-// Results: false for a line without a name, and for a known name without anything after it.
+// Results: false for a line without a name, and for a kept field without a value.
 bool TWHttpClient::StoreHeader(const char* line) {
   const HeaderLine parsed = ParseHeaderLine(line);
   if (!parsed.hasName) return false;
-  if (parsed.header != Header::kOther && parsed.value.empty()) return false;
-  switch (parsed.header) {
-    case Header::kContentType:
-      m_mapContent.try_emplace(HTTP_CONTENT_TYPE, TrimSpaces(parsed.value));
+  if (parsed.field == nullptr) return true;
+  if (parsed.value.empty()) return false;
+  switch (parsed.field->as) {
+    case KeptAs::kContent:
+      m_mapContent.try_emplace(parsed.field->key, Trim(parsed.value, " "));
       break;
-    case Header::kContentLength:
-      m_mapContent.try_emplace(HTTP_CONTENT_LENGTH, TrimSpaces(parsed.value));
-      break;
-    case Header::kContentRange:
-      m_mapContent.try_emplace(HTTP_CONTENT_RANGE, TrimSpaces(parsed.value));
-      break;
-    case Header::kSetCookie:
+    case KeptAs::kCookie:
       m_strCookie = ParseCookie(parsed.value);
       break;
-    case Header::kAuthenticate:
+    case KeptAs::kChallenge:
       m_strAuthenticate = parsed.value;
       break;
-    case Header::kTransferEncoding:
-      m_strTransferEncoding = TrimSpaces(parsed.value);
-      break;
-    case Header::kOther:
+    case KeptAs::kTransferEncoding:
+      m_strTransferEncoding = Trim(parsed.value, " ");
       break;
   }
   return true;

@@ -15,8 +15,6 @@ using namespace tarnwick;
 namespace {
 
 constexpr char kSendHttpGet[] = "SendHttpGet";
-constexpr char kSendHttpPost[] = "SendHttpPost";
-constexpr char kSendHttpsGet[] = "SendHttpsGet";
 
 // Sends the request and checks its status.
 bool Fetch(TWHttpClient* client) {
@@ -33,8 +31,7 @@ bool Fetch(TWHttpClient* client) {
   return false;
 }
 
-// Reads until the server closes.
-bool ReadBody(TWHttpClient* client, std::string* body) {
+bool ReadUntilClose(TWHttpClient* client, std::string* body) {
   char piece[8192];
   int count;
   while ((count = client->ReadData(piece, sizeof(piece))) > 0) {
@@ -45,79 +42,60 @@ bool ReadBody(TWHttpClient* client, std::string* body) {
   return false;
 }
 
-int GetJson(const std::string& host, int port, std::string path, Json::Value& result, int timeout,
-            bool encodeQuery) {
+}  // namespace
+
+int SendHttpGet(const std::string& host, int port, std::string path, Json::Value& result,
+                int timeout, bool encodeQuery) try {
   if (!encodeQuery) RemoveChar(path, '\n');
   TWHttpClient client(host, port, path, "", "", timeout, false, true, encodeQuery, true,
                       HTTP_VERSION_NONE, "");
   std::string body;
-  if (!Fetch(&client) || !ReadBody(&client, &body)) return -1;
+  if (!Fetch(&client) || !ReadUntilClose(&client, &body)) return -1;
   if (body.empty()) {
-    TW_LOG_AS(kSendHttpGet, LOG_CATEG_HTTP, LOG_LEVEL_ERROR, "Read Buffer Error\n");
+    TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_ERROR, "Read Buffer Error\n");
     return -1;
   }
   if (JsonParse(body, result) != 0) {
-    TW_LOG_AS(kSendHttpGet, LOG_CATEG_HTTP, LOG_LEVEL_ERROR, "Failed to parse json [%s].\n",
-              tarnwick::PeerText(body.c_str()).Get());
+    TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_ERROR, "Failed to parse json [%s].\n",
+           tarnwick::PeerText(body.c_str()).Get());
     return -2;
   }
   return 0;
+} catch (const std::exception&) {  // memory ran out
+  return -1;
 }
 
-int PostForm(const std::string& host, int port, const std::string& path, const std::string& body,
-             const std::string& cookie, int timeout) {
+int SendHttpPost(const std::string& host, int port, const std::string& path,
+                 const std::string& body, const std::string& cookie, int timeout) try {
   TWHttpClient client(host, port, path, "", "", timeout, false, true, true, true, HTTP_VERSION_NONE,
                       "");
   if (cookie.empty()) {
-    TW_LOG_AS(kSendHttpPost, LOG_CATEG_HTTP, LOG_LEVEL_WARN, "[Warning] Cannot set balnk cookie\n");
+    TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_WARN, "[Warning] Cannot set balnk cookie\n");
   } else {
     client.SetCookie(cookie);
   }
   if (client.SendRequestBySocketPost(body) != HTTP_RET_OK) {
-    TW_LOG_AS(kSendHttpPost, LOG_CATEG_HTTP, LOG_LEVEL_ERROR, "Send HTTP Request Error\n");
+    TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_ERROR, "Send HTTP Request Error\n");
     return -1;
   }
   return 0;
+} catch (const std::exception&) {  // memory ran out
+  return -1;
 }
 
-int GetJsonOverTls(const std::string& host, int port, const std::string& path, Json::Value& result,
-                   int timeout) {
+int SendHttpsGet(const std::string& host, int port, const std::string& path, Json::Value& result,
+                 int timeout) try {
   TWHttpClient client(host, port, path, "", "", timeout, true, true, true, true, HTTP_VERSION_NONE,
                       "");
   const int sent = client.SendRequestByCurl(HTTP_METHOD_GET, true, timeout);
   if (sent != HTTP_RET_OK) return sent == HTTP_RET_CERT_ERROR ? -2 : -1;
   const std::string text = client.GetCurlText();
   if (JsonParse(text, result) != 0) {
-    TW_LOG_AS(kSendHttpsGet, LOG_CATEG_HTTP, LOG_LEVEL_ERROR,
-              "Failed to parse json. Result is [%s]\n", tarnwick::PeerText(text.c_str()).Get());
+    TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_ERROR, "Failed to parse json. Result is [%s]\n",
+           tarnwick::PeerText(text.c_str()).Get());
     return -3;
   }
   return 0;
-}
-
-// Memory that runs out fails the call like anything else: no exception reaches a caller.
-template <typename Operation>
-int CatchAll(Operation operation) {
-  try {
-    return operation();
-  } catch (const std::exception&) {
-    return -1;
-  }
-}
-
-}  // namespace
-
-int SendHttpGet(const std::string& host, int port, std::string path, Json::Value& result,
-                int timeout, bool encodeQuery) {
-  return CatchAll([&] { return GetJson(host, port, path, result, timeout, encodeQuery); });
-}
-
-int SendHttpPost(const std::string& host, int port, const std::string& path,
-                 const std::string& body, const std::string& cookie, int timeout) {
-  return CatchAll([&] { return PostForm(host, port, path, body, cookie, timeout); });
-}
-
-int SendHttpsGet(const std::string& host, int port, const std::string& path, Json::Value& result,
-                 int timeout) {
-  return CatchAll([&] { return GetJsonOverTls(host, port, path, result, timeout); });
+} catch (const std::exception&) {  // memory ran out
+  return -1;
 }

@@ -3,23 +3,17 @@
 
 #include <exception>
 
-#include "tarnwick/http/twhttp.h"
+#include "tarnwick/http/request_text.h"
 #include "tarnwick/log/twdebuglog.h"
-#include "tarnwick/utils/utils.h"
 
-namespace {
-
-// 128 GiB. Kept as it is: callers may depend on it; pinned by the tests of OpenRawDataUpload.
-constexpr int64_t kUploadLength = int64_t{1} << 37;
-
-}  // namespace
+using namespace tarnwick;
 
 int TWHttpClient::OpenRawDataUpload() try {
   if (!Reconnect()) {
     TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_ERROR, "Connection failed!\n");
     return HTTP_RET_IO_ERROR;
   }
-  const std::string head = BuildUploadHead();
+  const std::string head = UploadRequest(Parts(m_strPath));
   if (m_pSocket->WriteData(head.data(), static_cast<int>(head.size())) <= 0) {
     TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_ERROR, "Write data faild.\n");
     return HTTP_RET_IO_ERROR;
@@ -28,21 +22,4 @@ int TWHttpClient::OpenRawDataUpload() try {
   return HTTP_RET_OK;
 } catch (const std::exception&) {  // memory ran out
   return HTTP_RET_IO_ERROR;
-}
-
-std::string TWHttpClient::BuildUploadHead() const {
-  std::string head = "POST /";
-  head.append(m_strPath).append(" HTTP/1.1\r\n");
-  head.append("Host: ").append(m_strHost).append(":").append(IntToString(m_port)).append("\r\n");
-  if (!m_strCookie.empty()) head.append("Cookie: ").append(m_strCookie).append("\r\n");
-  head +=
-      "Content-Type: multipart/form-data; "
-      "boundary=-----------QUENMULTIPART_BOUNDARY-----------\r\n";
-  head.append("Content-Length: ").append(IntToString(kUploadLength)).append("\r\n");
-  // RFC 7230, 3.2.4, forbids a blank in front of the colon. Kept as it is: callers may depend on
-  // it; pinned by OpenRawDataUpload.WithAnEmptyCookieTheHeadHasNoCookieLine.
-  head += "Cache-Control :no-cache\r\n";
-  head += "Connection: keep-alive\r\n";
-  head += "\r\n";
-  return head;
 }

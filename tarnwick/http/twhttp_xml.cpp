@@ -10,8 +10,7 @@
 #include <exception>
 
 #include "tarnwick/http/curl_callbacks.h"
-#include "tarnwick/http/curl_request.h"
-#include "tarnwick/http/twhttp.h"
+#include "tarnwick/http/curl_options.h"
 #include "tarnwick/http/xml_response.h"
 #include "tarnwick/log/twdebuglog.h"
 #include "tarnwick/platform/unique.h"
@@ -47,19 +46,81 @@ UniqueFile OpenTemporaryFile() {
 
 constexpr char kSetFile[] = "Failed to set file";
 
+// Without a host the path is not used either.
+bool SetTarget(CurlRequest* curl, const RequestParts& parts) {
+  const std::string host = PlainHostUrl(parts);
+  const std::string url = parts.host.empty() ? host : host + parts.path;
+  return SetCurlCredentials(curl, parts) &&
+         curl->Set(CURLOPT_URL, url.c_str(), "Failed to set url=", url.c_str());
+}
+
+bool SetHeaders(CurlRequest* curl, bool forUpload) {
+  // It speaks of the request, not of the headers. Messages are never reworded; pinned by
+  // XmlSenders.EachRefusedOptionHasItsLineAndEndsTheRequest.
+  constexpr char kFailed[] = "Failed to set custom request";
+  // The empty Expect keeps libcurl from waiting a second for a 100 (Continue), RFC 7231, 5.1.1.
+  return curl->AddHeader("Accept: */*", kFailed) &&
+         curl->AddHeader("Content-Type: application/xml; charset=UTF-8", kFailed) &&
+         (!forUpload || curl->AddHeader("Expect:", kFailed)) &&
+         curl->Set(CURLOPT_HTTPHEADER, curl->Headers(), kFailed);
+}
+
+bool SetPut(CurlRequest* curl) {
+#pragma GCC diagnostic push
+#pragma GCC diagnostic ignored "-Wdeprecated-declarations"
+  // CURLOPT_PUT is deprecated since libcurl 7.12.1, and still set; pinned by
+  // XmlSenders.TheOptionsAreSetInOrder.
+  return curl->Set(CURLOPT_UPLOAD, 1L, "Failed to set upload=", "1") &&
+         curl->Set(CURLOPT_PUT, 1L, "Failed to set put=", "1");
+#pragma GCC diagnostic pop
+}
+
+bool SetWriter(CurlRequest* curl) {
+  return curl->Set(CURLOPT_WRITEFUNCTION, CurlBufferWrite, "Failed to set WRITEFUNCTION");
+}
+
+// m_pRespBuf and m_respLen, which lie side by side.
+CurlMemBuffer* CollectedBody(char** data) {
+  return reinterpret_cast<CurlMemBuffer*>(data);
+}
+
+// The response's body goes after what an earlier request has left; pinned by
+// GetResponseXML.TwoGetsInARowLeaveBothBodiesWhichTogetherAreNoDocument.
+bool SetOutput(CurlRequest* curl, CurlMemBuffer* body, const char* message = kSetFile) {
+  return curl->Set(CURLOPT_WRITEDATA, body, message);
+}
+int Failed(const char* what) {
+  TW_LOG_AS("SendReqByXMLPut", LOG_CATEG_HTTP, LOG_LEVEL_DEBUG, "%s\n", what);
+  return -1;
+}
+
+// Writes the document to `file`, a temporary one, for libcurl to read. Results: the document's size
+// in bytes; -1 after a failure, which is logged.
+int WriteDocument(xmlDoc* doc, UniqueFile* file) {
+  if (doc == nullptr) return Failed("Empty XML document");
+  *file = OpenTemporaryFile();
+  if (!*file) return Failed("Failed to fopen temp file");
+  const int size = xmlDocDump(file->get(), doc);
+  if (size < 0) return Failed("Failed to write xml document to temp file");
+  rewind(file->get());
+  return size;
+}
+
+bool SetInput(CurlRequest* curl, FILE* file, int size) {
+  return curl->Set(CURLOPT_READDATA, file, kSetFile) &&
+         curl->Set(CURLOPT_INFILESIZE_LARGE, static_cast<curl_off_t>(size),
+                   "Failed to set file size");
+}
+
 }  // namespace
 
 int TWHttpClient::SendReqByXMLGet(int timeout) try {
-  CurlRequest curl(__func__);
-  if (!curl.Valid()) return HTTP_RET_IO_ERROR;
-  m_result = HTTP_RET_IO_ERROR;
-  if (!curl.Set(CURLOPT_TIMEOUT, static_cast<long>(timeout), "Failed to set timeout") ||
-      !SetCurlCredentials(&curl) || !SetXmlUrl(&curl) ||
-      !curl.Set(CURLOPT_HTTPAUTH, CURLAUTH_BASIC | CURLAUTH_DIGEST, "Failed to set auth") ||
-      !SetXmlWriter(&curl) || !SetXmlOutput(&curl, kSetFile)) {
-    return m_result;
-  }
-  return PerformByCurl(&curl);
+  const RequestParts parts = Parts(m_strPath);
+  return PerformByCurl(__func__, &m_result, &m_connState, [&](CurlRequest* curl) {
+    return curl->Set(CURLOPT_TIMEOUT, static_cast<long>(timeout), "Failed to set timeout") &&
+           SetTarget(curl, parts) && SetCurlAuth(curl) && SetWriter(curl) &&
+           SetOutput(curl, CollectedBody(&m_pRespBuf));
+  });
 } catch (const std::exception&) {  // memory ran out
   return HTTP_RET_IO_ERROR;
 }
@@ -70,70 +131,40 @@ int TWHttpClient::SendReqByXMLPost(xmlDoc*& doc) try {
     TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_DEBUG, "Empty xml document\n");
     return HTTP_RET_IO_ERROR;
   }
-  CurlRequest curl(__func__);
-  if (!curl.Valid()) return HTTP_RET_IO_ERROR;
-  m_result = HTTP_RET_IO_ERROR;
-  if (!SetCurlCredentials(&curl) || !SetXmlUrl(&curl) || !SetXmlHeaders(&curl, false) ||
-      !curl.Set(CURLOPT_POSTFIELDS, body, "Failed to set POST field") || !SetXmlWriter(&curl) ||
-      !SetXmlOutput(&curl, kSetFile)) {
-    return m_result;
-  }
-  return PerformByCurl(&curl);
+  const RequestParts parts = Parts(m_strPath);
+  return PerformByCurl(__func__, &m_result, &m_connState, [&](CurlRequest* curl) {
+    return SetTarget(curl, parts) && SetHeaders(curl, false) &&
+           curl->Set(CURLOPT_POSTFIELDS, body, "Failed to set POST field") && SetWriter(curl) &&
+           SetOutput(curl, CollectedBody(&m_pRespBuf));
+  });
 } catch (const std::exception&) {  // memory ran out
   return HTTP_RET_IO_ERROR;
 }
 
 int TWHttpClient::SendReqByXMLPut(xmlDoc*& doc) try {
-  CurlRequest curl(__func__);
-  if (!curl.Valid()) return HTTP_RET_IO_ERROR;
-  m_result = HTTP_RET_IO_ERROR;
-  if (!SetCurlCredentials(&curl) || !SetXmlUrl(&curl) || !SetXmlHeaders(&curl, true) ||
-      !curl.Set(CURLOPT_READFUNCTION, CurlFileRead, "Failed to set READFUNCTION") ||
-      !SetXmlWriter(&curl) || !SetCurlPut(&curl)) {
-    return m_result;
-  }
-  if (doc == nullptr) {
-    TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_DEBUG, "Empty XML document\n");
-    return m_result;
-  }
-  const UniqueFile file = OpenTemporaryFile();
-  if (!file) {
-    TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_DEBUG, "Failed to fopen temp file\n");
-    return m_result;
-  }
-  return PutXmlFile(&curl, doc, file.get());
+  const RequestParts parts = Parts(m_strPath);
+  UniqueFile file;
+  return PerformByCurl(__func__, &m_result, &m_connState, [&](CurlRequest* curl) {
+    if (!SetTarget(curl, parts) || !SetHeaders(curl, true) ||
+        !curl->Set(CURLOPT_READFUNCTION, CurlFileRead, "Failed to set READFUNCTION") ||
+        !SetWriter(curl) || !SetPut(curl)) {
+      return false;
+    }
+    const int size = WriteDocument(doc, &file);
+    return size >= 0 && SetInput(curl, file.get(), size) &&
+           SetOutput(curl, CollectedBody(&m_pRespBuf));
+  });
 } catch (const std::exception&) {  // memory ran out
   return HTTP_RET_IO_ERROR;
 }
 
-// REQUIRES: `file` is open for writing and reading.
-int TWHttpClient::PutXmlFile(CurlRequest* curl, xmlDoc* doc, FILE* file) {
-  const int size = xmlDocDump(file, doc);
-  if (size < 0) {
-    TW_LOG_AS("SendReqByXMLPut", LOG_CATEG_HTTP, LOG_LEVEL_DEBUG,
-              "Failed to write xml document to temp file\n");
-    return m_result;
-  }
-  rewind(file);
-  if (!curl->Set(CURLOPT_READDATA, file, kSetFile) ||
-      !curl->Set(CURLOPT_INFILESIZE_LARGE, static_cast<curl_off_t>(size),
-                 "Failed to set file size") ||
-      !SetXmlOutput(curl, kSetFile)) {
-    return m_result;
-  }
-  return PerformByCurl(curl);
-}
-
 int TWHttpClient::SendReqByXMLDelete() try {
-  CurlRequest curl(__func__);
-  if (!curl.Valid()) return HTTP_RET_IO_ERROR;
-  m_result = HTTP_RET_IO_ERROR;
-  if (!SetCurlCredentials(&curl) || !SetXmlUrl(&curl) ||
-      !curl.Set(CURLOPT_CUSTOMREQUEST, "DELETE", "Failed to setopt") || !SetXmlWriter(&curl) ||
-      !SetXmlOutput(&curl, "Failed to set WRITEDATA")) {
-    return m_result;
-  }
-  return PerformByCurl(&curl);
+  const RequestParts parts = Parts(m_strPath);
+  return PerformByCurl(__func__, &m_result, &m_connState, [&](CurlRequest* curl) {
+    return SetTarget(curl, parts) &&
+           curl->Set(CURLOPT_CUSTOMREQUEST, "DELETE", "Failed to setopt") && SetWriter(curl) &&
+           SetOutput(curl, CollectedBody(&m_pRespBuf), "Failed to set WRITEDATA");
+  });
 } catch (const std::exception&) {  // memory ran out
   return HTTP_RET_IO_ERROR;
 }
@@ -151,42 +182,4 @@ bool TWHttpClient::GetResponseXML(xmlDoc*& doc) {
   if (doc != nullptr) return true;
   TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_DEBUG, "Failed to parse response to XML\n");
   return false;
-}
-
-// Without a host the path is not used either.
-bool TWHttpClient::SetXmlUrl(CurlRequest* curl) {
-  const std::string url = m_strHost.empty() ? PlainHostUrl() : PlainHostUrl() + m_strPath;
-  return curl->Set(CURLOPT_URL, url.c_str(), "Failed to set url=", url.c_str());
-}
-
-bool TWHttpClient::SetXmlHeaders(CurlRequest* curl, bool forUpload) {
-  // It speaks of the request, not of the headers. Messages are never reworded; pinned by
-  // XmlSenders.EachRefusedOptionHasItsLineAndEndsTheRequest.
-  constexpr char kFailed[] = "Failed to set custom request";
-  // The empty Expect keeps libcurl from waiting a second for a 100 (Continue), RFC 7231, 5.1.1.
-  return curl->AddHeader("Accept: */*", kFailed) &&
-         curl->AddHeader("Content-Type: application/xml; charset=UTF-8", kFailed) &&
-         (!forUpload || curl->AddHeader("Expect:", kFailed)) &&
-         curl->Set(CURLOPT_HTTPHEADER, curl->Headers(), kFailed);
-}
-
-bool TWHttpClient::SetCurlPut(CurlRequest* curl) {
-#pragma GCC diagnostic push
-#pragma GCC diagnostic ignored "-Wdeprecated-declarations"
-  // CURLOPT_PUT is deprecated since libcurl 7.12.1, and still set; pinned by
-  // XmlSenders.TheOptionsAreSetInOrder.
-  return curl->Set(CURLOPT_UPLOAD, 1L, "Failed to set upload=", "1") &&
-         curl->Set(CURLOPT_PUT, 1L, "Failed to set put=", "1");
-#pragma GCC diagnostic pop
-}
-
-bool TWHttpClient::SetXmlWriter(CurlRequest* curl) {
-  return curl->Set(CURLOPT_WRITEFUNCTION, CurlBufferWrite, "Failed to set WRITEFUNCTION");
-}
-
-// The response's body goes after what an earlier request has left; pinned by
-// GetResponseXML.TwoGetsInARowLeaveBothBodiesWhichTogetherAreNoDocument. The two fields are side
-// by side as a CurlMemBuffer does.
-bool TWHttpClient::SetXmlOutput(CurlRequest* curl, const char* message) {
-  return curl->Set(CURLOPT_WRITEDATA, reinterpret_cast<CurlMemBuffer*>(&m_pRespBuf), message);
 }

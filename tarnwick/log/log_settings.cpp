@@ -3,9 +3,6 @@
 
 #include <fcntl.h>
 
-#include <algorithm>
-#include <climits>
-#include <cstdlib>
 #include <cstring>
 #include <exception>
 
@@ -14,6 +11,7 @@
 #include "tarnwick/platform/file_lock.h"
 #include "tarnwick/platform/qlibcfile.h"
 #include "tarnwick/platform/settings_file.h"
+#include "tarnwick/platform/text_view.h"
 #include "tarnwick/platform/unique.h"
 
 using namespace tarnwick;
@@ -24,12 +22,6 @@ constexpr char kSettingsFile[] = "/var/packages/Tarnwick/etc/settings.conf";
 constexpr char kLevelsKey[] = "tw_dbglog_settings";
 constexpr char kTimeScaleKey[] = "tw_dbglog_time_scale";
 constexpr char kLineFormat[] = "%s=\"%s\"\n";
-
-// The same number on every word size: a long of 64 bits could wrap into the range of a level.
-int ToInt(const char* text) {
-  const long value = std::strtol(text, nullptr, 10);
-  return static_cast<int>(std::clamp<long>(value, INT_MIN, INT_MAX));
-}
 
 }  // namespace
 

@@ -3,16 +3,18 @@
 //
 // A daemon logs with TW_LOG:
 //
-//   #define TW_LOG_SOURCE "camerad"  // this file's name in its log lines
+//   #define TW_LOG_SOURCE "camerad"  // the source that its log lines name
 //   #include "tarnwick/log/twdebuglog.h"
 //   ...
-//   TW_LOG(LOG_CATEG_CAMERA, LOG_LEVEL_WARN, "camera %d does not answer\n", id);
+//   TW_LOG(LOG_CATEG_CAMERA, LOG_LEVEL_WARN, "camera %d does not respond\n", id);
 //
 // which appends to /var/log/tarnwick/tarnwick.log a line such as
 //
-//   Mar  5 14:03:09 [812][camera][warn] camerad:57:Probe(): camera 3 does not answer
+//   Mar  5 14:03:09 [812][camera][warn] camerad:57:Probe(): camera 3 does not respond
 //
-// when the shared record lets the category write at that level.
+// when the shared record lets the category write at that level. Several files may name one source,
+// as the library's own do (all of TWHttpClient is "twhttp"): find a line by its function and
+// message.
 #ifndef TARNWICK_LOG_TWDEBUGLOG_H_
 #define TARNWICK_LOG_TWDEBUGLOG_H_
 
@@ -104,7 +106,7 @@ enum LOG_CATEG : int {
   LOG_CATEG_SHARE_LIB = 73,
 };
 
-// How many there are, and levels in the record.
+// How many categories there are, and levels in the record.
 constexpr int LOG_CATEG_COUNT = 74;
 
 // How severe a line is; the lower, the more severe.
@@ -161,12 +163,14 @@ TARNWICK_API const char* Enum2String<LOG_LEVEL>(LOG_LEVEL value);
 // The record of levels that all processes of the product share, byte for byte: the flag at offset
 // 0, three reserved bytes, then the 74 levels as 32-bit integers in the host's byte order.
 //
+// It is a System V shared memory segment, which one process of the product creates before the
+// daemons start; the library never does. Nothing here is logged.
 // Threads: the record has no lock. Each level is one aligned word, so a reader sees the old or the
 //   new level; it may see some levels old and some new while a process changes them.
 class TARNWICK_API TWDbgLogCfg {
  public:
   // Sets the flag to false and every level to notice, then calls LoadDbgLogSettings. The argument
-  // is not used; product code passes it.
+  // is ignored.
   // Results: those of LoadDbgLogSettings.
   int Init(int unused);
 
@@ -177,21 +181,24 @@ class TARNWICK_API TWDbgLogCfg {
   // not a number is 0. The flag is set by "yes" exactly, and cleared by any other value.
   // Results: 0; -1 when one of the keys is missing or empty, the file unreadable or memory
   //   short. What is missing stays as it is in the record; the levels are loaded even when the
-  //   flag's key is missing.
+  //   flag's key is missing. errno after -1 is that of QLIBCFileGetKeyValue; a key that is only
+  //   missing leaves it as it was.
   int LoadDbgLogSettings();
 
   // Writes both keys from this record into the settings file, which is created when missing.
   //
-  // Results: 0; -1 when one of the two could not be written (the other may have been).
+  // Results: 0; -1 when one of the two could not be written (the other may have been), with the
+  //   errno of QLIBCFileSetKeyValue.
   // Blocks while another process holds the lock of the settings file or of its directory.
   int SaveDbgLogSettings();
 
-  // True when log time stamps carry milliseconds.
+  // True when the time stamps of all log lines have milliseconds; SetTimeScale changes it for all
+  // processes at once.
   bool TimeScale() const;
   void SetTimeScale(bool milliseconds);
 
-  // The most verbose level that `categ` writes. REQUIRES for SetLevel: a category of LOG_CATEG; any
-  // other is ignored. Level gives notice for a category outside LOG_CATEG.
+  // The most verbose level that `categ` writes; SetLevel changes it for all processes at once. For
+  // a category outside LOG_CATEG Level returns notice, and SetLevel does nothing.
   int Level(LOG_CATEG categ) const {
     if (categ < 0 || categ >= LOG_CATEG_COUNT) return LOG_LEVEL_NOTICE;
     return __atomic_load_n(&m_levels[categ], __ATOMIC_RELAXED);
@@ -207,58 +214,65 @@ class TARNWICK_API TWDbgLogCfg {
 static_assert(sizeof(TWDbgLogCfg) == 300, "every process of the product shares this layout");
 
 // The attached record, or null when there is none. Set when the library is loaded, cleared when it
-// is unloaded; there is no retry in between, so the record must exist before a daemon starts.
+// is unloaded; there is no retry in between: a daemon that starts before the record exists logs at
+// notice for its whole life.
 TARNWICK_API extern TWDbgLogCfg* g_pDbgLogCfg;
 
 // The System V key of the record's segment: 0x18180004.
 // Threads: any.
 TARNWICK_API key_t TWShmDbgLogIPCKey();
 
-// Attaches the record's segment, read-write; never creates it.
-// Results: the record, to be released with shmdt; null when there is no segment or it may not be
-//   attached.
-// Threads: any; each call attaches once more.
+// Attaches the record's segment once more, read-write; never creates it.
+// Results: the record, which the caller releases with shmdt(2); null when there is no segment or it
+//   may not be attached.
+// Threads: any.
 TARNWICK_API TWDbgLogCfg* TWShmDbgLogCfgAt();
 
 // Sets g_pDbgLogCfg to TWShmDbgLogCfgAt(). Runs by itself when the library is loaded; a process
 // that creates the record itself calls it afterwards. A record that is attached already is not
 // detached.
-// Threads: not while other threads log.
+// REQUIRES: no other thread logs.
 TARNWICK_API void InitDbgCfg();
 
 // Detaches the record, if there is one, and sets g_pDbgLogCfg to null. Runs by itself when the
 // library is unloaded by dlclose. At the end of a process it does not: other threads may still log,
 // and the kernel detaches the record.
-// Threads: not while other threads log.
+// REQUIRES: no other thread logs.
 TARNWICK_API void FreeDbgCfg();
 
 // Appends one line to a log file. Use TW_LOG, which asks the levels first.
 //
 // Arguments: `categ` and `level` are the names to print; when either is null neither is printed.
 //   `file` is the source's name or path, of which the part after the last "/" or "\\" is printed.
-//   `format` is a printf format and ends in "\n" itself.
+//   `format` is a printf(3) format and ends in "\n" itself.
 // The line: time, "[pid]" (or "[pid][thread id]" outside the main thread), "[category][level]",
-//   then "file:line:function(): " and the message. Milliseconds are printed when the shared record
-//   says so.
-// Failures: a file that cannot be opened, one that is not regular (errno ENXIO: a FIFO or a device
-//   is neither waited for nor written), a stream that cannot be made for it, and an undefined
-//   `type` (errno EFAULT), are reported to the system log; a lock that cannot be had drops the line
-//   silently. A full disk and the process's limit on file sizes cut the line or lose it; no SIGXFSZ
-//   comes of it. errno is kept.
+//   then "file:line:function(): " and the message, as tarnwick.log(5) tells. Milliseconds are
+//   printed when the shared record says so.
+// Failures: a file that cannot be opened, one that is not regular, a stream that cannot be made for
+//   it, and an undefined `type`, are reported to syslog(3) with priority LOG_ERR and the error
+//   number: EFAULT for the type, EISDIR for a directory, ENXIO for any other file that is not
+//   regular (a FIFO, a device, a terminal or a socket, also at the end of a link, is neither waited
+//   for nor written), else that of open(2) or of the stream's allocation. A lock that cannot be had
+//   drops the line silently. A full disk and the process's limit on file sizes cut the line or lose
+//   it; no SIGXFSZ comes of it. errno is kept.
+// Blocks: while another process or thread holds the lock of the file, without a limit, and while
+//   the disk takes its time to open it.
 // Threads: any thread of any process; lines never mix, because each is written under an exclusive
-//   flock of the file. Blocks while another process or thread holds that lock.
-// Fork: a process may fork at any moment, and the child may log. It has none of the open log files.
-//   The fork waits while another thread opens or closes a log file, reads the time zone or reports
-//   to the system log, for 100 milliseconds at most. When one of the last two has not ended by
-//   then, the child's lines have no time, and it does not report failures: it would wait for ever.
-// End of the process: a thread may log while another one calls exit.
+//   flock(2) of the file.
+// Fork: a process may fork at any moment, and the child may log. It has none of the open log files
+//   and holds no lock. The fork waits while another thread opens or closes a log file, reads the
+//   time zone or reports to the system log, for 100 milliseconds at most. When one of the last two
+//   has not ended by then, the child's lines have no time, and it does not report failures: it
+//   would wait for ever.
+// End of the process: a thread may log while another one calls exit: nothing that a log call reads
+//   is destroyed there.
 // Cancellation: it is no cancellation point; nor are the functions of the record and the settings.
 TARNWICK_API void TWPrintf(LOG_TYPE type, const char* categ, const char* level, const char* file,
                            int line, const char* func, const char* format, ...)
     __attribute__((format(printf, 7, 8)));
 
 // The part of `path` after the last "/" or "\\"; the whole path when it holds neither, and an empty
-// text when it ends in one. Throws std::bad_alloc when memory runs out.
+// string when it ends in one. Throws std::bad_alloc when memory runs out.
 // Threads: any.
 TARNWICK_API std::string GetFileBaseName(std::string path);
 
@@ -270,25 +284,26 @@ inline bool TWLogEnabled(LOG_CATEG categ, LOG_LEVEL level) {
   return level <= (cfg != nullptr ? cfg->Level(categ) : static_cast<int>(LOG_LEVEL_NOTICE));
 }
 
-// Enum2String for TW_LOG: "unknown" when there is no memory for the names, which the first call of
-// a process builds. A log call throws nothing.
+// Enum2String for TW_LOG, which throws nothing: "unknown" also when there is no memory for the
+// names, which the first call of a process builds.
 // Threads: any.
 TARNWICK_API const char* TWLogName(LOG_CATEG value) noexcept;
 TARNWICK_API const char* TWLogName(LOG_LEVEL value) noexcept;
 
-// The source name that TW_LOG prints. A source file gives its own bare name by defining the macro
-// before its first include; without that its path is used, of which the base name is printed.
+// The source that TW_LOG prints. A file defines the macro before its first include; without that
+// its path is used, of which the base name is printed.
 #ifndef TW_LOG_SOURCE
 #define TW_LOG_SOURCE __FILE__
 #endif
 
-// TW_LOG(category, level, format, ...) writes a line to the main log when the category's level lets
-// it through. One statement, safe after `if` and before `else`; while the level is off, the
-// arguments after `level` are not evaluated.
+// TW_LOG(category, level, format, ...) writes a line to the main log when TWLogEnabled says so for
+// the LOG_CATEG and the LOG_LEVEL. One statement, safe after `if` and before `else`; while the
+// level is off, the arguments after `level` are not evaluated. `format` is a printf(3) format with
+// its own "\n".
 #define TW_LOG(categ, level, ...) TW_LOG_AS(__func__, categ, level, __VA_ARGS__)
 
-// TW_LOG under the name of another function: for a helper that logs for the operation it is a step
-// of, so that readers of the log find the name that they call.
+// TW_LOG under the name of another function, `func`: for a helper that logs for the operation it is
+// a step of, so that readers of the log find the name that they call.
 #define TW_LOG_AS(func, categ, level, ...)                                                 \
   do {                                                                                     \
     const LOG_CATEG twLogCateg = (categ);                                                  \

@@ -8,7 +8,7 @@
 
 #include "tarnwick/log/twdebuglog.h"
 #include "tarnwick/platform/cancel.h"
-#include "tarnwick/platform/sigpipe_guard.h"
+#include "tarnwick/platform/signal_guard.h"
 
 using namespace tarnwick;
 
@@ -80,7 +80,7 @@ int SSLSocket::Handshake() {
   SSL_clear(m_pSSL);
   SSL_set_fd(m_pSSL, m_sockFd);
   const NoCancel no_cancel;
-  SigpipeGuard guard;
+  SignalGuard guard(SIGPIPE);
   const int result = SSL_connect(m_pSSL);
   if (result != 1) guard.DiscardPending();
   return result;
@@ -90,7 +90,7 @@ void SSLSocket::Disconnect() {
   if (IsConnected() && m_pSSL != nullptr) {
     ERR_clear_error();
     const NoCancel no_cancel;
-    SigpipeGuard guard;
+    SignalGuard guard(SIGPIPE);
     if (SSL_shutdown(m_pSSL) < 0) guard.DiscardPending();
     SSL_clear(m_pSSL);
   }

@@ -4,6 +4,10 @@
 // Certificates are not verified, no server name is sent and no certificate shown, and OpenSSL's
 // default protocols and ciphers apply: it protects the bytes from listeners, and does not prove who
 // answers.
+//
+// Failures that TLS reports are logged in category socket at error, as source sslsocket, such as
+// "Failed to established SSL conn. with error [1] [...]." and, for a read that failed or that a
+// fatal alert of the peer ended, "Read error [N] [...].".
 #ifndef TARNWICK_NET_SSLSOCKET_H_
 #define TARNWICK_NET_SSLSOCKET_H_
 
@@ -14,6 +18,7 @@
 struct ssl_ctx_st;
 struct ssl_st;
 
+// A TWSocket whose bytes are encrypted.
 // Threads: one thread uses an object at a time. OpenSSL is initialised when the library is loaded.
 class TARNWICK_API SSLSocket : public TWSocket {
  public:
@@ -30,12 +35,13 @@ class TARNWICK_API SSLSocket : public TWSocket {
   int Connect() override;
 
   // Sends the close notice on a connection that is still taken for connected, does not wait for the
-  // peer's, and closes the descriptor.
+  // peer's, and closes the descriptor. With a negative time-out it waits while the peer takes
+  // nothing.
   void Disconnect() override;
 
-  // As TWSocket::DoSelect, but 0 at once for SELECT_READ while decrypted bytes are waiting; so
-  // HasDataToRead returns false just then, and ReadData returns them without a wait. After the
-  // peer's close notice ReadData does not wait, but DoSelect and HasDataToRead do, as on TCP.
+  // As TWSocket::DoSelect, but 0 at once for SELECT_READ while decrypted bytes are waiting; then
+  // HasDataToRead returns false, and ReadData returns them without a wait. After the peer's close
+  // notice ReadData does not wait; DoSelect and HasDataToRead do, as on TCP.
   int DoSelect(SELECT_TYPE type) override;
 
   // Reads at most `len` decrypted bytes.

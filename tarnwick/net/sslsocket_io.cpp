@@ -10,7 +10,7 @@
 #include "tarnwick/log/twdebuglog.h"
 #include "tarnwick/net/sslsocket.h"
 #include "tarnwick/platform/cancel.h"
-#include "tarnwick/platform/sigpipe_guard.h"
+#include "tarnwick/platform/signal_guard.h"
 
 using namespace tarnwick;
 
@@ -30,7 +30,7 @@ TlsResult CallSsl(SSL* ssl, Operation operation) {
   ERR_clear_error();
   if (ssl == nullptr) return {-1, SSL_ERROR_SSL};
   const NoCancel no_cancel;
-  SigpipeGuard guard;
+  SignalGuard guard(SIGPIPE);
   errno = 0;
   const int count = operation(ssl);
   const int error = SSL_get_error(ssl, count);

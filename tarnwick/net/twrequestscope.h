@@ -1,9 +1,7 @@
 // Settings of the library's calls for a part of one thread's work.
 //
-//   {
-//     TWRequestScope scope;
-//     scope.SetEscapedLog(true);
-//     SendHttpGet(host, 80, "/info.json", response, 5, false);  // what the device sends cannot forge
+//   { TWRequestScope scope; scope.SetEscapedLog(true); SendHttpGet(host, 80, "/info.json",
+//     response, 5, false);  // what the device sends cannot forge
 //   }                                                        // a line of the log
 //
 // Without a scope every call does what it always did.
@@ -20,7 +18,8 @@ struct RequestSettings;
 // makes, of any object.
 //
 // Scopes nest: a new one begins with the settings of the one around it, its setters change them for
-// its own lifetime, and afterwards those of the outer one hold again.
+// its own lifetime, and afterwards those of the outer one hold again. A scope is neither copied nor
+// moved. Since version 1.1.0.
 // Threads: belongs to the thread that made it, which alone may call and destroy it. Other threads
 //   are not affected, those started inside it neither.
 class TARNWICK_API TWRequestScope {
@@ -36,9 +35,9 @@ class TARNWICK_API TWRequestScope {
   bool Valid() const;
 
   // With true, text that came from a peer is escaped in the library's log lines: the body in the
-  // messages about JSON, with the parser's own words about it, the body in "strRet = ", and the
-  // header lines at debug3. Each line then ends where it seems to end, and a terminal that shows it
-  // gets no commands.
+  // messages that begin with "Failed to parse json", with the parser's own words about it, the body
+  // in "strRet = " at debug2, and the header lines at debug3. Each line then ends where it seems to
+  // end, and a terminal that shows it gets no commands.
   //
   // \xHH (upper case) represents each byte of a control character (U+0000 to U+001F, U+007F to
   // U+009F), of the separators U+2028 and U+2029, of a character that turns the direction of text

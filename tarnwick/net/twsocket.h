@@ -6,7 +6,10 @@
 //   char line[128];
 //   int length = socket->ReadToLineEnd(line, sizeof(line));
 //
-// Failures are logged in category socket.
+// Failures are logged in category socket, as source twsocket (twdebuglog.h tells what that is): at
+// info what a peer or a network may cause, such as "Reach end of file!", at error what the system
+// refused; at debug3 how many bytes a large read delivered. A write that failed is logged by
+// WriteFd.
 #ifndef TARNWICK_NET_TWSOCKET_H_
 #define TARNWICK_NET_TWSOCKET_H_
 
@@ -22,11 +25,16 @@ class SocketAccess;
 // One connection at a time to one host and port; it may be connected again and again.
 //
 // The object is large (a 64 KiB buffer lies inside it): create it on the heap. A class that derives
-// from it may be compiled with -fno-rtti and -fno-exceptions.
-// Threads: one thread uses an object at a time.
+// from it replaces DoSelect, _Read and _Write, and may be compiled with -fno-rtti and
+// -fno-exceptions.
+// Errors: errno is EAGAIN after a wait of ReadData that passed, EPIPE or ECONNRESET when the peer
+//   is gone, which raises no SIGPIPE, EMFILE or ENOMEM without a descriptor or memory. The
+//   constructors and SetSocketInfo throw std::bad_alloc when memory runs out.
+// Threads: one thread uses an object at a time; separate objects may run in separate threads.
 // Cancellation: a thread may be cancelled (pthread_cancel, the deferred kind) in any operation. It
 //   ends at a wait for the peer, or after a name resolution or a call of OpenSSL, which are not
-//   left in the middle. The object may then be destroyed, disconnected or connected again.
+//   left in the middle. Nothing leaks, and the object may then be destroyed, disconnected or
+//   connected again.
 class TARNWICK_API TWSocket {
  public:
   // What a wait is for.
@@ -35,7 +43,7 @@ class TARNWICK_API TWSocket {
     SELECT_WRITE = 1,  // room to write
   };
 
-  // A socket without a host; SetSocketInfo must follow.
+  // A socket without a host. REQUIRES: SetSocketInfo before Connect.
   TWSocket();
 
   // Arguments: `host` is a name or a dotted IPv4 address; `port` the TCP port; `timeout` the limit
@@ -52,9 +60,17 @@ class TARNWICK_API TWSocket {
   // Connects; an open connection is closed first.
   //
   // Results: 0; negative on failure, when IsConnected() is false and the descriptor may still be
-  //   open until the next Disconnect. After a connect time-out errno is ETIMEDOUT.
+  //   open until the next Disconnect. errno is ETIMEDOUT when the time-out passed, ECONNREFUSED
+  //   when nobody listens, or another one of connect(2); it says nothing when the name was not
+  //   resolved.
   // Blocks for the name resolution, which has no limit here, and then for `timeout` seconds at
   //   most. A `timeout` of 0 connects only where the connection completes at once.
+  // Logs: "Scoket getaddrinfo incomplete." alone when the name has no IPv4 address, "Socket connect
+  //   failed." alone without a time-out. With a time-out every other failed attempt ends with
+  //   "Socket connect timeout (N)", whatever the reason; the line before it tells more: "Socket
+  //   connection failed with error [N]." when the host refused (111) or another error number came
+  //   back, "Socket connect timeout." when nobody answered, "Socket connected." when the system
+  //   refused at once, for want of a route for example (the text is kept as it is).
   virtual int Connect();
 
   // Makes the descriptor non-blocking when the time-out is zero or positive, blocking when it is
@@ -62,13 +78,14 @@ class TARNWICK_API TWSocket {
   virtual int PostConnect();
 
   // Closes the connection, if there is one, and in buffered mode forgets what was read ahead; in
-  // direct mode that stays, unread. IsEOF() stays.
+  // direct mode that stays, unread. IsEOF() stays. Does not wait.
   virtual void Disconnect();
 
   // Waits until the descriptor can be read or written, or has an exceptional condition.
   //
   // Results: positive when it is ready; 0 when the time-out passed, and at once on a blocking
   //   connection; -1 on error or without a descriptor. Callers go on to the read or write after 0.
+  // Blocks for the time-out of the socket.
   virtual int DoSelect(SELECT_TYPE type);
 
   // One raw read of at most `len` bytes. Results: as read(2).
@@ -81,7 +98,8 @@ class TARNWICK_API TWSocket {
   // `buffered` what was read ahead is forgotten; without, it stays unread.
   void SetSocketInfo(const std::string& host, int port, int timeout, bool buffered);
 
-  // Sets the local source address to bind before connecting, in network byte order; 0 for none.
+  // Sets, in spite of its name, the local source address to bind before connecting, in network byte
+  // order; 0 for none.
   // An address that cannot be bound is logged and ignored.
   void SetRemoteAddr(unsigned int addr);
 
@@ -111,9 +129,10 @@ class TARNWICK_API TWSocket {
   //   before it, when `len` is negative, and when it is positive and `buf` null.
   // State: a buffered read that failed clears IsConnected(), a wait that failed does not; the
   //   descriptor stays open.
-  // Blocks for `timeout` seconds a wait; a small buffered read that gets nothing makes seven. One
-  // of 1,024 bytes or more that gets nothing waits once; one that got some waits twice for the rest
-  // while 1,024 or more are missing, else once.
+  // Blocks for the time-out at each wait. In direct mode that is one wait. A buffered read of fewer
+  // than 1,024 bytes waits seven times when nothing comes. One of 1,024 bytes or more waits once
+  // when nothing comes; when some bytes came, it waits twice for the rest while 1,024 or more are
+  // missing, else once.
   int ReadData(char* buf, int len);
 
   // Writes `len` bytes.
@@ -142,8 +161,8 @@ class TARNWICK_API TWSocket {
   int RestoreData(char* data, int len);
 
   // True when the descriptor becomes readable, or has an exceptional condition, within `timeout`
-  // seconds. What is in the read-ahead buffer is ignored; a negative `timeout` returns false at
-  // once.
+  // seconds, its own. What is in the read-ahead buffer is ignored; a negative `timeout` returns
+  // false at once.
   bool HasDataToRead(int timeout);
 
  protected:

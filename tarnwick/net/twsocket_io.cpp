@@ -1,4 +1,4 @@
-// Waiting, raw reads and writes, and what is built on them without the read-ahead buffer.
+// Waiting, and raw reads and writes.
 #define TW_LOG_SOURCE "twsocket"
 
 #include <unistd.h>
@@ -75,39 +75,6 @@ int TWSocket::WriteData(const char* buf, int len) {
   const int written = _Write(buf, static_cast<unsigned int>(len));
   if (written < 0) m_bConnected = false;
   return written;
-}
-
-int TWSocket::ReadToLineEnd(char* buf, int bufLen) {
-  if (buf == nullptr || bufLen <= 0) return -1;
-  int length = 0;
-  for (;;) {
-    if (m_bBuffered) {
-      length += ConsumeLineBody(buf + length, bufLen - 1 - length);
-      if (ConsumeLineEnding()) break;
-    }
-    char byte;
-    const int count = ReadData(&byte, 1);
-    if (count < 0) return -1;
-    if (count == 0 || byte == '\n') break;
-    if (byte == '\r') {
-      // Whatever follows is dropped, not only a line feed. Kept as it is: callers may depend on it;
-      // pinned by ReadToLineEnd.ACarriageReturnDropsTheNextByteWhateverItIs.
-      if (ReadData(&byte, 1) <= 0) return -1;
-      break;
-    }
-    buf[length++] = byte;
-    if (length == bufLen) {
-      TW_LOG(LOG_CATEG_SOCKET, LOG_LEVEL_INFO,
-             "BufLen [%d] reached before line ending when read Fd [%d],terminate buffer "
-             "explicitly.\n",
-             bufLen, m_sockFd);
-      // The byte just stored makes room for the terminating zero and is lost.
-      --length;
-      break;
-    }
-  }
-  buf[length] = '\0';
-  return length;
 }
 
 bool TWSocket::HasDataToRead(int timeout) {

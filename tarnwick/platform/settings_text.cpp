@@ -1,15 +1,12 @@
 #include "tarnwick/platform/settings_text.h"
 
+#include "tarnwick/platform/text_view.h"
+
 namespace tarnwick {
 
 namespace {
 
-std::string_view Strip(std::string_view text) {
-  constexpr std::string_view kBlanks = " \t\r";
-  const size_t first = text.find_first_not_of(kBlanks);
-  if (first == std::string_view::npos) return {};
-  return text.substr(first, text.find_last_not_of(kBlanks) - first + 1);
-}
+constexpr std::string_view kBlanks = " \t\r";
 
 // The last quote of the line closes the value: a value may hold quotes itself.
 std::string_view Unquote(std::string_view value) {
@@ -21,8 +18,9 @@ std::string_view Unquote(std::string_view value) {
 
 bool LineHasKey(std::string_view line, std::string_view key, std::string_view* value) {
   const size_t equals = line.find('=');
-  if (equals == std::string_view::npos || Strip(line.substr(0, equals)) != key) return false;
-  *value = Unquote(Strip(line.substr(equals + 1)));
+  if (equals == std::string_view::npos || Trim(line.substr(0, equals), kBlanks) != key)
+    return false;
+  *value = Unquote(Trim(line.substr(equals + 1), kBlanks));
   return true;
 }
 

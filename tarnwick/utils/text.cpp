@@ -5,7 +5,10 @@
 #include <ctime>
 #include <string>
 
+#include "tarnwick/platform/text_view.h"
 #include "tarnwick/utils/utils.h"
+
+using namespace tarnwick;
 
 // Moves what is between two of them at once: responses of megabytes have lines of some dozen
 // bytes.
@@ -25,10 +28,7 @@ void RemoveChar(std::string& text, char ch) {
 }
 
 std::string TrimString(std::string text, const char* set) {
-  if (set == nullptr) return text;
-  const size_t first = text.find_first_not_of(set);
-  if (first == std::string::npos) return std::string();
-  return text.substr(first, text.find_last_not_of(set) - first + 1);
+  return set != nullptr ? std::string(Trim(text, set)) : text;
 }
 
 char* StrNCopy(char* dest, const char* src, size_t size) {

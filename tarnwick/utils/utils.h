@@ -1,8 +1,9 @@
 // Small helpers that the daemons share: pacing, text and encodings, whole-buffer writes, threads.
 //
-// Unless a declaration says otherwise, the functions are safe from any thread and do not log. Those
-// that return std::string throw std::bad_alloc when memory runs out. WriteFd and DelayTimer::Delay
-// are cancellation points (pthread_cancel); nothing is lost there but what is not yet written.
+// Unless a declaration says otherwise, the functions are safe from any thread, do not wait and do
+// not log. Those that take or return a std::string by value throw std::bad_alloc when memory runs
+// out. WriteFd and DelayTimer::Delay are cancellation points (pthread_cancel); nothing is lost
+// there but what is not yet written.
 #ifndef TARNWICK_UTILS_UTILS_H_
 #define TARNWICK_UTILS_UTILS_H_
 
@@ -50,7 +51,8 @@ class TARNWICK_API TARNWICK_HOLDS_TIME DelayTimer {
   // Sleeps until the current period has passed and starts the next one where it ended. When the
   // period has passed already, or the clock was set back, yields the processor instead and starts a
   // period now. A period of 0 or less never sleeps.
-  // Results: what the sleep or yield gave: 0, or -1 with errno EINTR when a signal cut the sleep.
+  // Results: those of the sleep or the yield: 0, or -1 with errno EINTR when a signal cut the
+  //   sleep; the next period starts where this one would have ended.
   // Blocks for one period at most.
   int Delay();
 
@@ -83,7 +85,7 @@ TARNWICK_API char* StrNCopy(char* dest, const char* src, size_t size);
 //   out or `text` is null.
 TARNWICK_API char* Base64Encode(const char* text);
 
-// The 16 bytes at `digest` as 32 lower-case hex digits; an empty text when `digest` is null.
+// The 16 bytes at `digest` as 32 lower-case hex digits; an empty string when `digest` is null.
 // Computes no hash.
 TARNWICK_API std::string Md5ToHex(const unsigned char* digest);
 
@@ -96,9 +98,11 @@ TARNWICK_API std::string FormatUtcTimeStamp(int64_t microseconds);
 
 // Writes the `len` bytes at `buf` to the descriptor, which may be non-blocking.
 //
-// Results: the bytes written: `len`; fewer after an error, which is logged (category utils, level
-//   notice), and after the sixth write that took nothing; 0 when `len` is less than 1. A closed
-//   peer is an error (EPIPE) and raises no SIGPIPE; the caller's signal handler and mask stay.
+// Results: the bytes written: `len`; fewer after an error, and after the sixth write that took
+//   nothing; 0 when `len` is less than 1. After an error errno is that of write(2), EPIPE when the
+//   peer is gone, which raises no SIGPIPE: the caller's signal handler and mask stay. After six
+//   writes that took nothing it says nothing.
+// Logs: an error, in category utils at notice: "Write fd[N] error[N]", the descriptor and errno.
 // Blocks without a limit while the descriptor takes nothing, trying again every 10 milliseconds.
 // Threads: one writer per descriptor at a time.
 TARNWICK_API int WriteFd(int fd, const void* buf, int len);
@@ -106,9 +110,11 @@ TARNWICK_API int WriteFd(int fd, const void* buf, int len);
 // Starts a thread that runs `start(arg)` and stores its handle in `*thread`.
 //
 // Arguments: `stackSize` in bytes, 0 for the system's default, which also serves when the size is
-//   refused; `detached` other than 0 for a thread that nobody joins.
-// Results: 1; 0 when the thread could not be started or `start` or `thread` is null, which is
-//   logged (category utils, level error); `*thread` is then of no use.
+//   refused; `detached` other than 0 for a thread that nobody joins; the caller joins any other one
+//   with pthread_join(3).
+// Results: 1; 0 when the thread could not be started or `start` or `thread` is null; `*thread` is
+//   then of no use, and errno says nothing.
+// Logs: a failure, in category utils at error: "Failed to create thread."
 TARNWICK_API int CreateThread(void* (*start)(void*), void* arg, unsigned stackSize, int detached,
                               pthread_t* thread);
 

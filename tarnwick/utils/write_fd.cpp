@@ -5,7 +5,7 @@
 #include <cerrno>
 
 #include "tarnwick/log/twdebuglog.h"
-#include "tarnwick/platform/sigpipe_guard.h"
+#include "tarnwick/platform/signal_guard.h"
 #include "tarnwick/utils/utils.h"
 
 using namespace tarnwick;
@@ -20,7 +20,7 @@ constexpr int kMaxEmptyWrites = 5;
 int WriteFd(int fd, const void* buf, int len) {
   DelayTimer timer(kRetryPeriodUs);
   if (len < 1) return 0;
-  SigpipeGuard guard;
+  SignalGuard guard(SIGPIPE);
   const char* const bytes = static_cast<const char*>(buf);
   int written = 0;
   int emptyWrites = 0;

@@ -19,7 +19,7 @@ TEST(ManLog, TheDaemonReportsItsCamera) {
   ReportCamera(3, false);
   EXPECT_THAT(
       log.Lines("camera"),
-      ElementsAre(IsLog("camera", "warn", "camerad", "ReportCamera", "camera 3 does not answer\n"),
+      ElementsAre(IsLog("camera", "warn", "camerad", "ReportCamera", "camera 3 does not respond\n"),
                   IsLog("camera", "debug2", "camerad", "ReportCamera", "camera 3\n")));
 }
 

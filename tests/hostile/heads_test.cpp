@@ -2,6 +2,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "tarnwick/http/kept_fields.h"
 #include "tarnwick/platform/unique.h"
 #include "tests/hostile/hostile_util.h"
 #include "tests/hostile/peak_memory.h"
@@ -19,11 +20,21 @@ std::string Lines(int count) {
   return Repeated(count, "X: y\r\n");
 }
 
+// The last word of the field's name: "type" of Content-Type.
+std::string NameOf(HTTP_MAP_KEY key) {
+  for (const KeptField& field : kKeptFields) {
+    if (field.as != KeptAs::kContent || field.key != key) continue;
+    std::string word(field.name.substr(field.name.rfind('-') + 1));
+    word[0] = static_cast<char>(tolower(word[0]));
+    return word;
+  }
+  return "unknown";
+}
+
 // What the head left in the client: "name=value" each.
 std::string Kept(const ClientProbe& client) {
-  static constexpr const char* kNames[] = {"type", "length", "range"};
   std::string kept;
-  for (const auto& [key, value] : client.m_mapContent) kept += kNames[key] + "="s + value + "|";
+  for (const auto& [key, value] : client.m_mapContent) kept += NameOf(key) + "=" + value + "|";
   if (!client.m_strCookie.empty()) kept += "cookie=" + client.m_strCookie + "|";
   if (!client.m_strAuthenticate.empty()) kept += "challenge=" + client.m_strAuthenticate + "|";
   if (!client.m_strTransferEncoding.empty()) {

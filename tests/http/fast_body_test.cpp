@@ -231,16 +231,14 @@ TEST(FastBody, ToTheEndIsWhatReadsIntoABufferGive) {
 // A header line by splitting it at its delimiters first.
 HeaderLine PlainParse(const std::string& line) {
   static constexpr char kEnds[] = " :;=";
-  static constexpr const char* kNames[] = {"content-type", "content-length",   "content-range",
-                                           "set-cookie",   "www-authenticate", "transfer-encoding"};
   HeaderLine result;
   const size_t begin = std::min(line.find_first_not_of(kEnds), line.size());
   const size_t end = std::min(line.find_first_of(kEnds, begin), line.size());
   const std::string name = line.substr(begin, end - begin);
   result.hasName = !name.empty();
-  for (int i = 5; i >= 0; --i) {
-    if (strncasecmp(name.c_str(), kNames[i], strlen(kNames[i])) == 0) {
-      result.header = static_cast<Header>(i);
+  for (const KeptField& field : kKeptFields) {
+    if (strncasecmp(name.c_str(), field.name.data(), field.name.size()) == 0) {
+      result.field = &field;
       result.value = std::string_view(line).substr(std::min(end + 1, line.size()));
     }
   }
@@ -248,32 +246,19 @@ HeaderLine PlainParse(const std::string& line) {
 }
 
 TEST(FastHead, ALineGivesWhatSplittingItGives) {
-  static constexpr const char* kWords[] = {"Content-Type",
-                                           "content-length",
-                                           "CONTENT-RANGE",
-                                           "Set-Cookie",
-                                           "WWW-Authenticate",
-                                           "Transfer-Encoding",
-                                           "Content-",
-                                           "Set",
-                                           "X-Device",
-                                           "-2",
-                                           " ",
-                                           ":",
-                                           ";",
-                                           "=",
-                                           "\t",
-                                           "v"};
+  std::vector<std::string> words = {"Content-", "Set", "X-Device", "-2", " ",
+                                    ":",        ";",   "=",        "\t", "v"};
+  for (const KeptField& field : kKeptFields) words.emplace_back(field.name);
   std::mt19937 random(7);
   for (int round = 0; round < 20000; ++round) {
     std::string line;
-    for (size_t words = random() % 6; words > 0; --words) line += kWords[random() % 16];
+    for (size_t count = random() % 6; count > 0; --count) line += words[random() % words.size()];
     if (!line.empty() && random() % 4 == 0)
       line[random() % line.size()] = static_cast<char>(random());
     const HeaderLine fast = ParseHeaderLine(line);
     const HeaderLine plain = PlainParse(line);
     ASSERT_EQ(fast.hasName, plain.hasName) << line;
-    ASSERT_EQ(fast.header, plain.header) << line;
+    ASSERT_EQ(fast.field, plain.field) << line;
     ASSERT_EQ(fast.value, plain.value) << line;
   }
 }

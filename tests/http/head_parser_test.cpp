@@ -25,10 +25,11 @@ void ExpectStatus(const StatusCase& expected) {
   EXPECT_EQ(status, expected.status);
 }
 
-std::string ValueOf(const std::string& line, Header header) {
+// The value of a line whose field has that name.
+std::string ValueOf(const std::string& line, std::string_view name) {
   const HeaderLine parsed = ParseHeaderLine(line);
   EXPECT_TRUE(parsed.hasName) << line;
-  EXPECT_EQ(parsed.header, header) << line;
+  EXPECT_EQ(parsed.field != nullptr ? parsed.field->name : "none", name) << line;
   return std::string(parsed.value);
 }
 
@@ -92,19 +93,13 @@ TEST(ParseStatusLine, EveryCutOfALineIsAnsweredByItsWords) {
   }
 }
 
-TEST(ParseHeaderLine, TheSixNamesAreKnownInAnyCase) {
-  const struct {
-    const char* name;
-    Header header;
-  } names[] = {{"Content-Type", Header::kContentType},
-               {"CONTENT-LENGTH", Header::kContentLength},
-               {"content-range", Header::kContentRange},
-               {"sEt-cOOkie", Header::kSetCookie},
-               {"www-authenticate", Header::kAuthenticate},
-               {"TRANSFER-Encoding", Header::kTransferEncoding}};
-  for (const auto& known : names) {
-    EXPECT_EQ(ValueOf(std::string(known.name) + ": v w", known.header), " v w");
-    EXPECT_EQ(ValueOf(std::string(known.name) + "-2: v", known.header), " v");
+TEST(ParseHeaderLine, TheKeptNamesAreKnownInAnyCase) {
+  for (const KeptField& field : kKeptFields) {
+    std::string name(field.name);
+    EXPECT_EQ(ValueOf(name + ": v w", field.name), " v w");
+    EXPECT_EQ(ValueOf(name + "-2: v", field.name), " v");
+    for (char& c : name) c = static_cast<char>(c ^ (isalpha(c) ? 0x20 : 0));
+    EXPECT_EQ(ValueOf(name + ":v", field.name), "v");
   }
 }
 
@@ -113,7 +108,7 @@ TEST(ParseHeaderLine, OtherNamesAndCutNamesAreOther) {
                            "Set-Cooki", "\tContent-Type: x", "a"}) {
     const HeaderLine parsed = ParseHeaderLine(line);
     EXPECT_TRUE(parsed.hasName) << line;
-    EXPECT_EQ(parsed.header, Header::kOther) << line;
+    EXPECT_EQ(parsed.field, nullptr) << line;
   }
 }
 
@@ -126,30 +121,30 @@ TEST(ParseHeaderLine, ALineOfDelimitersHasNoName) {
 TEST(ParseHeaderLine, ASpaceColonSemicolonOrEqualsSignEndsTheName) {
   for (const char delimiter : {' ', ':', ';', '='}) {
     const std::string line = "Content-Type"s + delimiter + "a=b;c";
-    EXPECT_EQ(ValueOf(line, Header::kContentType), "a=b;c");
+    EXPECT_EQ(ValueOf(line, "Content-Type"), "a=b;c");
   }
 }
 
 TEST(ParseHeaderLine, LeadingDelimitersAreSkipped) {
-  EXPECT_EQ(ValueOf(" :;= Content-Type: x", Header::kContentType), " x");
+  EXPECT_EQ(ValueOf(" :;= Content-Type: x", "Content-Type"), " x");
 }
 
 TEST(ParseHeaderLine, OnlyOneDelimiterIsTakenBehindTheName) {
-  EXPECT_EQ(ValueOf("Content-Type : x", Header::kContentType), ": x");
-  EXPECT_EQ(ValueOf("Content-Type:: x ", Header::kContentType), ": x ");
+  EXPECT_EQ(ValueOf("Content-Type : x", "Content-Type"), ": x");
+  EXPECT_EQ(ValueOf("Content-Type:: x ", "Content-Type"), ": x ");
 }
 
 TEST(ParseHeaderLine, ANameAloneHasAnEmptyValue) {
-  EXPECT_EQ(ValueOf("Content-Length", Header::kContentLength), "");
-  EXPECT_EQ(ValueOf("Content-Length:", Header::kContentLength), "");
-  EXPECT_EQ(ValueOf("Content-Length: ", Header::kContentLength), " ");
+  EXPECT_EQ(ValueOf("Content-Length", "Content-Length"), "");
+  EXPECT_EQ(ValueOf("Content-Length:", "Content-Length"), "");
+  EXPECT_EQ(ValueOf("Content-Length: ", "Content-Length"), " ");
 }
 
 TEST(ParseHeaderLine, AnyBytesAreTaken) {
   for (int byte = 0; byte < 256; ++byte) {
     const std::string text(3, static_cast<char>(byte));
     ParseHeaderLine(text);
-    EXPECT_EQ(ValueOf("Content-Type:" + text, Header::kContentType), text);
+    EXPECT_EQ(ValueOf("Content-Type:" + text, "Content-Type"), text);
   }
 }
 

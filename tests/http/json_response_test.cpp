@@ -256,4 +256,7 @@ TEST(JsonDepth, LeavesStringsAndCommentsAside) {
   EXPECT_EQ(JsonDepth("[\"\\\\\",[]]"), 2);
   EXPECT_EQ(JsonDepth("/* [[ */ [ // [[\n ]"), 1);
   EXPECT_EQ(JsonDepth("[\"unended [["), 1);
+  EXPECT_EQ(JsonDepth("[/* unended [["), 1);
+  EXPECT_EQ(JsonDepth("[// unended [["), 1);
+  EXPECT_EQ(JsonDepth("/["), 1);
 }

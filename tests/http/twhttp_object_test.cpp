@@ -83,10 +83,10 @@ TEST(TWHttpClientObject, APathOfSlashesOnlyBecomesEmpty) {
   EXPECT_EQ(client.m_strPath, "");
 }
 
-TEST(TWHttpClientObject, KeyThreeIsABadKeyAndKeyZeroIsNotReadyBeforeAnyRequest) {
+TEST(TWHttpClientObject, AKeyOfNoFieldIsABadKeyAndKeyZeroIsNotReadyBeforeAnyRequest) {
   const ClientProbe client(80);
   std::string out = "kept";
-  EXPECT_EQ(client.GetHttpContent(static_cast<HTTP_MAP_KEY>(3), out), HTTP_RET_BAD_KEY);
+  EXPECT_EQ(client.GetHttpContent(static_cast<HTTP_MAP_KEY>(99), out), HTTP_RET_BAD_KEY);
   EXPECT_EQ(client.GetHttpContent(HTTP_CONTENT_TYPE, out), HTTP_RET_NOT_READY);
   EXPECT_EQ(out, "kept");
 }
@@ -240,7 +240,7 @@ TEST(TWHttpClientObject, TheKeyIsTestedBeforeTheState) {
   client.m_connState = 1;
   client.m_mapContent[HTTP_CONTENT_TYPE] = "x";
   std::string out;
-  EXPECT_EQ(client.GetHttpContent(static_cast<HTTP_MAP_KEY>(4), out), HTTP_RET_BAD_KEY);
+  EXPECT_EQ(client.GetHttpContent(static_cast<HTTP_MAP_KEY>(99), out), HTTP_RET_BAD_KEY);
   EXPECT_EQ(client.GetHttpContent(HTTP_CONTENT_TYPE, out), HTTP_RET_NOT_READY);
   client.m_connState = 2;
   EXPECT_EQ(client.GetHttpContent(HTTP_CONTENT_TYPE, out), HTTP_RET_OK);

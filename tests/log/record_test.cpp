@@ -71,6 +71,18 @@ TEST_F(Record, UnloadingTheLibraryFreesTheNames) {
   EXPECT_LT(atol(with_names.c_str()) - atol(without.c_str()), 20000);
 }
 
+// Other threads may still log then.
+TEST_F(Record, AtTheEndOfTheProcessTheNamesStay) {
+#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
+  GTEST_SKIP() << "the sanitizer's allocator does not tell the heap";
+#endif
+  std::string with_names;
+  std::string without;
+  EXPECT_EQ(RunProgram({TARNWICK_EXIT_PROBE, "names"}, &with_names).code, 0);
+  EXPECT_EQ(RunProgram({TARNWICK_EXIT_PROBE, "none"}, &without).code, 0);
+  EXPECT_GT(atol(with_names.c_str()) - atol(without.c_str()), 3000);
+}
+
 TEST_F(Record, ARecordThatComesLaterIsNotSeenWithoutACall) {
   InitDbgCfg();
   const SharedRecord record;

@@ -167,6 +167,14 @@ def test_a_line_is_seen_by_its_groups_or_by_those_of_its_function():
     assert names(1, (1, 1)) == ["one", "two"]  # a constant has no code
 
 
+def test_a_line_of_a_header_is_seen_by_the_tests_of_its_folder_too():
+    programs = [lines_seen.program_of(folder) for folder in ("platform", "log")]
+    groups = [{"filter": program, "program": program, "passed": True} for program in programs]
+    seen = lines_seen.LinesSeen(groups, {"tarnwick/platform/lock.h": {"3": 2}})
+    at = candidates.Candidate("tarnwick/platform/lock.h", 0, 1, "", "f", 3, (3, 3), "", "")
+    assert [group["filter"] for group in seen.of(at)] == programs
+
+
 def test_groups_are_cases_or_suites():
     listed = "Suite.\n  One\n  Two\nTable/Suite.\n  Row/0  # GetParam() = 1\n  DISABLED_Row\n"
     assert lines_seen.filters_of(listed, True) == ["Suite.One", "Suite.Two", "Table/Suite.Row/0"]

@@ -35,8 +35,9 @@ class LinesSeen:
         self._seen = seen
 
     def of(self, candidate):
-        """The groups that see the candidate: its line, or else its function, or else its file. A
-        function in a header may be counted nowhere, because the tests have copies of it."""
+        """The groups that see the candidate: its line, or else its function, or else its file. The
+        tests have copies of the functions in headers, whose lines are not counted: of a header the
+        tests of its own folder are groups too."""
         lines = self._seen.get(candidate.path, {})
         bits = lines.get(str(candidate.line))
         if not bits:
@@ -48,7 +49,13 @@ class LinesSeen:
                 bits = _union(lines.values())
             if not bits and candidate.path.endswith(".h"):
                 bits = (1 << len(self.groups)) - 1
+        if candidate.path.endswith(".h"):
+            bits |= self._of_folder(os.path.basename(os.path.dirname(candidate.path)))
         return [g for n, g in enumerate(self.groups) if bits >> n & 1 and g["passed"]]
+
+    def _of_folder(self, folder):
+        own = [group["program"] == program_of(folder) for group in self.groups]
+        return _union(int(is_own) << n for n, is_own in enumerate(own))
 
     def left_out(self):
         """The tests that fail in their groups; with all others, whose order is another, they may

@@ -119,6 +119,11 @@ TEST_P(BothModes, ANullBufferOrANegativeLengthIsRefused) {
   EXPECT_EQ(byte, '#');
 }
 
+TEST(ReadData, OfNothingIntoANullBufferIsNothing) {
+  PlainSocket socket("127.0.0.1", 9, 1, true);
+  EXPECT_EQ(socket.ReadData(nullptr, 0), 0);
+}
+
 TEST_P(BothModes, WithoutASocketReadingAndLineReadingFail) {
   PlainSocket socket("host", 1, GetParam() ? 5 : -1, GetParam());
   EXPECT_EQ(ReadSome(socket, 10).result, -1);

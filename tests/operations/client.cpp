@@ -3,7 +3,10 @@
 
 #include <cstdlib>
 
+#include "tarnwick/http/kept_fields.h"
 #include "tests/operations/parts.h"
+
+using namespace tarnwick;
 
 namespace {
 
@@ -79,19 +82,17 @@ std::shared_ptr<ClientProbe> ClientOf(const OperationSettings& settings) {
 void AskForHead(ClientProbe& client, OperationResult* result) {
   result->response = client.CheckResponse(result->status);
   result->head = client.m_connState == 2;
-  const auto ask = [&](HTTP_MAP_KEY key, std::string* kept) {
+  for (const KeptField& field : kKeptFields) {
+    if (field.as != KeptAs::kContent) continue;
     std::string value = "untouched";
-    const int found = client.GetHttpContent(key, value);
+    const int found = client.GetHttpContent(field.key, value);
     if (found == HTTP_RET_OK) {
-      *kept = value;
-      return;
+      result->fields[field.key] = value;
+      continue;
     }
     ExpectOneOf(found, {HTTP_RET_NOT_READY, HTTP_RET_NO_CONTENT}, "GetHttpContent", result);
     if (value != "untouched") result->mistake = "GetHttpContent has changed its output";
-  };
-  ask(HTTP_CONTENT_TYPE, &result->type);
-  ask(HTTP_CONTENT_LENGTH, &result->length);
-  ask(HTTP_CONTENT_RANGE, &result->range);
+  }
   if (client.GetCookie(result->cookie) != 0) result->mistake = "GetCookie";
   result->encoding = client.GetTransferEncoding();
 }
@@ -228,7 +229,7 @@ OperationResult Upload(const OperationSettings& settings) {
 // A request that the caller writes, on the connection of the one before, whose body he has read.
 OperationResult SecondRequest(const OperationSettings& settings) {
   return ReadAfterGet(settings, [&](ClientProbe& client, OperationResult* result) {
-    const size_t length = strtoul(result->length.c_str(), nullptr, 10);
+    const size_t length = strtoul(result->Field(HTTP_CONTENT_LENGTH).c_str(), nullptr, 10);
     const size_t most = std::min(settings.most, std::max<size_t>(length, 1));
     std::string& first = result->first;
     while (first.size() < most &&

@@ -5,6 +5,7 @@
 #define TARNWICK_TESTS_OPERATIONS_OPERATIONS_H_
 
 #include <functional>
+#include <map>
 #include <memory>
 #include <string>
 #include <vector>
@@ -44,10 +45,8 @@ struct OperationResult {
   int result = 0;              // of the call that the operation is named after
   int response = HTTP_RET_OK;  // of CheckResponse, and its status; -1 where there is none to ask
   int status = -1;
-  bool head = false;  // a whole head was read
-  std::string type;   // what the client keeps of the head; empty when there was none
-  std::string length;
-  std::string range;
+  bool head = false;                           // a whole head was read
+  std::map<HTTP_MAP_KEY, std::string> fields;  // that the client keeps of the head
   std::string cookie;
   std::string encoding;
 
@@ -58,6 +57,12 @@ struct OperationResult {
   std::string first;       // what came before: a line, another body, a document as it was received
   bool healthy = true;     // the smaller calls beside it have succeeded as well
   std::string mistake;     // what no contract allows; empty when there is nothing
+
+  // Empty when the head had none.
+  std::string Field(HTTP_MAP_KEY key) const {
+    const auto found = fields.find(key);
+    return found == fields.end() ? "" : found->second;
+  }
 };
 
 enum class OverTls { kNever, kEither, kAlways };

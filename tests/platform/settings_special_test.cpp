@@ -206,6 +206,22 @@ TEST_F(SpecialSettings, LinksInACircleAreRefused) {
   ExpectAllRefused(Path(), ELOOP);
 }
 
+// A chain of links from the path, of which the last one refers to the target.
+TEST_F(SpecialSettings, FortyLinksAreFollowedAndOneMoreIsRefused) {
+  WriteFile(Target(), kText);
+  std::string last = Path();
+  for (int links = 1; links <= 40; ++links) {
+    const std::string next = links < 40 ? folder_.File(std::to_string(links)) : Target();
+    ASSERT_EQ(symlink(next.c_str(), last.c_str()), 0);
+    last = next;
+  }
+  EXPECT_EQ(Set(Path()).result, 0);
+  EXPECT_EQ(ReadFile(Target()), kNewText);
+  const std::string longer = folder_.File("longer");
+  ASSERT_EQ(symlink(Path().c_str(), longer.c_str()), 0);
+  ExpectRefused(Set(longer), ELOOP);
+}
+
 // The place of the file is taken by a link after the path was followed.
 TEST_F(SpecialSettings, ALinkThatTakesTheFilesPlaceIsNotFollowed) {
   WriteFile(Path(), kText);

@@ -121,9 +121,9 @@ Outcome JudgeResponse(const OperationResult& result) {
 bool HeadIsRight(const Plan& plan, const OperationResult& result) {
   const std::string id = std::to_string(plan.id);
   const bool chunked = plan.framing == Framing::kChunked && !Has(plan, kTwoRequests);
-  const bool length =
-      result.length.empty() || result.length == std::to_string(AnswerOf(plan).size());
-  return result.type == "text/x-soak; id=" + id && result.cookie == "id=" + id + ";" && length &&
+  const std::string announced = result.Field(HTTP_CONTENT_LENGTH);
+  const bool length = announced.empty() || announced == std::to_string(AnswerOf(plan).size());
+  return result.Field(HTTP_CONTENT_TYPE) == "text/x-soak; id=" + id && result.cookie == "id=" + id + ";" && length &&
          (result.encoding == "chunked") == chunked;
 }
 

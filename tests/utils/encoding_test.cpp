@@ -80,6 +80,18 @@ TEST(Base64Encode, AnEmptyTextGivesAnAllocatedEmptyText) {
   free(encoded);
 }
 
+// OpenSSL takes a length of an int, so that the text goes to it in pieces.
+TEST(Base64Encode, ATextOfMoreThan768MebibytesIsEncodedToItsEnd) {
+  if (sizeof(size_t) < 8) GTEST_SKIP() << "no room for it in 32 bits of addresses";
+  constexpr size_t kWhole = (size_t{3} << 28) / 3 * 4;
+  const std::string text = std::string(size_t{3} << 28, 'a') + "bcd";
+  char* const encoded = Base64Encode(text.c_str());
+  ASSERT_NE(encoded, nullptr);
+  EXPECT_EQ(strlen(encoded), kWhole + 4);
+  EXPECT_STREQ(encoded + kWhole - 4, "YWFhYmNk");
+  free(encoded);
+}
+
 TEST(Base64Encode, GivesTheStandardsExamples) {
   EXPECT_EQ(Base64("f"), "Zg==");
   EXPECT_EQ(Base64("fo"), "Zm8=");

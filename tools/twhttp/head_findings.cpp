@@ -1,6 +1,7 @@
 // What is odd about a reply's head, and what the library makes of it.
 #include <algorithm>
 
+#include "tarnwick/http/kept_fields.h"
 #include "tools/twhttp/message.h"
 
 namespace {
@@ -46,7 +47,7 @@ std::string FirstLine(const std::string& head) {
   return head.substr(0, std::min(head.find_first_of("\r\n"), kShown));
 }
 
-size_t CountOf(const HeaderLines& headers, const char* name) {
+size_t CountOf(const HeaderLines& headers, const std::string& name) {
   return static_cast<size_t>(std::count_if(headers.begin(), headers.end(), [&](const auto& header) {
     return EqualsIgnoringCase(header.first, name);
   }));
@@ -82,11 +83,11 @@ void InspectLines(const ReplyMessage& reply, std::vector<HeadFinding>* found) {
     found->push_back({"a header line that begins with its colon",
                       "the library takes the next word for the name"});
   }
-  for (const char* known : {"Content-Type", "Content-Length", "Content-Range", "Set-Cookie",
-                            "WWW-Authenticate", "Transfer-Encoding"}) {
-    if (CountOf(reply.Headers(), known) == 0 || !reply.Value(known).empty()) continue;
-    const bool breaks = reply.Head().find(std::string(known) + ":\r\n") != std::string::npos;
-    found->push_back({std::string("an empty ") + known + " line",
+  for (const tarnwick::KeptField& field : tarnwick::kKeptFields) {
+    const std::string name(field.name);
+    if (CountOf(reply.Headers(), name) == 0 || !reply.Value(name).empty()) continue;
+    const bool breaks = reply.Head().find(name + ":\r\n") != std::string::npos;
+    found->push_back({"an empty " + name + " line",
                       breaks ? "the library takes the whole head for malformed"
                              : "the blank in it keeps the library from refusing the head",
                       breaks});

@@ -5,7 +5,7 @@
 #include <cstdint>
 #include <string>
 
-void ReportCamera(int camera, bool answers);
+void ReportCamera(int camera, bool responds);
 void NotifyUser(const char* text);
 
 std::string QueryOf(const std::string& place);
@@ -16,13 +16,13 @@ std::string SnapshotName(int camera, int64_t microseconds);
 int GrabThreeFrames();
 bool SendPicture(int fd, const std::string& picture);
 
-// The number that the device gives; -1 when it gives none.
+// The number that the device sends; -1 when it sends none.
 int CameraNumber(const std::string& host, int port);
 
-// Empty when the device does not give the whole page.
+// Empty when the device does not send the whole page.
 std::string InfoPage(const std::string& host, int port);
 
-// Empty when the device does not answer.
+// Empty when the device does not respond.
 std::string Greeting(const std::string& host, int port, bool tls);
 
 // The HTTP status; -1 when there was none.

@@ -12,8 +12,9 @@ int CameraNumber(const std::string& host, int port) {
 
 std::string InfoPage(const std::string& host, int port) {
   // At most 5 seconds a wait, with read-ahead; the login goes out when the device asks for it.
-  TWHttpClient client(host, port, "info.cgi", "admin", "secret", 5, false, true, false, false,
-                      HTTP_VERSION_NONE, "");
+  TWHttpClient client(host, port, "info.cgi", "admin", "secret", /*timeout=*/5, /*https=*/false,
+                      /*bufferedRead=*/true, /*encodeQuery=*/false, /*basicAuth=*/false,
+                      HTTP_VERSION_NONE, /*encodeKeep=*/"");
   int status = 0;
   std::string body;
   if (client.SendRequest(HTTP_METHOD_GET, "") != HTTP_RET_OK) return "";  // not sent

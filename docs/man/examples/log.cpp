@@ -14,11 +14,11 @@ std::string Describe(int camera) {
 
 }  // namespace
 
-void ReportCamera(int camera, bool answers) {
-  if (answers)
-    TW_LOG(LOG_CATEG_CAMERA, LOG_LEVEL_DEBUG, "camera %d answers\n", camera);
+void ReportCamera(int camera, bool responds) {
+  if (responds)
+    TW_LOG(LOG_CATEG_CAMERA, LOG_LEVEL_DEBUG, "camera %d responds\n", camera);
   else
-    TW_LOG(LOG_CATEG_CAMERA, LOG_LEVEL_WARN, "camera %d does not answer\n", camera);
+    TW_LOG(LOG_CATEG_CAMERA, LOG_LEVEL_WARN, "camera %d does not respond\n", camera);
 
   // Work that is for the log alone.
   if (TWLogEnabled(LOG_CATEG_CAMERA, LOG_LEVEL_DEBUG2)) {

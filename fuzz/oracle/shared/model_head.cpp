@@ -63,30 +63,28 @@ bool IsDelimiter(char c) {
   return c == ' ' || c == ':' || c == ';' || c == '=';
 }
 
-void Keep(ModelHead* head, size_t header, const std::string& value) {
-  if (header < 3) head->kept.emplace(static_cast<int>(header), WithoutSpaces(value));
-  if (header == 3) {
+void Keep(ModelHead* head, const ModelField& field, const std::string& value) {
+  if (field.key >= 0) head->kept.emplace(field.key, WithoutSpaces(value));
+  if (field.name == "set-cookie") {
     const size_t end = value.find(';');
     head->cookie = end == std::string::npos ? "" : WithoutSpaces(value.substr(0, end + 1));
   }
-  if (header == 4) head->challenge = value;
-  if (header == 5) head->encoding = WithoutSpaces(value);
+  if (field.name == "www-authenticate") head->challenge = value;
+  if (field.name == "transfer-encoding") head->encoding = WithoutSpaces(value);
 }
 
 // Results: 0, or 1 for a line without name or value.
 int KeepLine(ModelHead* head, const std::string& line) {
-  static const char* const kKnown[] = {"content-type", "content-length",   "content-range",
-                                       "set-cookie",   "www-authenticate", "transfer-encoding"};
   size_t begin = 0;
   while (begin < line.size() && IsDelimiter(line[begin])) ++begin;
   if (begin == line.size()) return 1;
   size_t end = begin;
   while (end < line.size() && !IsDelimiter(line[end])) ++end;
   const std::string name = Lower(line.substr(begin, end - begin));
-  for (size_t i = 0; i < 6; ++i) {
-    if (name.rfind(kKnown[i], 0) != 0) continue;
+  for (const ModelField& field : ModelFields()) {
+    if (name.rfind(field.name, 0) != 0) continue;
     if (end + 1 >= line.size()) return 1;
-    Keep(head, i, line.substr(end + 1));
+    Keep(head, field, line.substr(end + 1));
     return 0;
   }
   return 0;
@@ -108,6 +106,14 @@ int ReadHeaderLines(ModelSocket* socket, ModelHead* head) {
 }
 
 }  // namespace
+
+const std::vector<ModelField>& ModelFields() {
+  static const std::vector<ModelField> fields = {
+      {"content-type", 0}, {"content-length", 1},    {"content-range", 2},
+      {"set-cookie", -1},  {"www-authenticate", -1}, {"transfer-encoding", -1},
+  };
+  return fields;
+}
 
 int ReadModelHead(ModelSocket* socket, ModelHead* head) {
   head->status = 0;

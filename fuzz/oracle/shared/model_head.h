@@ -4,8 +4,18 @@
 
 #include <map>
 #include <string>
+#include <vector>
 
 #include "fuzz/oracle/shared/model_socket.h"
+
+// A header field that a client keeps: its name in lower case, and its HTTP_MAP_KEY or -1.
+struct ModelField {
+  std::string name;
+  int key;
+};
+
+// The oracle's own list; LLVMFuzzerInitialize of response_head compares it with the library's.
+const std::vector<ModelField>& ModelFields();
 
 // What a client keeps of a response. `encoding` outlives a response that has none.
 struct ModelHead {

@@ -1,5 +1,5 @@
 // A write to a closed connection, and the caller's own dealings with SIGPIPE.
-#include "tarnwick/platform/sigpipe_guard.h"
+#include "tarnwick/platform/signal_guard.h"
 
 #include <fcntl.h>
 #include <gtest/gtest.h>
@@ -38,7 +38,7 @@ bool GuardedWriteBreaks() {
   int ends[2];
   if (pipe2(ends, O_CLOEXEC) != 0) return false;
   close(ends[0]);
-  SigpipeGuard guard;
+  SignalGuard guard(SIGPIPE);
   const bool broken = write(ends[1], "x", 1) == -1 && errno == EPIPE;
   guard.DiscardPending();
   const bool errno_kept = errno == EPIPE;
@@ -56,18 +56,18 @@ void ExpectInChild(const std::function<bool()>& body) {
   EXPECT_EQ(result.code, 0);
 }
 
-TEST(SigpipeGuard, ABrokenPipeIsAnErrorAndDoesNotEndTheProcess) {
+TEST(SignalGuard, ABrokenPipeIsAnErrorAndDoesNotEndTheProcess) {
   ExpectInChild([] { return GuardedWriteBreaks() && !Blocked() && !Pending(); });
 }
 
-TEST(SigpipeGuard, ACallersBlockStaysAndNothingIsLeftPending) {
+TEST(SignalGuard, ACallersBlockStaysAndNothingIsLeftPending) {
   ExpectInChild([] {
     BlockSigpipe();
     return GuardedWriteBreaks() && Blocked() && !Pending();
   });
 }
 
-TEST(SigpipeGuard, ASignalThatWasPendingBeforeStaysPending) {
+TEST(SignalGuard, ASignalThatWasPendingBeforeStaysPending) {
   ExpectInChild([] {
     BlockSigpipe();
     raise(SIGPIPE);
@@ -75,7 +75,7 @@ TEST(SigpipeGuard, ASignalThatWasPendingBeforeStaysPending) {
   });
 }
 
-TEST(SigpipeGuard, ACallersHandlerStaysAndIsNotCalled) {
+TEST(SignalGuard, ACallersHandlerStaysAndIsNotCalled) {
   ExpectInChild([] {
     static volatile sig_atomic_t calls;
     calls = 0;
@@ -85,19 +85,19 @@ TEST(SigpipeGuard, ACallersHandlerStaysAndIsNotCalled) {
   });
 }
 
-TEST(SigpipeGuard, AnIgnoredSignalIsFineToo) {
+TEST(SignalGuard, AnIgnoredSignalIsFineToo) {
   ExpectInChild([] {
     signal(SIGPIPE, SIG_IGN);
     return GuardedWriteBreaks() && !Pending();
   });
 }
 
-TEST(SigpipeGuard, OtherSignalsAreDeliveredInsideIt) {
+TEST(SignalGuard, OtherSignalsAreDeliveredInsideIt) {
   ExpectInChild([] {
     static volatile sig_atomic_t calls;
     calls = 0;
     signal(SIGUSR1, [](int) { calls = calls + 1; });
-    SigpipeGuard guard;
+    SignalGuard guard(SIGPIPE);
     raise(SIGUSR1);
     return calls == 1;
   });

@@ -1,4 +1,4 @@
-// Reading: straight from the descriptor, and through the read-ahead and push-back buffer.
+// Reading data and lines: from the descriptor, and through the read-ahead and push-back buffer.
 #define TW_LOG_SOURCE "twsocket"
 
 #include <algorithm>
@@ -150,6 +150,39 @@ void TWSocket::OnEndOfStream() {
 void TWSocket::LogFailedRead() {
   TW_LOG_AS(kReadData, LOG_CATEG_SOCKET, LOG_LEVEL_INFO,
             "Read socket [%d] failed with errno [%d].\n", m_sockFd, errno);
+}
+
+int TWSocket::ReadToLineEnd(char* buf, int bufLen) {
+  if (buf == nullptr || bufLen <= 0) return -1;
+  int length = 0;
+  for (;;) {
+    if (m_bBuffered) {
+      length += ConsumeLineBody(buf + length, bufLen - 1 - length);
+      if (ConsumeLineEnding()) break;
+    }
+    char byte;
+    const int count = ReadData(&byte, 1);
+    if (count < 0) return -1;
+    if (count == 0 || byte == '\n') break;
+    if (byte == '\r') {
+      // Whatever follows is dropped, not only a line feed. Kept as it is: callers may depend on it;
+      // pinned by ReadToLineEnd.ACarriageReturnDropsTheNextByteWhateverItIs.
+      if (ReadData(&byte, 1) <= 0) return -1;
+      break;
+    }
+    buf[length++] = byte;
+    if (length == bufLen) {
+      TW_LOG(LOG_CATEG_SOCKET, LOG_LEVEL_INFO,
+             "BufLen [%d] reached before line ending when read Fd [%d],terminate buffer "
+             "explicitly.\n",
+             bufLen, m_sockFd);
+      // The byte just stored makes room for the terminating zero and is lost.
+      --length;
+      break;
+    }
+  }
+  buf[length] = '\0';
+  return length;
 }
 
 int TWSocket::RestoreData(char* data, int len) {
