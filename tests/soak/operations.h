@@ -8,7 +8,7 @@
 #include "tests/http/http_test_util.h"
 #include "tests/soak/plan.h"
 #include "tests/soak/server.h"
-#include "tests/soak/tally.h"
+#include "tests/soak/statistics.h"
 
 // Where the plans' requests go.
 struct Endpoints {

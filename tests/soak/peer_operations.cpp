@@ -123,8 +123,8 @@ bool HeadIsRight(const Plan& plan, const OperationResult& result) {
   const bool chunked = plan.framing == Framing::kChunked && !Has(plan, kTwoRequests);
   const std::string announced = result.Field(HTTP_CONTENT_LENGTH);
   const bool length = announced.empty() || announced == std::to_string(AnswerOf(plan).size());
-  return result.Field(HTTP_CONTENT_TYPE) == "text/x-soak; id=" + id && result.cookie == "id=" + id + ";" && length &&
-         (result.encoding == "chunked") == chunked;
+  return result.Field(HTTP_CONTENT_TYPE) == "text/x-soak; id=" + id &&
+         result.cookie == "id=" + id + ";" && length && (result.encoding == "chunked") == chunked;
 }
 
 // The text of a right response, as the operation shows it.

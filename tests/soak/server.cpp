@@ -12,7 +12,7 @@
 #include <cstdlib>
 #include <thread>
 
-#include "tests/soak/reply.h"
+#include "tests/soak/response.h"
 #include "tests/support/ports.h"
 #include "tests/support/tls_identity.h"
 

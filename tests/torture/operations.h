@@ -5,7 +5,7 @@
 #include <string>
 #include <vector>
 
-#include "tests/torture/stage.h"
+#include "tests/torture/test_run.h"
 
 std::vector<Operation> LogOperations();
 std::vector<Operation> UtilsOperations();

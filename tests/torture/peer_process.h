@@ -9,7 +9,7 @@
 #include <string>
 
 #include "tests/support/tls_identity.h"
-#include "tests/torture/stage.h"
+#include "tests/torture/test_run.h"
 
 // What the peer sends as a body, whole or in chunks.
 const std::string& Body();

@@ -3,7 +3,7 @@
 #define TARNWICK_TESTS_TORTURE_SWEEP_H_
 
 #include "tests/torture/injection.h"
-#include "tests/torture/stage.h"
+#include "tests/torture/test_run.h"
 
 // How far a sweep has come, in memory that the process which makes it shares with its parent.
 struct Progress {

@@ -9,8 +9,8 @@
 #include <thread>
 
 #include "tests/torture/injection.h"
-#include "tests/torture/stage.h"
 #include "tests/torture/sweep.h"
+#include "tests/torture/test_run.h"
 
 // Ends the process, with a mistake noted, when a run takes too long.
 class Watchdog {

@@ -1,4 +1,4 @@
-#include "tests/soak/tally.h"
+#include "tests/soak/statistics.h"
 
 #include <cstdio>
 

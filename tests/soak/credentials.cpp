@@ -1,4 +1,4 @@
-#include "tests/soak/login.h"
+#include "tests/soak/credentials.h"
 
 #include <openssl/evp.h>
 

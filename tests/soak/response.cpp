@@ -1,11 +1,11 @@
-#include "tests/soak/reply.h"
+#include "tests/soak/response.h"
 
 #include <algorithm>
 #include <cstdio>
 #include <cstdlib>
 #include <string_view>
 
-#include "tests/soak/login.h"
+#include "tests/soak/credentials.h"
 
 namespace {
 

@@ -1,4 +1,4 @@
-#include "tests/torture/stage.h"
+#include "tests/torture/test_run.h"
 
 void Stage::Expect(bool right, const std::string& mistake) {
   if (right) return;

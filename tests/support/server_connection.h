@@ -1,6 +1,6 @@
 // One connection as the soak's server sees it: plain or TLS, blocking, with limits of time.
-#ifndef TARNWICK_TESTS_SOAK_CHANNEL_H_
-#define TARNWICK_TESTS_SOAK_CHANNEL_H_
+#ifndef TARNWICK_TESTS_SUPPORT_SERVER_CONNECTION_H_
+#define TARNWICK_TESTS_SUPPORT_SERVER_CONNECTION_H_
 
 #include <openssl/ssl.h>
 
@@ -45,4 +45,4 @@ class Channel {
   std::string pending_;
 };
 
-#endif  // TARNWICK_TESTS_SOAK_CHANNEL_H_
+#endif  // TARNWICK_TESTS_SUPPORT_SERVER_CONNECTION_H_

@@ -1,11 +1,11 @@
 // What the soak's server answers to a request, and how it spoils the answer.
-#ifndef TARNWICK_TESTS_SOAK_REPLY_H_
-#define TARNWICK_TESTS_SOAK_REPLY_H_
+#ifndef TARNWICK_TESTS_SOAK_RESPONSE_H_
+#define TARNWICK_TESTS_SOAK_RESPONSE_H_
 
 #include <string>
 
-#include "tests/soak/channel.h"
 #include "tests/soak/plan.h"
+#include "tests/support/server_connection.h"
 
 struct Request {
   std::string head;  // with the empty line
@@ -22,4 +22,4 @@ bool SendReply(Channel* channel, const Request& request);
 // Bytes that are no reply.
 std::string Noise(unsigned seed);
 
-#endif  // TARNWICK_TESTS_SOAK_REPLY_H_
+#endif  // TARNWICK_TESTS_SOAK_RESPONSE_H_

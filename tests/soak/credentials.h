@@ -1,6 +1,6 @@
 // The logins that the soak's server asks for and checks.
-#ifndef TARNWICK_TESTS_SOAK_LOGIN_H_
-#define TARNWICK_TESTS_SOAK_LOGIN_H_
+#ifndef TARNWICK_TESTS_SOAK_CREDENTIALS_H_
+#define TARNWICK_TESTS_SOAK_CREDENTIALS_H_
 
 #include <string>
 
@@ -13,4 +13,4 @@ std::string ChallengeOf(Login login);
 // its own, without the library.
 bool LoginIsRight(Login login, const std::string& head);
 
-#endif  // TARNWICK_TESTS_SOAK_LOGIN_H_
+#endif  // TARNWICK_TESTS_SOAK_CREDENTIALS_H_

@@ -1,6 +1,6 @@
 // What the operations of the soak have come to.
-#ifndef TARNWICK_TESTS_SOAK_TALLY_H_
-#define TARNWICK_TESTS_SOAK_TALLY_H_
+#ifndef TARNWICK_TESTS_SOAK_STATISTICS_H_
+#define TARNWICK_TESTS_SOAK_STATISTICS_H_
 
 #include <mutex>
 #include <string>
@@ -54,4 +54,4 @@ class Tally {
   std::vector<std::string> details_;  // of the first unexpected ones
 };
 
-#endif  // TARNWICK_TESTS_SOAK_TALLY_H_
+#endif  // TARNWICK_TESTS_SOAK_STATISTICS_H_

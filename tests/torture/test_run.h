@@ -1,6 +1,6 @@
 // What an operation under torture works with, and its check of its own result.
-#ifndef TARNWICK_TESTS_TORTURE_STAGE_H_
-#define TARNWICK_TESTS_TORTURE_STAGE_H_
+#ifndef TARNWICK_TESTS_TORTURE_TEST_RUN_H_
+#define TARNWICK_TESTS_TORTURE_TEST_RUN_H_
 
 #include <pthread.h>
 
@@ -88,4 +88,4 @@ struct Operation {
   bool slow = false;  // makes a TLS handshake, which allocates thousands of times
 };
 
-#endif  // TARNWICK_TESTS_TORTURE_STAGE_H_
+#endif  // TARNWICK_TESTS_TORTURE_TEST_RUN_H_

@@ -1,4 +1,4 @@
-#include "tests/soak/channel.h"
+#include "tests/support/server_connection.h"
 
 #include <netinet/in.h>
 #include <netinet/tcp.h>
