@@ -1,4 +1,4 @@
-// The logins that the soak's server asks for and checks.
+// The credentials that the soak's server asks for and checks.
 #ifndef TARNWICK_TESTS_SOAK_CREDENTIALS_H_
 #define TARNWICK_TESTS_SOAK_CREDENTIALS_H_
 
@@ -6,11 +6,11 @@
 
 #include "tests/soak/plan.h"
 
-// The header line that asks for it, with its line end.
-std::string ChallengeOf(Login login);
+// The header field that asks for it, with its CRLF.
+std::string ChallengeOf(Scheme scheme);
 
-// True when the request's head carries the right login. The response of Digest is computed here on
+// True when the request's head carries the right credentials. The response of Digest is computed here on
 // its own, without the library.
-bool LoginIsRight(Login login, const std::string& head);
+bool CredentialsAreRight(Scheme scheme, const std::string& head);
 
 #endif  // TARNWICK_TESTS_SOAK_CREDENTIALS_H_

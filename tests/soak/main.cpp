@@ -57,7 +57,7 @@ struct Soak {
   Options options;
   Endpoints endpoints;
   std::atomic<bool> stop{false};
-  Tally tally;
+  Statistics statistics;
 };
 
 struct Worker {
@@ -102,7 +102,7 @@ void* Work(void* argument) {
     const Plan plan = NextPlan(round * kThreads + worker->number, &random);
     Outcome outcome = RunOperation(plan, &session);
     PlantFault(soak->options.plant, round, &session, &outcome);
-    soak->tally.Add(plan, outcome);
+    soak->statistics.Add(plan, outcome);
   }
   worker->log_lines = session.log_lines;
   return nullptr;
@@ -132,7 +132,7 @@ void EndIfHanging(const Worker (&workers)[kThreads]) {
 
 void PrintProgress(long elapsed, const Soak& soak, const MemoryMeter& memory) {
   printf("%5ld s  %9lu operations  %3lu unexpected  %7ld KiB resident  %7ld KiB in use  %zu fds\n",
-         elapsed, soak.tally.Operations(), soak.tally.Unexpected(), memory.ResidentNow(),
+         elapsed, soak.statistics.Operations(), soak.statistics.Unexpected(), memory.ResidentNow(),
          memory.InUseNow(), OpenDescriptors().size());
   fflush(stdout);
 }
@@ -222,11 +222,12 @@ bool Run(const Options& options) {
   StopWorkers(&soak, workers);
 
   Verdict verdict;
-  soak.tally.Print();
+  soak.statistics.Print();
   puts("");
-  const unsigned long unexpected = soak.tally.Unexpected();
+  const unsigned long unexpected = soak.statistics.Unexpected();
   verdict.Judge(unexpected == 0, "%-20s %lu, unexpected %lu, in %.1f minutes with seed %u",
-                "operations", soak.tally.Operations(), unexpected, options.minutes, options.seed);
+                "operations", soak.statistics.Operations(), unexpected, options.minutes,
+                options.seed);
   const bool warm = options.minutes / 2 >= kWarmMinutes;
   JudgeSlope("memory in use", memory.InUse(), kMostInUse, true, &verdict);
   JudgeSlope("resident memory", memory.Resident(), kMostResident, warm, &verdict);

@@ -67,7 +67,7 @@ OperationSettings SettingsOf(const Plan& plan, const Session& session) {
   // Without a buffer a SOAP request takes what one read returns for the response.
   settings.buffered = plan.size > 4000 || plan.id % 8 != 1 || Has(plan, kSoap) || Has(plan, kLine);
   settings.encode_query = Has(plan, kSendsQuery);
-  settings.basic_auth = plan.login == Login::kBasic && plan.id % 2 == 0;
+  settings.basic_auth = plan.scheme == Scheme::kBasic && plan.id % 2 == 0;
   settings.version = static_cast<HTTP_VERSION>(plan.id % 3);
   // Half of the TLS requests trust the server's authority, the others anybody; the one that must
   // meet the wrong certificate verifies it.
@@ -122,15 +122,15 @@ bool HeadIsRight(const Plan& plan, const OperationResult& result) {
   const std::string id = std::to_string(plan.id);
   const bool chunked = plan.framing == Framing::kChunked && !Has(plan, kTwoRequests);
   const std::string announced = result.Field(HTTP_CONTENT_LENGTH);
-  const bool length = announced.empty() || announced == std::to_string(AnswerOf(plan).size());
+  const bool length = announced.empty() || announced == std::to_string(ResponseBodyOf(plan).size());
   return result.Field(HTTP_CONTENT_TYPE) == "text/x-soak; id=" + id &&
          result.cookie == "id=" + id + ";" && length && (result.encoding == "chunked") == chunked;
 }
 
 // The text of a right response, as the operation shows it.
 std::string WantedText(const Plan& plan) {
-  if (Has(plan, kXml)) return "<?xml version=\"1.0\"?>\n" + AnswerOf(plan) + "\n";
-  if (!Has(plan, kJson)) return AnswerOf(plan);
+  if (Has(plan, kXml)) return "<?xml version=\"1.0\"?>\n" + ResponseBodyOf(plan) + "\n";
+  if (!Has(plan, kJson)) return ResponseBodyOf(plan);
   return "{\n\t\"success\" : true,\n\t\"value\" : \"" + ValueOf(plan) + "\"\n}\n";
 }
 
@@ -142,12 +142,12 @@ Outcome JudgeFile(const Plan& plan, const std::string& content) {
   if (head == std::string::npos && plan.fault == Fault::kCutHead) return {Outcome::kCut, ""};
   const std::string start = "Content-Type: text/x-soak; id=" + id + "\r\nSet-Cookie: id=" + id;
   if (head == std::string::npos || content.rfind(start, 0) != 0) return Wrong("the file's head");
-  return Compare(content.substr(head + 4), AnswerOf(plan));
+  return Compare(content.substr(head + 4), ResponseBodyOf(plan));
 }
 
 Outcome JudgeLine(const Plan& plan, const OperationResult& result) {
   if (result.first.empty()) return FailedBy("a line of", result.read);
-  const Outcome outcome = Compare(result.first, AnswerOf(plan));
+  const Outcome outcome = Compare(result.first, ResponseBodyOf(plan));
   if (outcome.kind != Outcome::kRight) return outcome;
   return result.has_text && result.text.empty() ? outcome : Wrong("no end");
 }
@@ -170,7 +170,8 @@ Outcome Judge(const Plan& plan, const PeerOperation& operation, const OperationR
   if (healthy && !result.healthy) return Wrong("a smaller call");
   if (Has(plan, kReadsNothing)) return {};
   if (Has(plan, kLine)) return JudgeLine(plan, result);
-  if (Has(plan, kTwoRequests) && result.first != AnswerOf(plan)) return Wrong("first response");
+  if (Has(plan, kTwoRequests) && result.first != ResponseBodyOf(plan))
+    return Wrong("first response");
   if (operation.name == std::string("curl_get_file")) return JudgeFile(plan, result.text);
   return JudgeText(plan, result);
 }

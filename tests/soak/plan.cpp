@@ -72,7 +72,7 @@ Framing PickFraming(const Plan& plan, Random* random) {
 }
 
 // Mostly small, now and then longer than the library's buffers, rarely over the mebibyte up to
-// which a SOAP reply is read at once.
+// which a SOAP response is read at once.
 size_t PickSize(Random* random) {
   const size_t kind = Below(200, random);
   if (kind == 0) return 1100000 + Below(400000, random);
@@ -179,7 +179,7 @@ Plan NextPlan(unsigned id, Random* random) {
   if (chance == 5) plan.fault = Fault::kSlow;
   plan.framing = PickFraming(plan, random);
   plan.size = plan.fault == Fault::kSlow ? 1 + Below(400, random) : PickSize(random);
-  if (Has(plan, kLogsIn)) plan.login = static_cast<Login>(Below(4, random));
+  if (Has(plan, kLogsIn)) plan.scheme = static_cast<Scheme>(Below(4, random));
   return plan;
 }
 
@@ -187,7 +187,7 @@ std::string ToPath(const Plan& plan) {
   char text[128];
   snprintf(text, sizeof(text), "soak/%d/%d/%u/%zu/%d/%d/", plan.operation,
            static_cast<int>(plan.fault), plan.id, plan.size, static_cast<int>(plan.framing),
-           static_cast<int>(plan.login));
+           static_cast<int>(plan.scheme));
   return text;
 }
 
@@ -197,9 +197,9 @@ bool FindPlan(const std::string& request, Plan* plan) {
   int operation = 0;
   int fault = 0;
   int framing = 0;
-  int login = 0;
+  int scheme = 0;
   if (sscanf(request.c_str() + found, "soak/%d/%d/%u/%zu/%d/%d/", &operation, &fault, &plan->id,
-             &plan->size, &framing, &login) != 6) {
+             &plan->size, &framing, &scheme) != 6) {
     return false;
   }
   const int count = static_cast<int>(SoakOperations().size());
@@ -207,7 +207,7 @@ bool FindPlan(const std::string& request, Plan* plan) {
   plan->operation = operation;
   plan->fault = static_cast<Fault>(fault);
   plan->framing = static_cast<Framing>(framing);
-  plan->login = static_cast<Login>(login);
+  plan->scheme = static_cast<Scheme>(scheme);
   return true;
 }
 
@@ -215,7 +215,7 @@ std::string ValueOf(const Plan& plan) {
   return Filler(plan, true);
 }
 
-std::string AnswerOf(const Plan& plan) {
+std::string ResponseBodyOf(const Plan& plan) {
   if (Has(plan, kXml)) return "<answer><value>" + ValueOf(plan) + "</value></answer>";
   if (Has(plan, kJson)) return "{\"success\":true,\"value\":\"" + ValueOf(plan) + "\"}";
   if (Has(plan, kLine)) return ValueOf(plan);

@@ -41,18 +41,18 @@ std::string MissedOperations();
 
 enum class Fault {
   kNone,
-  kSlow,  // a right reply in many small pieces: no fault, though it looks like one
+  kSlow,  // a right response in many small pieces: no fault, though it looks like one
   // on ports of their own
   kRefused,         // nobody listens
   kBlackHole,       // the connection is never made
   kHangUp,          // accepted and closed at once
   kNoise,           // bytes that nobody asked for, in place of a TLS handshake too
-  kSilence,         // accepted and never answered, the TLS handshake neither
+  kSilence,         // accepted and left without a byte, the TLS handshake too
   kBadCertificate,  // another host's
-  // played by the server behind the request
-  kReset,         // no reply
-  kStall,         // no reply in time
-  kGarbage,       // a reply that is none
+  // played by the server after the request
+  kReset,         // no response
+  kStall,         // no response in time
+  kGarbage,       // bytes that are not a response
   kCutHead,       // closed within the head
   kCutBody,       // closed within the body
   kResetBody,     // reset within the body
@@ -60,22 +60,22 @@ enum class Fault {
   kLongLength,    // the length announced is too large
   kShortLength,   // and too small
   kBadChunk,      // no number in place of a chunk's size
-  kUnauthorized,  // 401, whatever the login
+  kUnauthorized,  // 401, whatever the credentials
   kServerError,   // 500
   kCount_
 };
 constexpr int kFaults = static_cast<int>(Fault::kCount_);
 
 enum class Framing { kLength, kChunked, kClose };
-enum class Login { kNone, kBasic, kDigest, kOldDigest };
+enum class Scheme { kNone, kBasic, kDigest, kOldDigest };
 
 struct Plan {
   int operation = 0;  // its place among SoakOperations()
   Fault fault = Fault::kNone;
   unsigned id = 0;
-  size_t size = 1;  // of the answer's variable part
+  size_t size = 1;  // of the response's variable part
   Framing framing = Framing::kLength;
-  Login login = Login::kNone;
+  Scheme scheme = Scheme::kNone;
   bool tls = false;
 };
 
@@ -104,11 +104,11 @@ size_t Below(size_t limit, Random* random);
 std::string ToPath(const Plan& plan);
 bool FindPlan(const std::string& request, Plan* plan);
 
-// What the answer's body is, and what a request with a body sends in it.
-std::string AnswerOf(const Plan& plan);
+// What the response's body is, and what a request with a body sends in it.
+std::string ResponseBodyOf(const Plan& plan);
 std::string RequestBodyOf(const Plan& plan);
 
-// The text in the answer's XML element or JSON member.
+// The text in the response's XML element or JSON member.
 std::string ValueOf(const Plan& plan);
 
 #endif  // TARNWICK_TESTS_SOAK_PLAN_H_

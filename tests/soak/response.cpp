@@ -2,7 +2,6 @@
 
 #include <algorithm>
 #include <cstdio>
-#include <cstdlib>
 #include <string_view>
 
 #include "tests/soak/credentials.h"
@@ -15,16 +14,8 @@ bool Contains(const std::string& text, std::string_view part) {
   return text.find(part) != std::string::npos;
 }
 
-// The number behind "Content-Length:"; 0 without one.
-size_t LengthOf(const std::string& head) {
-  constexpr std::string_view kName = "Content-Length:";
-  const size_t found = head.find(kName);
-  if (found == std::string::npos) return 0;
-  return std::strtoul(head.c_str() + found + kName.size(), nullptr, 10);
-}
-
-// The parts of a reply on their way to the client.
-struct Reply {
+// The parts of a response on their way to the client.
+struct Response {
   std::string head;
   std::string body;  // as it travels, with its framing
   bool keep_open = false;
@@ -52,25 +43,25 @@ size_t AnnouncedLength(const Plan& plan, size_t length) {
   return length;
 }
 
-Reply Success(const Plan& plan, bool keep_open) {
-  Reply reply;
-  reply.keep_open = keep_open;
-  const std::string answer = AnswerOf(plan);
+Response Success(const Plan& plan, bool keep_open) {
+  Response response;
+  response.keep_open = keep_open;
+  const std::string body = ResponseBodyOf(plan);
   const std::string id = std::to_string(plan.id);
-  reply.head = "HTTP/1.1 200 OK\r\nContent-Type: text/x-soak; id=" + id +
-               "\r\nSet-Cookie: id=" + id + "; Path=/\r\n";
-  if (!keep_open) reply.head += "Connection: close\r\n";
+  response.head = "HTTP/1.1 200 OK\r\nContent-Type: text/x-soak; id=" + id +
+                  "\r\nSet-Cookie: id=" + id + "; Path=/\r\n";
+  if (!keep_open) response.head += "Connection: close\r\n";
   if (plan.framing == Framing::kLength) {
-    reply.head +=
-        "Content-Length: " + std::to_string(AnnouncedLength(plan, answer.size())) + "\r\n";
+    response.head +=
+        "Content-Length: " + std::to_string(AnnouncedLength(plan, body.size())) + "\r\n";
   }
-  if (plan.framing == Framing::kChunked) reply.head += "Transfer-Encoding: chunked\r\n";
-  reply.head += "\r\n";
-  reply.body = plan.framing == Framing::kChunked ? Chunked(plan, answer) : answer;
-  return reply;
+  if (plan.framing == Framing::kChunked) response.head += "Transfer-Encoding: chunked\r\n";
+  response.head += "\r\n";
+  response.body = plan.framing == Framing::kChunked ? Chunked(plan, body) : body;
+  return response;
 }
 
-Reply Refusal(const std::string& status, const std::string& more, unsigned id) {
+Response Refusal(const std::string& status, const std::string& more, unsigned id) {
   // A refusal without a body is another path through the SOAP requests than one with a body.
   const std::string body = id % 2 == 0 ? "refused" : "";
   return {"HTTP/1.1 " + status + "\r\n" + more +
@@ -91,17 +82,17 @@ std::string WrongPart(const Request& request) {
   return "";
 }
 
-Reply ReplyTo(const Request& request) {
+Response ResponseTo(const Request& request) {
   const Plan& plan = request.plan;
-  if (Has(plan, kLine)) return {"", AnswerOf(plan) + "\r\n", false};
+  if (Has(plan, kLine)) return {"", ResponseBodyOf(plan) + "\r\n", false};
   if (plan.fault == Fault::kServerError) return Refusal("500 Soak", "", plan.id);
   // Asked for in turns where the plan names none.
-  const Login login = plan.login != Login::kNone           ? plan.login
-                      : plan.fault != Fault::kUnauthorized ? Login::kNone
-                      : plan.id % 4 < 2                    ? Login::kBasic
-                                                           : Login::kDigest;
-  if (plan.fault == Fault::kUnauthorized || !LoginIsRight(login, request.head)) {
-    return Refusal("401 Unauthorized", ChallengeOf(login), plan.id);
+  const Scheme scheme = plan.scheme != Scheme::kNone         ? plan.scheme
+                        : plan.fault != Fault::kUnauthorized ? Scheme::kNone
+                        : plan.id % 4 < 2                    ? Scheme::kBasic
+                                                             : Scheme::kDigest;
+  if (plan.fault == Fault::kUnauthorized || !CredentialsAreRight(scheme, request.head)) {
+    return Refusal("401 Unauthorized", ChallengeOf(scheme), plan.id);
   }
   const std::string wrong = WrongPart(request);
   if (!wrong.empty()) return Refusal("409 Wrong " + wrong, "", plan.id);
@@ -113,11 +104,11 @@ Reply ReplyTo(const Request& request) {
   return Success(healthy, true);
 }
 
-void WriteSlowly(Channel* channel, const std::string& bytes, unsigned seed) {
+void WriteSlowly(ServerConnection* connection, const std::string& bytes, unsigned seed) {
   Random random(seed);
   for (size_t sent = 0; sent < bytes.size();) {
     const size_t count = 1 + Below(20, &random);
-    if (!channel->Write(bytes.substr(sent, count))) return;
+    if (!connection->Write(bytes.substr(sent, count))) return;
     sent += count;
   }
 }
@@ -129,58 +120,54 @@ std::string Half(const std::string& bytes, unsigned seed) {
 
 }  // namespace
 
-bool ReadRequest(Channel* channel, Request* request) {
-  if (!channel->ReadUntil("\r\n\r\n", &request->head)) return false;
-  request->body.clear();
-  const bool upload = Contains(request->head, "multipart/form-data");
-  const size_t length = LengthOf(request->head);
-  if (upload) {
-    if (!FindPlan(request->head, &request->plan)) return false;
-    // In the middle of what the client writes.
-    if (request->plan.fault == Fault::kReset) return true;
-    return channel->ReadUntil(std::string(kBoundary) + "--\r\n", &request->body);
+bool ReadRequest(ServerConnection* connection, Request* request) {
+  if (!connection->ReadRequest(&request->head, &request->body)) return false;
+  if (!Contains(request->head, "multipart/form-data")) {
+    return FindPlan(request->head, &request->plan) || FindPlan(request->body, &request->plan);
   }
-  if (length > 0 && !channel->ReadBytes(length, &request->body)) return false;
-  return FindPlan(request->head, &request->plan) || FindPlan(request->body, &request->plan);
+  if (!FindPlan(request->head, &request->plan)) return false;
+  // In the middle of what the client writes.
+  if (request->plan.fault == Fault::kReset) return true;
+  return connection->ReadUntil(std::string(kBoundary) + "--\r\n", &request->body);
 }
 
-bool SendReply(Channel* channel, const Request& request) {
+bool SendResponse(ServerConnection* connection, const Request& request) {
   const Plan& plan = request.plan;
-  const Reply reply = ReplyTo(request);
-  if (reply.keep_open) return channel->Write(reply.head + reply.body);
+  const Response response = ResponseTo(request);
+  if (response.keep_open) return connection->Write(response.head + response.body);
   switch (plan.fault) {
     case Fault::kReset:
-      channel->Reset();
+      connection->Reset();
       return false;
     case Fault::kStall:
-      channel->Stall();
+      connection->Stall();
       return false;
     case Fault::kGarbage:
-      channel->Write(Noise(plan.id));
+      connection->Write(Noise(plan.id));
       break;
     case Fault::kCutHead:
-      channel->Write(reply.head.substr(0, plan.id % (reply.head.size() - 2)));
-      channel->Cut();
+      connection->Write(response.head.substr(0, plan.id % (response.head.size() - 2)));
+      connection->Cut();
       return false;
     case Fault::kCutBody:
-      channel->Write(reply.head + Half(reply.body, plan.id));
-      channel->Cut();
+      connection->Write(response.head + Half(response.body, plan.id));
+      connection->Cut();
       return false;
     case Fault::kResetBody:
-      channel->Write(reply.head + Half(reply.body, plan.id));
-      channel->Reset();
+      connection->Write(response.head + Half(response.body, plan.id));
+      connection->Reset();
       return false;
     case Fault::kStallBody:
-      channel->Write(reply.head + Half(reply.body, plan.id));
-      channel->Stall();
+      connection->Write(response.head + Half(response.body, plan.id));
+      connection->Stall();
       return false;
     case Fault::kSlow:
-      WriteSlowly(channel, reply.head + reply.body, plan.id);
+      WriteSlowly(connection, response.head + response.body, plan.id);
       break;
     default:
-      channel->Write(reply.head + reply.body);
+      connection->Write(response.head + response.body);
   }
-  channel->Close();
+  connection->Close();
   return false;
 }
 

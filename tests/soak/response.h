@@ -1,4 +1,4 @@
-// What the soak's server answers to a request, and how it spoils the answer.
+// What the soak's server responds to a request, and how it spoils the response.
 #ifndef TARNWICK_TESTS_SOAK_RESPONSE_H_
 #define TARNWICK_TESTS_SOAK_RESPONSE_H_
 
@@ -14,12 +14,12 @@ struct Request {
 };
 
 // Reads one request; false when the client ended, or sent one that the soak does not know.
-bool ReadRequest(Channel* channel, Request* request);
+bool ReadRequest(ServerConnection* connection, Request* request);
 
-// Answers it, with the fault of its plan. Results: true when the connection stays open for another.
-bool SendReply(Channel* channel, const Request& request);
+// Responds to it, with the fault of its plan. Results: true when the connection stays open for another.
+bool SendResponse(ServerConnection* connection, const Request& request);
 
-// Bytes that are no reply.
+// Bytes that are not a response.
 std::string Noise(unsigned seed);
 
 #endif  // TARNWICK_TESTS_SOAK_RESPONSE_H_

@@ -50,7 +50,7 @@ bool IsExpected(const Plan& plan, const Outcome& outcome) {
   return ((Allowed(plan.fault) | AllowedBlindly(plan)) & Bit(outcome.kind)) != 0;
 }
 
-void Tally::AddTo(Count* count, const Plan& plan, const Outcome& outcome) {
+void Statistics::AddTo(Count* count, const Plan& plan, const Outcome& outcome) {
   ++count->all;
   const bool fault = plan.fault > Fault::kSlow;
   if (fault) ++count->faults;
@@ -65,7 +65,7 @@ void Tally::AddTo(Count* count, const Plan& plan, const Outcome& outcome) {
   }
 }
 
-void Tally::Add(const Plan& plan, const Outcome& outcome) {
+void Statistics::Add(const Plan& plan, const Outcome& outcome) {
   const std::lock_guard<std::mutex> lock(mutex_);
   AddTo(&total_, plan, outcome);
   AddTo(&operations_[static_cast<size_t>(plan.operation)], plan, outcome);
@@ -76,22 +76,22 @@ void Tally::Add(const Plan& plan, const Outcome& outcome) {
                      kKindNames[outcome.kind] + " " + outcome.detail);
 }
 
-unsigned long Tally::Operations() const {
+unsigned long Statistics::Operations() const {
   const std::lock_guard<std::mutex> lock(mutex_);
   return total_.all;
 }
 
-unsigned long Tally::Unexpected() const {
+unsigned long Statistics::Unexpected() const {
   const std::lock_guard<std::mutex> lock(mutex_);
   return total_.unexpected;
 }
 
-void Tally::PrintRow(const char* name, const Count& count) {
+void Statistics::PrintRow(const char* name, const Count& count) {
   printf("%-28s %9lu %9lu %8lu %8lu %8lu %8lu %10lu\n", name, count.all, count.right, count.faults,
          count.failed, count.cut, count.right_despite, count.unexpected);
 }
 
-void Tally::Print() const {
+void Statistics::Print() const {
   const std::lock_guard<std::mutex> lock(mutex_);
   constexpr char kHead[] = "\n%-28s %9s %9s %8s %8s %8s %8s %10s\n";
   printf(kHead, "operation", "all", "right", "faults", "= failed", "+ cut", "+ right",

@@ -24,7 +24,7 @@ struct Outcome {
 bool IsExpected(const Plan& plan, const Outcome& outcome);
 
 // Threads: any.
-class Tally {
+class Statistics {
  public:
   void Add(const Plan& plan, const Outcome& outcome);
 

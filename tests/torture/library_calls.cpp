@@ -19,7 +19,7 @@ Verdict Ask(const CallKind& kind) {
   return t_injection.armed ? NextCall(kind) : Verdict{Verdict::kPass, 0};
 }
 
-// The function behind this program's.
+// The function that this program's hides.
 template <typename Function>
 Function Next(const char* name, Function /*same_type*/) {
   return reinterpret_cast<Function>(dlsym(RTLD_NEXT, name));

@@ -168,12 +168,12 @@ OperationSettings SettingsOf(const Row& row, int port) {
 }
 
 // A head that was read whole, or was spoilt by the fault.
-void JudgeHead(Stage& stage, const Row& row, const OperationResult& result) {
+void JudgeHead(TestRun& test, const Row& row, const OperationResult& result) {
   const bool whole = result.response == HTTP_RET_OK && result.status == 200;
-  stage.ExpectEither(whole, result.response != HTTP_RET_OK, "the outcome is wrong");
+  test.ExpectEither(whole, result.response != HTTP_RET_OK, "the outcome is wrong");
   if (!whole || (row.traits & kKeepsHead) == 0) return;
-  stage.Expect(result.Field(HTTP_CONTENT_RANGE) == "bytes 0-9/10", "a header field is lost");
-  stage.Expect(result.cookie == "id=42;", "the cookie is lost");
+  test.Expect(result.Field(HTTP_CONTENT_RANGE) == "bytes 0-9/10", "a header field is lost");
+  test.Expect(result.cookie == "id=42;", "the cookie is lost");
 }
 
 // When they fail they may leave the text of a refusal, or half of a value.
@@ -183,47 +183,47 @@ bool LeavesAnotherText(const PeerOperation& operation) {
 }
 
 // The text is the peer's, or a front part of it.
-void JudgeText(Stage& stage, const Row& row, const OperationResult& result) {
+void JudgeText(TestRun& test, const Row& row, const OperationResult& result) {
   const bool any = result.result != 0 && LeavesAnotherText(OperationNamed(row.operation));
   const bool front = row.text.compare(0, result.text.size(), result.text) == 0;
-  stage.Expect(front || any, "the text is not the peer's");
+  test.Expect(front || any, "the text is not the peer's");
   const bool whole = result.has_text && result.text == row.text;
-  const bool cut = (row.traits & kMayBeCut) != 0 && stage.MayFail() && result.head;
-  stage.Expect(!result.has_text || whole || cut, "half a text is a success");
-  stage.Expect(whole || stage.MayFail(), "the text is not whole");
+  const bool cut = (row.traits & kMayBeCut) != 0 && test.MayFail() && result.head;
+  test.Expect(!result.has_text || whole || cut, "half a text is a success");
+  test.Expect(whole || test.MayFail(), "the text is not whole");
 }
 
-void Judge(Stage& stage, const Row& row, const OperationResult& result) {
+void Judge(TestRun& test, const Row& row, const OperationResult& result) {
   const PeerOperation& operation = OperationNamed(row.operation);
-  stage.Expect(result.mistake.empty(), result.mistake);
+  test.Expect(result.mistake.empty(), result.mistake);
   if ((row.traits & kRefused) != 0) {
-    stage.Expect(result.result != 0, "a refused connection is a success");
+    test.Expect(result.result != 0, "a refused connection is a success");
     return;
   }
   const std::vector<int>& failures = operation.failures;
   const bool documented =
       std::find(failures.begin(), failures.end(), result.result) != failures.end();
-  stage.ExpectEither(result.result == 0, documented, "the result is wrong");
-  stage.Expect(result.healthy || stage.MayFail(), "a smaller call has failed");
+  test.ExpectEither(result.result == 0, documented, "the result is wrong");
+  test.Expect(result.healthy || test.MayFail(), "a smaller call has failed");
   const bool has_head = result.status != -1 && !operation.curl;
-  if (has_head && result.result == HTTP_RET_OK) JudgeHead(stage, row, result);
+  if (has_head && result.result == HTTP_RET_OK) JudgeHead(test, row, result);
   if (row.operation == std::string("socket_exchange")) {
-    stage.ExpectEither(result.first == kStatusLine, result.read == -1, "the line is wrong");
+    test.ExpectEither(result.first == kStatusLine, result.read == -1, "the line is wrong");
   }
-  if (!row.text.empty()) JudgeText(stage, row, result);
+  if (!row.text.empty()) JudgeText(test, row, result);
 }
 
-void RunRow(Stage& stage, const Row& row) {
-  OperationSettings settings = SettingsOf(row, stage.Port());
+void RunRow(TestRun& test, const Row& row) {
+  OperationSettings settings = SettingsOf(row, test.Port());
   int step = 0;
   settings.run_step = [&](const std::function<void()>& run) {
     if (step++ < row.plain_steps) {
       run();
     } else {
-      stage.Run(run);
+      test.Run(run);
     }
   };
-  Judge(stage, row, OperationNamed(row.operation).run(settings));
+  Judge(test, row, OperationNamed(row.operation).run(settings));
 }
 
 }  // namespace
@@ -231,10 +231,10 @@ void RunRow(Stage& stage, const Row& row) {
 std::vector<Operation> PeerOperationsUnderTorture() {
   std::vector<Operation> operations;
   for (const Row& row : AllRows()) {
-    const Peer peer = (row.traits & kRefused) != 0 ? Peer::kNone
-                      : (row.traits & kTls) != 0   ? Peer::kTls
-                                                   : Peer::kPlain;
-    operations.push_back({row.name, peer, [row](Stage& stage) { RunRow(stage, row); },
+    const PeerKind peer = (row.traits & kRefused) != 0 ? PeerKind::kNone
+                          : (row.traits & kTls) != 0   ? PeerKind::kTls
+                                                       : PeerKind::kPlain;
+    operations.push_back({row.name, peer, [row](TestRun& test) { RunRow(test, row); },
                           (row.traits & kCold) != 0, (row.traits & kSlow) != 0});
   }
   return operations;

@@ -1,6 +1,6 @@
 #include "tests/torture/test_run.h"
 
-void Stage::Expect(bool right, const std::string& mistake) {
+void TestRun::Expect(bool right, const std::string& mistake) {
   if (right) return;
   mistakes_ += mistake;
   mistakes_ += "; ";
