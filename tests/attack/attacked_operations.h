@@ -1,5 +1,5 @@
-// The operations that the hostile server attacks: those of the table that read a response, with what
-// the headers and docs/longest-call.md say of each.
+// The operations that the hostile server attacks: those of the table that read a response, with
+// what the headers and docs/longest-call.md say of each.
 #ifndef TARNWICK_TESTS_ATTACK_ATTACKED_OPERATIONS_H_
 #define TARNWICK_TESTS_ATTACK_ATTACKED_OPERATIONS_H_
 

@@ -20,7 +20,7 @@ inline constexpr int kHold = 17;
 struct CasePeer {
   std::string endpoint;         // the simulated camera's, in the words of its command line
   std::vector<Script> scripts;  // of the connections, where the camera has no such fault
-  bool byte_by_byte = false;    // the scripts speak TLS, behind a relay that lets bytes wait
+  bool byte_by_byte = false;    // the scripts speak TLS, through a relay that delays bytes
 };
 
 inline CasePeer Camera(const std::string& endpoint) {

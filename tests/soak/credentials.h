@@ -9,8 +9,8 @@
 // The header field that asks for it, with its CRLF.
 std::string ChallengeOf(Scheme scheme);
 
-// True when the request's head carries the right credentials. The response of Digest is computed here on
-// its own, without the library.
+// True when the request's head carries the right credentials. The response of Digest is computed
+// here on its own, without the library.
 bool CredentialsAreRight(Scheme scheme, const std::string& head);
 
 #endif  // TARNWICK_TESTS_SOAK_CREDENTIALS_H_

@@ -11,7 +11,7 @@
 #include "tarnwick/log/twdebuglog.h"
 #include "tarnwick/platform/qlibcfile.h"
 #include "tarnwick/utils/utils.h"
-#include "tests/soak/log_keeper.h"
+#include "tests/soak/log_rotator.h"
 #include "tests/soak/operations.h"
 #include "tests/support/flag.h"
 

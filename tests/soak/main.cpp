@@ -1,7 +1,7 @@
 // The library under a long, mixed load: eight threads do everything that it offers, against a
-// server that spoils 5 of 100 answers, while the logs are rotated and the levels change.
+// server that spoils 5 of 100 responses, while the logs are rotated and the levels change.
 //
-//   scripts/sandbox tarnwick_soak [MINUTES] [--seed N] [--plant leak|descriptor|answer|line]
+//   scripts/sandbox tarnwick_soak [MINUTES] [--seed N] [--plant leak|descriptor|response|line]
 //
 // Each result is checked. It fails for one that the contract does not allow, for descriptors left
 // open, memory that grows, an operation that hangs, and a log line that is torn or missing. --plant
@@ -20,7 +20,7 @@
 #include "tarnwick/log/twdebuglog.h"
 #include "tarnwick/utils/utils.h"
 #include "tests/http/http_test_util.h"
-#include "tests/soak/log_keeper.h"
+#include "tests/soak/log_rotator.h"
 #include "tests/soak/meter.h"
 #include "tests/soak/operations.h"
 #include "tests/support/ports.h"
@@ -36,8 +36,8 @@ constexpr int kProgressSeconds = 10;
 // More than any operation takes, its time limits and a busy machine included.
 constexpr int kHangSeconds = 120;
 
-// Growth that counts as a leak, in KiB a minute. What is in use is known to the byte: 64 KiB are
-// under four bytes an operation, at the 20,000 that two processors make in a minute. Resident
+// Growth that is taken for a leak, in KiB a minute. What is in use is known to the byte: 64 KiB are
+// under four bytes per operation, at the 20,000 that two processors make in a minute. Resident
 // memory grows while malloc spreads over its arenas, so its bound is wider, and the first two
 // minutes, in which that is most of it, never count. Both have four standard errors on top: the
 // line through the samples of a short run is uncertain.
@@ -82,7 +82,7 @@ void PlantFault(const std::string& kind, unsigned round, Session* session, Outco
     lost = memset(malloc(kLost), 1, kLost);
   }
   if (kind == "descriptor" && dup(STDOUT_FILENO) < 0) *outcome = Wrong("no descriptor");
-  if (kind == "answer") *outcome = Wrong("planted");
+  if (kind == "response") *outcome = Wrong("planted");
   if (kind == "line") ++session->log_lines;
 }
 
@@ -177,7 +177,7 @@ class Verdict {
 
 void JudgeSlope(const char* what, const Slope& slope, double most, bool warm, Verdict* verdict) {
   const char* left_out = warm ? "" : " (not judged: still warming up)";
-  if (!MemoryMeter::Tells()) left_out = " (not judged under a sanitizer)";
+  if (!MemoryMeter::IsReliable()) left_out = " (not judged under a sanitizer)";
   const bool grows = slope.kib_per_minute > most + kErrors * slope.error;
   verdict->Judge(!grows || *left_out != '\0',
                  "%-20s %+.1f KiB/min, standard error %.1f, bound %.0f + %.0f errors%s", what,
@@ -210,7 +210,7 @@ bool Run(const Options& options) {
   const ClosedPort refused;
   const BlackHolePort black_hole;
   const Server server;
-  LogKeeper log_keeper;
+  LogRotator log_rotator;
   const TrustedAuthority trusted(server.CaFile());
   soak.endpoints = {server.Ports(), refused.Port(), black_hole.Port()};
 
@@ -232,7 +232,7 @@ bool Run(const Options& options) {
   JudgeSlope("memory in use", memory.InUse(), kMostInUse, true, &verdict);
   JudgeSlope("resident memory", memory.Resident(), kMostResident, warm, &verdict);
   JudgeDescriptors(descriptors, &verdict);
-  JudgeLog(log_keeper.Finish(), workers, &verdict);
+  JudgeLog(log_rotator.Finish(), workers, &verdict);
   return verdict.Good();
 }
 
@@ -256,7 +256,7 @@ bool ParseOptions(int argc, char** argv, Options* options) {
 int main(int argc, char** argv) {
   Options options;
   if (!ParseOptions(argc, argv, &options)) {
-    fprintf(stderr, "usage: %s [MINUTES] [--seed N] [--plant leak|descriptor|answer|line]\n",
+    fprintf(stderr, "usage: %s [MINUTES] [--seed N] [--plant leak|descriptor|response|line]\n",
             argv[0]);
     return 2;
   }

@@ -79,8 +79,8 @@ OperationSettings SettingsOf(const Plan& plan, const Session& session) {
   return settings;
 }
 
-// The port of a fault is another one, which an object cannot change to, so such a plan has an object
-// of its own.
+// The port of a fault is another one, which an object cannot change to, so such a plan has an
+// object of its own.
 void TakeOneObject(const Plan& plan, Session* session, OperationSettings* settings) {
   const ServerPorts& ports = session->endpoints.server;
   const bool usual = settings->port == (plan.tls ? ports.tls : ports.plain);

@@ -216,7 +216,7 @@ std::string ValueOf(const Plan& plan) {
 }
 
 std::string ResponseBodyOf(const Plan& plan) {
-  if (Has(plan, kXml)) return "<answer><value>" + ValueOf(plan) + "</value></answer>";
+  if (Has(plan, kXml)) return "<response><value>" + ValueOf(plan) + "</value></response>";
   if (Has(plan, kJson)) return "{\"success\":true,\"value\":\"" + ValueOf(plan) + "\"}";
   if (Has(plan, kLine)) return ValueOf(plan);
   return Filler(plan, false);

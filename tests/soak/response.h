@@ -16,7 +16,8 @@ struct Request {
 // Reads one request; false when the client ended, or sent one that the soak does not know.
 bool ReadRequest(ServerConnection* connection, Request* request);
 
-// Responds to it, with the fault of its plan. Results: true when the connection stays open for another.
+// Responds to it, with the fault of its plan. Results: true when the connection stays open for
+// another.
 bool SendResponse(ServerConnection* connection, const Request& request);
 
 // Bytes that are not a response.

@@ -6,7 +6,7 @@
 
 #include "tests/support/server_process.h"
 
-// The ports of 127.0.0.1 at which the server answers.
+// The ports of 127.0.0.1 that the server serves.
 struct ServerPorts {
   int plain = 0;
   int tls = 0;

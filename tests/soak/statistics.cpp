@@ -16,7 +16,7 @@ unsigned Allowed(Fault fault) {
     case Fault::kNone:
     case Fault::kSlow:
       return Bit(Outcome::kRight);
-    case Fault::kCutHead:  // behind the status line it is a head without an answer
+    case Fault::kCutHead:  // after the status line it is a head without a body
     case Fault::kCutBody:
     case Fault::kResetBody:
     case Fault::kStallBody:
@@ -31,7 +31,7 @@ unsigned Allowed(Fault fault) {
   }
 }
 
-// Those that do not look at the answer's body succeed where only that is spoilt; the first one does
+// Those that do not look at the body succeed where only that is spoilt; the first one does
 // not even look at the status.
 unsigned AllowedBlindly(const Plan& plan) {
   const bool connected = plan.fault > Fault::kBadCertificate;

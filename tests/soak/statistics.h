@@ -8,11 +8,11 @@
 
 #include "tests/soak/plan.h"
 
-// The answer of one operation, seen against what its contract says.
+// What one operation came to, seen against what its contract says.
 struct Outcome {
   enum Kind {
-    kRight,   // success with the right answer, to the byte
-    kCut,     // success, as the contract has it, with the beginning of the right answer
+    kRight,   // success with the right response, to the byte
+    kCut,     // success, as the contract has it, with the beginning of the right response
     kFailed,  // one of the failures that the contract names
     kWrong,   // anything else
   };
@@ -20,7 +20,7 @@ struct Outcome {
   std::string detail;  // of a wrong one
 };
 
-// Whether the plan allows for the outcome: without a fault only the right answer will do.
+// Whether the plan allows for the outcome: without a fault only the right response will do.
 bool IsExpected(const Plan& plan, const Outcome& outcome);
 
 // Threads: any.

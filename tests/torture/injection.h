@@ -9,10 +9,10 @@
 
 // What happens at the chosen call.
 enum class Fault {
-  kNone,             // nothing: counts the calls
-  kAllocation,       // the n-th allocation fails
-  kAllocationsFrom,  // the n-th allocation and all later ones fail
-  kAllFromAllocation,  // the n-th allocation fails, and from there on every allocation and system call
+  kNone,               // nothing: counts the calls
+  kAllocation,         // the n-th allocation fails
+  kAllocationsFrom,    // the n-th allocation and all later ones fail
+  kAllFromAllocation,  // the n-th allocation fails, and from there on every call and allocation
   kCall,               // the n-th system call fails with its usual error
   kAllFromCall,        // the n-th system call fails, and from there on every call and allocation
   kInterrupted,        // the n-th system call fails with EINTR

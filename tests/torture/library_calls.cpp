@@ -1,4 +1,4 @@
-// Library calls that count as system calls: OpenSSL's reads and writes, which may be short of what
+// Library calls that are treated as system calls: OpenSSL's reads and writes, which may be short of what
 // their callers want, and the start of a thread, whose system call is made with all signals blocked
 // and so cannot be trapped.
 #include <dlfcn.h>

@@ -21,11 +21,11 @@ inline constexpr char kUploadEnd[] = "END OF UPLOAD";
 std::string LengthResponse();
 
 // Takes any number of connections, one after the other, each of which may break off anywhere. A
-// whole request gets the response that the first word of its path names: "body" a body that ends with
-// the connection, "length" one with a length, "chunked", "json", "xml", or "upload" once the
+// whole request gets the response that the first word of its path names: "body" a body that ends
+// with the connection, "length" one with a length, "chunked", "json", "xml", or "upload" once the
 // upload's end has come. With "digest" or "basic" in front, as in "digest/body", a request without
-// such a login is refused with a challenge; with "whole" in front, one whose document has no end
-// is.
+// such credentials is refused with a challenge; with "whole" in front, one whose document has no
+// end is.
 class PeerProcess {
  public:
   // REQUIRES: the calling process has no other thread.
