@@ -1,129 +1,209 @@
-// Runs one operation, or lists them, or compares their times with their floors'.
+// Measures the contenders of each work in turn, round by round (A B C A B C ...), so that all of
+// them see the same machine, and prints a line of JSON a measurement. A round is short, and the
+// ratios of one round are what a report takes the median of: hence no framework that measures one
+// after the other.
 #include <alloca.h>
+#include <sched.h>
+#include <sys/resource.h>
+#include <unistd.h>
 
 #include <algorithm>
 #include <chrono>
+#include <cmath>
+#include <csignal>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <string>
+#include <vector>
 
-#include "bench/idle_clients.h"
-#include "bench/operations.h"
+#include "bench/apart.h"
+#include "bench/contender.h"
+#include "bench/options.h"
+#include "bench/server.h"
 
-// The name by which bench/count finds what is to be counted.
-extern "C" __attribute__((noinline)) void MeasuredRun(Operation* operation, int count) {
-  operation->Run(count);
+// The name by which callgrind finds what is to be counted.
+extern "C" __attribute__((noinline)) void CountedRun(Contender* contender, int count) {
+  contender->Count(count);
   asm volatile("");  // not the last call, or it would become a jump
 }
 
 namespace {
 
 // With the stack so many bytes further down.
-__attribute__((noinline)) void RunLower(size_t bytes, Operation* operation, int count) {
+__attribute__((noinline)) void CountLower(size_t bytes, Contender* contender, int count) {
   Use(alloca(bytes));
-  MeasuredRun(operation, count);
+  CountedRun(contender, count);
 }
 
-// The C library's comparisons take a longer way where a text crosses a cache line. Where in a line
-// the stack begins is the kernel's choice, so a fourth of the calls is made at each of the places.
-void RunAtAllPlaces(Operation* operation, int count) {
+// The C library's comparisons take a longer way where a string crosses a cache line. Where in a
+// line the stack begins is the kernel's choice, so a fourth of the operations is done at each of
+// the places.
+void CountAtAllPlaces(Contender* contender, int count) {
   constexpr int kPlaces = 4;
   constexpr size_t kStackAlignment = 16;
   for (int i = 0; i < kPlaces; ++i) {
-    const int calls = count * (i + 1) / kPlaces - count * i / kPlaces;
-    RunLower(kStackAlignment * static_cast<size_t>(i), operation, calls);
+    const int operations = count * (i + 1) / kPlaces - count * i / kPlaces;
+    CountLower(kStackAlignment * static_cast<size_t>(i), contender, operations);
   }
 }
 
-constexpr int kRounds = 15;
-constexpr double kRoundSeconds = 0.01;
+// Of a work whose time is over.
+constexpr int kLeastRounds = 3;
 
-std::vector<Entry> AllEntries() {
-  std::vector<Entry> entries;
-  AddLogOperations(&entries);
-  AddRequestOperations(&entries);
-  AddHeadOperations(&entries);
-  AddBodyOperations(&entries);
-  AddEncodingOperations(&entries);
-  return entries;
+// Client and server share one processor, as this process and its children: what is compared is the
+// work of both, and no transfer between processors.
+void PinToOneProcessor() {
+  cpu_set_t allowed;
+  if (sched_getaffinity(0, sizeof(allowed), &allowed) != 0) return;
+  int last = CPU_SETSIZE - 1;
+  while (last > 0 && !CPU_ISSET(last, &allowed)) --last;
+  CPU_ZERO(&allowed);
+  CPU_SET(last, &allowed);
+  sched_setaffinity(0, sizeof(allowed), &allowed);
 }
 
-const Entry* Find(const std::vector<Entry>& entries, const std::string& name) {
-  const auto found = std::find_if(entries.begin(), entries.end(),
-                                  [&](const Entry& entry) { return entry.name == name; });
-  return found == entries.end() ? nullptr : &*found;
+// For the thousand clients.
+void AllowManyFiles() {
+  struct rlimit limit;
+  if (getrlimit(RLIMIT_NOFILE, &limit) != 0) return;
+  limit.rlim_cur = limit.rlim_max;
+  setrlimit(RLIMIT_NOFILE, &limit);
 }
 
-// One call before the counted ones: the first one of a process resolves symbols and builds tables.
-int RunOnce(const Entry& entry, int count) {
-  const auto operation = entry.make();
-  operation->Run(1);
-  RunAtAllPlaces(operation.get(), count);
-  return 0;
+// One of the peers has blocked it before main, which costs who looks at it a system call more than
+// in a daemon.
+void UnblockSigpipe() {
+  sigset_t pipe;
+  sigemptyset(&pipe);
+  sigaddset(&pipe, SIGPIPE);
+  sigprocmask(SIG_UNBLOCK, &pipe, nullptr);
 }
 
-double Seconds(Operation* operation, int count) {
-  const auto start = std::chrono::steady_clock::now();
-  operation->Run(count);
-  return std::chrono::duration<double>(std::chrono::steady_clock::now() - start).count();
+bool IsSelected(const Options& options, const Work& work) {
+  const auto names = [&work](const std::string& name) {
+    return name == work.section || name == work.name;
+  };
+  return options.selected.empty() ||
+         std::any_of(options.selected.begin(), options.selected.end(), names);
 }
 
-// How many calls fill a round.
-int CallsPerRound(Operation* operation) {
+struct Runner {
+  std::string name;
+  std::unique_ptr<Contender> contender;
+  int count;
+};
+
+// How many operations fill a round.
+int CountFor(const Work& work, Contender* contender, double seconds) {
+  if (work.count != 0) return work.count;
+  contender->Measure(1);  // the first one of a process resolves symbols and fills caches
+  const double wanted = seconds * 1e9;
   int count = 1;
-  while (Seconds(operation, count) < kRoundSeconds && count < (1 << 28)) count *= 2;
-  return count;
-}
-
-double Median(std::vector<double> values) {
-  std::sort(values.begin(), values.end());
-  return values[values.size() / 2];
-}
-
-// The two in turn, round by round, so that both see the same machine.
-void Compare(const Entry& entry, const Entry& floor) {
-  const auto operation = entry.make();
-  const auto base = floor.make();
-  const int count = CallsPerRound(operation.get());
-  const int baseCount = CallsPerRound(base.get());
-  std::vector<double> times, ratios;
-  for (int round = 0; round < kRounds; ++round) {
-    times.push_back(Seconds(operation.get(), count) / count);
-    ratios.push_back(times.back() / (Seconds(base.get(), baseCount) / baseCount));
+  double each = contender->Measure(count);
+  while (each * count < wanted / 10 && count < (1 << 24)) {
+    count *= 8;
+    each = contender->Measure(count);
   }
-  const double best = *std::min_element(times.begin(), times.end());
-  std::printf("%s %.1f %.2f", entry.name.c_str(), best * 1e9, Median(ratios));
-  if (entry.bytes != 0) std::printf(" %.2f", static_cast<double>(entry.bytes) / best / 1e9);
-  std::printf("\n");
+  return std::max(1, static_cast<int>(std::lround(wanted / each)));
+}
+
+void Print(const Work& work, const std::string& contender, int round, double value) {
+  std::printf(
+      "{\"section\":\"%s\",\"work\":\"%s\",\"contender\":\"%s\",\"round\":%d,\"%s\":%.4f,"
+      "\"handles\":%zu}\n",
+      work.section, work.name, contender.c_str(), round, work.unit == Unit::kBytes ? "bytes" : "ns",
+      value, work.bytes);
   std::fflush(stdout);
 }
 
-int CompareAll(const std::vector<Entry>& entries, const char* prefix) {
-  for (const Entry& entry : entries) {
-    const Entry* const floor = Find(entries, entry.floor);
-    if (floor != nullptr && entry.name.rfind(prefix, 0) == 0) Compare(entry, *floor);
+std::vector<Runner> Prepare(const Work& work, const Options& options) {
+  std::vector<Runner> runners;
+  for (const Registry::Entry& entry : AllContenders().Of(work.name)) {
+    auto contender = work.apart ? MakeApart(work.name, entry.contender) : entry.make();
+    const int count = CountFor(work, contender.get(), options.roundSeconds);
+    runners.push_back({entry.contender, std::move(contender), count});
+  }
+  return runners;
+}
+
+void Compare(const Work& work, const Options& options) {
+  std::fprintf(stderr, "%s\n", work.name);
+  const std::vector<Runner> runners = Prepare(work, options);
+  const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(options.seconds);
+  for (int round = 0; round < options.rounds; ++round) {
+    if (round >= kLeastRounds && std::chrono::steady_clock::now() > end) break;
+    for (const Runner& runner : runners) {
+      Print(work, runner.name, round, runner.contender->Measure(runner.count));
+    }
+  }
+}
+
+// For a process that measures or counts one work of one contender.
+int RunOne(const Options& options) {
+  for (const Registry::Entry& entry : AllContenders().Of(options.work)) {
+    if (entry.contender != options.contender) continue;
+    const auto contender = entry.make();
+    if (options.mode == Options::kMeasureOne) {
+      std::printf("%.4f\n", contender->Measure(options.count));
+    } else {
+      contender->Count(2);  // the first ones of a process resolve symbols and make the heap grow
+      getppid();            // the system calls between the two are counted
+      CountAtAllPlaces(contender.get(), options.count);
+      getppid();
+      _exit(0);  // how many calls the end of the threads of peers takes is different each time
+    }
+    return 0;
+  }
+  return 2;
+}
+
+int List() {
+  for (const Work& work : AllWorks()) {
+    std::printf("%s %s:", work.section, work.name);
+    for (const auto& entry : AllContenders().Of(work.name)) {
+      std::printf(" %s", entry.contender.c_str());
+    }
+    std::printf("\n");
   }
   return 0;
 }
 
-int List(const std::vector<Entry>& entries) {
-  for (const Entry& entry : entries) std::printf("%s %d\n", entry.name.c_str(), entry.count);
+int ListCounted(const Options& options) {
+  for (const Work& work : AllWorks()) {
+    if (work.counted == 0 || !IsSelected(options, work)) continue;
+    for (const auto& entry : AllContenders().Of(work.name)) {
+      std::printf("%s %s %s %d\n", work.section, work.name, entry.contender.c_str(), work.counted);
+    }
+  }
+  return 0;
+}
+
+int CompareAll(const Options& options) {
+  for (const std::string& name : AllContenders().LeftOut()) {
+    std::fprintf(stderr, "%s is left out: it is not there\n", name.c_str());
+  }
+  for (const Work& work : AllWorks()) {
+    if (IsSelected(options, work)) Compare(work, options);
+  }
   return 0;
 }
 
 }  // namespace
 
 int main(int argc, char** argv) {
-  const std::vector<Entry> entries = AllEntries();
-  const std::string command = argc > 1 ? argv[1] : "";
-  if (command == "list" && argc == 2) return List(entries);
-  if (command == "time") return CompareAll(entries, argc > 2 ? argv[2] : "");
-  if (command == "idle" && argc == 3) return MeasureIdleClients(std::atoi(argv[2]));
-  const Entry* const entry = command == "run" && argc == 4 ? Find(entries, argv[2]) : nullptr;
-  if (entry != nullptr) return RunOnce(*entry, std::atoi(argv[3]));
-  std::fprintf(stderr,
-               "usage: tarnwick_bench list | run OPERATION COUNT | time [PREFIX] | idle CLIENTS\n"
-               "list: operations and counts; time: nanoseconds, ratio to the floor, GB/s;\n"
-               "idle: kilobytes that a client keeps resident after a small GET\n");
-  return 2;
+  Options options;
+  if (!ParseOptions(argc, argv, &options)) return 2;
+  if (options.mode == Options::kList) return List();
+  if (options.mode == Options::kListCounted) return ListCounted(options);
+  if (std::getenv("TARNWICK_SANDBOX") == nullptr) {
+    std::fputs("tarnwick_bench: the log files are fixed; run it in scripts/sandbox\n", stderr);
+    return 2;
+  }
+  AllowManyFiles();
+  UnblockSigpipe();
+  PinToOneProcessor();
+  if (options.work != nullptr) return RunOne(options);
+  StartServers();
+  return CompareAll(options);
 }

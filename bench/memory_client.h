@@ -1,4 +1,4 @@
-// A client whose server is a text in memory, for what is parsed without a network.
+// A client whose server is a string in memory, for what is parsed without a network.
 #ifndef TARNWICK_BENCH_MEMORY_CLIENT_H_
 #define TARNWICK_BENCH_MEMORY_CLIENT_H_
 
@@ -51,8 +51,8 @@ class MemoryClient : public TWHttpClient {
 
   MemorySocket* Memory() { return m_memory; }
 
-  // Puts the client behind the head of a reply with this Transfer-Encoding.
-  void SetBehindHead(const std::string& encoding) {
+  // Puts the client after the head of a response with this Transfer-Encoding.
+  void SetAfterHead(const std::string& encoding) {
     m_connState = 2;
     m_strTransferEncoding = encoding;
   }

@@ -6,7 +6,7 @@
 #include <string>
 #include <string_view>
 
-// A head with memchr for line ends and colons. It keeps what the library keeps.
+// Parses a head with memchr for line feeds and colons. It keeps what the library keeps.
 class HeadParser {
  public:
   void Parse(const std::string& head);

@@ -28,14 +28,14 @@ std::string Lines() {
   return lines;
 }
 
-std::string SoapReply(size_t size) {
-  std::string reply;
-  while (reply.size() < size) {
-    reply +=
+std::string SoapResponse(size_t size) {
+  std::string response;
+  while (response.size() < size) {
+    response +=
         "<tt:Profile token=\"profile_1\" fixed=\"true\"><tt:Name>main</tt:Name></tt:Profile>\r\n";
-    reply += "        <tt:UseCount>2</tt:UseCount>\r\n";
+    response += "        <tt:UseCount>2</tt:UseCount>\r\n";
   }
-  return reply;
+  return response;
 }
 
 std::string QueryText(size_t size) {

@@ -1,24 +1,24 @@
-// The texts that are asked for, sent, parsed and encoded.
+// The strings that are requested, sent, parsed and encoded.
 #ifndef TARNWICK_BENCH_TEXTS_H_
 #define TARNWICK_BENCH_TEXTS_H_
 
 #include <cstddef>
 #include <string>
 
-// A response's head: a status line, thirty header lines, of which the library keeps seven, and the
+// A response's head: a status line, thirty header fields, of which the library keeps seven, and the
 // empty line.
 std::string HeadOf30Lines();
 
 // 60,000 bytes of lines.
 std::string Lines();
 
-// An envelope as devices send it, with a line end every 30 to 80 bytes.
-std::string SoapReply(size_t size);
+// An envelope as devices send it, with a CRLF every 30 to 80 bytes.
+std::string SoapResponse(size_t size);
 
 // Text as a query's value is: one byte in five is to be escaped.
 std::string QueryText(size_t size);
 
-// What requests for JSON are answered with.
+// The response to requests for JSON.
 constexpr char kJsonText[] =
     "{\"data\":{\"id\":7,\"name\":\"front door\",\"on\":true},\"success\":true}";
 

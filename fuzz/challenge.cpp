@@ -1,4 +1,4 @@
-// A challenge and the login that answers it. The lines are user, password, path, method and time;
+// A challenge and the credentials for it. The lines are user, password, path, method and time;
 // whatever follows is the challenge:
 //
 //   admin
@@ -13,7 +13,7 @@
 #include <string>
 #include <string_view>
 
-#include "fuzz/oracle/shared/model_login.h"
+#include "fuzz/oracle/shared/model_credentials.h"
 #include "fuzz/support/script.h"
 #include "fuzz/support/target.h"
 #include "fuzz/support/wire.h"
@@ -26,10 +26,10 @@ namespace {
 
 class Client : public TWHttpClient {
  public:
-  Client(const ModelLogin& login, const std::string& challenge) {
-    m_strUser = login.user;
-    m_strPassword = login.password;
-    m_strPath = login.path;
+  Client(const ModelCredentials& credentials, const std::string& challenge) {
+    m_strUser = credentials.user;
+    m_strPassword = credentials.password;
+    m_strPath = credentials.path;
     m_strAuthenticate = challenge;
   }
 };
@@ -39,19 +39,19 @@ class Client : public TWHttpClient {
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
   LogEverything();
   std::string_view text(reinterpret_cast<const char*>(data), size);
-  ModelLogin login;
-  login.user = TakeLine(&text);
-  login.password = TakeLine(&text);
-  login.path = TakeLine(&text);
+  ModelCredentials credentials;
+  credentials.user = TakeLine(&text);
+  credentials.password = TakeLine(&text);
+  credentials.path = TakeLine(&text);
   const std::string method(TakeLine(&text));
   g_fuzz_time = std::strtol(std::string(TakeLine(&text)).c_str(), nullptr, 10) & 0x7fffffff;
   const std::string challenge(text);
 
-  Client client(login, challenge);
+  Client client(credentials, challenge);
   ExpectSame("Digest line", client.GenDigestAccessAuth(method, "body"),
-             ModelDigestLine(login, challenge, method, "body", g_fuzz_time));
-  ExpectSame("Basic line", client.GenBasicAccessAuth(), ModelBasicLine(login));
-  for (const std::string& word : {std::string("digest"), std::string("basic"), login.user}) {
+             ModelDigestLine(credentials, challenge, method, "body", g_fuzz_time));
+  ExpectSame("Basic line", client.GenBasicAccessAuth(), ModelBasicLine(credentials));
+  for (const std::string& word : {std::string("digest"), std::string("basic"), credentials.user}) {
     ExpectSame("word in the challenge", static_cast<int64_t>(ContainsIgnoreCase(challenge, word)),
                static_cast<int64_t>(ModelContains(challenge, word)));
   }

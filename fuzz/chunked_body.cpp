@@ -1,4 +1,4 @@
-// A body, chunked or not, in both ways to read: ReadBody behind a head that has been read, GetResp
+// A body, chunked or not, in both ways to read: ReadBody after a head that has been read, GetResp
 // with the head in front.
 //
 //   chunked buffered 3

@@ -1,4 +1,4 @@
-// The buffer that collects a reply in memory. Each line is a step:
+// The buffer that collects a response in memory. Each line is a step:
 //
 //   write TEXT        appends the text
 //   items N TEXT      appends as many items of N bytes as the text has
@@ -103,7 +103,7 @@ class Collector {
     if (memory) Expect("the memory held", malloc_usable_size(buffer_.data) == needed);
   }
 
-  // A block that cannot grow is given up as it is.
+  // A block that cannot grow stays as it is.
   static void CheckLost(char* block, const std::string& bytes) {
     if (block == nullptr) return;
     ExpectSame("the lost block", std::string_view(block, bytes.size()), bytes);
@@ -115,14 +115,14 @@ class Collector {
     ExpectSame("the size", buffer_.size, model_.size);
     if (!model_.there) return;
     ExpectSame("the bytes", std::string_view(buffer_.data, buffer_.size), model_.bytes);
-    ExpectSame("the byte behind them", buffer_.data[buffer_.size], 0);
+    ExpectSame("the byte after them", buffer_.data[buffer_.size], 0);
   }
 
   CurlMemBuffer buffer_ = {};
   oracle::Buffer model_;
 };
 
-// Takes the first word off `line`, and the blank behind it.
+// Takes the first word off `line`, and the blank after it.
 std::string_view TakeWord(std::string_view* line) {
   const std::string_view word = line->substr(0, line->find(' '));
   line->remove_prefix(std::min(word.size() + 1, line->size()));

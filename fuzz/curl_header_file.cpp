@@ -1,4 +1,4 @@
-// The response file: a head, line by line, and the body behind it. Line 1: "items" and a number
+// The response file: a head, line by line, and the body after it. Line 1: "items" and a number
 // deliver items of that many bytes, "room" and a number end the file's space, "unbuffered" writes
 // through; further numbers are the sizes of the body's pieces. The rest is what the server sends.
 #include <algorithm>
@@ -90,9 +90,9 @@ class Transfer {
     line.resize(count * settings_.item);
     const size_t taken = Call(CurlHeaderToFile, line, settings_.item, count, library_.Get());
     ExpectSame(
-        "what a header line gives", static_cast<int64_t>(taken),
+        "what a header line returns", static_cast<int64_t>(taken),
         static_cast<int64_t>(oracle::WriteHeaderLine(line, settings_.item, count, oracle_.Get())));
-    ExpectSame("the file behind a header line", library_.Bytes(), oracle_.Bytes());
+    ExpectSame("the file after a header line", library_.Bytes(), oracle_.Bytes());
     if (oracle::GoesIntoFile(line)) expected_ += line;
   }
 
@@ -114,7 +114,7 @@ class Transfer {
  private:
   using Callback = size_t (*)(char*, size_t, size_t, void*);
 
-  // From memory that ends where the data does, so that the sanitizer sees a read behind it.
+  // From memory that ends where the data does, so that the sanitizer sees a read beyond it.
   static size_t Call(Callback callback, const std::string& text, size_t size, size_t count,
                      void* target) {
     const std::unique_ptr<char[]> bytes(new char[text.size()]);
@@ -125,7 +125,7 @@ class Transfer {
   void BodyPiece(const std::string& piece) {
     const size_t n = piece.size();
     const size_t taken = Call(CurlFileWrite, piece, 1, n, library_.Get());
-    ExpectSame("what a piece of the body gives", static_cast<int64_t>(taken),
+    ExpectSame("what a piece of the body returns", static_cast<int64_t>(taken),
                static_cast<int64_t>(std::fwrite(piece.data(), 1, n, oracle_.Get())));
     expected_ += piece;
     std::string text = "kept";
@@ -150,11 +150,11 @@ void CheckReading(const std::string& message, const Settings& settings) {
   for (size_t n = 0;; ++n) {
     const size_t size = settings.pieces[n % settings.pieces.size()];
     const std::unique_ptr<char[]> piece(new char[size]);
-    const size_t given = CurlFileRead(piece.get(), 1, size, file.get());
-    ExpectSame("what a read gives", static_cast<int64_t>(given),
+    const size_t count = CurlFileRead(piece.get(), 1, size, file.get());
+    ExpectSame("what a read returns", static_cast<int64_t>(count),
                static_cast<int64_t>(std::min(size, message.size() - read.size())));
-    if (given == 0) break;
-    read.append(piece.get(), given);
+    if (count == 0) break;
+    read.append(piece.get(), count);
   }
   ExpectSame("what was read", read, message);
 }

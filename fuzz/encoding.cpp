@@ -64,7 +64,7 @@ void CheckHelpers(const std::string& text, const std::string& set) {
 void CheckCopy(const std::string& text, const std::string& set) {
   const auto buffer = std::make_unique<char[]>(set.size());  // the sanitizer sees its end
   std::memset(buffer.get(), '#', set.size());
-  Expect("StrNCopy gives its buffer",
+  Expect("StrNCopy returns its buffer",
          StrNCopy(buffer.get(), text.c_str(), set.size()) == buffer.get());
   ExpectSame("StrNCopy", std::string_view(buffer.get(), set.size()),
              oracle::CopiedIntoBuffer(UpToZero(text), set.size(), '#'));

@@ -39,11 +39,11 @@ ModelSettings SettingsOf(const Options& options, std::string_view path) {
   settings.basic = options.Has("basic");
   settings.version = options.Has("http11") ? 2 : options.Has("http10") ? 1 : 0;
   settings.keep = options.Has("keep") ? "/:" : "";
-  settings.login.user = "admin";
-  settings.login.password = "secret";
+  settings.credentials.user = "admin";
+  settings.credentials.password = "secret";
   // Callers keep these out of a path.
   for (const char c : path) {
-    if (c != '\0' && c != '\r') settings.login.path += c;
+    if (c != '\0' && c != '\r') settings.credentials.path += c;
   }
   return settings;
 }
@@ -51,10 +51,10 @@ ModelSettings SettingsOf(const Options& options, std::string_view path) {
 class Client : public TWHttpClient {
  public:
   explicit Client(const ModelSettings& settings)
-      : TWHttpClient(settings.host, settings.port, settings.login.path, settings.login.user,
-                     settings.login.password, settings.timeout, false, settings.buffered,
-                     settings.encode, settings.basic, static_cast<HTTP_VERSION>(settings.version),
-                     settings.keep) {}
+      : TWHttpClient(settings.host, settings.port, settings.credentials.path,
+                     settings.credentials.user, settings.credentials.password, settings.timeout,
+                     false, settings.buffered, settings.encode, settings.basic,
+                     static_cast<HTTP_VERSION>(settings.version), settings.keep) {}
 
   int State() const { return m_connState; }
   const std::string& Challenge() const { return m_strAuthenticate; }
@@ -85,16 +85,16 @@ void Exchange::ReadBody() {
 }
 
 void Exchange::Soap(bool login) {
-  std::string reply = kUntouched;
+  std::string response = kUntouched;
   std::string expected = kUntouched;
   if (login) {
-    ExpectSame("SendAuthReqBySocketPost", client_->SendAuthReqBySocketPost(kSoap, reply),
-               model_->SoapWithLogin(kSoap, &expected));
+    ExpectSame("SendAuthReqBySocketPost", client_->SendAuthReqBySocketPost(kSoap, response),
+               model_->SoapWithCredentials(kSoap, &expected));
   } else {
-    ExpectSame("SendReqBySocketPost", client_->SendReqBySocketPost(kSoap, reply),
+    ExpectSame("SendReqBySocketPost", client_->SendReqBySocketPost(kSoap, response),
                model_->Soap(kSoap, &expected));
   }
-  ExpectSame("reply", reply, expected);
+  ExpectSame("response", response, expected);
 }
 
 void Exchange::Upload() {
@@ -112,7 +112,8 @@ void Exchange::Play(const Options& options) {
     ExpectSame("SendRequestBySocketPost", client_->SendRequestBySocketPost(kForm),
                model_->Form(kForm));
   } else if (options.Has("request")) {
-    ExpectSame("SendRequest", client_->SendRequest(HTTP_METHOD_GET, "?"), model_->GetWithLogin());
+    ExpectSame("SendRequest", client_->SendRequest(HTTP_METHOD_GET, "?"),
+               model_->GetWithCredentials());
   } else {
     ExpectSame("SendRequestByGet", client_->SendRequestByGet(), model_->Get());
   }

@@ -159,7 +159,7 @@ void PlayAll(std::string_view operations, Game* game) {
   }
 }
 
-// The library asked for the same reads as the model, so it waited as often as well.
+// The library made the same reads as the model, so it waited as often as well.
 void CompareReads(const Wire& wire, const ModelSocket& model) {
   ExpectSame("connects", static_cast<int64_t>(wire.Dialled().size()),
              static_cast<int64_t>(model.Dialled().size()));

@@ -157,7 +157,7 @@ void Write(const Line& line) {
     RealTWPrintf(line.type, category, level, c.file.c_str(), c.line, c.function.c_str(), "%s",
                  c.message.c_str());
   }
-  ExpectSame("errno behind the call", errno, kErrno);
+  ExpectSame("errno after the call", errno, kErrno);
 }
 
 void WriteFrom(bool thread, Line* line) {
@@ -192,7 +192,7 @@ void Check(Line line) {
   const std::string expected = opens && g_system.locks ? oracle::LogLineOf(line.call) : "";
   ExpectSame("the line", TakeLog(), expected);
   CheckComplaint(!opens);
-  Expect("the lock is given back", !g_system.locked);
+  Expect("the lock is released", !g_system.locked);
   if (!expected.empty()) {
     ExpectSame("what the next writer finds", g_system.when_unlocked,
                static_cast<int64_t>(expected.size()));

@@ -1,5 +1,6 @@
-// A parser that is wrong on purpose: fuzz/run fails when this target runs through, for then a
-// difference to the oracle goes unseen. Its sizes of chunks lose the letters in upper case.
+// A parser that is wrong on purpose: the test fuzz_planted_difference fails when this target runs
+// through, for then a difference to the oracle goes unseen. Its sizes of chunks lose the letters in
+// upper case.
 #include <cctype>
 #include <cstddef>
 #include <cstdint>

@@ -1,5 +1,6 @@
-// A parser with a fault on purpose: fuzz/run fails when this target runs through, for then the
-// detectors are off. It takes a header line apart and copies its value without asking for the size.
+// A parser with a fault on purpose: the test fuzz_planted_fault fails when this target runs through,
+// for then the detectors are off. It takes a header line apart and copies its value without a look
+// at the size.
 #include <cstddef>
 #include <cstdint>
 #include <cstring>

@@ -30,7 +30,7 @@ class Client : public TWHttpClient {
       : TWHttpClient("cam", 80, "a.cgi", "", "", kTimeout, false, buffered, false, false,
                      HTTP_VERSION_1_1, "") {}
 
-  // As behind a request that has been written.
+  // As after a request that has been written.
   int ReadHead() {
     m_pSocket->Connect();
     m_connState = 1;
@@ -118,7 +118,7 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
       Compare(&client, head);
       std::string byte;
       socket.Read(1, &byte);
-      ExpectSame("first byte behind the head", client.NextByte(), byte);
+      ExpectSame("first byte after the head", client.NextByte(), byte);
     }
   }
   ExpectSame("open descriptors", wire.Open(), 0);

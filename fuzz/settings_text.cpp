@@ -96,7 +96,7 @@ void CheckFind(const std::string& text, const std::string& key) {
   ExpectSame("the value", line.value, *expected);
   const std::string whole = text.substr(line.begin, line.end - line.begin);
   Expect("the line is one line", oracle::LinesOf(whole).size() == 1);
-  Expect("the line gives the value", oracle::ValueIn(whole, key) == expected);
+  Expect("the line has the value", oracle::ValueIn(whole, key) == expected);
   Expect("the line begins where one ends", line.begin == 0 || text[line.begin - 1] == '\n');
 }
 
@@ -149,7 +149,7 @@ void CheckGet(const Setting& s, size_t size) {
   const size_t stored = std::min(expected.size(), size - 1);
   ExpectSame("the value in the buffer", std::string_view(buffer.get(), stored),
              expected.substr(0, stored));
-  ExpectSame("the zero byte behind it", buffer[stored], 0);
+  ExpectSame("the zero byte after it", buffer[stored], 0);
 }
 
 void CheckLevels(const std::string& text) {
@@ -166,18 +166,18 @@ void CheckLevels(const std::string& text) {
   }
 }
 
-// A folder beside the program, with one file; both go when the program ends.
-class Folder {
+// A directory beside the program, with one file; both go when the program ends.
+class Directory {
  public:
-  Folder() : name_(std::filesystem::read_symlink("/proc/self/exe").string() + "-XXXXXX") {
-    Expect("a folder is made", mkdtemp(name_.data()) != nullptr);
+  Directory() : name_(std::filesystem::read_symlink("/proc/self/exe").string() + "-XXXXXX") {
+    Expect("a directory is made", mkdtemp(name_.data()) != nullptr);
   }
-  ~Folder() {
+  ~Directory() {
     std::error_code ignored;
     std::filesystem::remove_all(name_, ignored);
   }
-  Folder(const Folder&) = delete;
-  Folder& operator=(const Folder&) = delete;
+  Directory(const Directory&) = delete;
+  Directory& operator=(const Directory&) = delete;
 
   std::string File() const { return name_ + "/conf"; }
 
@@ -191,14 +191,14 @@ std::string Contents(const std::string& path) {
 }
 
 void CheckSet(const Setting& s) {
-  static const Folder folder;
-  std::ofstream(folder.File(), std::ios::binary | std::ios::trunc) << s.text;
+  static const Directory directory;
+  std::ofstream(directory.File(), std::ios::binary | std::ios::trunc) << s.text;
   const std::optional<std::string> line = oracle::Formatted(s.format, s.key, s.value);
   const bool taken = line && oracle::CanBeReadBack(s.key, s.value);
-  const int result =
-      QLIBCFileSetKeyValue(folder.File().c_str(), s.key.c_str(), s.value.c_str(), s.format.c_str());
+  const int result = QLIBCFileSetKeyValue(directory.File().c_str(), s.key.c_str(), s.value.c_str(),
+                                          s.format.c_str());
   ExpectSame("setting the key", result, taken ? 0 : -1);
-  ExpectSame("the file", Contents(folder.File()),
+  ExpectSame("the file", Contents(directory.File()),
              taken ? oracle::WithSetting(s.text, s.key, *line) : s.text);
 }
 

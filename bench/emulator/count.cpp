@@ -3,9 +3,9 @@
 //
 //   qemu-arm -plugin PLUGIN,out=FILE PROGRAM [ARGUMENT...]
 //
-// At its end the process writes "INSTRUCTIONS SYSTEM_CALLS" to FILE. An instruction counts when it
-// is reached, also when its condition keeps it from doing anything. A child that was forked counts
-// for itself and, killed by a signal, writes nothing.
+// At its end the process writes "INSTRUCTIONS SYSTEM_CALLS" to FILE. An instruction is
+// counted when it is reached, also when its condition keeps it from doing anything. A child that was
+// forked counts for itself and, killed by a signal, writes nothing.
 //
 // Debian ships no header with these functions, so those that are needed stand here: version 1 of
 // the interface, which QEMU 7.2 speaks.

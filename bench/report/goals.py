@@ -58,7 +58,7 @@ def linear(work, smaller, limit):
         large, small = run.rate(work, LIBRARY), run.rate(smaller, LIBRARY)
         return small / large if large and small else None
 
-    return Goal(work, f"at most {limit:.2f} times as much a byte as {smaller}", limit, measure)
+    return Goal(work, f"at most {limit:.2f} times as much per byte as {smaller}", limit, measure)
 
 
 def as_linear(work, smaller, limit):
@@ -72,7 +72,7 @@ def as_linear(work, smaller, limit):
         library, floor = grows(run, LIBRARY), grows(run, FLOOR)
         return library / floor if library and floor else None
 
-    text = f"a byte grows against {smaller} at most {limit:.2f} times as much as the floor's does"
+    text = f"its cost per byte grows against {smaller} at most {limit:.2f} times as much as the floor's does"
     return Goal(work, text, limit, measure)
 
 
@@ -115,7 +115,7 @@ def as_much(work, other, limit):
         one, two = run.median(work, LIBRARY), run.median(other, LIBRARY)
         return one / two if one is not None and two else None
 
-    return Goal(work, f"at most {limit:.2f} times as much a client as {other}", limit, measure)
+    return Goal(work, f"at most {limit:.2f} times as much per client as {other}", limit, measure)
 
 
 NAMES = {REQUIRED: "the required floor", FLOOR: "the floor"}

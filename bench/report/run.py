@@ -1,4 +1,4 @@
-"""A run of the comparison: the lines that tarnwick_compare has printed."""
+"""A run of the comparison: the lines that tarnwick_bench has printed."""
 
 import json
 from statistics import median

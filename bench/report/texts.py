@@ -2,10 +2,10 @@
 
 SECTIONS = {
     "log": ("The log", "Calls at a level that is off, and lines in a file."),
-    "request": ("Small requests", "Each over a connection of its own, with the answer read."),
+    "request": ("Small requests", "Each over a connection of its own, with the response read."),
     "parse": ("Parsing", "Bytes that are in memory already: no system call, no network."),
     "body": ("Large bodies", "From the server into a string, or in pieces of 64 KiB."),
-    "tls": ("TLS", "Handshake, request and answer, with nobody asked who answers."),
+    "tls": ("TLS", "Handshake, request and response, without a check of the certificate."),
     "upload": ("Upload", "256 MiB in pieces of 64 KiB, until the server has them all."),
     "encoding": ("Encodings", "Percent-encoding of a query's value, and base64."),
     "idle": ("Idle clients", "Memory for each further client that stays after a small GET."),
@@ -19,15 +19,18 @@ WORKS = {
     "log_line_4_processes": "the same from 4 processes at once, for each line",
     "log_line_16_processes": "the same from 16 processes at once, for each line",
     "json_get": "GET of a small JSON document, parsed",
-    "digest_get": "GET that is asked for a Digest login",
+    "digest_get": "GET with Digest credentials after a challenge",
     "form_post": "POST of a form",
-    "soap_post_4k": "POST of a SOAP envelope of 4 KiB, answered by another",
+    "soap_post_4k": "POST of a SOAP envelope of 4 KiB, with another as the response",
+    "soap_xml": "POST of a SOAP envelope of 512 bytes, the response parsed as XML",
     "head_30": "a response's head of 30 lines",
     "lines": "lines of 58 bytes",
     "chunked_64": "a body of 1 MiB in chunks of 64 bytes",
     "chunked_4k": "a body of 1 MiB in chunks of 4 KiB",
-    "line_ends_1m": "line ends out of a SOAP reply of 1 MiB",
-    "line_ends_16m": "line ends out of a SOAP reply of 16 MiB",
+    "memory_body_1m": "a body of 1 MiB into a string",
+    "memory_body_64m": "a body of 64 MiB into a string",
+    "line_ends_1m": "CR and LF removed from a SOAP response of 1 MiB",
+    "line_ends_16m": "CR and LF removed from a SOAP response of 16 MiB",
     "body_1m": "1 MiB into a string",
     "body_64m": "64 MiB into a string",
     "body_chunked_1m": "1 MiB in chunks of 16 KiB into a string",
@@ -49,21 +52,21 @@ WORKS = {
 METHOD = """\
 Each work is done by all of its contenders in turn, round by round, so that all of them see the same
 machine; a ratio is the median of the rounds' ratios. Clients and the server, a small process that
-reads a request, writes a fixed answer and closes, share one processor: what is compared is the work
-of both without transfers between processors. The lines of several processes use all processors.
+reads a request, writes a fixed response and closes, share one processor: what is compared is the
+work of both without transfers between processors. The lines of several processes use all processors.
 Whoever delivers a wrong body, a torn line or too few of them ends the run.
 
 Times change from machine to machine and from run to run. Instructions and system calls do not:
 those of one operation stand beside the times of all works but those whose number of reads depends
 on how the server's bytes arrive. callgrind counts the instructions in the contender's process,
-behind a first operation that is not counted, and strace the calls, as the difference between a run
-and one of twice as many operations. The C library is held to the ways that every processor has.
+after two operations that are not counted, and strace the calls. The C library is held to the ways
+that every processor has.
 
 | contender | is |
 |---|---|
 | floor | the bare system calls in plain C, blocking; in memory, one plain pass |
 | required | the system calls that the library's interface asks for, and nothing else: a connect \
-that does not block with `select`, `fcntl`, `getsockopt` and `ioctl`; `select` in front of each \
+that does not block with `select`, `fcntl`, `getsockopt` and `ioctl`; `select` before each \
 read and write; open, lock, stream, write, unlock and close for each line of the log |
 | library | this library |
 | libcurl, cpp-httplib, Poco, Beast | the same request with a client object and a connection of \
@@ -85,22 +88,22 @@ UNMET = {
     ),
     ("log_line", "at most 1.00 times the required floor"): (
         "One system call more: a write beyond the process's limit on file sizes ends the process, so "
-        "the limit is asked for in front of each line; to remember it would miss one that is set "
+        "the limit is read before each line; to remember it would miss one that is set "
         "meanwhile. That is a third of the difference. By instructions the line costs less than the "
         "floor's."
     ),
     ("log_line_4_processes", "at most 1.00 times the required floor"): (
-        "As log_line: what is done in front of the lock is not waited for by the others, and what "
+        "As log_line: what is done before the lock is not waited for by the others, and what "
         "is done under it is."
     ),
-    ("body_64m", "at most 1.40 times as much a byte as body_1m"): (
+    ("body_64m", "at most 1.40 times as much per byte as body_1m"): (
         "A body of 1 MiB lies where the one before it lay: no page fault, and much of it in the "
         "processor's caches. One of 64 MiB gets fresh pages, which the kernel clears, and is moved "
         "once while it grows. Large pages and a growth by four have brought it from 2.0 times to "
-        "this; the floor's own 64 MiB cost several times as much a byte as its 1 MiB."
+        "this; the floor's own 64 MiB cost several times as much per byte as its 1 MiB."
     ),
-    ("body_chunked_64m", "at most 1.40 times as much a byte as body_chunked_1m"): (
-        "As body_64m. The floor's own 64 MiB in chunks cost several times as much a byte as its "
+    ("body_chunked_64m", "at most 1.40 times as much per byte as body_chunked_1m"): (
+        "As body_64m. The floor's own 64 MiB in chunks cost several times as much per byte as its "
         "1 MiB, too."
     ),
     ("chunked_4k", "at most 1.10 times the floor"): (
@@ -121,7 +124,7 @@ UNMET = {
         "ASCII."
     ),
     ("log_line", "at most 1.00 times log4cplus"): (
-        "log4cplus keeps its file and its lock file open and makes 5 system calls a line: lock, "
+        "log4cplus keeps its file and its lock file open and makes 5 system calls per line: lock, "
         "seek, getpid, write, unlock. The library opens and closes its file for each line, so that "
         "a file that was moved away or removed is left with the next line: 9 system calls. Its own "
         "work is half of log4cplus's, by instructions."

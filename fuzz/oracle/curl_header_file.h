@@ -11,7 +11,7 @@ namespace oracle {
 bool GoesIntoFile(const std::string& line);
 
 // Writes `line`, `count` items of `size` bytes, the way the file is to be written.
-// Results: what the callback is to give.
+// Results: what the callback must return.
 size_t WriteHeaderLine(const std::string& line, size_t size, size_t count, FILE* file);
 
 }  // namespace oracle

@@ -47,7 +47,7 @@ std::string EncodeSegment(const std::string& segment, const std::string& keep) {
   return segment.substr(0, equals + 1) + Encode(segment.substr(equals + 1), keep);
 }
 
-// Only an "&" behind an "=" ends a segment, so "?a&b=1 2" is one of the name "a&b".
+// Only an "&" after an "=" ends a segment, so "?a&b=1 2" is one of the name "a&b".
 std::string EncodeQuery(const std::string& path, const std::string& keep) {
   const size_t question = path.find('?');
   if (question == std::string::npos) return path;
@@ -68,7 +68,7 @@ ModelClient::ModelClient(ModelSettings settings, const std::vector<Connection>& 
                          const std::vector<size_t>& sizes)
     : settings_(std::move(settings)),
       socket_(settings_.timeout, settings_.buffered, connections, sizes) {
-  std::string* path = &settings_.login.path;
+  std::string* path = &settings_.credentials.path;
   path->erase(0, path->find_first_not_of('/'));
   head_.state = 0;
 }
@@ -84,7 +84,7 @@ std::string ModelClient::AuthorizationLine() {
 }
 
 std::string ModelClient::GetRequest() {
-  std::string path = settings_.login.path;
+  std::string path = settings_.credentials.path;
   if (settings_.encode) path = EncodeQuery(path, settings_.keep);
   const bool newer = settings_.version == 2;
   std::string request = "GET /" + path + (newer ? " HTTP/1.1\r\n" : " HTTP/1.0\r\n");
@@ -92,7 +92,7 @@ std::string ModelClient::GetRequest() {
   request += CookieLine() + AuthorizationLine();
   if (newer) request += "Host: " + settings_.host + "\r\n";
   request += "\r\n";
-  request = request.c_str();  // a zero byte in a cookie or a login ends it
+  request = request.c_str();  // a zero byte in a cookie or in credentials ends it
   return request.substr(0, kMostOfAGet);
 }
 
@@ -108,28 +108,28 @@ int ModelClient::Get() {
   return kOk;
 }
 
-// Results: whether the challenge is one that can be answered.
-bool ModelClient::MakeLogin(const std::string& method) {
+// Results: whether there are credentials for the challenge.
+bool ModelClient::MakeCredentials(const std::string& method) {
   if (ModelContains(head_.challenge, "digest")) {
-    authorization_ = ModelDigestLine(settings_.login, head_.challenge, method, "", 1);
+    authorization_ = ModelDigestLine(settings_.credentials, head_.challenge, method, "", 1);
     return true;
   }
   if (!ModelContains(head_.challenge, "basic")) return false;
-  authorization_ = ModelBasicLine(settings_.login);
+  authorization_ = ModelBasicLine(settings_.credentials);
   return true;
 }
 
-int ModelClient::GetWithLogin() {
-  if (settings_.basic) authorization_ = ModelBasicLine(settings_.login);
+int ModelClient::GetWithCredentials() {
+  if (settings_.basic) authorization_ = ModelBasicLine(settings_.credentials);
   const int result = Get();
-  if (result_ != kUnauthorized || !MakeLogin("GET")) return result;
+  if (result_ != kUnauthorized || !MakeCredentials("GET")) return result;
   return Get();
 }
 
 int ModelClient::Form(const std::string& content) {
   if (socket_.Connect() != 0) return kIoError;
   const bool newer = settings_.version != 1;
-  std::string request = "POST /" + settings_.login.path;
+  std::string request = "POST /" + settings_.credentials.path;
   request += newer ? " HTTP/1.1\r\n" : " HTTP/1.0\r\n";
   request += "Host: " + settings_.host + "\r\n" + CookieLine();
   request += "Content-Type: application/x-www-form-urlencoded; charset=utf-8\r\n";
@@ -141,9 +141,9 @@ int ModelClient::Form(const std::string& content) {
   return kOk;
 }
 
-int ModelClient::Soap(const std::string& body, std::string* reply) {
+int ModelClient::Soap(const std::string& body, std::string* response) {
   if (body.empty() || socket_.Connect() != 0) return kIoError;
-  std::string request = "POST /" + settings_.login.path + " HTTP/1.1\r\n";
+  std::string request = "POST /" + settings_.credentials.path + " HTTP/1.1\r\n";
   request += "Host: " + settings_.host + "\r\n";
   request += "Content-Type: application/soap+xml; charset=utf-8\r\n" + AuthorizationLine();
   request += "Content-Length: " + std::to_string(body.size()) + "\r\n\r\n" + body;
@@ -156,19 +156,19 @@ int ModelClient::Soap(const std::string& body, std::string* reply) {
   std::string text;
   // No peer here sends as much as the client reads at once.
   if (socket_.Read(static_cast<int>(std::min(length, kMostAtOnce)), &text) <= 0) return kIoError;
-  *reply = text.c_str();
+  *response = text.c_str();
   return kOk;
 }
 
-int ModelClient::SoapWithLogin(const std::string& body, std::string* reply) {
-  int result = Soap(body, reply);
-  if (result_ == kUnauthorized && MakeLogin("POST")) result = Soap(body, reply);
+int ModelClient::SoapWithCredentials(const std::string& body, std::string* response) {
+  int result = Soap(body, response);
+  if (result_ == kUnauthorized && MakeCredentials("POST")) result = Soap(body, response);
   return result == kOk ? result_ : kIoError;
 }
 
 int ModelClient::OpenUpload() {
   if (socket_.Connect() != 0) return kIoError;
-  std::string request = "POST /" + settings_.login.path + " HTTP/1.1\r\n";
+  std::string request = "POST /" + settings_.credentials.path + " HTTP/1.1\r\n";
   request += "Host: " + settings_.host + ":" + std::to_string(settings_.port) + "\r\n";
   request += CookieLine();
   request +=

@@ -1,13 +1,13 @@
-// A client over its own socket, told once more in the plainest way: what it sends on each
-// connection, and what it makes of the answers.
+// A client over its own socket, written once more in the plainest way: what it sends on each
+// connection, and what it makes of the responses.
 #ifndef TARNWICK_FUZZ_ORACLE_EXCHANGE_H_
 #define TARNWICK_FUZZ_ORACLE_EXCHANGE_H_
 
 #include <string>
 #include <vector>
 
+#include "fuzz/oracle/shared/model_credentials.h"
 #include "fuzz/oracle/shared/model_head.h"
-#include "fuzz/oracle/shared/model_login.h"
 #include "fuzz/oracle/shared/model_socket.h"
 #include "fuzz/support/script.h"
 
@@ -20,7 +20,7 @@ struct ModelSettings {
   bool basic = false;
   int version = 0;  // 2: HTTP/1.1, 1: HTTP/1.0, 0: none chosen
   std::string keep;
-  ModelLogin login;
+  ModelCredentials credentials;
 };
 
 class ModelClient {
@@ -29,10 +29,10 @@ class ModelClient {
               const std::vector<size_t>& sizes);
 
   int Get();
-  int GetWithLogin();
+  int GetWithCredentials();
   int Form(const std::string& content);
-  int Soap(const std::string& body, std::string* reply);
-  int SoapWithLogin(const std::string& body, std::string* reply);
+  int Soap(const std::string& body, std::string* response);
+  int SoapWithCredentials(const std::string& body, std::string* response);
   int OpenUpload();
   int WriteData(const std::string& data);
   int ReadBody(std::string* body);
@@ -45,7 +45,7 @@ class ModelClient {
 
  private:
   void ReadHead();
-  bool MakeLogin(const std::string& method);
+  bool MakeCredentials(const std::string& method);
   std::string AuthorizationLine();
   std::string GetRequest();
   std::string CookieLine() const;

@@ -24,7 +24,7 @@ struct LogCall {
 
 std::string LogLineOf(const LogCall& call);
 
-// The part behind the last separator of either kind.
+// The part after the last separator of either kind.
 std::string BaseName(const std::string& path);
 
 }  // namespace oracle

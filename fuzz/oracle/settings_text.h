@@ -14,10 +14,10 @@ bool IsWord(const std::string& key);
 // The lines of `text`, each with its line feed; the last one may have none.
 std::vector<std::string> LinesOf(const std::string& text);
 
-// The value that one line gives `key`, if it does.
+// The value of `key` in one line, if the line has one.
 std::optional<std::string> ValueIn(const std::string& line, const std::string& key);
 
-// The value of the first line that gives `key` one.
+// The value of `key` in the first line that has one.
 std::optional<std::string> ValueOf(const std::string& text, const std::string& key);
 
 // The text after setting the key.
@@ -27,7 +27,7 @@ std::string WithSetting(const std::string& text, const std::string& key, const s
 std::optional<std::string> Formatted(const std::string& format, const std::string& key,
                                      const std::string& value);
 
-// A key and a value that a file in the usual format gives back.
+// A key and a value that can be read back from a file in the usual format.
 bool CanBeReadBack(const std::string& key, const std::string& value);
 
 // The numbers between the delimiters.

@@ -11,7 +11,7 @@
 
 class Peer {
  public:
-  // `sizes`: how much each read gives at most, over and over; whatever is there when empty.
+  // `sizes`: how much each read returns at most, over and over; whatever is there when empty.
   Peer(Connection connection, std::vector<size_t> sizes);
 
   Dial HowToDial() const { return connection_.dial; }
@@ -28,7 +28,7 @@ class Peer {
   // Everything that Write took.
   const std::string& Written() const { return written_; }
 
-  // The sizes that Read was asked for, in order: "64512 64512 2000 ".
+  // The sizes that Read was called with, in order: "64512 64512 2000 ".
   const std::string& Reads() const { return reads_; }
 
  private:

@@ -16,7 +16,7 @@
 #include <string_view>
 #include <vector>
 
-// What a reader meets behind some bytes.
+// What a reader meets after some bytes.
 enum class Event {
   kNone,
   kWait,     // a wait that times out, and a read without anything to read

@@ -18,7 +18,7 @@
 #include "fuzz/support/peer.h"
 #include "fuzz/support/script.h"
 
-// The n-th connect reaches the n-th connection; behind the last one it is refused.
+// The n-th connect reaches the n-th connection; after the last one it is refused.
 // REQUIRES: one at a time.
 class Wire {
  public:

@@ -10,7 +10,7 @@ class PlainMd5 {
  public:
   void Add(const std::string& text);
 
-  // The digest in lower-case hex. More may be added afterwards: it goes on from the state behind
+  // The digest in lower-case hex. More may be added afterwards: it goes on from the state after
   // the padding, with the length counted without it.
   std::string Finish();
 
