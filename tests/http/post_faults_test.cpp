@@ -117,7 +117,9 @@ class PeerFaults : public ::testing::TestWithParam<FaultCase> {
     }
     if (test.text.empty()) return;
     const bool part = test.part_is_success && struck && result.head;
-    EXPECT_TRUE(result.text == test.text || !result.has_text || part) << result.text;
+    // Memory may run out for the document's text, which the test asks for, as well.
+    const bool unprinted = struck && result.text.empty() && test.text.rfind("<?xml", 0) == 0;
+    EXPECT_TRUE(result.text == test.text || !result.has_text || part || unprinted) << result.text;
     EXPECT_TRUE((result.has_text && result.text == test.text) || struck) << result.text;
     const bool front = test.text.compare(0, result.text.size(), result.text) == 0;
     EXPECT_TRUE(front || result.result != HTTP_RET_OK) << result.text;
