@@ -133,7 +133,7 @@ void RestoreData(Ground& ground, Draw& draw) {
 void HasDataToRead(Ground& ground, Draw& draw) {
   const int seconds = draw.Seconds();
   const bool has = Client(ground).HasDataToRead(seconds);
-  ground.Expect(!has || seconds >= 0, "a negative time-out answers true");
+  ground.Expect(!has || seconds >= 0, "a negative time-out returns true");
 }
 
 void ReadBody(Ground& ground, Draw& draw) {

@@ -22,7 +22,7 @@ class Draw {
   // The string lives as long as the object: empty, line ends, conversions, NUL, bad UTF-8, markup,
   // 70,000 bytes, random bytes, two of these in a row, and ordinary ones.
   const std::string& Text();
-  // The same up to its first NUL; one call in eight gives null where OrNull says so.
+  // The same up to its first NUL; one call in eight returns null where OrNull says so.
   const char* CText() { return Text().c_str(); }
   const char* CTextOrNull() { return OneIn(8) ? nullptr : CText(); }
 

@@ -45,7 +45,7 @@ class Document {
   xmlDoc* document_ = nullptr;
 };
 
-// A value of any kind, into which a reply is parsed.
+// A value of any kind, into which a response is parsed.
 Json::Value Value(Draw& draw) {
   switch (draw.Below(4)) {
     case 0:
@@ -83,17 +83,18 @@ void SocketPost(Ground& ground, Draw& draw) {
 }
 
 void SoapPost(Ground& ground, Draw& draw) {
-  std::string reply = "untouched";
+  std::string response = "untouched";
   const std::string& body = draw.Text();
-  const int result = Client(ground).SendReqBySocketPost(body, reply);
+  const int result = Client(ground).SendReqBySocketPost(body, response);
   ExpectSent(ground, result);
-  ground.Expect(result == HTTP_RET_OK || reply == "untouched", "a failure that changes the reply");
+  ground.Expect(result == HTTP_RET_OK || response == "untouched",
+                "a failure that changes the response");
   ground.Expect(result != HTTP_RET_OK || !body.empty(), "an empty body was sent");
 }
 
 void SoapLogin(Ground& ground, Draw& draw) {
-  std::string reply;
-  const int result = Client(ground).SendAuthReqBySocketPost(draw.Text(), reply);
+  std::string response;
+  const int result = Client(ground).SendAuthReqBySocketPost(draw.Text(), response);
   ground.Expect(result >= HTTP_RET_OK && result <= HTTP_RET_URI_TOO_LONG, "another result code");
 }
 

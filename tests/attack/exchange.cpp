@@ -14,31 +14,33 @@ constexpr unsigned kPoliteSilenceMs = 1500;
 constexpr int kTimeout = 10;
 constexpr int kTimeoutOfStalls = 1;
 
-const PeerOperation& PickOperation(bool tls, Dice* dice) {
-  const std::vector<PeerOperation>& all = PeerOperations();
+const AttackedOperation& PickOperation(bool tls, Dice* dice) {
+  const std::vector<AttackedOperation>& all = AttackedOperations();
   const OverTls impossible = tls ? OverTls::kNever : OverTls::kAlways;
   for (;;) {
-    const PeerOperation& operation = all[dice->Below(all.size())];
+    const AttackedOperation& operation = all[dice->Below(all.size())];
     if (operation.tls != impossible) return operation;
   }
 }
 
-BodyKind KindFor(const PeerOperation& operation, Dice* dice) {
+BodyKind KindFor(const AttackedOperation& operation, Dice* dice) {
   const std::string name = operation.name;
   if (name.find("json") != std::string::npos) return BodyKind::kJson;
   if (name.find("xml") != std::string::npos) return BodyKind::kXml;
   return dice->OneIn(4) ? BodyKind::kJson : BodyKind::kAny;
 }
 
-Target PickTarget(bool tls, bool stalls, Dice* dice) {
+OperationSettings PickTarget(const AttackedOperation& operation, bool tls, bool stalls,
+                             Dice* dice) {
   static constexpr size_t kPieces[] = {16, 64, 512, 1500, 8192};
-  Target target;
-  target.tls = tls;
+  OperationSettings target = AttackSettings(operation, dice->Pick(kPieces));
+  target.https = tls;
   target.buffered = dice->PerCent(75);
   target.verify = dice->OneIn(2);
+  target.encode_query = dice->OneIn(2);
   target.version = static_cast<HTTP_VERSION>(dice->Below(3));
-  target.timeout = stalls ? kTimeoutOfStalls : kTimeout;
-  target.piece = dice->Pick(kPieces);
+  target.timeout = target.limit = stalls ? kTimeoutOfStalls : kTimeout;
+  if (dice->OneIn(4)) target.cookie = "id=1;";
   return target;
 }
 
@@ -71,13 +73,13 @@ void PickPieces(Delivery* delivery, Dice* dice) {
   delivery->delay_us = static_cast<unsigned>(dice->Below(200));
 }
 
-unsigned PickStall(const PeerOperation& operation, Dice* dice) {
+unsigned PickStall(const AttackedOperation& operation, Dice* dice) {
   if (dice->PerCent(98)) return static_cast<unsigned>(dice->Between(100, 1300));
   return operation.limit == Limit::kNone ? kPoliteSilenceMs : kSilenceMs;
 }
 
 // A pause at any byte, before the first one too.
-void PickStallPlace(const PeerOperation& operation, Delivery* delivery, Dice* dice) {
+void PickStallPlace(const AttackedOperation& operation, Delivery* delivery, Dice* dice) {
   delivery->stall_ms = PickStall(operation, dice);
   delivery->stall_piece = 0;
   if (delivery->response.bytes.empty() || dice->OneIn(5)) return;
@@ -105,14 +107,14 @@ Delivery PickDelivery(const HostileExchange& exchange, Dice* dice) {
   delivery.response = clean ? CleanResponse(kind, dice) : HostileResponse(kind, dice);
   PickPieces(&delivery, dice);
   if (!clean) {
-    delivery.end = PickEnd(exchange.target.tls, dice);
+    delivery.end = PickEnd(exchange.target.https, dice);
     delivery.before_request = dice->OneIn(25);
   }
-  if (exchange.target.tls) PickRecordFaults(&delivery, dice);
+  if (exchange.target.https) PickRecordFaults(&delivery, dice);
   return delivery;
 }
 
-TlsPlan PickTls(const PeerOperation& operation, Dice* dice) {
+TlsPlan PickTls(const AttackedOperation& operation, Dice* dice) {
   TlsPlan plan;
   plan.only_tls12 = dice->OneIn(3);
   plan.stranger = operation.curl && dice->OneIn(12);
@@ -160,7 +162,7 @@ HostileExchange MakeExchange(uint64_t seed, uint64_t number, const Shares& share
   exchange.stalls = dice.PerCent(shares.stall);
   const bool tls = dice.PerCent(shares.tls);
   exchange.operation = &PickOperation(tls, &dice);
-  exchange.target = PickTarget(tls, exchange.stalls, &dice);
+  exchange.target = PickTarget(*exchange.operation, tls, exchange.stalls, &dice);
   exchange.escaped = dice.OneIn(2);
   if (tls) exchange.tls = PickTls(*exchange.operation, &dice);
   constexpr int kMostPlanned = 3;
@@ -180,8 +182,8 @@ HostileExchange MakeExchange(uint64_t seed, uint64_t number, const Shares& share
 }
 
 std::string Summary(const HostileExchange& exchange) {
-  const Target& target = exchange.target;
-  return std::string(exchange.operation->name) + (target.tls ? ", TLS" : ", plain") +
+  const OperationSettings& target = exchange.target;
+  return std::string(exchange.operation->name) + (target.https ? ", TLS" : ", plain") +
          (target.buffered ? ", buffered" : ", direct") + ", version " +
          std::to_string(target.version) + ", T " + std::to_string(target.timeout) +
          (exchange.escaped ? ", escaped log" : "") + (exchange.stalls ? ", stall" : "");

@@ -7,8 +7,8 @@
 #include <string>
 #include <vector>
 
+#include "tests/attack/attacked_operations.h"
 #include "tests/attack/attacks.h"
-#include "tests/attack/operations.h"
 #include "tests/attack/response.h"
 
 // How the server leaves a connection.
@@ -51,8 +51,8 @@ struct TlsPlan {
 
 struct HostileExchange {
   uint64_t number = 0;
-  const PeerOperation* operation = nullptr;
-  Target target;
+  const AttackedOperation* operation = nullptr;
+  OperationSettings target;
   bool escaped = false;  // inside a TWRequestScope with SetEscapedLog
   bool stalls = false;
   TlsPlan tls;

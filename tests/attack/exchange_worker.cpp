@@ -37,14 +37,14 @@ void TakeOwnLog() {
 // libxml2 tells of documents that are wrong, on the error output.
 void SayNothing(void* /*context*/, xmlError* /*error*/) {}
 
-OperationOutcome RunGuarded(const HostileExchange& exchange, const std::string& plant) {
+OperationResult RunGuarded(const HostileExchange& exchange, const std::string& plant) {
   try {
     std::optional<TWRequestScope> scope;
     if (exchange.escaped && plant != "log") scope.emplace().SetEscapedLog(true);
     PlantInCall(plant);
     return exchange.operation->run(exchange.target);
   } catch (const std::exception& exception) {
-    OperationOutcome outcome;
+    OperationResult outcome;
     outcome.mistake = std::string("threw ") + exception.what();
     return outcome;
   }
@@ -125,10 +125,10 @@ void ExchangeWorker::Note(const HostileExchange& exchange, const Played& played)
   const std::lock_guard<std::mutex> lock(run_->mutex);
   ExchangeTally& tally = run_->tally;
   ++tally.exchanges;
-  if (exchange.target.tls) ++tally.over_tls;
+  if (exchange.target.https) ++tally.over_tls;
   if (exchange.operation->curl) ++tally.by_curl;
   if (stalled) ++tally.stalled;
-  if (stalled && exchange.target.tls) ++tally.stalled_over_tls;
+  if (stalled && exchange.target.https) ++tally.stalled_over_tls;
   if (exchange.escaped) ++tally.escaped;
   if (IsUnderstood(exchange, record)) ++tally.understood;
   tally.requests += static_cast<unsigned long>(record.deliveries);

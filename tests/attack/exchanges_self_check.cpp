@@ -10,7 +10,7 @@
 namespace {
 
 // Enough for every violation to meet an exchange that shows it, a log without its escapes too.
-constexpr uint64_t kPlanted = 40;
+constexpr uint64_t kPlanted = 100;
 
 // The planted exchanges of the seed, or one of them. A machine that is busy may hold a call for as
 // long as the usual margin; only the violation "slow" is looked for with a smaller one.
@@ -75,7 +75,9 @@ bool CheckThatExchangesRepeat() {
 
 int CheckExchanges(const AttackOptions& /*options*/) {
   long number = -1;
-  bool good = CheckThatExchangesRepeat();
+  bool good = Expect(MissedOperations().empty(),
+                     "each operation is attacked or left out:" + MissedOperations());
+  good = CheckThatExchangesRepeat() && good;
   good =
       Expect(FindingsOf("", -1, &number) == 0, "nothing is found where nothing is planted") && good;
   for (const std::string& plant : ExchangePlants()) {

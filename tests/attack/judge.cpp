@@ -18,13 +18,13 @@ std::string TimeProblem(double took, double allowed) {
 // What one pause of the server's may cost the call.
 double CostOfPause(const HostileExchange& exchange, unsigned pause_ms) {
   const double pause = pause_ms / 1000.0;
-  const Target& target = exchange.target;
-  const PeerOperation& operation = *exchange.operation;
+  const OperationSettings& target = exchange.target;
+  const AttackedOperation& operation = *exchange.operation;
   if (operation.limit == Limit::kTransfer) return std::min<double>(pause, target.timeout);
   // A handshake over the socket has no limit.
   if (operation.limit == Limit::kNone || exchange.tls.fault == HandshakeFault::kStall) return pause;
   const int waits = target.buffered ? operation.waits_buffered : operation.waits_direct;
-  return std::min<double>(pause, waits * target.timeout * (target.tls ? 2 : 1));
+  return std::min<double>(pause, waits * target.timeout * (target.https ? 2 : 1));
 }
 
 bool IsSuccess(int status) {
@@ -40,7 +40,7 @@ const Response* UnderstoodResponse(const HostileExchange& exchange, const PeerRe
 }
 
 std::string StatusProblem(const HostileExchange& exchange, const Response& response,
-                          const OperationOutcome& outcome) {
+                          const OperationResult& outcome) {
   const std::string sent = "status " + std::to_string(response.status) + " was sent";
   switch (exchange.operation->shows) {
     case Shows::kNothing:
@@ -57,9 +57,10 @@ std::string StatusProblem(const HostileExchange& exchange, const Response& respo
   return sent + ", result " + std::to_string(outcome.result);
 }
 
-std::string ResultProblem(const HostileExchange& exchange, const OperationOutcome& outcome) {
-  const std::vector<int>& results = exchange.operation->results;
-  if (std::find(results.begin(), results.end(), outcome.result) == results.end()) {
+std::string ResultProblem(const HostileExchange& exchange, const OperationResult& outcome) {
+  const std::vector<int>& failures = exchange.operation->failures;
+  const bool failed = outcome.result != HTTP_RET_OK;
+  if (failed && std::find(failures.begin(), failures.end(), outcome.result) == failures.end()) {
     return "undocumented result " + std::to_string(outcome.result);
   }
   const bool known = outcome.response >= HTTP_RET_OK && outcome.response <= HTTP_RET_CERT_ERROR &&
@@ -168,8 +169,8 @@ std::vector<std::string> Judge(const HostileExchange& exchange, const Played& pl
   if (const Response* response = UnderstoodResponse(exchange, played.record)) {
     note(StatusProblem(exchange, *response, played.outcome));
     // A body after another response is decoded by that one's transfer encoding.
-    const bool body =
-        played.outcome.has_text && response->clean_body && played.record.deliveries == 1;
+    const bool body = exchange.operation->decoded && played.outcome.has_text &&
+                      response->clean_body && played.record.deliveries == 1;
     if (body && played.outcome.text != response->content) note("another body than was sent");
   }
   if (exchange.escaped) note(EscapedLogProblem(played.log));

@@ -10,7 +10,7 @@
 
 // One exchange after it has been played.
 struct Played {
-  OperationOutcome outcome;
+  OperationResult outcome;
   PeerRecord record;
   double seconds = 0;
   double without_processor = 0;  // of these seconds; see SecondsWithoutProcessor

@@ -201,7 +201,7 @@ void PeerThread::Run() {
 
 // Connections one after the other, until the client's call is over and none is left.
 void PeerThread::Play() {
-  SSL_CTX* const context = exchange_->target.tls ? contexts_.For(exchange_->tls) : nullptr;
+  SSL_CTX* const context = exchange_->target.https ? contexts_.For(exchange_->tls) : nullptr;
   Player player(*exchange_, &record_);
   for (;;) {
     pollfd waiting[] = {{listener_, POLLIN, 0}, {over_, POLLIN, 0}};

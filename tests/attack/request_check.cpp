@@ -18,7 +18,7 @@ const char* const kNames[] = {"User-Agent",     "Cookie",       "Authorization",
 
 constexpr char kOddLine[] = "Cache-Control :no-cache";  // of an upload
 
-bool IsCutGet(const std::string& bytes, const PeerOperation& operation) {
+bool IsCutGet(const std::string& bytes, const AttackedOperation& operation) {
   return !operation.curl && bytes.size() == kMostOfAGet && bytes.compare(0, 4, "GET ") == 0 &&
          bytes.find(kHeadEnd) == std::string::npos;
 }
@@ -30,7 +30,7 @@ size_t BodyLength(const std::string& head) {
                                     : strtoul(head.c_str() + found + strlen(kName), nullptr, 10);
 }
 
-std::string RequestLineProblem(const std::string& line, const PeerOperation& operation) {
+std::string RequestLineProblem(const std::string& line, const AttackedOperation& operation) {
   const std::string start = operation.request;
   if (line.compare(0, start.size(), start) != 0) return "request line";
   if (std::count(line.begin(), line.end(), ' ') != 2) return "blanks of the request line";
@@ -52,7 +52,7 @@ std::string HeaderProblem(const std::string& line, std::map<std::string, int>* s
 }
 
 // The complete lines of a head, or of the beginning of one.
-std::string HeadProblem(const std::string& head, const PeerOperation& operation) {
+std::string HeadProblem(const std::string& head, const AttackedOperation& operation) {
   std::map<std::string, int> seen;
   bool first = true;
   for (size_t at = 0;;) {
@@ -73,20 +73,20 @@ std::string HeadProblem(const std::string& head, const PeerOperation& operation)
 
 }  // namespace
 
-bool IsWholeRequest(const std::string& bytes, const PeerOperation& operation) {
+bool IsWholeRequest(const std::string& bytes, const AttackedOperation& operation) {
   if (IsCutGet(bytes, operation)) return true;
   const size_t end = bytes.find(kHeadEnd);
   if (end == std::string::npos) return false;
   return operation.upload || bytes.size() >= RequestLength(bytes, operation);
 }
 
-size_t RequestLength(const std::string& bytes, const PeerOperation& operation) {
+size_t RequestLength(const std::string& bytes, const AttackedOperation& operation) {
   const size_t end = bytes.find(kHeadEnd);
   if (end == std::string::npos || operation.upload) return bytes.size();
   return end + strlen(kHeadEnd) + BodyLength(bytes.substr(0, end));
 }
 
-std::string RequestProblem(const std::string& bytes, const PeerOperation& operation,
+std::string RequestProblem(const std::string& bytes, const AttackedOperation& operation,
                            int* requests) {
   for (size_t at = 0; at < bytes.size();) {
     ++*requests;

@@ -5,16 +5,17 @@
 
 #include <string>
 
-#include "tests/attack/operations.h"
+#include "tests/attack/attacked_operations.h"
 
 // True when `bytes` hold a whole request of the operation; of an upload, a whole head.
-bool IsWholeRequest(const std::string& bytes, const PeerOperation& operation);
+bool IsWholeRequest(const std::string& bytes, const AttackedOperation& operation);
 
 // How long the whole request at the front of `bytes` is. REQUIRES: IsWholeRequest.
-size_t RequestLength(const std::string& bytes, const PeerOperation& operation);
+size_t RequestLength(const std::string& bytes, const AttackedOperation& operation);
 
 // What is wrong with all that came on one connection; empty for nothing. The last request may have
 // broken off. `requests` is increased by those that were begun.
-std::string RequestProblem(const std::string& bytes, const PeerOperation& operation, int* requests);
+std::string RequestProblem(const std::string& bytes, const AttackedOperation& operation,
+                           int* requests);
 
 #endif  // TARNWICK_TESTS_ATTACK_REQUEST_CHECK_H_

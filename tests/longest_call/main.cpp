@@ -146,6 +146,10 @@ int main(int argc, char** argv) {
     return 2;
   }
   const std::vector<Case> cases = CasesOfPeers();
+  if (!MissedOperations().empty()) {
+    std::fprintf(stderr, "longest_call: no case of:%s\n", MissedOperations().c_str());
+    return 2;
+  }
   const SimulatedCamera camera(argv[1], Endpoints(cases), kHold);
   if (!camera.Serves()) {
     std::fprintf(stderr, "longest_call: no simulated camera\n");

@@ -1,59 +1,23 @@
-// The n-th call fails: whatever goes wrong in a dialog, the result says so, no descriptor is left
-// behind, and the same object serves the next dialog.
-#include <poll.h>
-
-#include <atomic>
-#include <thread>
-
+// The n-th call fails: whatever goes wrong in a dialog, the result says so, no descriptor is left,
+// and the same object serves the next dialog.
 #include "tests/net/net_test_util.h"
 #include "tests/support/faults.h"
-#include "tests/support/ports.h"
 #include "tests/support/process.h"
+#include "tests/support/server_process.h"
 
 namespace {
 
 using ::testing::MatchesRegex;
 
-// Answers "pong\n" to the first bytes of each connection, any number of connections.
-class PongServer {
+// Responds "pong" to the first line of each connection.
+void Pong(ServerConnection& connection, unsigned /*number*/) {
+  std::string line;
+  if (connection.ReadUntil("\n", &line) && connection.Write("pong\n")) connection.Close();
+}
+
+class PongServer : public ServerProcess {
  public:
-  PongServer() : port_(0), listener_(BindLoopback(&port_)) {
-    listen(listener_, 64);
-    thread_ = std::thread([this] { Run(); });
-  }
-  ~PongServer() {
-    stop_ = true;
-    thread_.join();
-    close(listener_);
-  }
-  int Port() const { return port_; }
-
- private:
-  static bool Readable(int fd, int milliseconds) {
-    pollfd waiting = {fd, POLLIN, 0};
-    return poll(&waiting, 1, milliseconds) > 0;
-  }
-
-  void Run() {
-    while (!stop_) {
-      if (!Readable(listener_, 5)) continue;
-      const int fd = accept4(listener_, nullptr, nullptr, SOCK_CLOEXEC);
-      Serve(fd);
-      close(fd);
-    }
-  }
-
-  void Serve(int fd) {
-    char buf[64];
-    if (!Readable(fd, 5000) || recv(fd, buf, sizeof(buf), 0) <= 0) return;
-    send(fd, "pong\n", 5, MSG_NOSIGNAL);
-    if (Readable(fd, 5000)) recv(fd, buf, sizeof(buf), 0);
-  }
-
-  int port_;
-  int listener_;
-  std::atomic<bool> stop_{false};
-  std::thread thread_;
+  PongServer() : ServerProcess({{Pong}}) {}
 };
 
 bool Dialog(TWSocket& socket) {

@@ -5,11 +5,13 @@
 #include <cerrno>
 #include <cstdlib>
 #include <cstring>
+#include <functional>
+#include <map>
 
 #include "tarnwick/log/twdebuglog.h"
 #include "tarnwick/platform/qlibcfile.h"
 #include "tarnwick/utils/utils.h"
-#include "tests/soak/log_keeper.h"
+#include "tests/soak/log_rotator.h"
 #include "tests/soak/operations.h"
 #include "tests/support/flag.h"
 
@@ -20,7 +22,7 @@ constexpr char kSettingsFile[] = "/var/packages/Tarnwick/etc/settings.conf";
 // Each thread has a key of its own; all of them rewrite the same file.
 Outcome Settings(const Plan& plan, const Session& session) {
   const std::string key = "soak_" + std::to_string(session.thread);
-  const std::string value = ValueOf(plan) + std::to_string(plan.id);
+  const std::string value = ValueOf(plan).substr(0, 20) + std::to_string(plan.id);
   if (QLIBCFileSetKeyValue(kSettingsFile, key.c_str(), value.c_str(), "%s=\"%s\"\n") != 0) {
     return Wrong("the key could not be set");
   }
@@ -124,20 +126,13 @@ Outcome WriteToPipe(const Plan& plan) {
 }  // namespace
 
 Outcome RunLocalOperation(const Plan& plan, Session* session) {
-  switch (plan.operation) {
-    case Operation::kSettings:
-      return Settings(plan, *session);
-    case Operation::kLevels:
-      return Levels(plan);
-    case Operation::kLog:
-      return Log(plan, session);
-    case Operation::kEncoding:
-      return Encoding(plan);
-    case Operation::kThread:
-      return Thread(plan);
-    case Operation::kWriteFd:
-      return WriteToPipe(plan);
-    default:
-      return Wrong("no such operation");
-  }
+  static const std::map<std::string, std::function<Outcome(const Plan&, Session*)>> works = {
+      {"settings: one key", [](const Plan& p, Session* s) { return Settings(p, *s); }},
+      {"settings: levels", [](const Plan& p, Session* /*unused*/) { return Levels(p); }},
+      {"TW_LOG, TWPrintf", Log},
+      {"UrlEncode and the like", [](const Plan& p, Session* /*unused*/) { return Encoding(p); }},
+      {"CreateThread", [](const Plan& p, Session* /*unused*/) { return Thread(p); }},
+      {"WriteFd, DelayTimer", [](const Plan& p, Session* /*unused*/) { return WriteToPipe(p); }},
+  };
+  return works.at(OperationOf(plan).title)(plan, session);
 }

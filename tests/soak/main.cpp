@@ -1,7 +1,7 @@
 // The library under a long, mixed load: eight threads do everything that it offers, against a
-// server that spoils 5 of 100 answers, while the logs are rotated and the levels change.
+// server that spoils 5 of 100 responses, while the logs are rotated and the levels change.
 //
-//   scripts/sandbox tarnwick_soak [MINUTES] [--seed N] [--plant leak|descriptor|answer|line]
+//   scripts/sandbox tarnwick_soak [MINUTES] [--seed N] [--plant leak|descriptor|response|line]
 //
 // Each result is checked. It fails for one that the contract does not allow, for descriptors left
 // open, memory that grows, an operation that hangs, and a log line that is torn or missing. --plant
@@ -20,7 +20,7 @@
 #include "tarnwick/log/twdebuglog.h"
 #include "tarnwick/utils/utils.h"
 #include "tests/http/http_test_util.h"
-#include "tests/soak/log_keeper.h"
+#include "tests/soak/log_rotator.h"
 #include "tests/soak/meter.h"
 #include "tests/soak/operations.h"
 #include "tests/support/ports.h"
@@ -36,8 +36,8 @@ constexpr int kProgressSeconds = 10;
 // More than any operation takes, its time limits and a busy machine included.
 constexpr int kHangSeconds = 120;
 
-// Growth that counts as a leak, in KiB a minute. What is in use is known to the byte: 64 KiB are
-// under four bytes an operation, at the 20,000 that two processors make in a minute. Resident
+// Growth that is taken for a leak, in KiB a minute. What is in use is known to the byte: 64 KiB are
+// under four bytes per operation, at the 20,000 that two processors make in a minute. Resident
 // memory grows while malloc spreads over its arenas, so its bound is wider, and the first two
 // minutes, in which that is most of it, never count. Both have four standard errors on top: the
 // line through the samples of a short run is uncertain.
@@ -57,7 +57,7 @@ struct Soak {
   Options options;
   Endpoints endpoints;
   std::atomic<bool> stop{false};
-  Tally tally;
+  Statistics statistics;
 };
 
 struct Worker {
@@ -82,7 +82,7 @@ void PlantFault(const std::string& kind, unsigned round, Session* session, Outco
     lost = memset(malloc(kLost), 1, kLost);
   }
   if (kind == "descriptor" && dup(STDOUT_FILENO) < 0) *outcome = Wrong("no descriptor");
-  if (kind == "answer") *outcome = Wrong("planted");
+  if (kind == "response") *outcome = Wrong("planted");
   if (kind == "line") ++session->log_lines;
 }
 
@@ -102,7 +102,7 @@ void* Work(void* argument) {
     const Plan plan = NextPlan(round * kThreads + worker->number, &random);
     Outcome outcome = RunOperation(plan, &session);
     PlantFault(soak->options.plant, round, &session, &outcome);
-    soak->tally.Add(plan, outcome);
+    soak->statistics.Add(plan, outcome);
   }
   worker->log_lines = session.log_lines;
   return nullptr;
@@ -132,7 +132,7 @@ void EndIfHanging(const Worker (&workers)[kThreads]) {
 
 void PrintProgress(long elapsed, const Soak& soak, const MemoryMeter& memory) {
   printf("%5ld s  %9lu operations  %3lu unexpected  %7ld KiB resident  %7ld KiB in use  %zu fds\n",
-         elapsed, soak.tally.Operations(), soak.tally.Unexpected(), memory.ResidentNow(),
+         elapsed, soak.statistics.Operations(), soak.statistics.Unexpected(), memory.ResidentNow(),
          memory.InUseNow(), OpenDescriptors().size());
   fflush(stdout);
 }
@@ -177,7 +177,7 @@ class Verdict {
 
 void JudgeSlope(const char* what, const Slope& slope, double most, bool warm, Verdict* verdict) {
   const char* left_out = warm ? "" : " (not judged: still warming up)";
-  if (!MemoryMeter::Tells()) left_out = " (not judged under a sanitizer)";
+  if (!MemoryMeter::IsReliable()) left_out = " (not judged under a sanitizer)";
   const bool grows = slope.kib_per_minute > most + kErrors * slope.error;
   verdict->Judge(!grows || *left_out != '\0',
                  "%-20s %+.1f KiB/min, standard error %.1f, bound %.0f + %.0f errors%s", what,
@@ -210,7 +210,7 @@ bool Run(const Options& options) {
   const ClosedPort refused;
   const BlackHolePort black_hole;
   const Server server;
-  LogKeeper log_keeper;
+  LogRotator log_rotator;
   const TrustedAuthority trusted(server.CaFile());
   soak.endpoints = {server.Ports(), refused.Port(), black_hole.Port()};
 
@@ -222,16 +222,17 @@ bool Run(const Options& options) {
   StopWorkers(&soak, workers);
 
   Verdict verdict;
-  soak.tally.Print();
+  soak.statistics.Print();
   puts("");
-  const unsigned long unexpected = soak.tally.Unexpected();
+  const unsigned long unexpected = soak.statistics.Unexpected();
   verdict.Judge(unexpected == 0, "%-20s %lu, unexpected %lu, in %.1f minutes with seed %u",
-                "operations", soak.tally.Operations(), unexpected, options.minutes, options.seed);
+                "operations", soak.statistics.Operations(), unexpected, options.minutes,
+                options.seed);
   const bool warm = options.minutes / 2 >= kWarmMinutes;
   JudgeSlope("memory in use", memory.InUse(), kMostInUse, true, &verdict);
   JudgeSlope("resident memory", memory.Resident(), kMostResident, warm, &verdict);
   JudgeDescriptors(descriptors, &verdict);
-  JudgeLog(log_keeper.Finish(), workers, &verdict);
+  JudgeLog(log_rotator.Finish(), workers, &verdict);
   return verdict.Good();
 }
 
@@ -255,12 +256,16 @@ bool ParseOptions(int argc, char** argv, Options* options) {
 int main(int argc, char** argv) {
   Options options;
   if (!ParseOptions(argc, argv, &options)) {
-    fprintf(stderr, "usage: %s [MINUTES] [--seed N] [--plant leak|descriptor|answer|line]\n",
+    fprintf(stderr, "usage: %s [MINUTES] [--seed N] [--plant leak|descriptor|response|line]\n",
             argv[0]);
     return 2;
   }
   if (getenv("TARNWICK_SANDBOX") == nullptr) {
     fprintf(stderr, "%s writes to /var/log and the settings: run it by scripts/sandbox\n", argv[0]);
+    return 2;
+  }
+  if (!MissedOperations().empty()) {
+    fprintf(stderr, "operations that the soak misses:%s\n", MissedOperations().c_str());
     return 2;
   }
   const bool good = Run(options);

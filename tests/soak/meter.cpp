@@ -35,7 +35,7 @@ void MemoryMeter::Sample(double seconds) {
   points_.push_back({seconds / 60, ResidentKib(), InUseKib()});
 }
 
-bool MemoryMeter::Tells() {
+bool MemoryMeter::IsReliable() {
 #if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
   return false;
 #else

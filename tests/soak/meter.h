@@ -29,7 +29,7 @@ class MemoryMeter {
   size_t Samples() const { return points_.size(); }
 
   // False where a sanitizer's own allocator serves malloc: what it keeps back says nothing.
-  static bool Tells();
+  static bool IsReliable();
 
  private:
   struct Point {

@@ -2,42 +2,10 @@
 
 #include <algorithm>
 #include <cstdio>
-#include <initializer_list>
+
+#include "tests/operations/operations.h"
 
 namespace {
-
-constexpr const char* kOperationNames[] = {
-    "SendRequestByGet, ReadBody",
-    "the same, one object",
-    "SendRequestByGet, ReadData",
-    "SendRequest(GET), login",
-    "SendRequestBySocketPost",
-    "SendReqBySocketPost",
-    "SendAuthReqBySocketPost",
-    "SendReqByXMLSocketPost",
-    "OpenRawDataUpload, GetResp",
-    "second request, GetResp",
-    "TWSocket, SSLSocket",
-    "SendHttpGet",
-    "SendHttpPost",
-    "SendRequestByCurl(GET)",
-    "SendRequestByCurl(POST)",
-    "SendRequestByCurl, file",
-    "SendRequest(POST), login",
-    "SendReqByXMLGet",
-    "SendReqByXMLPost",
-    "SendReqByXMLPut",
-    "SendReqByXMLDelete",
-    "SendHttpsGet",
-    "settings: one key",
-    "settings: levels",
-    "TW_LOG, TWPrintf",
-    "UrlEncode and the like",
-    "CreateThread",
-    "WriteFd, DelayTimer",
-};
-static_assert(sizeof(kOperationNames) / sizeof(kOperationNames[0]) == kOperations,
-              "each operation has a name");
 
 constexpr const char* kFaultNames[] = {
     "none",
@@ -63,52 +31,13 @@ constexpr const char* kFaultNames[] = {
 };
 static_assert(sizeof(kFaultNames) / sizeof(kFaultNames[0]) == kFaults, "each fault has a name");
 
-bool IsOneOf(Operation operation, std::initializer_list<Operation> list) {
-  return std::find(list.begin(), list.end(), operation) != list.end();
-}
-
-bool IsXml(Operation operation) {
-  return IsOneOf(operation, {Operation::kSoapXml, Operation::kXmlGet, Operation::kXmlPost,
-                             Operation::kXmlPut, Operation::kXmlDelete});
-}
-
-bool IsJson(Operation operation) {
-  return IsOneOf(operation, {Operation::kJsonGet, Operation::kJsonGetTls});
-}
-
-// The requests that log in by whatever the server asks for; the other XML requests know Basic
-// alone.
-bool LogsIn(Operation operation) {
-  return IsOneOf(operation, {Operation::kLoginGet, Operation::kSoapLogin, Operation::kLoginPost,
-                             Operation::kXmlGet});
-}
-
-bool MayUseTls(Operation operation) {
-  return UsesServer(operation) &&
-         !IsOneOf(operation, {Operation::kJsonGet, Operation::kJsonPost, Operation::kLoginPost,
-                              Operation::kXmlGet, Operation::kXmlPost, Operation::kXmlPut,
-                              Operation::kXmlDelete});
-}
-
-// The others read the body as it travels, or one of a known length.
-bool DecodesChunks(Operation operation) {
-  return !IsSoap(operation) && !IsOneOf(operation, {Operation::kGetAgain, Operation::kGetPieces,
-                                                    Operation::kJsonGet, Operation::kLines});
-}
-
-// Without a limit of its own such a request would wait for minutes where no connection is made.
-bool HasTimeLimit(Operation operation) {
-  return !IsOneOf(operation, {Operation::kLoginPost, Operation::kXmlPost, Operation::kXmlPut,
-                              Operation::kXmlDelete});
-}
-
 bool IsPossible(Fault fault, const Plan& plan) {
-  const bool lines = plan.operation == Operation::kLines;
+  const bool lines = Has(plan, kLine);
   switch (fault) {
     case Fault::kBlackHole:
-      return HasTimeLimit(plan.operation);
+      return !Has(plan, kHasNoLimit);
     case Fault::kBadCertificate:
-      return plan.tls && UsesCurl(plan.operation);
+      return plan.tls && UsesCurl(plan);
     case Fault::kNoise:
     case Fault::kGarbage:
     case Fault::kCutHead:
@@ -118,7 +47,7 @@ bool IsPossible(Fault fault, const Plan& plan) {
     case Fault::kShortLength:
       return !lines;
     case Fault::kBadChunk:
-      return DecodesChunks(plan.operation);
+      return Has(plan, kDecodesChunks);
     default:
       return true;
   }
@@ -135,16 +64,15 @@ Fault PickFault(const Plan& plan, Random* random) {
 
 Framing PickFraming(const Plan& plan, Random* random) {
   if (plan.fault == Fault::kBadChunk) return Framing::kChunked;
-  if (plan.fault == Fault::kLongLength || plan.fault == Fault::kShortLength ||
-      IsSoap(plan.operation)) {
+  if (plan.fault == Fault::kLongLength || plan.fault == Fault::kShortLength || Has(plan, kSoap)) {
     return Framing::kLength;
   }
   const auto framing = static_cast<Framing>(Below(3, random));
-  return framing == Framing::kChunked && !DecodesChunks(plan.operation) ? Framing::kClose : framing;
+  return framing == Framing::kChunked && !Has(plan, kDecodesChunks) ? Framing::kClose : framing;
 }
 
 // Mostly small, now and then longer than the library's buffers, rarely over the mebibyte up to
-// which a SOAP reply is read at once.
+// which a SOAP response is read at once.
 size_t PickSize(Random* random) {
   const size_t kind = Below(200, random);
   if (kind == 0) return 1100000 + Below(400000, random);
@@ -166,24 +94,72 @@ std::string Filler(const Plan& plan, bool letters) {
 
 }  // namespace
 
-const char* NameOf(Operation operation) {
-  return kOperationNames[static_cast<int>(operation)];
+const std::vector<SoakOperation>& SoakOperations() {
+  static const std::vector<SoakOperation> operations = {
+      {"SendRequestByGet, ReadBody", "get_body", kDecodesChunks | kSendsQuery},
+      {"the same, one object", "get_body", kOneObject},
+      {"SendRequestByGet, ReadData", "get_data"},
+      {"SendRequest(GET), login", "login_get", kDecodesChunks | kLogsIn},
+      {"SendRequestBySocketPost", "form_post", kDecodesChunks | kSendsCookie, Sends::kForm},
+      {"SendReqBySocketPost", "soap", kSoap, Sends::kEnvelope},
+      {"SendAuthReqBySocketPost", "soap_login", kSoap | kLogsIn, Sends::kEnvelope},
+      {"SendReqByXMLSocketPost", "soap_xml", kSoap | kXml, Sends::kEnvelope},
+      {"OpenRawDataUpload, GetResp", "upload", kDecodesChunks, Sends::kUpload},
+      {"second request, GetResp", "second_request", kDecodesChunks | kTwoRequests},
+      {"TWSocket, SSLSocket", "socket_exchange", kLine},
+      {"SendHttpGet", "json_get", kJson | kSendsQuery},
+      {"SendHttpPost", "json_post", kDecodesChunks | kReadsNothing, Sends::kForm},
+      {"SendRequestByCurl(GET)", "curl_get", kDecodesChunks},
+      {"SendRequestByCurl(POST)", "curl_post", kDecodesChunks | kSendsCookie, Sends::kPath},
+      {"SendRequestByCurl, file", "curl_get_file", kDecodesChunks},
+      {"SendRequest(POST), login", "curl_login_form",
+       kDecodesChunks | kLogsIn | kHasNoLimit | kReadsNothing, Sends::kForm},
+      {"SendReqByXMLGet", "xml_get", kDecodesChunks | kXml | kLogsIn},
+      {"SendReqByXMLPost", "xml_post", kDecodesChunks | kXml | kHasNoLimit, Sends::kIndentedPreset},
+      {"SendReqByXMLPut", "xml_put", kDecodesChunks | kXml | kHasNoLimit, Sends::kPreset},
+      {"SendReqByXMLDelete", "xml_delete", kDecodesChunks | kXml | kHasNoLimit},
+      {"SendHttpsGet", "json_get_tls", kDecodesChunks | kJson},
+      {"settings: one key", nullptr},
+      {"settings: levels", nullptr},
+      {"TW_LOG, TWPrintf", nullptr},
+      {"UrlEncode and the like", nullptr},
+      {"CreateThread", nullptr},
+      {"WriteFd, DelayTimer", nullptr},
+  };
+  return operations;
+}
+
+std::string MissedOperations() {
+  // Parts of what the others do, and other ways to read the same responses.
+  const std::vector<std::string> left_out = {
+      "get_lines",   "get_twice",    "get_head_again", "curl_post_file", "curl_form",
+      "curl_handle", "connect",      "reconnect",      "keep_alive",     "probe",
+      "socket_data", "socket_lines", "socket_raw"};
+  std::vector<std::string> names;
+  for (const SoakOperation& operation : SoakOperations()) {
+    if (operation.name != nullptr) names.emplace_back(operation.name);
+  }
+  return Unmatched(names, left_out);
 }
 
 const char* NameOf(Fault fault) {
   return kFaultNames[static_cast<int>(fault)];
 }
 
-bool UsesServer(Operation operation) {
-  return operation < Operation::kSettings;
+const SoakOperation& OperationOf(const Plan& plan) {
+  return SoakOperations()[static_cast<size_t>(plan.operation)];
 }
 
-bool IsSoap(Operation operation) {
-  return IsOneOf(operation, {Operation::kSoap, Operation::kSoapLogin, Operation::kSoapXml});
+bool Has(const Plan& plan, Trait trait) {
+  return (OperationOf(plan).traits & trait) != 0;
 }
 
-bool UsesCurl(Operation operation) {
-  return operation >= Operation::kCurlGet && operation <= Operation::kJsonGetTls;
+bool UsesServer(const Plan& plan) {
+  return OperationOf(plan).name != nullptr;
+}
+
+bool UsesCurl(const Plan& plan) {
+  return UsesServer(plan) && OperationNamed(OperationOf(plan).name).curl;
 }
 
 size_t Below(size_t limit, Random* random) {
@@ -193,25 +169,25 @@ size_t Below(size_t limit, Random* random) {
 Plan NextPlan(unsigned id, Random* random) {
   Plan plan;
   plan.id = id;
-  plan.operation = static_cast<Operation>(Below(kOperations, random));
-  plan.size = 1 + Below(plan.operation == Operation::kSettings ? 20 : 3000, random);
-  if (!UsesServer(plan.operation)) return plan;
-  plan.tls = plan.operation == Operation::kJsonGetTls ||
-             (MayUseTls(plan.operation) && Below(2, random) == 0);
+  plan.operation = static_cast<int>(Below(SoakOperations().size(), random));
+  plan.size = 1 + Below(3000, random);
+  if (!UsesServer(plan)) return plan;
+  const OverTls tls = OperationNamed(OperationOf(plan).name).tls;
+  plan.tls = tls == OverTls::kAlways || (tls == OverTls::kEither && Below(2, random) == 0);
   const size_t chance = Below(100, random);
   if (chance < 5) plan.fault = PickFault(plan, random);
   if (chance == 5) plan.fault = Fault::kSlow;
   plan.framing = PickFraming(plan, random);
   plan.size = plan.fault == Fault::kSlow ? 1 + Below(400, random) : PickSize(random);
-  if (LogsIn(plan.operation)) plan.login = static_cast<Login>(Below(4, random));
+  if (Has(plan, kLogsIn)) plan.scheme = static_cast<Scheme>(Below(4, random));
   return plan;
 }
 
 std::string ToPath(const Plan& plan) {
   char text[128];
-  snprintf(text, sizeof(text), "soak/%d/%d/%u/%zu/%d/%d/", static_cast<int>(plan.operation),
+  snprintf(text, sizeof(text), "soak/%d/%d/%u/%zu/%d/%d/", plan.operation,
            static_cast<int>(plan.fault), plan.id, plan.size, static_cast<int>(plan.framing),
-           static_cast<int>(plan.login));
+           static_cast<int>(plan.scheme));
   return text;
 }
 
@@ -221,15 +197,17 @@ bool FindPlan(const std::string& request, Plan* plan) {
   int operation = 0;
   int fault = 0;
   int framing = 0;
-  int login = 0;
+  int scheme = 0;
   if (sscanf(request.c_str() + found, "soak/%d/%d/%u/%zu/%d/%d/", &operation, &fault, &plan->id,
-             &plan->size, &framing, &login) != 6) {
+             &plan->size, &framing, &scheme) != 6) {
     return false;
   }
-  plan->operation = static_cast<Operation>(operation);
+  const int count = static_cast<int>(SoakOperations().size());
+  if (operation < 0 || operation >= count) return false;
+  plan->operation = operation;
   plan->fault = static_cast<Fault>(fault);
   plan->framing = static_cast<Framing>(framing);
-  plan->login = static_cast<Login>(login);
+  plan->scheme = static_cast<Scheme>(scheme);
   return true;
 }
 
@@ -237,35 +215,32 @@ std::string ValueOf(const Plan& plan) {
   return Filler(plan, true);
 }
 
-std::string AnswerOf(const Plan& plan) {
-  if (IsXml(plan.operation)) return "<answer><value>" + ValueOf(plan) + "</value></answer>";
-  if (IsJson(plan.operation)) return "{\"success\":true,\"value\":\"" + ValueOf(plan) + "\"}";
-  if (plan.operation == Operation::kLines) return ValueOf(plan);
+std::string ResponseBodyOf(const Plan& plan) {
+  if (Has(plan, kXml)) return "<response><value>" + ValueOf(plan) + "</value></response>";
+  if (Has(plan, kJson)) return "{\"success\":true,\"value\":\"" + ValueOf(plan) + "\"}";
+  if (Has(plan, kLine)) return ValueOf(plan);
   return Filler(plan, false);
 }
 
 std::string RequestBodyOf(const Plan& plan) {
   const std::string id = std::to_string(plan.id);
-  switch (plan.operation) {
-    case Operation::kSoap:
-    case Operation::kSoapLogin:
-    case Operation::kSoapXml:
+  switch (OperationOf(plan).sends) {
+    case Sends::kEnvelope:
       return "<Envelope><Body><Get id=\"" + id + "\"/></Body></Envelope>";
-    case Operation::kFormPost:
-    case Operation::kJsonPost:
-    case Operation::kLoginPost:
+    case Sends::kForm:
       return "id=" + id + "&value=" + ValueOf(plan).substr(0, 2000);
-    case Operation::kXmlPost:  // indented
+    case Sends::kIndentedPreset:
       return "<?xml version=\"1.0\"?>\n<preset>\n  <pan>" + id + "</pan>\n</preset>\n";
-    case Operation::kXmlPut:
+    case Sends::kPreset:
       return "<?xml version=\"1.0\"?>\n<preset><pan>" + id + "</pan></preset>\n";
-    case Operation::kCurlPost:
+    case Sends::kPath:
       return ToPath(plan);
-    case Operation::kUpload:
+    case Sends::kUpload:
       return std::string("--") + kBoundary +
              "\r\nContent-Disposition: form-data; name=\"clip\"\r\n\r\n" + ValueOf(plan) +
              "\r\n--" + kBoundary + "--\r\n";
-    default:
-      return "";
+    case Sends::kNothing:
+      break;
   }
+  return "";
 }

@@ -2,13 +2,11 @@
 #ifndef TARNWICK_TESTS_SOAK_SERVER_H_
 #define TARNWICK_TESTS_SOAK_SERVER_H_
 
-#include <sys/types.h>
-
 #include <string>
 
-#include "tests/soak/plan.h"
+#include "tests/support/server_process.h"
 
-// The ports of 127.0.0.1 at which the server answers.
+// The ports of 127.0.0.1 that the server serves.
 struct ServerPorts {
   int plain = 0;
   int tls = 0;
@@ -18,24 +16,21 @@ struct ServerPorts {
   int silence = 0;
 };
 
-// Starts the process. It answers until EndServer, or until its parent ends.
 // REQUIRES: no other thread runs yet.
 class Server {
  public:
   Server();
-  ~Server();
-  Server(const Server&) = delete;
-  Server& operator=(const Server&) = delete;
 
   const ServerPorts& Ports() const { return ports_; }
 
   // A PEM file with the authority that the certificate of the TLS port comes from.
-  const std::string& CaFile() const { return ca_file_; }
+  const std::string& CaFile() const { return identity_.CaFile(); }
 
  private:
-  pid_t pid_ = -1;
-  ServerPorts ports_;
-  std::string ca_file_;
+  const TlsIdentity identity_;
+  const TlsIdentity stranger_;
+  const ServerProcess process_;
+  const ServerPorts ports_;
 };
 
 #endif  // TARNWICK_TESTS_SOAK_SERVER_H_

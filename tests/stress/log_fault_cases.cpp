@@ -21,12 +21,12 @@ constexpr int kProcesses = 4;
 constexpr double kSeconds = 30;
 
 // A file that takes the space of a file system.
-class Ballast {
+class DiskFiller {
  public:
-  Ballast() : fd_(open(kPath, O_WRONLY | O_CREAT | O_CLOEXEC, 0600)) {}
-  ~Ballast() { close(fd_); }
-  Ballast(const Ballast&) = delete;
-  Ballast& operator=(const Ballast&) = delete;
+  DiskFiller() : fd_(open(kPath, O_WRONLY | O_CREAT | O_CLOEXEC, 0600)) {}
+  ~DiskFiller() { close(fd_); }
+  DiskFiller(const DiskFiller&) = delete;
+  DiskFiller& operator=(const DiskFiller&) = delete;
 
   // Takes all that is free.
   void Fill() {
@@ -42,12 +42,12 @@ class Ballast {
   void Remove() { Release(size_); }
 
  private:
-  static constexpr char kPath[] = "/var/log/tarnwick/ballast";
+  static constexpr char kPath[] = "/var/log/tarnwick/filler";
   int fd_;
   off_t size_ = 0;
 };
 
-void Conclude(WriterTeam& team, CaseResult& result) {
+void Conclude(WriterPool& team, CaseResult& result) {
   team.Stop(result);
   LogVerifier verifier(team.Facts());
   LogFiles().Verify(verifier, result);
@@ -60,17 +60,17 @@ void FullDisk(CaseResult& result) {
   if (mount("tmpfs", kLogFolder, "tmpfs", 0, "size=256m,mode=755") != 0) {
     return result.Fail("no file system");
   }
-  WriterTeam team(kProcesses);
+  WriterPool team(kProcesses);
   team.AwaitLines(20, result);
   team.FaultBegins();
-  Ballast ballast;
+  DiskFiller filler;
   for (int i = 0; i < refills; ++i) {
-    ballast.Fill();
+    filler.Fill();
     usleep(10000);
-    ballast.Release(4096 * (1 + i % 64));
+    filler.Release(4096 * (1 + i % 64));
     usleep(2000);
   }
-  ballast.Remove();
+  filler.Remove();
   team.FaultEnds();
   team.AwaitLines(50, result);
   Conclude(team, result);
@@ -107,7 +107,7 @@ class ReportCounter {
 // costs has its report, and no other.
 void WithoutAFile(CaseResult& result, bool (*begin)(), bool (*end)()) {
   ReportCounter reports;
-  WriterTeam team(kProcesses);
+  WriterPool team(kProcesses);
   team.AwaitLines(20, result);
   team.FaultBegins();
   result.Expect(begin(), "the fault could not be made");
@@ -171,7 +171,7 @@ void FileSizeLimit(CaseResult& result) {
   for (int i = 0; i < rounds; ++i) {
     unlink(kMainLog);
     LogFiles files;
-    WriterTeam team(kProcesses, LimitFileSize);
+    WriterPool team(kProcesses, LimitFileSize);
     team.FaultBegins();
     result.Expect(LogHasReached(4 << 20), "the limit was not reached");
     usleep(200000);

@@ -164,7 +164,8 @@ void LogVerifier::Read(std::string_view text) {
     const size_t end = feed == std::string_view::npos ? text.size() : feed + 1;
     std::string_view line = text.substr(0, end);
     text.remove_prefix(end);
-    // A cut line has no line end, so the next one, with the capital of its month, stands behind it.
+    // A cut line has no line feed, so the next one, with the capital of its month, follows in the
+    // same line.
     while (!line.empty()) {
       const size_t next = line.find_first_of("ABCDEFGHIJKLMNOPQRSTUVWXYZ", 1);
       ReadPiece(line.substr(0, next), next == std::string_view::npos);
@@ -233,7 +234,7 @@ void LogVerifier::Finish() {
       Fail("lost", "w" + std::to_string(i) + " n" + std::to_string(number));
     }
   }
-  // Lines that were cut before their number count as missing as well.
+  // Lines that were cut before their number are taken for missing as well.
   if (cut_before_number_ > missing_) Fail("more cut lines than missing ones", "");
 }
 

@@ -39,7 +39,7 @@ void LogFiles::Verify(LogVerifier& verifier, CaseResult& result) const {
   for (const std::string& failure : verifier.Failures()) result.Fail(failure);
 }
 
-WriterTeam::WriterTeam(int processes, const std::function<void()>& setup)
+WriterPool::WriterPool(int processes, const std::function<void()>& setup)
     : writers_(processes * kThreads),
       progress_(static_cast<size_t>(writers_)),
       lossy_from_(static_cast<size_t>(writers_), 0),
@@ -52,21 +52,21 @@ WriterTeam::WriterTeam(int processes, const std::function<void()>& setup)
   }
 }
 
-WriterTeam::~WriterTeam() {
+WriterPool::~WriterPool() {
   for (const pid_t pid : pids_) {
     kill(pid, SIGKILL);
     waitpid(pid, nullptr, 0);
   }
 }
 
-int WriterTeam::RunProcess(int process) {
+int WriterPool::RunProcess(int process) {
   std::thread other([this, process] { RunThread(process * kThreads + 1); });
   RunThread(process * kThreads);
   other.join();
   return DescriptorsOn(kLogFolder) == 0 ? 0 : kDescriptorLeft;
 }
 
-void WriterTeam::RunThread(int writer) {
+void WriterPool::RunThread(int writer) {
   WriterProgress& progress = progress_[static_cast<size_t>(writer)];
   progress.pid = getpid();
   while (!*stop_) {
@@ -75,7 +75,7 @@ void WriterTeam::RunThread(int writer) {
   }
 }
 
-void WriterTeam::AwaitLines(int count, CaseResult& result) {
+void WriterPool::AwaitLines(int count, CaseResult& result) {
   const auto deadline = std::chrono::steady_clock::now() + std::chrono::duration<double>(kSeconds);
   std::vector<int> targets;
   for (size_t i = 0; i < lossy_from_.size(); ++i) targets.push_back(progress_[i].finished + count);
@@ -89,15 +89,15 @@ void WriterTeam::AwaitLines(int count, CaseResult& result) {
   }
 }
 
-void WriterTeam::FaultBegins() {
+void WriterPool::FaultBegins() {
   for (size_t i = 0; i < lossy_from_.size(); ++i) lossy_from_[i] = progress_[i].finished;
 }
 
-void WriterTeam::FaultEnds() {
+void WriterPool::FaultEnds() {
   for (size_t i = 0; i < lossy_to_.size(); ++i) lossy_to_[i] = progress_[i].started;
 }
 
-void WriterTeam::Stop(CaseResult& result) {
+void WriterPool::Stop(CaseResult& result) {
   *stop_ = true;
   for (const pid_t pid : pids_) {
     const auto status = WaitFor(pid, kSeconds);
@@ -107,7 +107,7 @@ void WriterTeam::Stop(CaseResult& result) {
   pids_.clear();
 }
 
-std::vector<WriterFacts> WriterTeam::Facts() const {
+std::vector<WriterFacts> WriterPool::Facts() const {
   std::vector<WriterFacts> facts;
   for (size_t i = 0; i < lossy_from_.size(); ++i) {
     facts.push_back({progress_[i].pid, progress_[i].started, lossy_from_[i], lossy_to_[i]});
@@ -115,7 +115,7 @@ std::vector<WriterFacts> WriterTeam::Facts() const {
   return facts;
 }
 
-long WriterTeam::Lines() const {
+long WriterPool::Lines() const {
   long lines = 0;
   for (size_t i = 0; i < lossy_from_.size(); ++i) lines += progress_[i].started;
   return lines;

@@ -38,15 +38,15 @@ class LogFiles {
 };
 
 // Processes of two threads each, which write a line every millisecond or so until they are stopped.
-class WriterTeam {
+class WriterPool {
  public:
   static constexpr int kThreads = 2;
 
   // Each process runs `setup` first.
-  explicit WriterTeam(int processes, const std::function<void()>& setup = {});
-  ~WriterTeam();
-  WriterTeam(const WriterTeam&) = delete;
-  WriterTeam& operator=(const WriterTeam&) = delete;
+  explicit WriterPool(int processes, const std::function<void()>& setup = {});
+  ~WriterPool();
+  WriterPool(const WriterPool&) = delete;
+  WriterPool& operator=(const WriterPool&) = delete;
 
   // Waits until each writer has written `count` further lines.
   void AwaitLines(int count, CaseResult& result);

@@ -71,7 +71,7 @@ void SettingsRun::StartWriter(int writer, int rounds) {
   writers_[writer] = Spawn([=] { return RunWriter(writer, rounds); });
 }
 
-// A writer that follows a killed one goes on behind the round that it may have written.
+// A writer that follows a killed one goes on after the round that it may have written.
 int SettingsRun::RunWriter(int writer, int rounds) {
   WriterRounds& mine = rounds_[static_cast<size_t>(writer)];
   while (mine.finished < rounds) {

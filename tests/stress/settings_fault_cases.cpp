@@ -28,9 +28,9 @@ void ExpectResult(int outcome, const struct stat& before, CaseResult& result) {
 }
 
 // Takes the file system's space but for `pages`.
-void FillBut(int pages) {
+void FillLeaving(int pages) {
   const std::vector<char> page(4096, 'b');
-  const int fd = open("/var/packages/Tarnwick/etc/ballast", O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
+  const int fd = open("/var/packages/Tarnwick/etc/filler", O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
   off_t size = 0;
   while (write(fd, page.data(), page.size()) == static_cast<ssize_t>(page.size())) size += 4096;
   if (ftruncate(fd, size > pages * 4096 ? size - pages * 4096 : 0) != 0) perror("ftruncate");
@@ -45,10 +45,10 @@ void NoSpace(CaseResult& result) {
       return result.Fail("no file system");
     }
     const struct stat before = MakeSettingsFile();
-    FillBut(pages);
+    FillLeaving(pages);
     const int outcome = WriteRound(0, 1) == 0 ? kWritten : kRefused;
     ++outcomes[outcome];
-    unlink("/var/packages/Tarnwick/etc/ballast");
+    unlink("/var/packages/Tarnwick/etc/filler");
     ExpectResult(outcome, before, result);
     result.Expect(WriteRound(0, 1) == 0, "no write with new space");
     ExpectResult(kWritten, before, result);
@@ -69,7 +69,7 @@ void NoInode(CaseResult& result) {
   result.Done("a file system that holds one file");
 }
 
-struct Hindrance {
+struct Obstacle {
   const char* name;
   std::function<void()> make;   // on the file and folder, as root
   std::function<bool()> enter;  // in the writing process
@@ -77,8 +77,8 @@ struct Hindrance {
 };
 
 // A process without capabilities meets permissions although it is root.
-const std::vector<Hindrance>& Hindrances() {
-  static const std::vector<Hindrance> hindrances = {
+const std::vector<Obstacle>& Obstacles() {
+  static const std::vector<Obstacle> obstacles = {
       {"folder without write permission", [] { chmod(kSettingsFolder, 0555); }, DropCapabilities,
        kRefused},
       {"file that may not be read", [] { chmod(kSettingsFile, 0); }, DropCapabilities, kRefused},
@@ -91,12 +91,12 @@ const std::vector<Hindrance>& Hindrances() {
        [] { mount(nullptr, kSettingsFolder, nullptr, MS_REMOUNT | MS_BIND | MS_RDONLY, nullptr); },
        [] { return true; }, kRefused},
   };
-  return hindrances;
+  return obstacles;
 }
 
 // Those that need a second user, which a user namespace may not have.
-const std::vector<Hindrance>& HindrancesOfOthers() {
-  static const std::vector<Hindrance> hindrances = {
+const std::vector<Obstacle>& HindrancesOfOthers() {
+  static const std::vector<Obstacle> obstacles = {
       {"file of another user", [] { chmod(kSettingsFile, 0644); }, DropCapabilities, kRefused},
       {"another user in root's folder", [] { chmod(kSettingsFile, 0644); },
        [] { return setgid(2345) == 0 && setuid(1234) == 0; }, kRefused},
@@ -106,35 +106,35 @@ const std::vector<Hindrance>& HindrancesOfOthers() {
        },
        [] { return setgid(2345) == 0 && setuid(1234) == 0; }, kWritten},
   };
-  return hindrances;
+  return obstacles;
 }
 
-void Hinder(const Hindrance& hindrance, CaseResult& result) {
+void Hinder(const Obstacle& obstacle, CaseResult& result) {
   if (mount("tmpfs", kSettingsFolder, "tmpfs", 0, "mode=755") != 0) {
     return result.Fail("no file system");
   }
   MakeSettingsFile();
-  hindrance.make();
+  obstacle.make();
   struct stat before = {};
   stat(kSettingsFile, &before);
   const pid_t pid = Spawn([&] {
-    if (!hindrance.enter()) return 9;
+    if (!obstacle.enter()) return 9;
     return WriteRound(0, 1) == 0 ? kWritten : kRefused;
   });
   const auto status = WaitFor(pid, kSeconds);
-  result.Expect(status == hindrance.outcome << 8,
-                std::string(hindrance.name) + ": " + StatusText(status));
-  ExpectResult(hindrance.outcome, before, result);
+  result.Expect(status == obstacle.outcome << 8,
+                std::string(obstacle.name) + ": " + StatusText(status));
+  ExpectResult(obstacle.outcome, before, result);
   umount(kSettingsFolder);
 }
 
 void NoPermission(CaseResult& result) {
   const bool others = MakeSettingsFile().st_uid == 1234;
-  for (const Hindrance& hindrance : Hindrances()) Hinder(hindrance, result);
+  for (const Obstacle& obstacle : Obstacles()) Hinder(obstacle, result);
   if (others) {
-    for (const Hindrance& hindrance : HindrancesOfOthers()) Hinder(hindrance, result);
+    for (const Obstacle& obstacle : HindrancesOfOthers()) Hinder(obstacle, result);
   }
-  result.Done("%zu hindrances%s", Hindrances().size() + (others ? HindrancesOfOthers().size() : 0),
+  result.Done("%zu obstacles%s", Obstacles().size() + (others ? HindrancesOfOthers().size() : 0),
               others ? "" : " (no second user here)");
 }
 

@@ -109,7 +109,7 @@ int posix_memalign(void** block, size_t alignment, size_t size) noexcept {
   return 0;
 }
 
-// The sanitizer's own copying functions would allocate behind this file's back.
+// The sanitizer's own copying functions would allocate unseen by this file.
 char* strdup(const char* text) noexcept {
   return CopyOf(text, strlen(text));
 }

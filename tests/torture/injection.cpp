@@ -21,20 +21,21 @@ bool Strike(const char* name) {
 
 // The faults after which nothing works any more.
 bool IsLasting(Fault fault) {
-  return fault == Fault::kNoMemory || fault == Fault::kNothingLeft || fault == Fault::kNothingWorks;
+  return fault == Fault::kAllocationsFrom || fault == Fault::kAllFromAllocation ||
+         fault == Fault::kAllFromCall;
 }
 
 bool TakesAllocationsAfterwards(Fault fault) {
-  return fault == Fault::kNothingWorks && t_injection.struck;
+  return fault == Fault::kAllFromCall && t_injection.struck;
 }
 
 bool TakesCallsAfterwards(Fault fault) {
-  return fault == Fault::kNothingLeft && t_injection.struck;
+  return fault == Fault::kAllFromAllocation && t_injection.struck;
 }
 
 // Whether the point is this call, by its number.
 bool IsDue(long number) {
-  const Point& point = t_injection.point;
+  const FaultPoint& point = t_injection.point;
   return IsLasting(point.fault) ? number >= point.number : number == point.number;
 }
 
@@ -60,10 +61,11 @@ Fault FaultNamed(const char* name) {
 }
 
 bool CountsAllocations(Fault fault) {
-  return fault == Fault::kAllocation || fault == Fault::kNoMemory || fault == Fault::kNothingLeft;
+  return fault == Fault::kAllocation || fault == Fault::kAllocationsFrom ||
+         fault == Fault::kAllFromAllocation;
 }
 
-void StartRun(const Point& point) {
+void StartRun(const FaultPoint& point) {
   t_injection.armed = false;
   t_injection.point = point;
   t_injection.struck = false;

@@ -9,23 +9,23 @@
 
 // What happens at the chosen call.
 enum class Fault {
-  kNone,          // nothing: counts the calls
-  kAllocation,    // the n-th allocation fails
-  kNoMemory,      // the n-th allocation and all later ones fail
-  kNothingLeft,   // the n-th allocation fails, and from there on every allocation and system call
-  kCall,          // the n-th system call fails with its usual error
-  kNothingWorks,  // the n-th system call fails, and from there on every call and allocation
-  kInterrupted,   // the n-th system call fails with EINTR
-  kTryAgain,      // the n-th system call fails with EAGAIN
-  kShort,         // the n-th system call, when it moves bytes, moves one
-  kCancelled,     // the n-th system call finds the thread cancelled
+  kNone,               // nothing: counts the calls
+  kAllocation,         // the n-th allocation fails
+  kAllocationsFrom,    // the n-th allocation and all later ones fail
+  kAllFromAllocation,  // the n-th allocation fails, and from there on every call and allocation
+  kCall,               // the n-th system call fails with its usual error
+  kAllFromCall,        // the n-th system call fails, and from there on every call and allocation
+  kInterrupted,        // the n-th system call fails with EINTR
+  kTryAgain,           // the n-th system call fails with EAGAIN
+  kShort,              // the n-th system call, when it moves bytes, moves one
+  kCancelled,          // the n-th system call finds the thread cancelled
 };
 
 // Those of a usual sweep. A cancelled thread has a sweep of its own: the address sanitizer does not
 // know that its frames are left.
-constexpr Fault kFaults[] = {Fault::kAllocation, Fault::kNoMemory,     Fault::kNothingLeft,
-                             Fault::kCall,       Fault::kNothingWorks, Fault::kInterrupted,
-                             Fault::kTryAgain,   Fault::kShort};
+constexpr Fault kFaults[] = {
+    Fault::kAllocation,  Fault::kAllocationsFrom, Fault::kAllFromAllocation, Fault::kCall,
+    Fault::kAllFromCall, Fault::kInterrupted,     Fault::kTryAgain,          Fault::kShort};
 
 // The name for the command line and the messages; a Fault by its name, kNone when there is none.
 const char* FaultName(Fault fault);
@@ -35,7 +35,7 @@ Fault FaultNamed(const char* name);
 bool CountsAllocations(Fault fault);
 
 // One run's fault. Calls are numbered from 1.
-struct Point {
+struct FaultPoint {
   Fault fault;
   long number;
 };
@@ -58,7 +58,7 @@ struct Verdict {
 struct Injection {
   bool counting_blocks;  // this is the thread under test
   bool armed;            // the library's code is running, not the test's
-  Point point;
+  FaultPoint point;
   bool struck;              // the fault has met a call
   const char* struck_name;  // that call
   long allocations;         // since the run's start, failed ones included
@@ -70,7 +70,7 @@ struct Injection {
 extern __thread Injection t_injection;  // thread_local would be asked for its initialisation
 
 // Starts a run: zeroes the counts and sets the fault.
-void StartRun(const Point& point);
+void StartRun(const FaultPoint& point);
 
 // For the interposed calls of the armed thread: the next call's fate.
 bool NextAllocationFails();

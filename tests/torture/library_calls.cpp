@@ -1,4 +1,4 @@
-// Library calls that count as system calls: OpenSSL's reads and writes, which may be short of what
+// Library calls that are treated as system calls: OpenSSL's reads and writes, which may be short of what
 // their callers want, and the start of a thread, whose system call is made with all signals blocked
 // and so cannot be trapped.
 #include <dlfcn.h>
@@ -19,7 +19,7 @@ Verdict Ask(const CallKind& kind) {
   return t_injection.armed ? NextCall(kind) : Verdict{Verdict::kPass, 0};
 }
 
-// The function behind this program's.
+// The function that this program's hides.
 template <typename Function>
 Function Next(const char* name, Function /*same_type*/) {
   return reinterpret_cast<Function>(dlsym(RTLD_NEXT, name));

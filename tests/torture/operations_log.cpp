@@ -30,56 +30,56 @@ bool IsCut(const std::string& text) {
 }
 
 // The line is in the file, whole and once, or after a fault not at all.
-void ExpectLine(Stage& stage, const std::string& path) {
+void ExpectLine(TestRun& test, const std::string& path) {
   const std::string text = ReadFile(path);
   const bool whole = EndsWith(text, " file:7:func(): message 5\n") &&
                      text.find('\n') == text.size() - 1 &&
                      text.find("[http][warn]") != std::string::npos;
-  stage.ExpectEither(whole, IsCut(text), "the line is not whole: " + text);
+  test.ExpectEither(whole, IsCut(text), "the line is not whole: " + text);
 }
 
-void LogLineTo(Stage& stage, LOG_TYPE type, const char* path) {
+void LogLineTo(TestRun& test, LOG_TYPE type, const char* path) {
   unlink(path);
-  stage.Run([&] {
+  test.Run([&] {
     errno = ETIMEDOUT;
     TWPrintf(type, "http", "warn", "a/file", 7, "func", "message %d\n", 5);
     if (errno != ETIMEDOUT) errno = 0;
   });
-  stage.Expect(errno == ETIMEDOUT, "errno has changed");
-  ExpectLine(stage, path);
+  test.Expect(errno == ETIMEDOUT, "errno has changed");
+  ExpectLine(test, path);
   unlink(path);
 }
 
-void MainLogLine(Stage& stage) {
-  LogLineTo(stage, LOG_TYPE_MAIN, kMainLog);
+void MainLogLine(TestRun& test) {
+  LogLineTo(test, LOG_TYPE_MAIN, kMainLog);
 }
 
-void NotificationLine(Stage& stage) {
-  LogLineTo(stage, LOG_TYPE_NOTIFICATION, kNotificationLog);
+void NotificationLine(TestRun& test) {
+  LogLineTo(test, LOG_TYPE_NOTIFICATION, kNotificationLog);
 }
 
 // Through the gate, with the names of category and level.
-void GatedLine(Stage& stage) {
+void GatedLine(TestRun& test) {
   unlink(kMainLog);
-  stage.Run([] { TW_LOG_AS("func", LOG_CATEG_HTTP, LOG_LEVEL_WARN, "message %d\n", 5); });
+  test.Run([] { TW_LOG_AS("func", LOG_CATEG_HTTP, LOG_LEVEL_WARN, "message %d\n", 5); });
   const std::string text = ReadFile(kMainLog);
   const bool named = text.find("[http][warn]") != std::string::npos;
   // Without memory for the names the line says so.
-  const bool unnamed = stage.Struck() && text.find("[unknown]") != std::string::npos;
-  stage.ExpectEither(EndsWith(text, "(): message 5\n"), IsCut(text),
-                     "the line is not whole: " + text);
-  stage.Expect(named || unnamed || text.empty(), "the names are wrong: " + text);
+  const bool unnamed = test.Struck() && text.find("[unknown]") != std::string::npos;
+  test.ExpectEither(EndsWith(text, "(): message 5\n"), IsCut(text),
+                    "the line is not whole: " + text);
+  test.Expect(named || unnamed || text.empty(), "the names are wrong: " + text);
   unlink(kMainLog);
 }
 
 // Without memory for the scope the text stands as it is, without memory for the text the line says
 // so.
-void EscapedLine(Stage& stage) {
+void EscapedLine(TestRun& test) {
   unlink(kMainLog);
   const std::string tail(40, 'b');
   const std::string text = "a\n" + tail;
   bool valid = false;
-  stage.Run([&] {
+  test.Run([&] {
     TWRequestScope scope;
     valid = scope.Valid();
     scope.SetEscapedLog(true);
@@ -89,13 +89,13 @@ void EscapedLine(Stage& stage) {
   const std::string log = ReadFile(kMainLog);
   const bool lost =
       valid ? EndsWith(log, "(): (no memory)\n") : EndsWith(log, "(): " + text + "\n");
-  stage.ExpectEither(valid && EndsWith(log, "(): a\\x0A" + tail + "\n"), lost || IsCut(log),
-                     "the line is wrong: " + log);
+  test.ExpectEither(valid && EndsWith(log, "(): a\\x0A" + tail + "\n"), lost || IsCut(log),
+                    "the line is wrong: " + log);
   unlink(kMainLog);
 }
 
-void UndefinedLog(Stage& stage) {
-  stage.Run([] {
+void UndefinedLog(TestRun& test) {
+  test.Run([] {
     TWPrintf(static_cast<LOG_TYPE>(2), "http", "warn", "file", 7, "func", "message %d\n", 5);
   });
 }
@@ -111,14 +111,14 @@ struct OtherRecord {
   TWDbgLogCfg* before;
 };
 
-void RecordAttach(Stage& stage) {
+void RecordAttach(TestRun& test) {
   const OtherRecord other;
-  stage.Run([] { InitDbgCfg(); });
+  test.Run([] { InitDbgCfg(); });
   TWDbgLogCfg* const attached = g_pDbgLogCfg;
   const bool is_record = attached != nullptr && attached->Level(LOG_CATEG_HTTP) == 7;
-  stage.ExpectEither(is_record, attached == nullptr, "the record is not attached");
-  stage.Run([] { FreeDbgCfg(); });
-  stage.Expect(g_pDbgLogCfg == nullptr, "the record is still attached");
+  test.ExpectEither(is_record, attached == nullptr, "the record is not attached");
+  test.Run([] { FreeDbgCfg(); });
+  test.Expect(g_pDbgLogCfg == nullptr, "the record is still attached");
 }
 
 std::string LevelsText(int level) {
@@ -141,16 +141,16 @@ int CommonLevel(const TWDbgLogCfg& record) {
   return record.Level(LOG_CATEG_ACCOUNT);
 }
 
-void SettingsLoad(Stage& stage) {
+void SettingsLoad(TestRun& test) {
   WriteFile(kSettings, SettingsText(5, "yes"));
   TWDbgLogCfg record = {};
   int result = 1;
-  stage.Run([&] { result = record.Init(0); });
+  test.Run([&] { result = record.Init(0); });
   const int level = CommonLevel(record);
-  stage.ExpectEither(result == 0, result == -1, "the result is wrong");
-  stage.ExpectEither(level == 5, level == 3, "the levels are neither loaded nor the default");
+  test.ExpectEither(result == 0, result == -1, "the result is wrong");
+  test.ExpectEither(level == 5, level == 3, "the levels are neither loaded nor the default");
   // Levels for whose text there is no memory stay as they are, without a failure.
-  if (result == 0) stage.Expect(record.TimeScale(), "the flag is not loaded");
+  if (result == 0) test.Expect(record.TimeScale(), "the flag is not loaded");
   unlink(kSettings);
 }
 
@@ -159,73 +159,73 @@ bool IsOldOrNew(const std::string& text, int level, const char* time_scale) {
 }
 
 // Each key has its old or its new value; the mode, and what else is in the file, stay.
-void ExpectSaved(Stage& stage, int result) {
+void ExpectSaved(TestRun& test, int result) {
   const std::string text = ReadFile(kSettings);
-  stage.ExpectEither(result == 0 && text == SettingsText(6, "no"),
-                     result == -1 && (IsOldOrNew(text, 5, "no") || IsOldOrNew(text, 6, "no")),
-                     "the settings are neither old nor new: " + text);
+  test.ExpectEither(result == 0 && text == SettingsText(6, "no"),
+                    result == -1 && (IsOldOrNew(text, 5, "no") || IsOldOrNew(text, 6, "no")),
+                    "the settings are neither old nor new: " + text);
   struct stat status = {};
-  stage.Expect(stat(kSettings, &status) == 0 && (status.st_mode & 07777) == 0640,
-               "the settings' mode has changed");
+  test.Expect(stat(kSettings, &status) == 0 && (status.st_mode & 07777) == 0640,
+              "the settings' mode has changed");
 }
 
-void SettingsSave(Stage& stage) {
+void SettingsSave(TestRun& test) {
   WriteFile(kSettings, SettingsText(5, "yes"));
   chmod(kSettings, 0640);
   TWDbgLogCfg record = {};
   for (int i = 0; i < LOG_CATEG_COUNT; ++i) record.SetLevel(static_cast<LOG_CATEG>(i), 6);
   int result = 1;
-  stage.Run([&] { result = record.SaveDbgLogSettings(); });
-  ExpectSaved(stage, result);
+  test.Run([&] { result = record.SaveDbgLogSettings(); });
+  ExpectSaved(test, result);
   unlink(kSettings);
 }
 
-void SettingsFirstSave(Stage& stage) {
+void SettingsFirstSave(TestRun& test) {
   unlink(kSettings);
   TWDbgLogCfg record = {};
   int result = 1;
-  stage.Run([&] { result = record.SaveDbgLogSettings(); });
+  test.Run([&] { result = record.SaveDbgLogSettings(); });
   const std::string text = ReadFile(kSettings);
   const std::string levels = "tw_dbglog_settings=\"" + LevelsText(0) + "\"\n";
   const std::string flag = "tw_dbglog_time_scale=\"no\"\n";
-  stage.ExpectEither(result == 0 && text == levels + flag,
-                     result == -1 && (text.empty() || text == levels || text == flag),
-                     "the settings are wrong: " + text);
+  test.ExpectEither(result == 0 && text == levels + flag,
+                    result == -1 && (text.empty() || text == levels || text == flag),
+                    "the settings are wrong: " + text);
   unlink(kSettings);
 }
 
-void SettingsKey(Stage& stage) {
+void SettingsKey(TestRun& test) {
   WriteFile(kSettings, SettingsText(5, "yes"));
   char value[16] = "untouched";
   int result = -2;
-  stage.Run([&] { result = QLIBCFileGetKeyValue(kSettings, "other", value, sizeof(value), 0); });
-  stage.ExpectEither(result == 4 && strcmp(value, "kept") == 0,
-                     result == -1 && strcmp(value, "untouched") == 0, "the value is wrong");
+  test.Run([&] { result = QLIBCFileGetKeyValue(kSettings, "other", value, sizeof(value), 0); });
+  test.ExpectEither(result == 4 && strcmp(value, "kept") == 0,
+                    result == -1 && strcmp(value, "untouched") == 0, "the value is wrong");
   unlink(kSettings);
 }
 
-void IntList(Stage& stage) {
+void IntList(TestRun& test) {
   std::vector<int> list;
   const std::string text = "1,2,,3 and more, a text that is longer than a short string";
   const std::string delimiters = ",";
-  stage.RunMayThrow<std::bad_alloc>([&] { list = SplitToIntList(text, delimiters); });
-  stage.ExpectEither(list == std::vector<int>({1, 2, 3, 0}), list.empty(), "the list is wrong");
+  test.RunMayThrow<std::bad_alloc>([&] { list = SplitToIntList(text, delimiters); });
+  test.ExpectEither(list == std::vector<int>({1, 2, 3, 0}), list.empty(), "the list is wrong");
 }
 
 }  // namespace
 
 std::vector<Operation> LogOperations() {
   return {
-      {"log_line", Peer::kNone, MainLogLine},
-      {"log_notification", Peer::kNone, NotificationLine},
-      {"log_gate", Peer::kNone, GatedLine, true},
-      {"log_escaped", Peer::kNone, EscapedLine},
-      {"log_undefined", Peer::kNone, UndefinedLog},
-      {"record_attach", Peer::kNone, RecordAttach},
-      {"settings_load", Peer::kNone, SettingsLoad, true},
-      {"settings_save", Peer::kNone, SettingsSave},
-      {"settings_first_save", Peer::kNone, SettingsFirstSave},
-      {"settings_key", Peer::kNone, SettingsKey},
-      {"int_list", Peer::kNone, IntList},
+      {"log_line", PeerKind::kNone, MainLogLine},
+      {"log_notification", PeerKind::kNone, NotificationLine},
+      {"log_gate", PeerKind::kNone, GatedLine, true},
+      {"log_escaped", PeerKind::kNone, EscapedLine},
+      {"log_undefined", PeerKind::kNone, UndefinedLog},
+      {"record_attach", PeerKind::kNone, RecordAttach},
+      {"settings_load", PeerKind::kNone, SettingsLoad, true},
+      {"settings_save", PeerKind::kNone, SettingsSave},
+      {"settings_first_save", PeerKind::kNone, SettingsFirstSave},
+      {"settings_key", PeerKind::kNone, SettingsKey},
+      {"int_list", PeerKind::kNone, IntList},
   };
 }

@@ -41,7 +41,7 @@ void OnTrappedThread(const Setting& setting, Action action) {
   std::thread([&] {
     t_injection.counting_blocks = true;
     xmlSetGenericErrorFunc(nullptr, IgnoreMessage);
-    Sweeper sweeper(setting.operation, setting.port, setting.progress, &watchdog);
+    SweepRunner sweeper(setting.operation, setting.port, setting.progress, &watchdog);
     if (TrapSystemCalls()) {
       action(sweeper);
     } else {
@@ -51,7 +51,7 @@ void OnTrappedThread(const Setting& setting, Action action) {
 }
 
 void SweepWarm(const Setting& setting) {
-  OnTrappedThread(setting, [&](Sweeper& sweeper) {
+  OnTrappedThread(setting, [&](SweepRunner& sweeper) {
     if (sweeper.WarmUp()) sweeper.Make(setting.selection);
   });
 }
@@ -59,7 +59,7 @@ void SweepWarm(const Setting& setting) {
 enum class ColdRun { kReached, kMissed, kCrashed };
 
 // A point's run in a process of its own. A crash is noted.
-ColdRun TryColdPoint(const Setting& setting, const Point& point) {
+ColdRun TryColdPoint(const Setting& setting, const FaultPoint& point) {
   constexpr int kReached = 10;
   constexpr int kMissed = 11;
   Progress* const progress = setting.progress;
@@ -68,7 +68,7 @@ ColdRun TryColdPoint(const Setting& setting, const Point& point) {
   const pid_t child = fork();
   if (child == 0) {
     bool reached = false;
-    OnTrappedThread(setting, [&](Sweeper& sweeper) { reached = sweeper.TryFirstRun(point); });
+    OnTrappedThread(setting, [&](SweepRunner& sweeper) { reached = sweeper.TryFirstRun(point); });
     _exit(reached ? kReached : kMissed);
   }
   int status = 0;
@@ -105,20 +105,20 @@ void NoteMistake(const Operation& operation, const char* mistake, Progress* prog
     snprintf(progress->message, sizeof(progress->message), "%s", mistake);
   }
   if (progress->failures > kMostPrinted) return;
-  const Point& point = progress->current;
+  const FaultPoint& point = progress->current;
   printf("FAILED %s --fault %s --point %ld%s: %s\n", operation.name, FaultName(point.fault),
          point.number, progress->cold ? " --cold" : "", mistake);
   fflush(stdout);
 }
 
-bool Sweep(const Operation& operation, const Selection& selection, Progress* progress) {
+bool FaultSweep(const Operation& operation, const Selection& selection, Progress* progress) {
   if (!IsolateProcess()) {
     NoteMistake(operation, "the folders cannot be covered", progress);
     return false;
   }
   const PeerProcess peer(operation.peer);
   std::optional<TrustedAuthority> trusted;
-  if (operation.peer == Peer::kTls) trusted.emplace(peer.CaFile());
+  if (operation.peer == PeerKind::kTls) trusted.emplace(peer.CaFile());
   const LogCapture log;
   progress->cold = selection.cold;
   const Setting setting = {operation, selection, peer.Port(), progress};

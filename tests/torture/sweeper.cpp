@@ -25,17 +25,17 @@ std::string LogMistake() {
   return text.empty() || text.back() == '\n' ? "" : "the log ends in the middle of a line; ";
 }
 
-std::string RunHere(const Operation& operation, const Point& point, Stage& stage) {
+std::string RunHere(const Operation& operation, const FaultPoint& point, TestRun& test) {
   StartRun(point);
-  operation.run(stage);
+  operation.run(test);
   return "";
 }
 
 // A run in a thread of its own, whose counts outlive it.
 struct CancelledRun {
   const Operation& operation;
-  const Point& point;
-  Stage& stage;
+  const FaultPoint& point;
+  TestRun& test;
   Injection counts;
 };
 
@@ -55,13 +55,13 @@ void* RunInThread(void* argument) {
   pthread_setspecific(key, argument);
   auto* const run = static_cast<CancelledRun*>(argument);
   t_injection.counting_blocks = true;
-  RunHere(run->operation, run->point, run->stage);
+  RunHere(run->operation, run->point, run->test);
   return nullptr;
 }
 
 // Results: a mistake when the thread does not end as a cancelled one, or by itself.
-std::string RunCancelled(const Operation& operation, const Point& point, Stage& stage) {
-  CancelledRun run = {operation, point, stage, {}};
+std::string RunCancelled(const Operation& operation, const FaultPoint& point, TestRun& test) {
+  CancelledRun run = {operation, point, test, {}};
   pthread_t thread;
   if (pthread_create(&thread, nullptr, RunInThread, &run) != 0) return "there is no thread; ";
   void* end = nullptr;
@@ -99,11 +99,11 @@ void Watchdog::Watch() {
   }
 }
 
-std::set<std::string> Sweeper::FilesThere() {
+std::set<std::string> SweepRunner::FilesThere() {
   return TakeTraces().files;
 }
 
-bool Sweeper::WarmUp() {
+bool SweepRunner::WarmUp() {
   for (int i = 0; i < kWarmUpRuns; ++i) {
     const RunResult result = RunOnce(kNoPoint);
     if (result.mistakes.empty()) continue;
@@ -114,17 +114,17 @@ bool Sweeper::WarmUp() {
   return true;
 }
 
-bool Sweeper::TryFirstRun(const Point& point) {
-  if (point.fault != Fault::kNone) return TryPoint(point, true);
+bool SweepRunner::TryFirstRun(const FaultPoint& point) {
+  if (point.fault != Fault::kNone) return RunPoint(point, true);
   const RunResult result = RunOnce(point);
   NoteCounts();
   if (!result.mistakes.empty()) NoteMistake(operation_, result.mistakes.c_str(), progress_);
   return true;
 }
 
-void Sweeper::Make(const Selection& selection) {
+void SweepRunner::Make(const Selection& selection) {
   if (selection.only_first) {
-    TryPoint(selection.first, true);
+    RunPoint(selection.first, true);
     return;
   }
   if (selection.first.fault == Fault::kCancelled) {
@@ -135,67 +135,67 @@ void Sweeper::Make(const Selection& selection) {
     const bool resumes = fault == selection.first.fault;
     SweepFault(fault, resumes ? selection.first.number : 1);
   }
-  const std::string mistakes = AfterEffects();
+  const std::string mistakes = MistakesOfHealthyRun();
   if (!mistakes.empty()) NoteMistake(operation_, mistakes.c_str(), progress_);
 }
 
-void Sweeper::NoteCounts() {
+void SweepRunner::NoteCounts() {
   progress_->allocations = t_injection.allocations;
   progress_->calls = t_injection.calls;
 }
 
-void Sweeper::SweepFault(Fault fault, long first) {
+void SweepRunner::SweepFault(Fault fault, long first) {
   int misses = 0;
   for (long number = first; misses < kMissesToEnd; ++number) {
-    misses = TryPoint({fault, number}, false) ? 0 : misses + 1;
+    misses = RunPoint({fault, number}, false) ? 0 : misses + 1;
   }
 }
 
-bool Sweeper::TryPoint(const Point& point, bool checks) {
+bool SweepRunner::RunPoint(const FaultPoint& point, bool checks) {
   progress_->current = point;
   RunResult result = RunOnce(point);
-  if (result.blocks_left > 0 && !Settles(point)) {
+  if (result.blocks_left > 0 && !RepeatsWithoutLoss(point)) {
     result.mistakes += std::to_string(result.blocks_left) + " blocks of memory are left; ";
   }
   if (!result.struck) return result.reached;
   if (++progress_->points % kPointsBetweenChecks == 0) checks = true;
-  if (checks && result.mistakes.empty()) result.mistakes = AfterEffects();
+  if (checks && result.mistakes.empty()) result.mistakes = MistakesOfHealthyRun();
   if (!result.mistakes.empty()) {
     NoteMistake(operation_, (result.mistakes + "after " + struck_name_).c_str(), progress_);
   }
   return true;
 }
 
-bool Sweeper::Settles(const Point& point) {
+bool SweepRunner::RepeatsWithoutLoss(const FaultPoint& point) {
   for (int i = 0; i < kRunsToSettle; ++i) {
     if (RunOnce(point).blocks_left <= 0) return true;
   }
   return false;
 }
 
-std::string Sweeper::AfterEffects() {
+std::string SweepRunner::MistakesOfHealthyRun() {
   const std::string mistakes = RunOnce(kNoPoint).mistakes;
   return mistakes.empty() ? "" : "the next run without a fault: " + mistakes;
 }
 
-Sweeper::RunResult Sweeper::RunOnce(const Point& point) {
+SweepRunner::RunResult SweepRunner::RunOnce(const FaultPoint& point) {
   watchdog_->StartRun();
   unlink(kMainLog);
   RunResult result;
-  Stage stage(port_);
+  TestRun test(port_);
   Traces before = TakeTraces();
   // What an earlier run could not remove is gone after one without a fault.
   if (point.fault == Fault::kNone) before.files = first_files_;
   const long blocks = t_injection.blocks;
-  result.mistakes = point.fault == Fault::kCancelled ? RunCancelled(operation_, point, stage)
-                                                     : RunHere(operation_, point, stage);
-  result.blocks_left = t_injection.blocks - blocks - (stage.Mistakes().empty() ? 0 : 1);
+  result.mistakes = point.fault == Fault::kCancelled ? RunCancelled(operation_, point, test)
+                                                     : RunHere(operation_, point, test);
+  result.blocks_left = t_injection.blocks - blocks - (test.Mistakes().empty() ? 0 : 1);
   const bool with_files = !t_injection.unlink_failed;
   result.struck = t_injection.struck;
   if (result.struck) struck_name_ = t_injection.struck_name;
   const long made = CountsAllocations(point.fault) ? t_injection.allocations : t_injection.calls;
   result.reached = made >= point.number;
   result.mistakes +=
-      stage.Mistakes() + DifferenceOf(before, TakeTraces(), with_files) + HeldLock() + LogMistake();
+      test.Mistakes() + DifferenceOf(before, TakeTraces(), with_files) + HeldLock() + LogMistake();
   return result;
 }

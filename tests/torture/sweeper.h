@@ -9,8 +9,8 @@
 #include <thread>
 
 #include "tests/torture/injection.h"
-#include "tests/torture/stage.h"
 #include "tests/torture/sweep.h"
+#include "tests/torture/test_run.h"
 
 // Ends the process, with a mistake noted, when a run takes too long.
 class Watchdog {
@@ -36,17 +36,17 @@ class Watchdog {
 };
 
 // REQUIRES: the calling thread's calls are trapped, and it is the one that made the object.
-class Sweeper {
+class SweepRunner {
  public:
-  Sweeper(const Operation& operation, int port, Progress* progress, Watchdog* watchdog)
+  SweepRunner(const Operation& operation, int port, Progress* progress, Watchdog* watchdog)
       : operation_(operation), port_(port), progress_(progress), watchdog_(watchdog) {}
 
   // The runs without a fault, which fill the caches and count the calls. Results: false after a
   // mistake, which is noted.
   bool WarmUp();
 
-  // A point's run as the first of the process. Results: those of TryPoint.
-  bool TryFirstRun(const Point& point);
+  // A point's run as the first of the process. Results: those of RunPoint.
+  bool TryFirstRun(const FaultPoint& point);
 
   void Make(const Selection& selection);
 
@@ -64,13 +64,13 @@ class Sweeper {
 
   // `checks` has a run without a fault follow in any case. Results: false when the run came to its
   // end before the point.
-  bool TryPoint(const Point& point, bool checks);
+  bool RunPoint(const FaultPoint& point, bool checks);
 
-  // The same operation without a fault must succeed behind those that had one.
-  std::string AfterEffects();
+  // The same operation without a fault must succeed after those that had one.
+  std::string MistakesOfHealthyRun();
 
-  bool Settles(const Point& point);
-  RunResult RunOnce(const Point& point);
+  bool RepeatsWithoutLoss(const FaultPoint& point);
+  RunResult RunOnce(const FaultPoint& point);
 
   const Operation& operation_;
   const int port_;
@@ -87,6 +87,6 @@ class Sweeper {
 constexpr int kMissesToEnd = 3;
 
 // The point of a run without a fault.
-constexpr Point kNoPoint = {Fault::kNone, 0};
+constexpr FaultPoint kNoPoint = {Fault::kNone, 0};
 
 #endif  // TARNWICK_TESTS_TORTURE_SWEEPER_H_

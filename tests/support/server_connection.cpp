@@ -1,4 +1,4 @@
-#include "tests/soak/channel.h"
+#include "tests/support/server_connection.h"
 
 #include <netinet/in.h>
 #include <netinet/tcp.h>
@@ -7,10 +7,10 @@
 #include <sys/time.h>
 #include <unistd.h>
 
-namespace {
+#include <cstdlib>
+#include <cstring>
 
-// Longer than any client waits for its answer; it bounds a thread of the server, nothing else.
-constexpr int kLimitSeconds = 40;
+namespace {
 
 // More than the time-out of the requests that meet a stall, and the end for those without one.
 constexpr int kStallMs = 2500;
@@ -27,8 +27,8 @@ void WaitForEnd(int fd, int limit_ms) {
 
 }  // namespace
 
-Channel::Channel(int fd, SSL_CTX* context) : fd_(fd) {
-  const timeval limit = {kLimitSeconds, 0};
+ServerConnection::ServerConnection(int fd, SSL_CTX* context, int limit_seconds) : fd_(fd) {
+  const timeval limit = {limit_seconds, 0};
   const int on = 1;
   setsockopt(fd_, SOL_SOCKET, SO_RCVTIMEO, &limit, sizeof(limit));
   setsockopt(fd_, SOL_SOCKET, SO_SNDTIMEO, &limit, sizeof(limit));
@@ -38,16 +38,16 @@ Channel::Channel(int fd, SSL_CTX* context) : fd_(fd) {
   SSL_set_fd(ssl_, fd_);
 }
 
-Channel::~Channel() {
+ServerConnection::~ServerConnection() {
   SSL_free(ssl_);
   if (fd_ >= 0) close(fd_);
 }
 
-bool Channel::Open() {
+bool ServerConnection::Open() {
   return ssl_ == nullptr || SSL_accept(ssl_) == 1;
 }
 
-bool Channel::ReadMore() {
+bool ServerConnection::ReadMore() {
   char piece[16384];
   const int size = static_cast<int>(sizeof(piece));
   const int count = ssl_ != nullptr ? SSL_read(ssl_, piece, size)
@@ -57,7 +57,7 @@ bool Channel::ReadMore() {
   return true;
 }
 
-bool Channel::ReadUntil(const std::string& mark, std::string* bytes) {
+bool ServerConnection::ReadUntil(const std::string& mark, std::string* bytes) {
   size_t searched = 0;
   size_t found;
   while ((found = pending_.find(mark, searched)) == std::string::npos) {
@@ -67,7 +67,7 @@ bool Channel::ReadUntil(const std::string& mark, std::string* bytes) {
   return ReadBytes(found + mark.size(), bytes);
 }
 
-bool Channel::ReadBytes(size_t count, std::string* bytes) {
+bool ServerConnection::ReadBytes(size_t count, std::string* bytes) {
   while (pending_.size() < count) {
     if (!ReadMore()) return false;
   }
@@ -76,12 +76,24 @@ bool Channel::ReadBytes(size_t count, std::string* bytes) {
   return true;
 }
 
-bool Channel::Write(const std::string& bytes) {
+bool ServerConnection::ReadRequest(std::string* head, std::string* body) {
+  constexpr size_t kUpload = 1 << 20;
+  constexpr char kName[] = "Content-Length:";
+  if (!ReadUntil("\r\n\r\n", head)) return false;
+  const size_t found = head->find(kName);
+  const size_t length =
+      found == std::string::npos ? 0 : strtoul(head->c_str() + found + strlen(kName), nullptr, 10);
+  if (length > 0 && length < kUpload) return ReadBytes(length, body);
+  body->clear();
+  return true;
+}
+
+bool ServerConnection::Write(const std::string& bytes) {
   if (ssl_ == nullptr) return WriteBelowTls(bytes);
   return bytes.empty() || SSL_write(ssl_, bytes.data(), static_cast<int>(bytes.size())) > 0;
 }
 
-bool Channel::WriteBelowTls(const std::string& bytes) const {
+bool ServerConnection::WriteBelowTls(const std::string& bytes) const {
   for (size_t sent = 0; sent < bytes.size();) {
     const ssize_t count = send(fd_, bytes.data() + sent, bytes.size() - sent, MSG_NOSIGNAL);
     if (count <= 0) return false;
@@ -90,24 +102,28 @@ bool Channel::WriteBelowTls(const std::string& bytes) const {
   return true;
 }
 
-void Channel::Close() {
+void ServerConnection::Notify() {
   if (ssl_ != nullptr) SSL_shutdown(ssl_);
+}
+
+void ServerConnection::Close() {
+  Notify();
   shutdown(fd_, SHUT_WR);
   WaitForEnd(fd_, kGoodbyeMs);
 }
 
-void Channel::Cut() {
+void ServerConnection::Cut() {
   shutdown(fd_, SHUT_WR);
   WaitForEnd(fd_, kGoodbyeMs);
 }
 
-void Channel::Reset() {
+void ServerConnection::Reset() {
   const linger at_once = {1, 0};
   setsockopt(fd_, SOL_SOCKET, SO_LINGER, &at_once, sizeof(at_once));
   close(fd_);
   fd_ = -1;
 }
 
-void Channel::Stall() const {
+void ServerConnection::Stall() const {
   WaitForEnd(fd_, kStallMs);
 }

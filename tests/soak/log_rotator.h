@@ -1,7 +1,7 @@
 // What an administrator and a managing process do to the logs meanwhile: rotation by rename, and
 // levels that change all the time. A process of its own, which also reads what was rotated away.
-#ifndef TARNWICK_TESTS_SOAK_LOG_KEEPER_H_
-#define TARNWICK_TESTS_SOAK_LOG_KEEPER_H_
+#ifndef TARNWICK_TESTS_SOAK_LOG_ROTATOR_H_
+#define TARNWICK_TESTS_SOAK_LOG_ROTATOR_H_
 
 #include <sys/types.h>
 
@@ -23,13 +23,13 @@ struct LogReport {
 };
 
 // REQUIRES: no other thread runs yet.
-class LogKeeper {
+class LogRotator {
  public:
   // Makes the shared record, attaches the library to it and starts the process.
-  LogKeeper();
-  ~LogKeeper();
-  LogKeeper(const LogKeeper&) = delete;
-  LogKeeper& operator=(const LogKeeper&) = delete;
+  LogRotator();
+  ~LogRotator();
+  LogRotator(const LogRotator&) = delete;
+  LogRotator& operator=(const LogRotator&) = delete;
 
   // Ends the process once it has read everything. REQUIRES: nothing is logged any more.
   LogReport Finish();
@@ -41,4 +41,4 @@ class LogKeeper {
   int report_ = -1;  // what the process found
 };
 
-#endif  // TARNWICK_TESTS_SOAK_LOG_KEEPER_H_
+#endif  // TARNWICK_TESTS_SOAK_LOG_ROTATOR_H_

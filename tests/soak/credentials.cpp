@@ -1,4 +1,4 @@
-#include "tests/soak/login.h"
+#include "tests/soak/credentials.h"
 
 #include <openssl/evp.h>
 
@@ -33,7 +33,7 @@ std::string Parameter(const std::string& line, const std::string& name) {
   return line.substr(begin, line.find_first_of(",\r", begin) - begin);
 }
 
-bool DigestIsRight(Login login, const std::string& head) {
+bool DigestIsRight(Scheme scheme, const std::string& head) {
   const size_t begin = head.find("Authorization: Digest ");
   if (begin == std::string::npos) return false;
   const std::string line = head.substr(begin, head.find('\n', begin) - begin);
@@ -43,7 +43,7 @@ bool DigestIsRight(Login login, const std::string& head) {
   const std::string ha1 = Md5(std::string(kUser) + ":" + kRealm + ":" + kPassword);
   const std::string ha2 = Md5(method + ":" + target);
   std::string middle = kNonce;
-  if (login == Login::kDigest) {
+  if (scheme == Scheme::kDigest) {
     middle += ":" + Parameter(line, "nc") + ":" + Parameter(line, "cnonce") + ":auth";
   }
   return Parameter(line, "username") == kUser && Parameter(line, "nonce") == kNonce &&
@@ -52,15 +52,15 @@ bool DigestIsRight(Login login, const std::string& head) {
 
 }  // namespace
 
-std::string ChallengeOf(Login login) {
+std::string ChallengeOf(Scheme scheme) {
   const std::string realm = std::string("realm=\"") + kRealm + "\"";
-  if (login == Login::kBasic) return "WWW-Authenticate: Basic " + realm + "\r\n";
-  const std::string qop = login == Login::kDigest ? ", qop=\"auth\"" : "";
+  if (scheme == Scheme::kBasic) return "WWW-Authenticate: Basic " + realm + "\r\n";
+  const std::string qop = scheme == Scheme::kDigest ? ", qop=\"auth\"" : "";
   return "WWW-Authenticate: Digest " + realm + ", nonce=\"" + kNonce + "\"" + qop + "\r\n";
 }
 
-bool LoginIsRight(Login login, const std::string& head) {
-  if (login == Login::kNone) return true;
-  if (login == Login::kBasic) return head.find(kBasic) != std::string::npos;
-  return DigestIsRight(login, head);
+bool CredentialsAreRight(Scheme scheme, const std::string& head) {
+  if (scheme == Scheme::kNone) return true;
+  if (scheme == Scheme::kBasic) return head.find(kBasic) != std::string::npos;
+  return DigestIsRight(scheme, head);
 }

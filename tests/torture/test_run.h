@@ -1,19 +1,20 @@
-// What an operation under torture works with, and its check of its own result.
-#ifndef TARNWICK_TESTS_TORTURE_STAGE_H_
-#define TARNWICK_TESTS_TORTURE_STAGE_H_
+// What an operation under torture runs its steps by, and how it judges its result.
+#ifndef TARNWICK_TESTS_TORTURE_TEST_RUN_H_
+#define TARNWICK_TESTS_TORTURE_TEST_RUN_H_
 
 #include <pthread.h>
 
 #include <exception>
+#include <functional>
 #include <new>
 #include <string>
 
 #include "tests/torture/injection.h"
 
 // Threads: the thread under test alone.
-class Stage {
+class TestRun {
  public:
-  explicit Stage(int port) : port_(port) {}
+  explicit TestRun(int port) : port_(port) {}
 
   // The peer's, on 127.0.0.1.
   int Port() const { return port_; }
@@ -75,16 +76,16 @@ class Stage {
   std::string mistakes_;
 };
 
-// Who answers an operation.
-enum class Peer { kNone, kPlain, kTls };
+// Who serves an operation.
+enum class PeerKind { kNone, kPlain, kTls };
 
 // One operation of the library, from its preparation to the check of what it gave.
 struct Operation {
   const char* name;
-  Peer peer;
-  void (*run)(Stage& stage);
+  PeerKind peer;
+  std::function<void(TestRun&)> run;
   bool cold = false;  // tortured as the first operation of a process as well
   bool slow = false;  // makes a TLS handshake, which allocates thousands of times
 };
 
-#endif  // TARNWICK_TESTS_TORTURE_STAGE_H_
+#endif  // TARNWICK_TESTS_TORTURE_TEST_RUN_H_

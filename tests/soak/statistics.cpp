@@ -1,4 +1,4 @@
-#include "tests/soak/tally.h"
+#include "tests/soak/statistics.h"
 
 #include <cstdio>
 
@@ -16,7 +16,7 @@ unsigned Allowed(Fault fault) {
     case Fault::kNone:
     case Fault::kSlow:
       return Bit(Outcome::kRight);
-    case Fault::kCutHead:  // behind the status line it is a head without an answer
+    case Fault::kCutHead:  // after the status line it is a head without a body
     case Fault::kCutBody:
     case Fault::kResetBody:
     case Fault::kStallBody:
@@ -31,17 +31,17 @@ unsigned Allowed(Fault fault) {
   }
 }
 
-// Those that do not look at the answer's body succeed where only that is spoilt; the first one does
+// Those that do not look at the body succeed where only that is spoilt; the first one does
 // not even look at the status.
 unsigned AllowedBlindly(const Plan& plan) {
   const bool connected = plan.fault > Fault::kBadCertificate;
   const bool through =
       plan.fault == Fault::kHangUp || plan.fault == Fault::kNoise || plan.fault == Fault::kSilence;
-  if (plan.operation == Operation::kJsonPost && (connected || through)) {
+  if (!UsesCurl(plan) && Has(plan, kReadsNothing) && (connected || through)) {
     return Bit(Outcome::kRight);
   }
   const bool spoilt = plan.fault >= Fault::kCutHead && plan.fault <= Fault::kBadChunk;
-  return plan.operation == Operation::kLoginPost && spoilt ? Bit(Outcome::kRight) : 0;
+  return UsesCurl(plan) && Has(plan, kReadsNothing) && spoilt ? Bit(Outcome::kRight) : 0;
 }
 
 }  // namespace
@@ -50,7 +50,7 @@ bool IsExpected(const Plan& plan, const Outcome& outcome) {
   return ((Allowed(plan.fault) | AllowedBlindly(plan)) & Bit(outcome.kind)) != 0;
 }
 
-void Tally::AddTo(Count* count, const Plan& plan, const Outcome& outcome) {
+void Statistics::AddTo(Count* count, const Plan& plan, const Outcome& outcome) {
   ++count->all;
   const bool fault = plan.fault > Fault::kSlow;
   if (fault) ++count->faults;
@@ -65,39 +65,39 @@ void Tally::AddTo(Count* count, const Plan& plan, const Outcome& outcome) {
   }
 }
 
-void Tally::Add(const Plan& plan, const Outcome& outcome) {
+void Statistics::Add(const Plan& plan, const Outcome& outcome) {
   const std::lock_guard<std::mutex> lock(mutex_);
   AddTo(&total_, plan, outcome);
-  AddTo(&operations_[static_cast<int>(plan.operation)], plan, outcome);
+  AddTo(&operations_[static_cast<size_t>(plan.operation)], plan, outcome);
   AddTo(&faults_[static_cast<int>(plan.fault)], plan, outcome);
   if (IsExpected(plan, outcome) || details_.size() >= kDetailsKept) return;
-  details_.push_back(std::string(NameOf(plan.operation)) + (plan.tls ? ", TLS" : "") +
+  details_.push_back(std::string(OperationOf(plan).title) + (plan.tls ? ", TLS" : "") +
                      ", fault: " + NameOf(plan.fault) + ", " + ToPath(plan) + ": " +
                      kKindNames[outcome.kind] + " " + outcome.detail);
 }
 
-unsigned long Tally::Operations() const {
+unsigned long Statistics::Operations() const {
   const std::lock_guard<std::mutex> lock(mutex_);
   return total_.all;
 }
 
-unsigned long Tally::Unexpected() const {
+unsigned long Statistics::Unexpected() const {
   const std::lock_guard<std::mutex> lock(mutex_);
   return total_.unexpected;
 }
 
-void Tally::PrintRow(const char* name, const Count& count) {
+void Statistics::PrintRow(const char* name, const Count& count) {
   printf("%-28s %9lu %9lu %8lu %8lu %8lu %8lu %10lu\n", name, count.all, count.right, count.faults,
          count.failed, count.cut, count.right_despite, count.unexpected);
 }
 
-void Tally::Print() const {
+void Statistics::Print() const {
   const std::lock_guard<std::mutex> lock(mutex_);
   constexpr char kHead[] = "\n%-28s %9s %9s %8s %8s %8s %8s %10s\n";
   printf(kHead, "operation", "all", "right", "faults", "= failed", "+ cut", "+ right",
          "unexpected");
-  for (int i = 0; i < kOperations; ++i) {
-    PrintRow(NameOf(static_cast<Operation>(i)), operations_[i]);
+  for (size_t i = 0; i < operations_.size(); ++i) {
+    PrintRow(SoakOperations()[i].title, operations_[i]);
   }
   PrintRow("all", total_);
   printf(kHead, "fault", "all", "right", "faults", "= failed", "+ cut", "+ right", "unexpected");

@@ -1,4 +1,4 @@
-#include "tests/soak/log_keeper.h"
+#include "tests/soak/log_rotator.h"
 
 #include <fcntl.h>
 #include <poll.h>
@@ -130,7 +130,7 @@ void Keeper::Fault(const std::string& what) {
 
 }  // namespace
 
-LogKeeper::LogKeeper() {
+LogRotator::LogRotator() {
   int stop[2];
   int report[2];
   if (pipe2(stop, O_CLOEXEC) != 0 || pipe2(report, O_CLOEXEC) != 0) {
@@ -156,7 +156,7 @@ LogKeeper::LogKeeper() {
   InitDbgCfg();
 }
 
-LogKeeper::~LogKeeper() {
+LogRotator::~LogRotator() {
   FreeDbgCfg();
   if (stop_ >= 0) close(stop_);
   if (report_ >= 0) close(report_);
@@ -165,7 +165,7 @@ LogKeeper::~LogKeeper() {
   waitpid(pid_, nullptr, 0);
 }
 
-LogReport LogKeeper::Finish() {
+LogReport LogRotator::Finish() {
   close(stop_);
   stop_ = -1;
   LogReport report;

@@ -1,6 +1,6 @@
-// One connection as the soak's server sees it: plain or TLS, blocking, with limits of time.
-#ifndef TARNWICK_TESTS_SOAK_CHANNEL_H_
-#define TARNWICK_TESTS_SOAK_CHANNEL_H_
+// One connection of a server process: plain or TLS, blocking, with limits of time.
+#ifndef TARNWICK_TESTS_SUPPORT_SERVER_CONNECTION_H_
+#define TARNWICK_TESTS_SUPPORT_SERVER_CONNECTION_H_
 
 #include <openssl/ssl.h>
 
@@ -8,13 +8,13 @@
 #include <string>
 
 // Threads: one thread.
-class Channel {
+class ServerConnection {
  public:
   // Owns `fd`. `context` is null for a plain connection.
-  Channel(int fd, SSL_CTX* context);
-  ~Channel();
-  Channel(const Channel&) = delete;
-  Channel& operator=(const Channel&) = delete;
+  ServerConnection(int fd, SSL_CTX* context, int limit_seconds);
+  ~ServerConnection();
+  ServerConnection(const ServerConnection&) = delete;
+  ServerConnection& operator=(const ServerConnection&) = delete;
 
   // Makes the handshake of a TLS connection.
   bool Open();
@@ -23,8 +23,15 @@ class Channel {
   bool ReadUntil(const std::string& mark, std::string* bytes);
   bool ReadBytes(size_t count, std::string* bytes);
 
+  // Reads a head, with its empty line, and the body that its Content-Length announces, unless that is
+  // an upload's, which has no end.
+  bool ReadRequest(std::string* head, std::string* body);
+
   bool Write(const std::string& bytes);
   bool WriteBelowTls(const std::string& bytes) const;
+
+  // Sends the close notice of TLS.
+  void Notify();
 
   // Ends the connection in order and waits for the client to end it as well: bytes that it still
   // sends would else turn the close into a reset.
@@ -45,4 +52,4 @@ class Channel {
   std::string pending_;
 };
 
-#endif  // TARNWICK_TESTS_SOAK_CHANNEL_H_
+#endif  // TARNWICK_TESTS_SUPPORT_SERVER_CONNECTION_H_

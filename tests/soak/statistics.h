@@ -1,6 +1,6 @@
 // What the operations of the soak have come to.
-#ifndef TARNWICK_TESTS_SOAK_TALLY_H_
-#define TARNWICK_TESTS_SOAK_TALLY_H_
+#ifndef TARNWICK_TESTS_SOAK_STATISTICS_H_
+#define TARNWICK_TESTS_SOAK_STATISTICS_H_
 
 #include <mutex>
 #include <string>
@@ -8,11 +8,11 @@
 
 #include "tests/soak/plan.h"
 
-// The answer of one operation, seen against what its contract says.
+// What one operation came to, seen against what its contract says.
 struct Outcome {
   enum Kind {
-    kRight,   // success with the right answer, to the byte
-    kCut,     // success, as the contract has it, with the beginning of the right answer
+    kRight,   // success with the right response, to the byte
+    kCut,     // success, as the contract has it, with the beginning of the right response
     kFailed,  // one of the failures that the contract names
     kWrong,   // anything else
   };
@@ -20,11 +20,11 @@ struct Outcome {
   std::string detail;  // of a wrong one
 };
 
-// Whether the plan allows for the outcome: without a fault only the right answer will do.
+// Whether the plan allows for the outcome: without a fault only the right response will do.
 bool IsExpected(const Plan& plan, const Outcome& outcome);
 
 // Threads: any.
-class Tally {
+class Statistics {
  public:
   void Add(const Plan& plan, const Outcome& outcome);
 
@@ -49,9 +49,9 @@ class Tally {
 
   mutable std::mutex mutex_;
   Count total_;
-  Count operations_[kOperations];
+  std::vector<Count> operations_ = std::vector<Count>(SoakOperations().size());
   Count faults_[kFaults];
   std::vector<std::string> details_;  // of the first unexpected ones
 };
 
-#endif  // TARNWICK_TESTS_SOAK_TALLY_H_
+#endif  // TARNWICK_TESTS_SOAK_STATISTICS_H_

@@ -1,7 +1,0 @@
-#include "tests/torture/stage.h"
-
-void Stage::Expect(bool right, const std::string& mistake) {
-  if (right) return;
-  mistakes_ += mistake;
-  mistakes_ += "; ";
-}
