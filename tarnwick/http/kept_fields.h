@@ -22,7 +22,7 @@ struct KeptField {
 };
 
 // A field whose name begins with one of these is taken for it, and one of these without a value
-// fails the response; pinned by CheckContentType.ALongerNameWithAKnownPrefixCountsAsTheKnownOne and
+// fails the response; pinned by CheckContentType.ALongerNameWithAKnownPrefixIsTakenForTheKnownOne and
 // CheckContentType.EachKnownNameWithoutAValueIsNotReady.
 inline constexpr KeptField kKeptFields[] = {
     {"Content-Type", KeptAs::kContent, HTTP_CONTENT_TYPE},

@@ -14,7 +14,7 @@ using namespace tarnwick;
 namespace {
 
 // Longer requests are cut there. Kept as it is: callers may depend on it; pinned by
-// SendRequestByGet.ARequestOfMoreThan2047BytesIsCutThereAndCountsAsSent.
+// SendRequestByGet.ARequestOfMoreThan2047BytesIsCutThereAndIsTakenForSent.
 constexpr size_t kMaxRequest = 2047;
 
 }  // namespace

@@ -46,7 +46,7 @@ int TWHttpClient::CheckContentType() try {
   m_strAuthenticate.clear();
   // The transfer encoding of an earlier response stays, and the next body is decoded by it. Kept as
   // it is: callers may depend on it; pinned by
-  // ReadBody.ATransferEncodingStaysForALaterReplyWithoutOne.
+  // ReadBody.ATransferEncodingStaysForALaterResponseWithoutOne.
   for (int count = 0; count < kMaxHeaderLines; ++count) {
     char line[kLineSize];
     const int length = ReadToLineEnd(line, kLineSize);

@@ -30,14 +30,14 @@ std::vector<std::string> ExamplesOf(const std::string& header) {
 }
 
 // Answers a request as servers do that keep a connection of HTTP/1.1 and close one of HTTP/1.0.
-Step AnswerAndKeep(const std::string& reply) {
-  return {"AnswerAndKeep()", [reply](PeerConnection& peer, std::string* error) {
+Step AnswerAndKeep(const std::string& response) {
+  return {"AnswerAndKeep()", [response](PeerConnection& peer, std::string* error) {
             while (peer.Pending().find("\r\n\r\n") == std::string::npos) {
               if (peer.ReadMore() != PeerConnection::Read::kData) return false;
             }
             const bool kept = peer.Pending().find(" HTTP/1.1\r\n") != std::string::npos;
             peer.Pending().clear();
-            if (!peer.Write(reply)) return false;
+            if (!peer.Write(response)) return false;
             if (kept) return StallUntilFinish().play(peer, error);
             peer.Close();
             return true;
@@ -51,10 +51,10 @@ constexpr char kChallenge[] =
 }  // namespace
 
 TEST(HttpHeader, ItsExamplesAreThoseThatAreRun) {
-  const std::string folder = TARNWICK_SOURCE_FOLDER;
-  const std::string source = ReadFile(folder + "/docs/man/examples/http.cpp");
+  const std::string directory = TARNWICK_SOURCE_FOLDER;
+  const std::string source = ReadFile(directory + "/docs/man/examples/http.cpp");
   const std::vector<std::string> examples =
-      ExamplesOf(ReadFile(folder + "/tarnwick/http/twhttp.h"));
+      ExamplesOf(ReadFile(directory + "/tarnwick/http/twhttp.h"));
   EXPECT_THAT(examples, SizeIs(2));
   for (const std::string& example : examples) EXPECT_THAT(source, HasSubstr(example));
 }
@@ -74,14 +74,14 @@ TEST(HttpHeader, APageComesWholeFromAServerThatSendsChunksAndKeepsTheConnection)
   EXPECT_EQ(InfoPage("127.0.0.1", peer.Port()), "page");
 }
 
-TEST(HttpHeader, ARefusedLoginAndAClosedPortGiveNoPage) {
+TEST(HttpHeader, RefusedCredentialsAndAClosedPortHaveNoPage) {
   ScriptedPeer peer({Exchange(kChallenge), Exchange(kChallenge)});
   EXPECT_EQ(InfoPage("127.0.0.1", peer.Port()), "");
   const ClosedPort closed;
   EXPECT_EQ(InfoPage("127.0.0.1", closed.Port()), "");
 }
 
-TEST(HttpHeader, AJsonServiceGivesItsNumber) {
+TEST(HttpHeader, AJsonServiceReturnsItsNumber) {
   ScriptedPeer peer({{AnswerAndKeep("HTTP/1.1 200 OK\r\n\r\n{\"success\":true,\"camera\":7}")},
                      {AnswerAndKeep("HTTP/1.1 200 OK\r\n\r\n{\"success\":false}")}});
   EXPECT_EQ(CameraNumber("127.0.0.1", peer.Port()), 7);

@@ -69,12 +69,12 @@ TEST(ManCurl, TheStatusIsTheServers) {
 }
 
 TEST(ManPlatform, TheSettingIsDoubled) {
-  const TempDir folder;
-  const std::string path = folder.File("settings.conf");
+  const TempDir directory;
+  const std::string path = directory.File("settings.conf");
   WriteFile(path, "# rate\nrate=\"12\"\n");
   EXPECT_EQ(DoubleSetting(path.c_str(), "rate"), 0);
   EXPECT_EQ(ReadFile(path), "# rate\nrate=\"24\"\n");
-  EXPECT_EQ(DoubleSetting(folder.File("none").c_str(), "rate"), -1);
+  EXPECT_EQ(DoubleSetting(directory.File("none").c_str(), "rate"), -1);
 }
 
 TEST(ManScope, TheDevicesTextIsEscaped) {

@@ -34,7 +34,7 @@ Memory MemoryNow() {
 constexpr size_t kFew = 1;
 constexpr size_t kMany = 64;
 
-// What `add` makes a client take, on the average of the 63 behind the first, which also pays for
+// What `add` makes a client take, on the average of the 63 after the first, which also pays for
 // what all of them share.
 template <typename Add>
 Memory PerFurtherClient(Add add) {
@@ -66,7 +66,7 @@ TEST(IdleClient, TakesItsBufferAndLittleElse) {
 }
 
 TEST(IdleClient, TakesNoMoreAfterASmallGet) {
-  ReplyServer server("HTTP/1.1 200 OK\r\nContent-Length: 16\r\n\r\n{\"success\":true}");
+  RepeatingPeer server(Exchange("HTTP/1.1 200 OK\r\nContent-Length: 16\r\n\r\n{\"success\":true}"));
   const Memory memory = PerFurtherClient([&server](Clients* clients) {
     clients->push_back(std::make_unique<ClientProbe>(server.Port()));
     std::string body;

@@ -21,76 +21,79 @@ struct ChunkRow {
   const char* name;
   std::string chunks;
   std::string body;
-  int curl_code;
+  CURLcode curl_code;
   std::string curl_body;
   std::string trailer = "";  // libcurl hands it on as header lines, and a file gets these as well
 };
 
 const ChunkRow kChunks[] = {
-    {"TwoChunks", "4\r\nWiki\r\n5\r\npedia\r\n0\r\n\r\n", "Wikipedia", 0, "Wikipedia"},
+    {"TwoChunks", "4\r\nWiki\r\n5\r\npedia\r\n0\r\n\r\n", "Wikipedia", CURLE_OK, "Wikipedia"},
     {"DigitsOfBothCases", "a\r\n0123456789\r\nA\r\n0123456789\r\n0\r\n\r\n", "01234567890123456789",
-     0, "01234567890123456789"},
-    {"NothingAtAll", "", "", 18, ""},
-    {"TheLastChunkAlone", "0\r\n\r\n", "", 0, ""},
+     CURLE_OK, "01234567890123456789"},
+    {"NothingAtAll", "", "", CURLE_PARTIAL_FILE, ""},
+    {"TheLastChunkAlone", "0\r\n\r\n", "", CURLE_OK, ""},
 
     // Sizes.
-    {"ASizeOf80000000", "80000000\r\nabc", "abc", 18, "abc"},
-    {"ASizeOfFfffffff", "ffffffff\r\nabc", "abc", 18, "abc"},
-    {"ASizeOf100000001", "100000001\r\nabc", "a", 18, "abc"},
-    {"ASizeOf100000000", "100000000\r\nabc", "", 18, "abc"},
-    {"ASizeOfSixteenF", "ffffffffffffffff\r\nabc", "abc", 56, ""},
-    {"ASizeOfAHundredF", std::string(100, 'f') + "\r\nabc", "abc", 56, ""},
-    {"ANegativeSize", "-2\r\nabc", "", 56, ""},
-    {"APlusSign", "+3\r\nabc\r\n0\r\n\r\n", "", 56, ""},
-    {"AHexadecimalPrefix", "0x10\r\nabc\r\n\r\n", "", 43, ""},
-    {"ABlankInFront", " 3\r\nabc\r\n0\r\n\r\n", "", 56, ""},
-    {"FourThousandZeros", std::string(4096, '0') + "\r\n\r\n", "", 56, ""},
-    {"FourThousandZerosAndAThree", std::string(4096, '0') + "3\r\nabc\r\n0\r\n\r\n", "abc", 56, ""},
-    {"ZerosBeyondTheBuffer", std::string(9000, '0') + "3\r\nabc\r\n0\r\n\r\n", "", 56, ""},
-    {"AText", "hello\r\nabc", "", 56, ""},
-    {"ATextOfDigits", "decade\r\nabc", "abc", 18, "abc"},
-    {"AnEmptyLineForASize", "\r\nabc", "", 56, ""},
-    {"AZeroByteBehindTheSize", "3\0\r\nabc\r\n0\r\n\r\n"s, "abc", 0, "abc"},
-    {"AZeroByteBeforeTheSize", "\0"s + "3\r\nabc\r\n0\r\n\r\n", "", 56, ""},
-    {"ControlBytesForASize", "\x01\x02\x03\r\nabc", "", 56, ""},
+    {"ASizeOf80000000", "80000000\r\nabc", "abc", CURLE_PARTIAL_FILE, "abc"},
+    {"ASizeOfFfffffff", "ffffffff\r\nabc", "abc", CURLE_PARTIAL_FILE, "abc"},
+    {"ASizeOf100000001", "100000001\r\nabc", "a", CURLE_PARTIAL_FILE, "abc"},
+    {"ASizeOf100000000", "100000000\r\nabc", "", CURLE_PARTIAL_FILE, "abc"},
+    {"ASizeOfSixteenF", "ffffffffffffffff\r\nabc", "abc", CURLE_RECV_ERROR, ""},
+    {"ASizeOfAHundredF", std::string(100, 'f') + "\r\nabc", "abc", CURLE_RECV_ERROR, ""},
+    {"ANegativeSize", "-2\r\nabc", "", CURLE_RECV_ERROR, ""},
+    {"APlusSign", "+3\r\nabc\r\n0\r\n\r\n", "", CURLE_RECV_ERROR, ""},
+    {"AHexadecimalPrefix", "0x10\r\nabc\r\n\r\n", "", CURLE_BAD_FUNCTION_ARGUMENT, ""},
+    {"ABlankInFront", " 3\r\nabc\r\n0\r\n\r\n", "", CURLE_RECV_ERROR, ""},
+    {"FourThousandZeros", std::string(4096, '0') + "\r\n\r\n", "", CURLE_RECV_ERROR, ""},
+    {"FourThousandZerosAndAThree", std::string(4096, '0') + "3\r\nabc\r\n0\r\n\r\n", "abc",
+     CURLE_RECV_ERROR, ""},
+    {"ZerosBeyondTheBuffer", std::string(9000, '0') + "3\r\nabc\r\n0\r\n\r\n", "", CURLE_RECV_ERROR,
+     ""},
+    {"AText", "hello\r\nabc", "", CURLE_RECV_ERROR, ""},
+    {"ATextOfDigits", "decade\r\nabc", "abc", CURLE_PARTIAL_FILE, "abc"},
+    {"AnEmptyLineForASize", "\r\nabc", "", CURLE_RECV_ERROR, ""},
+    {"AZeroByteBehindTheSize", "3\0\r\nabc\r\n0\r\n\r\n"s, "abc", CURLE_OK, "abc"},
+    {"AZeroByteBeforeTheSize", "\0"s + "3\r\nabc\r\n0\r\n\r\n", "", CURLE_RECV_ERROR, ""},
+    {"ControlBytesForASize", "\x01\x02\x03\r\nabc", "", CURLE_RECV_ERROR, ""},
 
     // Extensions.
-    {"AnExtension", "3;a=b\r\nabc\r\n0;c\r\n\r\n", "abc", 0, "abc"},
-    {"AnExtensionBehindABlank", "3 a=b\r\nabc\r\n0\r\n\r\n", "abc", 0, "abc"},
-    {"AnExtensionAlone", ";a=b\r\nabc\r\n0\r\n\r\n", "", 56, ""},
-    {"AnExtensionBeyondTheBuffer", "3;" + std::string(9000, 'x') + "\r\nabc\r\n0\r\n\r\n", "xxx", 0,
-     "abc"},
+    {"AnExtension", "3;a=b\r\nabc\r\n0;c\r\n\r\n", "abc", CURLE_OK, "abc"},
+    {"AnExtensionBehindABlank", "3 a=b\r\nabc\r\n0\r\n\r\n", "abc", CURLE_OK, "abc"},
+    {"AnExtensionAlone", ";a=b\r\nabc\r\n0\r\n\r\n", "", CURLE_RECV_ERROR, ""},
+    {"AnExtensionBeyondTheBuffer", "3;" + std::string(9000, 'x') + "\r\nabc\r\n0\r\n\r\n", "xxx",
+     CURLE_OK, "abc"},
 
-    // Sizes that lie, and line ends that are none.
-    {"ASizeTooSmall", "3\r\nabcde\r\n0\r\n\r\n", "abc", 56, "abc"},
-    {"ASizeTooLarge", "8\r\nabcde\r\n0\r\n\r\n", "abcde\r\n0", 56, "abcde\r\n0"},
-    {"NoLineEndBehindAChunk", "3\r\nabc3\r\ndef\r\n0\r\n\r\n", "abc", 56, "abc"},
-    {"AnotherPairBehindAChunk", "3\r\nabcXY3\r\ndef\r\n0\r\n\r\n", "abcdef", 56, "abc"},
-    {"BareLineFeeds", "3\nabc\n0\n\n", "abc", 0, "abc"},
-    {"BareCarriageReturns", "3\rabc\r0\r\r", "bc\r", 18, ""},
+    // Sizes that lie, and other bytes in place of CRLF.
+    {"ASizeTooSmall", "3\r\nabcde\r\n0\r\n\r\n", "abc", CURLE_RECV_ERROR, "abc"},
+    {"ASizeTooLarge", "8\r\nabcde\r\n0\r\n\r\n", "abcde\r\n0", CURLE_RECV_ERROR, "abcde\r\n0"},
+    {"NoLineEndBehindAChunk", "3\r\nabc3\r\ndef\r\n0\r\n\r\n", "abc", CURLE_RECV_ERROR, "abc"},
+    {"AnotherPairBehindAChunk", "3\r\nabcXY3\r\ndef\r\n0\r\n\r\n", "abcdef", CURLE_RECV_ERROR,
+     "abc"},
+    {"BareLineFeeds", "3\nabc\n0\n\n", "abc", CURLE_OK, "abc"},
+    {"BareCarriageReturns", "3\rabc\r0\r\r", "bc\r", CURLE_PARTIAL_FILE, ""},
 
     // Ends.
-    {"NoLastChunk", "3\r\nabc\r\n", "abc", 18, "abc"},
-    {"CutInAChunk", "5\r\nabc", "abc", 18, "abc"},
-    {"CutInASize", "5", "", 18, ""},
-    {"CutInASizesLineEnd", "5\r", "", 18, ""},
-    {"CutBehindASize", "5\r\n", "", 18, ""},
-    {"CutInAChunksLineEnd", "3\r\nabc\r", "abc", 18, "abc"},
-    {"CutInTheLastSize", "3\r\nabc\r\n0", "abc", 18, "abc"},
-    {"CutBehindTheLastSize", "3\r\nabc\r\n0\r\n", "abc", 18, "abc"},
-    {"ATrailer", "3\r\nabc\r\n0\r\nX: y\r\n\r\n", "abc", 0, "abc", "X: y\r\n"},
-    {"AnotherReplyBehindTheLastChunk", "3\r\nabc\r\n0\r\n\r\nHTTP/1.1 500 No\r\n\r\n", "abc", 0,
-     "abc"},
+    {"NoLastChunk", "3\r\nabc\r\n", "abc", CURLE_PARTIAL_FILE, "abc"},
+    {"CutInAChunk", "5\r\nabc", "abc", CURLE_PARTIAL_FILE, "abc"},
+    {"CutInASize", "5", "", CURLE_PARTIAL_FILE, ""},
+    {"CutInASizesLineEnd", "5\r", "", CURLE_PARTIAL_FILE, ""},
+    {"CutBehindASize", "5\r\n", "", CURLE_PARTIAL_FILE, ""},
+    {"CutInAChunksLineEnd", "3\r\nabc\r", "abc", CURLE_PARTIAL_FILE, "abc"},
+    {"CutInTheLastSize", "3\r\nabc\r\n0", "abc", CURLE_PARTIAL_FILE, "abc"},
+    {"CutBehindTheLastSize", "3\r\nabc\r\n0\r\n", "abc", CURLE_PARTIAL_FILE, "abc"},
+    {"ATrailer", "3\r\nabc\r\n0\r\nX: y\r\n\r\n", "abc", CURLE_OK, "abc", "X: y\r\n"},
+    {"AnotherReplyBehindTheLastChunk", "3\r\nabc\r\n0\r\n\r\nHTTP/1.1 500 No\r\n\r\n", "abc",
+     CURLE_OK, "abc"},
 
     // Data.
-    {"ZeroBytesInAChunk", "3\r\n\0\0\0\r\n0\r\n\r\n"s, "\0\0\0"s, 0, "\0\0\0"s},
+    {"ZeroBytesInAChunk", "3\r\n\0\0\0\r\n0\r\n\r\n"s, "\0\0\0"s, CURLE_OK, "\0\0\0"s},
     {"AChunkOfManyBuffers", "4e20\r\n" + std::string(20000, 'x') + "\r\n0\r\n\r\n",
-     std::string(20000, 'x'), 0, std::string(20000, 'x')},
+     std::string(20000, 'x'), CURLE_OK, std::string(20000, 'x')},
     {"AThousandChunksOfAByte", Repeated(1000, "1\r\nx\r\n") + "0\r\n\r\n", std::string(1000, 'x'),
-     0, std::string(1000, 'x')},
+     CURLE_OK, std::string(1000, 'x')},
 };
 
-// A GET, and the whole body behind it.
+// A GET, and the whole body after it.
 Outcome GetAndReadBody(ClientProbe& client) {
   EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
   std::string body;
@@ -107,7 +110,7 @@ Outcome GetResponse(ClientProbe& client) {
   return OutcomeOf(client, 0, text);
 }
 
-// A form, and the whole body behind it.
+// A form, and the whole body after it.
 Outcome PostAndReadBody(ClientProbe& client) {
   EXPECT_EQ(client.SendRequestBySocketPost("a=1"), HTTP_RET_OK);
   std::string body;
@@ -149,10 +152,10 @@ Outcome XmlGet(int port) {
   return OutcomeOf(client, result, text);
 }
 
-std::vector<ReplyScenario> SocketTable(Outcome (*operation)(ClientProbe&)) {
-  std::vector<ReplyScenario> table;
+std::vector<ResponseScenario> SocketTable(Outcome (*operation)(ClientProbe&)) {
+  std::vector<ResponseScenario> table;
   for (const ChunkRow& row : kChunks) {
-    table.push_back({row.name, kHead + row.chunks, operation, {0, 0, 200, row.body}});
+    table.push_back({row.name, kHead + row.chunks, operation, Success(row.body)});
   }
   return table;
 }
@@ -161,14 +164,14 @@ std::vector<Scenario> CurlTable(const std::string& function, Outcome (*operation
                                 std::string (*text)(const ChunkRow&)) {
   std::vector<Scenario> table;
   for (const ChunkRow& row : kChunks) {
-    const int result = row.curl_code == 0 ? HTTP_RET_OK : HTTP_RET_IO_ERROR;
+    const int result = row.curl_code == CURLE_OK ? HTTP_RET_OK : HTTP_RET_IO_ERROR;
     std::vector<std::string> log;
-    if (row.curl_code != 0) {
+    if (row.curl_code != CURLE_OK) {
       log.push_back(function + ": Failed to make http connection, return value=" +
                     std::to_string(row.curl_code) + "\n");
     }
     table.push_back({row.name,
-                     {{ExpectRequest(), Offer(kHead + row.chunks), Close()}},
+                     {{ExpectRequest(), SendWhileRead(kHead + row.chunks), Close()}},
                      operation,
                      {result, result, 0, text(row)},
                      log});
@@ -185,64 +188,52 @@ std::string FileOf(const ChunkRow& row) {
   return "\r\n" + row.curl_body + row.trailer;
 }
 
-// Replies whose chunks a reader takes for the body itself.
+// Responses whose chunks a reader takes for the body itself.
 const char kChunkedJson[] = "10\r\n{\"success\":true}\r\n0\r\n\r\n";
 
 std::string Under(const std::string& lines, const std::string& body) {
   return "HTTP/1.1 200 OK\r\n" + lines + "\r\n" + body;
 }
 
-const ReplyScenario kUndecoded[] = {
-    {"ChunkedWithACapital",
-     Under("Transfer-Encoding: Chunked\r\n", "3\r\nabc\r\n0\r\n\r\n"),
-     GetAndReadBody,
-     {0, 0, 200, "3\r\nabc\r\n0\r\n\r\n"}},
+const ResponseScenario kUndecoded[] = {
+    {"ChunkedWithACapital", Under("Transfer-Encoding: Chunked\r\n", "3\r\nabc\r\n0\r\n\r\n"),
+     GetAndReadBody, Success("3\r\nabc\r\n0\r\n\r\n")},
     {"ChunkedBehindAnotherCoding",
-     Under("Transfer-Encoding: gzip, chunked\r\n", "3\r\nabc\r\n0\r\n\r\n"),
-     GetAndReadBody,
-     {0, 0, 200, "3\r\nabc\r\n0\r\n\r\n"}},
-    {"ChunkedAmongBlanks",
-     Under("Transfer-Encoding:   chunked  \r\n", "3\r\nabc\r\n0\r\n\r\n"),
-     GetAndReadBody,
-     {0, 0, 200, "abc"}},
+     Under("Transfer-Encoding: gzip, chunked\r\n", "3\r\nabc\r\n0\r\n\r\n"), GetAndReadBody,
+     Success("3\r\nabc\r\n0\r\n\r\n")},
+    {"ChunkedAmongBlanks", Under("Transfer-Encoding:   chunked  \r\n", "3\r\nabc\r\n0\r\n\r\n"),
+     GetAndReadBody, Success("abc")},
     {"ChunkedTakenBack",
      Under("Transfer-Encoding: chunked\r\nTransfer-Encoding: identity\r\n", "3\r\nabc\r\n"),
-     GetAndReadBody,
-     {0, 0, 200, "3\r\nabc\r\n"}},
+     GetAndReadBody, Success("3\r\nabc\r\n")},
     {"ChunkedBehindALengthLine",
      Under("Content-Length: 2\r\nTransfer-Encoding: chunked\r\n", "3\r\nabc\r\n0\r\n\r\n"),
-     GetAndReadBody,
-     {0, 0, 200, "abc"}},
+     GetAndReadBody, Success("abc")},
     {"AnErrorStatusIsReadAllTheSame",
-     "HTTP/1.1 500 No\r\nTransfer-Encoding: chunked\r\n\r\n3\r\nabc\r\n0\r\n\r\n",
-     GetAndReadBody,
-     {0, 5, 500, "abc"}},
+     "HTTP/1.1 500 No\r\nTransfer-Encoding: chunked\r\n\r\n3\r\nabc\r\n0\r\n\r\n", GetAndReadBody,
+     Sent(HTTP_RET_BAD_RESPONSE, 500, "abc")},
     {"AnErrorStatusIsNoResponse",
      "HTTP/1.1 500 No\r\nTransfer-Encoding: chunked\r\n\r\n3\r\nabc\r\n0\r\n\r\n",
      GetResponse,
-     {0, 5, 500, "{\"error\":true}"},
+     Sent(HTTP_RET_BAD_RESPONSE, 500, "{\"error\":true}"),
      {"GetResp: Http Resp error\n"}},
-    {"PiecesAreNotDecoded",
-     std::string(kHead) + "3\r\nabc\r\n0\r\n\r\n",
-     GetInPieces,
-     {0, 0, 200, "3\r\nabc\r\n0\r\n\r\n"}},
-    {"AFormsReplyIsDecoded",
-     std::string(kHead) + "3\r\nabc\r\n0\r\n\r\n",
-     PostAndReadBody,
-     {0, 0, 200, "abc"}},
+    {"PiecesAreNotDecoded", std::string(kHead) + "3\r\nabc\r\n0\r\n\r\n", GetInPieces,
+     Success("3\r\nabc\r\n0\r\n\r\n")},
+    {"AFormsReplyIsDecoded", std::string(kHead) + "3\r\nabc\r\n0\r\n\r\n", PostAndReadBody,
+     Success("abc")},
 };
 
 Outcome JsonGet(int port) {
   Json::Value value = "untouched";
   const int result = SendHttpGet("127.0.0.1", port, "a.cgi", value, 5, true);
-  return {result, 0, 0, value.toStyledString()};
+  return OneCall(result, value.toStyledString());
 }
 
 Outcome Soap(int port) {
   ClientProbe client(port);
-  std::string reply = "untouched";
-  const int result = client.SendReqBySocketPost("<a/>", reply);
-  return OutcomeOf(client, result, reply);
+  std::string response = "untouched";
+  const int result = client.SendReqBySocketPost("<a/>", response);
+  return OutcomeOf(client, result, response);
 }
 
 Outcome XmlSoap(int port) {
@@ -255,53 +246,54 @@ Outcome XmlSoap(int port) {
   return OutcomeOf(client, result, stays ? "untouched" : doc == nullptr ? "none" : "a document");
 }
 
-Script Reply(const std::string& reply) {
-  return {ExpectRequest(), Offer(reply), Close()};
+Script Response(const std::string& response) {
+  return {ExpectRequest(), SendWhileRead(response), Close()};
 }
 
 const Scenario kOtherReaders[] = {
     {"JsonTakesTheChunksForTheBody",
-     {Reply(std::string(kHead) + kChunkedJson)},
+     {Response(std::string(kHead) + kChunkedJson)},
      JsonGet,
-     {-2, 0, 0, "10\n"},
+     OneCall(-2, "10\n"),
      {"SendHttpGet: Failed to parse json [" + std::string(kChunkedJson) + "].\n"}},
     {"SoapNeverReadsChunks",
-     {Reply(std::string(kHead) + "4\r\n<a/>\r\n0\r\n\r\n")},
+     {Response(std::string(kHead) + "4\r\n<a/>\r\n0\r\n\r\n")},
      Soap,
-     {3, 0, 200, "untouched"}},
+     BodyFailed("untouched")},
     {"SoapWithALengthTakesTheChunksForTheBody",
-     {Reply(
+     {Response(
          Under("Transfer-Encoding: chunked\r\nContent-Length: 7\r\n", "4\r\n<a/>\r\n0\r\n\r\n"))},
      Soap,
-     {0, 0, 200, "4\r\n<a/>"}},
+     Success("4\r\n<a/>")},
     {"XmlSoapNeverReadsChunks",
-     {Reply(std::string(kHead) + "4\r\n<a/>\r\n0\r\n\r\n")},
+     {Response(std::string(kHead) + "4\r\n<a/>\r\n0\r\n\r\n")},
      XmlSoap,
-     {3, 0, 200, "untouched"}},
+     BodyFailed("untouched")},
     {"XmlSoapWithALengthTakesTheChunksForTheBody",
-     {Reply(
+     {Response(
          Under("Transfer-Encoding: chunked\r\nContent-Length: 7\r\n", "4\r\n<a/>\r\n0\r\n\r\n"))},
      XmlSoap,
-     {0, 0, 200, "none"}},
+     Success("none")},
 };
 
 }  // namespace
 
-class Chunks : public ::testing::TestWithParam<ReplyScenario> {};
+class Chunks : public ::testing::TestWithParam<ResponseScenario> {};
 
 TEST_P(Chunks, EndAsTheTableSays) {
-  PlayReply(GetParam());
+  RunInEachWay(GetParam());
 }
 
 INSTANTIATE_TEST_SUITE_P(ReadBody, Chunks, ::testing::ValuesIn(SocketTable(GetAndReadBody)),
-                         ReplyName);
-INSTANTIATE_TEST_SUITE_P(GetResp, Chunks, ::testing::ValuesIn(SocketTable(GetResponse)), ReplyName);
-INSTANTIATE_TEST_SUITE_P(Codings, Chunks, ::testing::ValuesIn(kUndecoded), ReplyName);
+                         ResponseName);
+INSTANTIATE_TEST_SUITE_P(GetResp, Chunks, ::testing::ValuesIn(SocketTable(GetResponse)),
+                         ResponseName);
+INSTANTIATE_TEST_SUITE_P(Codings, Chunks, ::testing::ValuesIn(kUndecoded), ResponseName);
 
 class ChunkReaders : public ::testing::TestWithParam<Scenario> {};
 
 TEST_P(ChunkReaders, EndAsTheTableSays) {
-  PlayScenario(GetParam());
+  RunScenario(GetParam());
 }
 
 INSTANTIATE_TEST_SUITE_P(Text, ChunkReaders,

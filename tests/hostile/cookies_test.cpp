@@ -19,9 +19,9 @@ constexpr char kOldCookie[] = "old=1;";
 
 struct CookieCase {
   std::string name;
-  std::string lines;           // the header lines of the reply
+  std::string lines;           // the header lines of the response
   std::string cookie;          // that the next request carries; empty: none
-  int response = HTTP_RET_OK;  // what CheckResponse gives for the reply
+  int response = HTTP_RET_OK;  // what CheckResponse returns for the response
   std::string status = "HTTP/1.1 200 OK\r\n";
 };
 
@@ -125,7 +125,7 @@ std::vector<CookieCase> ByteTable() {
   };
 }
 
-// A reply that is refused sets its cookie all the same, unless its head is not read.
+// A response that is refused sets its cookie all the same, unless its head is not read.
 std::vector<CookieCase> StatusTable() {
   const auto with = [](const char* name, const char* status, const char* cookie, int response) {
     return CookieCase{name, Cookie("a=1;"), cookie, response, status};
@@ -196,7 +196,7 @@ const NextRequest kCurlGet = {
 
 const char kOk[] = "HTTP/1.1 200 OK\r\nContent-Length: 0\r\n\r\n";
 
-// The reply sets the cookie; `next`, by the same client, is compared byte by byte.
+// The response sets the cookie; `next`, by the same client, is compared byte by byte.
 void ExpectNextRequest(const CookieCase& test, const NextRequest& next) {
   const LogCapture log(5);
   const size_t length = next.expected(test, 10000).size();  // every port here has five digits

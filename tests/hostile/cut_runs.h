@@ -1,4 +1,4 @@
-// Exchanges whose replies are cut behind every byte: by a close, by a reset, and over TLS with and
+// Exchanges whose responses are cut after every byte: by a close, by a reset, and over TLS with and
 // without a close notice.
 #ifndef TARNWICK_TESTS_HOSTILE_CUT_RUNS_H_
 #define TARNWICK_TESTS_HOSTILE_CUT_RUNS_H_
@@ -12,10 +12,10 @@
 #include <utility>
 #include <vector>
 
-#include "tests/hostile/cut_model.h"
 #include "tests/hostile/hostile_util.h"
+#include "tests/model/response.h"
 
-// How a connection ends behind the last byte that it carries.
+// How a connection ends after the last byte that it carries.
 enum class End { kClose, kReset, kTlsNotice, kTlsNoNotice, kTlsReset };
 
 inline bool IsTls(End end) {
@@ -37,15 +37,15 @@ struct Expected {
   size_t connections = 1;
 };
 
-// One exchange: the replies to its requests, what the client does, and what must come of replies
+// One exchange: the responses to its requests, what the client does, and what must come of responses
 // that are cut.
-struct Exchanged {
+struct ExchangeCase {
   std::string name;
-  std::vector<std::string> replies;
+  std::vector<std::string> responses;
   Outcome (*operation)(ClientProbe& client);
-  std::function<Expected(const std::vector<Cut>& replies, bool buffered)> rule;
+  std::function<Expected(const std::vector<Cut>& responses, bool buffered)> rule;
   std::string request_mark = "";  // what the request ends with, when it is no whole request
-  size_t first_cut = 0;           // the replies before this one come whole
+  size_t first_cut = 0;           // the responses before this one come whole
 };
 
 inline constexpr char kTypes[] = "Content-Type: a/b\r\n";
@@ -80,34 +80,34 @@ inline const std::string kBasic =
     "6\r\n\r\n"
     "login\n";
 
-// One run: the replies, one of them cut, and what must come of it.
+// One run: the responses, one of them cut, and what must come of it.
 struct Run {
   std::string name;
-  std::vector<Cut> replies;
+  std::vector<Cut> responses;
   size_t cut = 0;  // which of them is
   Expected expected = {};
   Outcome outcome = {};
   std::vector<std::string> log = {};
 };
 
-inline std::vector<Run> RunsOf(const Exchanged& exchange, End end, bool buffered) {
+inline std::vector<Run> RunsOf(const ExchangeCase& exchange, End end, bool buffered) {
   std::vector<Run> runs;
-  for (size_t cut = exchange.first_cut; cut < exchange.replies.size(); ++cut) {
-    for (size_t length = 0; length <= exchange.replies[cut].size(); ++length) {
+  for (size_t cut = exchange.first_cut; cut < exchange.responses.size(); ++cut) {
+    for (size_t length = 0; length <= exchange.responses[cut].size(); ++length) {
       Run run;
-      run.name = "reply " + std::to_string(cut) + " cut at " + std::to_string(length);
-      for (const std::string& reply : exchange.replies) run.replies.push_back({reply});
+      run.name = "response " + std::to_string(cut) + " cut at " + std::to_string(length);
+      for (const std::string& response : exchange.responses) run.responses.push_back({response});
       run.cut = cut;
-      run.replies[cut] = {exchange.replies[cut].substr(0, length), IsReset(end)};
-      run.expected = exchange.rule(run.replies, buffered);
+      run.responses[cut] = {exchange.responses[cut].substr(0, length), IsReset(end)};
+      run.expected = exchange.rule(run.responses, buffered);
       runs.push_back(run);
     }
   }
   return runs;
 }
 
-// A script for each connection that the runs make. A connection whose reply is not cut is closed.
-inline std::vector<Script> ScriptsOf(const Exchanged& exchange, const std::vector<Run>& runs,
+// A script for each connection that the runs make. A connection whose response is not cut is closed.
+inline std::vector<Script> ScriptsOf(const ExchangeCase& exchange, const std::vector<Run>& runs,
                                      End end) {
   std::vector<Script> scripts;
   const Step request =
@@ -115,7 +115,7 @@ inline std::vector<Script> ScriptsOf(const Exchanged& exchange, const std::vecto
   for (const Run& run : runs) {
     for (size_t i = 0; i < run.expected.connections; ++i) {
       const Step ending = i == run.cut ? EndingStep(end) : Close();
-      scripts.push_back({request, Send(run.replies[i].bytes), ending});
+      scripts.push_back({request, Send(run.responses[i].bytes), ending});
     }
   }
   return scripts;
@@ -126,7 +126,7 @@ inline std::unique_ptr<ScriptedPeer> NewPeer(std::vector<Script> scripts, End en
   return std::make_unique<TlsScriptedPeer>(std::move(scripts));
 }
 
-inline void PlayRuns(const Exchanged& exchange, End end, bool buffered, std::vector<Run>* runs) {
+inline void RunAll(const ExchangeCase& exchange, End end, bool buffered, std::vector<Run>* runs) {
   constexpr int kDebug = 5;
   LogCapture log(kDebug);
   const auto peer = NewPeer(ScriptsOf(exchange, *runs, end), end);
@@ -149,15 +149,15 @@ inline void PlayRuns(const Exchanged& exchange, End end, bool buffered, std::vec
   });
 }
 
-inline void PlayCuts(const Exchanged& exchange, End end, bool buffered) {
+inline void RunCuts(const ExchangeCase& exchange, End end, bool buffered) {
   const DescriptorGuard descriptors;
   std::vector<Run> runs = RunsOf(exchange, end, buffered);
-  PlayRuns(exchange, end, buffered, &runs);
+  RunAll(exchange, end, buffered, &runs);
   for (const Run& run : runs) {
     std::vector<std::string> log;
-    for (const std::string& line : run.log) log.push_back(WithoutNumbers(line));
+    for (const std::string& line : run.log) log.push_back(MaskNumbers(line));
     std::vector<std::string> expected;
-    for (const std::string& line : run.expected.log) expected.push_back(WithoutNumbers(line));
+    for (const std::string& line : run.expected.log) expected.push_back(MaskNumbers(line));
     EXPECT_EQ(run.outcome, run.expected.outcome) << run.name;
     EXPECT_EQ(log, expected) << run.name;
   }
@@ -171,7 +171,7 @@ inline const std::pair<const char*, End> kEnds[] = {{"Close", End::kClose},
 
 struct CutCase {
   std::string name;
-  Exchanged exchange;
+  ExchangeCase exchange;
   End end;
   bool buffered;
 };
@@ -181,9 +181,9 @@ inline std::ostream& operator<<(std::ostream& out, const CutCase& test) {
 }
 
 template <size_t kSize>
-std::vector<CutCase> CasesOf(const Exchanged (&exchanges)[kSize], bool plain, bool tls) {
+std::vector<CutCase> CasesOf(const ExchangeCase (&exchanges)[kSize], bool plain, bool tls) {
   std::vector<CutCase> cases;
-  for (const Exchanged& exchange : exchanges) {
+  for (const ExchangeCase& exchange : exchanges) {
     for (const auto& [name, end] : kEnds) {
       if (!(IsTls(end) ? tls : plain)) continue;
       cases.push_back({exchange.name + name, exchange, end, true});

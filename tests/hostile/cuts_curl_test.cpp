@@ -1,4 +1,4 @@
-// libcurl's exchanges, cut behind every byte of their replies.
+// libcurl's exchanges, cut after every byte of their responses.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <json/value.h>
@@ -39,7 +39,7 @@ Outcome LoginByCurl(ClientProbe& client) {
 Outcome HttpsJson(ClientProbe& client) {
   Json::Value value = "untouched";
   const int result = SendHttpsGet("127.0.0.1", client.m_port, "a.cgi", value, 5);
-  return {result, 0, 0, result == 0 && value.isObject() ? value["id"].asString() : "none"};
+  return OneCall(result, result == 0 && value.isObject() ? value["id"].asString() : "none");
 }
 
 // The outcome of an XML request, with what was collected for a document.
@@ -70,16 +70,16 @@ Outcome XmlDelete(ClientProbe& client) {
   return XmlRequest(client, [&](xmlDoc*) { return client.SendReqByXMLDelete(); });
 }
 
-// How far libcurl comes with a cut reply.
+// How far libcurl comes with a cut response.
 struct CurlProgress {
   bool succeeds = false;
   std::string lines;  // complete header lines, without the status line
   std::string body;   // decoded
 };
 
-// libcurl takes a close within the head, behind the status line, for the end of the reply, until it
+// libcurl takes a close within the head, after the status line, for the end of the response, until it
 // has read the line that tells where the body ends. From there on the body must be whole. A reset
-// is a failure unless the reply was known to be whole.
+// is a failure unless the response was known to be whole.
 CurlProgress FollowCurl(const std::string& whole, const Cut& cut) {
   const size_t status_end = whole.find("\r\n") + 2;
   const size_t head_end = whole.find("\r\n\r\n") + 4;
@@ -89,7 +89,7 @@ CurlProgress FollowCurl(const std::string& whole, const Cut& cut) {
   const size_t length = cut.bytes.size();
   CurlProgress progress;
   progress.succeeds = length == whole.size() && framed != std::string::npos;
-  // The line feed behind the last chunk is not missed.
+  // The line feed after the last chunk is not missed.
   if (!cut.reset && chunked && length + 1 == whole.size()) progress.succeeds = true;
   if (!cut.reset && length >= status_end && length < framed) progress.succeeds = true;
   const size_t lines_end = length < head_end ? cut.bytes.rfind('\n') + 1 : head_end;
@@ -108,9 +108,9 @@ std::string FailedIn(const std::string& function) {
 using Rule = std::function<Expected(const std::vector<Cut>&, bool)>;
 
 Rule CurlRule(const std::string& function, const std::string& whole, bool to_file = false) {
-  return [=](const std::vector<Cut>& replies, bool) {
-    const CurlProgress progress = FollowCurl(whole, replies[0]);
-    const int result = progress.succeeds ? 0 : 3;
+  return [=](const std::vector<Cut>& responses, bool) {
+    const CurlProgress progress = FollowCurl(whole, responses[0]);
+    const int result = progress.succeeds ? HTTP_RET_OK : HTTP_RET_IO_ERROR;
     Expected expected = {{result, result, 0, progress.body}, {}};
     if (to_file) {
       std::string lines = progress.lines;
@@ -123,20 +123,20 @@ Rule CurlRule(const std::string& function, const std::string& whole, bool to_fil
   };
 }
 
-// An empty text counts as a success.
-Expected HttpsJsonRule(const std::vector<Cut>& replies, bool /*buffered*/) {
-  const CurlProgress progress = FollowCurl(Ok("", kJson), replies[0]);
-  if (!progress.succeeds) return {{-1, 0, 0, "none"}, {FailedIn("SendRequestByCurl")}};
-  if (progress.body.empty()) return {{0, 0, 0, "none"}, {}};
-  if (progress.body == kJson) return {{0, 0, 0, "7"}, {}};
-  return {{-3, 0, 0, "none"},
+// An empty text is taken for a success.
+Expected HttpsJsonRule(const std::vector<Cut>& responses, bool /*buffered*/) {
+  const CurlProgress progress = FollowCurl(Ok("", kJson), responses[0]);
+  if (!progress.succeeds) return {OneCall(-1, "none"), {FailedIn("SendRequestByCurl")}};
+  if (progress.body.empty()) return {OneCall(0, "none"), {}};
+  if (progress.body == kJson) return {OneCall(0, "7"), {}};
+  return {OneCall(-3, "none"),
           {"SendHttpsGet: Failed to parse json. Result is [" + progress.body + "]\n"}};
 }
 
-// What libcurl makes of half a refusal is its own matter: the first reply comes whole.
-Expected CurlLoginRule(const std::vector<Cut>& replies, bool /*buffered*/) {
-  const CurlProgress progress = FollowCurl(kOfALength, replies[1]);
-  const int result = progress.succeeds ? 0 : 3;
+// What libcurl makes of half a refusal is its own matter: the first response comes whole.
+Expected CurlLoginRule(const std::vector<Cut>& responses, bool /*buffered*/) {
+  const CurlProgress progress = FollowCurl(kOfALength, responses[1]);
+  const int result = progress.succeeds ? HTTP_RET_OK : HTTP_RET_IO_ERROR;
   Expected expected = {{result, result, 0, ""}, {}, 2};
   if (!progress.succeeds) expected.log = {FailedIn("SendRequestByPost")};
   return expected;
@@ -144,7 +144,7 @@ Expected CurlLoginRule(const std::vector<Cut>& replies, bool /*buffered*/) {
 
 constexpr char kByCurl[] = "SendRequestByCurl";
 
-const Exchanged kCurlExchanges[] = {
+const ExchangeCase kCurlExchanges[] = {
     {"CurlGet", {kOfALength}, CurlGet, CurlRule(kByCurl, kOfALength)},
     {"CurlGetToTheEnd", {kToTheEnd}, CurlGet, CurlRule(kByCurl, kToTheEnd)},
     {"CurlGetOfChunks", {kChunked}, CurlGet, CurlRule(kByCurl, kChunked)},
@@ -153,7 +153,7 @@ const Exchanged kCurlExchanges[] = {
     {"CurlPost", {kOfALength}, CurlPost, CurlRule(kByCurl, kOfALength)},
 };
 
-const Exchanged kPlainCurlExchanges[] = {
+const ExchangeCase kPlainCurlExchanges[] = {
     {"CurlLogin", {kClosedDigest, kOfALength}, LoginByCurl, CurlLoginRule, "", 1},
     {"XmlGet", {OkOfLength(kXml)}, XmlGet, CurlRule("SendReqByXMLGet", OkOfLength(kXml))},
     {"XmlPost", {OkOfLength(kXml)}, XmlPost, CurlRule("SendReqByXMLPost", OkOfLength(kXml))},
@@ -161,7 +161,7 @@ const Exchanged kPlainCurlExchanges[] = {
     {"XmlDelete", {OkOfLength(kXml)}, XmlDelete, CurlRule("SendReqByXMLDelete", OkOfLength(kXml))},
 };
 
-const Exchanged kHttpsExchanges[] = {
+const ExchangeCase kHttpsExchanges[] = {
     {"HttpsJson", {Ok("", kJson)}, HttpsJson, HttpsJsonRule},
 };
 
@@ -170,7 +170,7 @@ const Exchanged kHttpsExchanges[] = {
 class CurlCuts : public ::testing::TestWithParam<CutCase> {};
 
 TEST_P(CurlCuts, AtEveryByteGiveWhatTheRulesSay) {
-  PlayCuts(GetParam().exchange, GetParam().end, GetParam().buffered);
+  RunCuts(GetParam().exchange, GetParam().end, GetParam().buffered);
 }
 
 INSTANTIATE_TEST_SUITE_P(PlainAndTls, CurlCuts,

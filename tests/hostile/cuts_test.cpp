@@ -1,5 +1,5 @@
-// The socket's exchanges, cut behind every byte of their replies. What a client makes of the rest
-// is worked out by cut_model.h.
+// The socket's exchanges, cut after every byte of their responses. What a client makes of the rest
+// is worked out by tests/model/response.h.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <json/value.h>
@@ -35,15 +35,15 @@ Outcome PostAndReadBody(ClientProbe& client) {
 }
 
 Outcome Soap(ClientProbe& client) {
-  std::string reply = "untouched";
-  const int result = client.SendReqBySocketPost("<a/>", reply);
-  return OutcomeOf(client, result, reply);
+  std::string response = "untouched";
+  const int result = client.SendReqBySocketPost("<a/>", response);
+  return OutcomeOf(client, result, response);
 }
 
 Outcome SoapWithLogin(ClientProbe& client) {
-  std::string reply = "untouched";
-  const int result = client.SendAuthReqBySocketPost("<a/>", reply);
-  return OutcomeOf(client, result, reply);
+  std::string response = "untouched";
+  const int result = client.SendAuthReqBySocketPost("<a/>", response);
+  return OutcomeOf(client, result, response);
 }
 
 Outcome XmlSoap(ClientProbe& client) {
@@ -59,15 +59,15 @@ Outcome XmlSoap(ClientProbe& client) {
 Outcome Upload(ClientProbe& client) {
   EXPECT_EQ(client.OpenRawDataUpload(), HTTP_RET_OK);
   EXPECT_EQ(client.WriteData("data, to the end.", 17), 17);
-  const std::string reply = client.GetResp();
-  return OutcomeOf(client, 0, reply);
+  const std::string response = client.GetResp();
+  return OutcomeOf(client, 0, response);
 }
 
 Outcome JsonGet(ClientProbe& client) {
   Json::Value value = "untouched";
   const int result = SendHttpGet("127.0.0.1", client.m_port, "a.cgi", value, 5, true);
   // A part of a document may leave a part of its values.
-  return {result, 0, 0, result == 0 ? value["id"].asString() : "none"};
+  return OneCall(result, result == 0 ? value["id"].asString() : "none");
 }
 
 Outcome OneCallPost(ClientProbe& client) {
@@ -81,100 +81,101 @@ std::vector<std::string> ReadBodyLog(bool read) {
               : std::vector<std::string>{"ReadBody: Read data error\n"};
 }
 
-// The head and the body of the last reply, with the log of the heads before it.
-Expected HeadAndBody(const Cut& reply, bool buffered, std::vector<std::string> log) {
-  CutReader reader(reply, buffered);
+// The head and the body of the last response, with the log of the heads before it.
+Expected HeadAndBody(const Cut& response, bool buffered, std::vector<std::string> log) {
+  CutReader reader(response, buffered);
   const ModelHead head = ReadModelHead(reader, &log);
   std::string body;
   const bool read = ReadModelBody(reader, head, &body);
   for (const std::string& line : ReadBodyLog(read)) log.push_back(line);
-  return {{read ? 0 : 3, head.response, head.status, body}, log};
+  return {{read ? HTTP_RET_OK : HTTP_RET_IO_ERROR, head.response, head.status, body}, log};
 }
 
-Expected GetRule(const std::vector<Cut>& replies, bool buffered) {
-  return HeadAndBody(replies[0], buffered, {});
+Expected GetRule(const std::vector<Cut>& responses, bool buffered) {
+  return HeadAndBody(responses[0], buffered, {});
 }
 
-// A challenge that names a scheme is answered, and its reply counts.
+// A challenge that names a scheme is answered, and the next response is the last.
 bool AsksForLogin(const ModelHead& head) {
-  return head.response == 4 && (head.challenge.find("Digest") != std::string::npos ||
-                                head.challenge.find("Basic") != std::string::npos);
+  return head.response == HTTP_RET_UNAUTHORIZED &&
+         (head.challenge.find("Digest") != std::string::npos ||
+          head.challenge.find("Basic") != std::string::npos);
 }
 
-Expected LoginRule(const std::vector<Cut>& replies, bool buffered) {
-  CutReader reader(replies[0], buffered);
+Expected LoginRule(const std::vector<Cut>& responses, bool buffered) {
+  CutReader reader(responses[0], buffered);
   std::vector<std::string> log;
-  if (!AsksForLogin(ReadModelHead(reader, &log))) return GetRule(replies, buffered);
-  Expected expected = HeadAndBody(replies[1], buffered, log);
+  if (!AsksForLogin(ReadModelHead(reader, &log))) return GetRule(responses, buffered);
+  Expected expected = HeadAndBody(responses[1], buffered, log);
   expected.connections = 2;
   return expected;
 }
 
-// One SOAP reply; `text` stays when there is nothing to read.
-int ReadSoap(const Cut& reply, bool buffered, ModelHead* head, Expected* expected) {
-  CutReader reader(reply, buffered);
+// One SOAP response; `text` stays when there is nothing to read.
+int ReadSoap(const Cut& response, bool buffered, ModelHead* head, Expected* expected) {
+  CutReader reader(response, buffered);
   *head = ReadModelHead(reader, &expected->log);
   expected->outcome.response = head->response;
   expected->outcome.status = head->status;
   const size_t length = head->complete ? strtoul(head->length.c_str(), nullptr, 10) : 0;
-  if (length == 0) return 3;
+  if (length == 0) return HTTP_RET_IO_ERROR;
   std::string text;
   if (reader.Read(length, &text) > 0) {
     expected->outcome.text = text;
-    return 0;
+    return HTTP_RET_OK;
   }
   expected->log.push_back("SendReqBySocketPost: Read data faild.\n");
-  return 3;
+  return HTTP_RET_IO_ERROR;
 }
 
-Expected SoapRule(const std::vector<Cut>& replies, bool buffered) {
-  Expected expected = {{0, 0, 0, "untouched"}, {}};
+Expected SoapRule(const std::vector<Cut>& responses, bool buffered) {
+  Expected expected = {{HTTP_RET_OK, HTTP_RET_OK, 0, "untouched"}, {}};
   ModelHead head;
-  expected.outcome.result = ReadSoap(replies[0], buffered, &head, &expected);
+  expected.outcome.result = ReadSoap(responses[0], buffered, &head, &expected);
   return expected;
 }
 
-Expected SoapLoginRule(const std::vector<Cut>& replies, bool buffered) {
-  Expected expected = {{0, 0, 0, "untouched"}, {}};
+Expected SoapLoginRule(const std::vector<Cut>& responses, bool buffered) {
+  Expected expected = {{HTTP_RET_OK, HTTP_RET_OK, 0, "untouched"}, {}};
   ModelHead head;
-  int result = ReadSoap(replies[0], buffered, &head, &expected);
+  int result = ReadSoap(responses[0], buffered, &head, &expected);
   if (AsksForLogin(head)) {
-    result = ReadSoap(replies[1], buffered, &head, &expected);
+    result = ReadSoap(responses[1], buffered, &head, &expected);
     expected.connections = 2;
   }
-  expected.outcome.result = result != 0 ? result : head.response;
+  expected.outcome.result = result != HTTP_RET_OK ? result : head.response;
   return expected;
 }
 
 // Half a document is none.
-Expected XmlSoapRule(const std::vector<Cut>& replies, bool buffered) {
-  Expected expected = SoapRule(replies, buffered);
-  if (expected.outcome.result != 0) return expected;
+Expected XmlSoapRule(const std::vector<Cut>& responses, bool buffered) {
+  Expected expected = SoapRule(responses, buffered);
+  if (expected.outcome.result != HTTP_RET_OK) return expected;
   expected.outcome.text = expected.outcome.text == kXml ? "a document" : "none";
   return expected;
 }
 
-Expected UploadRule(const std::vector<Cut>& replies, bool buffered) {
+Expected UploadRule(const std::vector<Cut>& responses, bool buffered) {
   const std::string error = "{\"error\":true}";
   Expected expected;
-  CutReader reader(replies[0], buffered);
+  CutReader reader(responses[0], buffered);
   const ModelHead head = ReadModelHead(reader, &expected.log);
   std::string body;
-  const bool success = head.response == 0;
+  const bool success = head.response == HTTP_RET_OK;
   const bool read = success && ReadModelBody(reader, head, &body);
   if (!read) {
     expected.log.push_back(success ? "GetResp: Read data error\n" : "GetResp: Http Resp error\n");
   }
-  expected.outcome = {0, head.response, head.status, read ? body : error};
+  expected.outcome = Sent(head.response, head.status, read ? body : error);
   return expected;
 }
 
-Expected JsonRule(const std::vector<Cut>& replies, bool /*buffered*/) {
-  Expected expected = {{-1, 0, 0, "none"}, {}};
-  CutReader reader(replies[0], true);
+Expected JsonRule(const std::vector<Cut>& responses, bool /*buffered*/) {
+  Expected expected = {OneCall(-1, "none"), {}};
+  CutReader reader(responses[0], true);
   const ModelHead head = ReadModelHead(reader, &expected.log);
   std::string body;
-  if (head.response != 0) {
+  if (head.response != HTTP_RET_OK) {
     expected.log.push_back("SendHttpGet: Failed to check response[N]: N\n");
   } else if (!ReadModelBody(reader, head, &body)) {
     expected.log.push_back("SendHttpGet: Failed to read data: N\n");
@@ -184,20 +185,20 @@ Expected JsonRule(const std::vector<Cut>& replies, bool /*buffered*/) {
     expected.log.push_back("SendHttpGet: Failed to parse json [" + body + "].\n");
     expected.outcome.result = -2;
   } else {
-    expected.outcome = {0, 0, 0, "7"};
+    expected.outcome = OneCall(0, "7");
   }
   return expected;
 }
 
-// The answer's outcome does not count.
-Expected OneCallPostRule(const std::vector<Cut>& replies, bool /*buffered*/) {
-  Expected expected = {{0, 0, 0, ""}, {}};
-  CutReader reader(replies[0], true);
+// The response's outcome is ignored.
+Expected OneCallPostRule(const std::vector<Cut>& responses, bool /*buffered*/) {
+  Expected expected = {OneCall(0, ""), {}};
+  CutReader reader(responses[0], true);
   ReadModelHead(reader, &expected.log);
   return expected;
 }
 
-const Exchanged kSocketExchanges[] = {
+const ExchangeCase kSocketExchanges[] = {
     {"GetToTheEnd", {kToTheEnd}, GetAndReadBody, GetRule},
     {"GetOfALength", {kOfALength}, GetAndReadBody, GetRule},
     {"GetOfChunks", {kChunked}, GetAndReadBody, GetRule},
@@ -213,16 +214,16 @@ const Exchanged kSocketExchanges[] = {
     {"Upload", {kChunked}, Upload, UploadRule, "data, to the end."},
 };
 
-const Exchanged kPlainExchanges[] = {
+const ExchangeCase kPlainExchanges[] = {
     {"Json", {Ok("", kJson)}, JsonGet, JsonRule},
     {"OneCallPost", {kNotFound}, OneCallPost, OneCallPostRule},
 };
 
-// Each exchange with each end. Over TLS a direct read gives what a direct plain one does, so that
+// Each exchange with each end. Over TLS a direct read returns what a direct plain one does, so that
 // two exchanges will do.
 std::vector<CutCase> SocketCuts() {
   std::vector<CutCase> cases;
-  for (const Exchanged& exchange : kSocketExchanges) {
+  for (const ExchangeCase& exchange : kSocketExchanges) {
     const bool in_all_ways = exchange.name == "GetOfChunks" || exchange.name == "SoapDigestLogin";
     for (const auto& [name, end] : kEnds) {
       cases.push_back({exchange.name + name, exchange, end, true});
@@ -238,7 +239,7 @@ std::vector<CutCase> SocketCuts() {
 class Cuts : public ::testing::TestWithParam<CutCase> {};
 
 TEST_P(Cuts, AtEveryByteGiveWhatTheRulesSay) {
-  PlayCuts(GetParam().exchange, GetParam().end, GetParam().buffered);
+  RunCuts(GetParam().exchange, GetParam().end, GetParam().buffered);
 }
 
 INSTANTIATE_TEST_SUITE_P(Socket, Cuts, ::testing::ValuesIn(SocketCuts()), CutName);

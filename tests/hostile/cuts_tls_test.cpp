@@ -1,5 +1,5 @@
-// A TLS connection, cut behind every byte that the server sends: in its handshake messages, its
-// tickets, the record of its reply and its close notice.
+// A TLS connection, cut after every byte that the server sends: in its handshake messages, its
+// tickets, the record of its response and its close notice.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <openssl/bio.h>
@@ -14,17 +14,17 @@
 
 namespace {
 
-constexpr char kReply[] = "HTTP/1.1 200 OK\r\nContent-Length: 4\r\n\r\nbody";
+constexpr char kResponse[] = "HTTP/1.1 200 OK\r\nContent-Length: 4\r\n\r\nbody";
 constexpr size_t kNowhere = std::numeric_limits<size_t>::max();
 
 // Where the parts of one connection's bytes ended; kNowhere when they were not reached.
 struct Marks {
   size_t handshake = kNowhere;  // the last byte that the client's handshake needs
-  size_t reply = kNowhere;
+  size_t response = kNowhere;
   size_t all = kNowhere;
 };
 
-// A TLS server whose bytes end behind the first `limit` ones. What it would send beyond is counted
+// A TLS server whose bytes end after the first `limit` ones. What it would send beyond is counted
 // and dropped.
 class CutTlsServer {
  public:
@@ -70,9 +70,9 @@ class CutTlsServer {
     return true;
   }
 
-  void Reply(Marks* marks) {
-    SSL_write(ssl_, kReply, sizeof(kReply) - 1);
-    marks->reply = made_ + static_cast<size_t>(BIO_ctrl_pending(to_client_));
+  void Response(Marks* marks) {
+    SSL_write(ssl_, kResponse, sizeof(kResponse) - 1);
+    marks->response = made_ + static_cast<size_t>(BIO_ctrl_pending(to_client_));
     SSL_shutdown(ssl_);
     Flush();
     marks->all = made_;
@@ -107,7 +107,7 @@ Step ServeUpTo(const TlsIdentity& identity, size_t limit, Marks* marks) {
   return {"ServeUpTo(" + std::to_string(limit) + ")",
           [&identity, limit, marks](PeerConnection& peer, std::string* error) {
             CutTlsServer server(identity, peer, limit);
-            if (server.Handshake(marks) && server.ReadRequest()) server.Reply(marks);
+            if (server.Handshake(marks) && server.ReadRequest()) server.Response(marks);
             if (peer.DeadlinePassed()) *error = "deadline passed";
             return !peer.DeadlinePassed();
           }};
@@ -154,7 +154,7 @@ Outcome GetAndReadBody(ClientProbe& client) {
   return OutcomeOf(client, result, body);
 }
 
-void PlayRuns(const TlsCutCase& test, std::vector<TlsRun>* runs) {
+void RunAll(const TlsCutCase& test, std::vector<TlsRun>* runs) {
   constexpr int kDebug = 5;
   const TlsIdentity identity(TlsOptions{false, false, test.version});
   std::vector<Script> scripts;
@@ -179,15 +179,15 @@ void PlayRuns(const TlsCutCase& test, std::vector<TlsRun>* runs) {
 // Nothing of a record counts before it is whole.
 void ExpectOutcome(const TlsRun& run) {
   const bool connects = run.limit >= run.marks.handshake;
-  const bool replies = run.limit >= run.marks.reply;
-  Outcome outcome = {3, 1, 0, "not sent"};
+  const bool responses = run.limit >= run.marks.response;
+  Outcome outcome = {HTTP_RET_IO_ERROR, HTTP_RET_NOT_READY, 0, "not sent"};
   std::vector<std::string> log = {"SendRequestByGet: Connection failed!\n"};
   if (connects) {
-    outcome = {3, 3, 0, ""};
+    outcome = NoResponse();
     log = {"ReadBody: Read data error\n"};
   }
-  if (replies) {
-    outcome = {0, 0, 200, "body"};
+  if (responses) {
+    outcome = Success("body");
     log.clear();
   }
   EXPECT_EQ(run.outcome, outcome) << "cut at " << run.limit;
@@ -197,8 +197,8 @@ void ExpectOutcome(const TlsRun& run) {
 // The bytes of a whole connection; they vary by a few, as signatures do.
 size_t BytesOf(const TlsCutCase& test) {
   std::vector<TlsRun> runs(1);
-  PlayRuns(test, &runs);
-  EXPECT_EQ(runs[0].outcome, (Outcome{0, 0, 200, "body"}));
+  RunAll(test, &runs);
+  EXPECT_EQ(runs[0].outcome, Success("body"));
   return runs[0].marks.all;
 }
 
@@ -206,13 +206,13 @@ size_t BytesOf(const TlsCutCase& test) {
 
 class TlsCuts : public ::testing::TestWithParam<TlsCutCase> {};
 
-TEST_P(TlsCuts, AtEveryByteEndTheHandshakeOrTheReply) {
+TEST_P(TlsCuts, AtEveryByteEndTheHandshakeOrTheResponse) {
   const DescriptorGuard descriptors;
   const size_t bytes = BytesOf(GetParam());
   ASSERT_LT(bytes, 4000u);
   std::vector<TlsRun> runs(bytes + 1);
   for (size_t i = 0; i < runs.size(); ++i) runs[i].limit = i;
-  PlayRuns(GetParam(), &runs);
+  RunAll(GetParam(), &runs);
   for (const TlsRun& run : runs) ExpectOutcome(run);
 }
 

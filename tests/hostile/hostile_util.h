@@ -33,13 +33,40 @@ inline std::string Repeated(int count, const std::string& text) {
   return all;
 }
 
-// What an operation gave.
+// What an operation returned and left.
 struct Outcome {
-  int result = 0;    // what it returned
-  int response = 0;  // what CheckResponse returns afterwards
-  int status = 0;    // and the status that it tells
-  std::string text;  // the body, or what else the operation gives
+  int result = HTTP_RET_OK;    // what it returned
+  int response = HTTP_RET_OK;  // what CheckResponse returns afterwards
+  int status = 0;              // and the status that it stores
+  std::string text;            // the body, or what else the operation returns
 };
+
+// The outcomes that most rows expect.
+
+// A response of status 200 was read to its end.
+inline Outcome Success(const std::string& text) {
+  return {HTTP_RET_OK, HTTP_RET_OK, 200, text};
+}
+
+// The operation succeeded, whatever the response was.
+inline Outcome Sent(int response, int status, const std::string& text) {
+  return {HTTP_RET_OK, response, status, text};
+}
+
+// No status line was read, or libcurl's transfer failed.
+inline Outcome NoResponse(const std::string& text = "") {
+  return {HTTP_RET_IO_ERROR, HTTP_RET_IO_ERROR, 0, text};
+}
+
+// The head was read, its status is 200, and the body failed after `text`.
+inline Outcome BodyFailed(const std::string& text) {
+  return {HTTP_RET_IO_ERROR, HTTP_RET_OK, 200, text};
+}
+
+// A one-call function leaves no client whose response could be asked for.
+inline Outcome OneCall(int result, const std::string& text) {
+  return {result, 0, 0, text};
+}
 
 inline bool operator==(const Outcome& a, const Outcome& b) {
   return a.result == b.result && a.response == b.response && a.status == b.status &&
@@ -77,6 +104,14 @@ inline std::ostream& operator<<(std::ostream& out, const Scenario& scenario) {
   return out << scenario.name;
 }
 
+// A row in which the peer plays one connection, or none.
+inline Scenario Meets(const std::string& name, const Script& peer,
+                      const std::function<Outcome(int port)>& operation, const Outcome& expected,
+                      const std::vector<std::string>& log = {}, bool tls = false) {
+  const std::vector<Script> connections(peer.empty() ? 0 : 1, peer);
+  return {name, connections, operation, expected, log, tls};
+}
+
 inline std::string ScenarioName(const ::testing::TestParamInfo<Scenario>& info) {
   return info.param.name;
 }
@@ -89,7 +124,7 @@ inline std::vector<std::string> HttpLog(const LogCapture& log) {
 }
 
 // The text with N for each number: descriptors, ports, codes and sizes that are not sure.
-inline std::string WithoutNumbers(const std::string& text) {
+inline std::string MaskNumbers(const std::string& text) {
   std::string result;
   for (const char c : text) {
     const bool digit = isdigit(static_cast<unsigned char>(c)) != 0;
@@ -106,7 +141,7 @@ inline std::unique_ptr<ScriptedPeer> PeerOf(const Scenario& scenario) {
 
 // Runs the operation against the peer on a small stack, and compares what came of it. No descriptor
 // may be left.
-inline void PlayScenario(const Scenario& scenario) {
+inline void RunScenario(const Scenario& scenario) {
   constexpr int kDebug = 5;
   const DescriptorGuard descriptors;
   const LogCapture log(kDebug);
@@ -118,7 +153,7 @@ inline void PlayScenario(const Scenario& scenario) {
 }
 
 // Sends bytes in pieces, for as long as the client takes them: one that has seen enough may go.
-inline Step Offer(const std::string& bytes, size_t piece = std::string::npos) {
+inline Step SendWhileRead(const std::string& bytes, size_t piece = std::string::npos) {
   return {"Offer()", [bytes, piece](PeerConnection& peer, std::string* error) {
             constexpr useconds_t kBetweenPieces = 100;
             for (size_t at = 0; at < bytes.size(); at += std::min(piece, bytes.size())) {
@@ -130,10 +165,10 @@ inline Step Offer(const std::string& bytes, size_t piece = std::string::npos) {
           }};
 }
 
-// A reply that has the same outcome however it travels.
-struct ReplyScenario {
+// A response that has the same outcome however it travels.
+struct ResponseScenario {
   std::string name;
-  std::string reply;
+  std::string response;
   std::function<Outcome(ClientProbe&)> operation;
   Outcome expected;
   std::vector<std::string> log = {};
@@ -142,15 +177,15 @@ struct ReplyScenario {
   bool buffered_only = false;
 };
 
-inline std::ostream& operator<<(std::ostream& out, const ReplyScenario& scenario) {
+inline std::ostream& operator<<(std::ostream& out, const ResponseScenario& scenario) {
   return out << scenario.name;
 }
 
-inline std::string ReplyName(const ::testing::TestParamInfo<ReplyScenario>& info) {
+inline std::string ResponseName(const ::testing::TestParamInfo<ResponseScenario>& info) {
   return info.param.name;
 }
 
-// How a reply travels, and how the client reads it.
+// How a response travels, and how the client reads it.
 struct Delivery {
   const char* name;
   bool tls;
@@ -167,14 +202,14 @@ inline constexpr Delivery kDeliveries[] = {
     {"TLS, direct, record by record of a byte", true, false, 1},
 };
 
-// Of a long reply, byte by byte, several bytes travel together, so that it does not take seconds.
-inline size_t PieceOf(const Delivery& delivery, const std::string& reply) {
+// Of a long response, byte by byte, several bytes travel together, so that it does not take seconds.
+inline size_t PieceOf(const Delivery& delivery, const std::string& response) {
   constexpr size_t kMostPieces = 500;
-  return std::max(delivery.piece, reply.size() / kMostPieces);
+  return std::max(delivery.piece, response.size() / kMostPieces);
 }
 
-// Plays one reply in each of the ways.
-inline void PlayReply(const ReplyScenario& scenario) {
+// Plays one response in each of the ways.
+inline void RunInEachWay(const ResponseScenario& scenario) {
   for (const Delivery& delivery : kDeliveries) {
     if (scenario.buffered_only && !delivery.buffered) continue;
     SCOPED_TRACE(delivery.name);
@@ -186,8 +221,9 @@ inline void PlayReply(const ReplyScenario& scenario) {
       return scenario.operation(client);
     };
     const Script script = {ExpectRequest(),
-                           Offer(scenario.reply, PieceOf(delivery, scenario.reply)), Close()};
-    PlayScenario(
+                           SendWhileRead(scenario.response, PieceOf(delivery, scenario.response)),
+                           Close()};
+    RunScenario(
         {scenario.name, {script}, operation, scenario.expected, scenario.log, delivery.tls});
   }
 }

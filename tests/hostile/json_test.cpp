@@ -36,11 +36,11 @@ constexpr int kTrueOnALargeStack = kNoJson;
 struct JsonCase {
   JsonCase(std::string called, std::string text, int gives)
       : name(std::move(called)),
-        reply(std::make_shared<const std::string>(std::move(text))),
+        response(std::make_shared<const std::string>(std::move(text))),
         result(gives) {}
 
   std::string name;
-  std::shared_ptr<const std::string> reply;
+  std::shared_ptr<const std::string> response;
   int result;  // of JsonParse
 };
 
@@ -48,12 +48,12 @@ std::ostream& operator<<(std::ostream& out, const JsonCase& test) {
   return out << test.name;
 }
 
-// A reply that succeeds, with `value` beside it.
+// A response that succeeds, with `value` beside it.
 std::string Beside(const std::string& value) {
   return "{\"success\":true,\"x\":" + value + "}";
 }
 
-std::string Success(const std::string& value) {
+std::string SuccessIs(const std::string& value) {
   return "{\"success\":" + value + "}";
 }
 
@@ -73,21 +73,21 @@ std::vector<JsonCase> DepthTable() {
       {"100000InAString", Beside("\"" + Repeated(100000, "[") + "\""), kTrue},
       {"100000BehindAnEscapedQuote", Beside("\"\\\"" + Repeated(100000, "[") + "\""), kTrue},
       {"100000BehindTwoBackslashes", "[\"\\\\\"," + Repeated(100000, "["), kNoJson},
-      {"100000InAComment", "/*" + Repeated(100000, "[") + "*/" + Success("true"), kTrue},
-      {"100000InALineComment", "//" + Repeated(100000, "[") + "\n" + Success("true"), kTrue},
+      {"100000InAComment", "/*" + Repeated(100000, "[") + "*/" + SuccessIs("true"), kTrue},
+      {"100000InALineComment", "//" + Repeated(100000, "[") + "\n" + SuccessIs("true"), kTrue},
       {"100000BehindALineComment", "//\r" + Repeated(100000, "["), kNoJson},
       {"100000BehindASlash", "/" + Repeated(100000, "["), kNoJson},
       {"100000BehindAnOpenString", "\"" + Repeated(100000, "["), kNoJson},
       {"100000BehindAZeroByte", std::string(1, '\0') + Repeated(100000, "["), kNoJson},
-      {"100000BehindTheRoot", Success("true") + Repeated(100000, "["), kNoJson},
+      {"100000BehindTheRoot", SuccessIs("true") + Repeated(100000, "["), kNoJson},
       {"100000Commas", "[" + Repeated(100000, ",") + "]", kNoJson},
       {"100000Colons", "{" + Repeated(100000, ":") + "}", kNoJson},
-      {"100000Comments", Repeated(100000, "/**/") + Success("true"), kTrue},
+      {"100000Comments", Repeated(100000, "/**/") + SuccessIs("true"), kTrue},
   };
 }
 
 std::vector<JsonCase> ShapeTable() {
-  const std::string sound = Success("true");
+  const std::string sound = SuccessIs("true");
   const std::string zero(1, '\0');
   return {
       {"Sound", sound, kTrue},
@@ -192,25 +192,25 @@ std::vector<JsonCase> NumberTable() {
 
 std::vector<JsonCase> SuccessTable() {
   return {
-      {"True", Success("true"), kTrue},
-      {"False", Success("false"), kNotTrue},
-      {"InCapitals", Success("TRUE"), kNoJson},
+      {"True", SuccessIs("true"), kTrue},
+      {"False", SuccessIs("false"), kNotTrue},
+      {"InCapitals", SuccessIs("TRUE"), kNoJson},
       {"OfAnotherCase", "{\"Success\":true}", kNotTrue},
-      {"Null", Success("null"), kNotTrue},
-      {"AString", Success("\"true\""), kNotTrue},
-      {"AnEmptyString", Success("\"\""), kNotTrue},
-      {"AnArray", Success("[true]"), kNotTrue},
-      {"AnEmptyArray", Success("[]"), kNotTrue},
-      {"AnObject", Success("{\"success\":true}"), kNotTrue},
-      {"Zero", Success("0"), kNotTrue},
-      {"MinusZero", Success("-0"), kNotTrue},
-      {"MinusZeroPointZero", Success("-0.0"), kNotTrue},
-      {"One", Success("1"), kTrue},
-      {"MinusOne", Success("-1"), kTrue},
-      {"ASmallFraction", Success("1e-300"), kTrue},
-      {"TooSmallAFraction", Success("1e-999"), kNotTrue},
-      {"BeyondAllNumbers", Success("1e999"), kNoJson},
-      {"TheLargestNumber", Success("18446744073709551615"), kTrue},
+      {"Null", SuccessIs("null"), kNotTrue},
+      {"AString", SuccessIs("\"true\""), kNotTrue},
+      {"AnEmptyString", SuccessIs("\"\""), kNotTrue},
+      {"AnArray", SuccessIs("[true]"), kNotTrue},
+      {"AnEmptyArray", SuccessIs("[]"), kNotTrue},
+      {"AnObject", SuccessIs("{\"success\":true}"), kNotTrue},
+      {"Zero", SuccessIs("0"), kNotTrue},
+      {"MinusZero", SuccessIs("-0"), kNotTrue},
+      {"MinusZeroPointZero", SuccessIs("-0.0"), kNotTrue},
+      {"One", SuccessIs("1"), kTrue},
+      {"MinusOne", SuccessIs("-1"), kTrue},
+      {"ASmallFraction", SuccessIs("1e-300"), kTrue},
+      {"TooSmallAFraction", SuccessIs("1e-999"), kNotTrue},
+      {"BeyondAllNumbers", SuccessIs("1e999"), kNoJson},
+      {"TheLargestNumber", SuccessIs("18446744073709551615"), kTrue},
       {"Twice", "{\"success\":false,\"success\":true}", kTrue},
       {"TwiceTheOtherWay", "{\"success\":true,\"success\":false}", kNotTrue},
       {"AHundredThousandTimes", "{" + Repeated(100000, "\"success\":true,") + "\"success\":false}",
@@ -235,12 +235,12 @@ MATCHER_P(TellsOf, text, "") {
          ::testing::Value(arg.message, EndsWith("]\n"));
 }
 
-class JsonReplies : public ::testing::TestWithParam<JsonCase> {
+class JsonResponses : public ::testing::TestWithParam<JsonCase> {
  protected:
-  const std::string& Reply() const { return *GetParam().reply; }
+  const std::string& Response() const { return *GetParam().response; }
 
   // As the log shows it: a zero byte ends it.
-  std::string Shown() const { return Reply().c_str(); }
+  std::string Shown() const { return Response().c_str(); }
 };
 
 std::string NameOf(const ::testing::TestParamInfo<JsonCase>& test) {
@@ -253,12 +253,12 @@ std::string Served(const std::string& body) {
 
 }  // namespace
 
-TEST_P(JsonReplies, AreParsedAsTheTableSays) {
+TEST_P(JsonResponses, AreParsedAsTheTableSays) {
   const LogCapture log(3);
   int result = 1;
   RunOnSmallStack(kSmallStack, [&] {
     Json::Value value;
-    EXPECT_NO_THROW(result = JsonParse(Reply(), value));
+    EXPECT_NO_THROW(result = JsonParse(Response(), value));
   });
   EXPECT_EQ(result, GetParam().result);
   if (GetParam().result == kNoJson) {
@@ -268,9 +268,9 @@ TEST_P(JsonReplies, AreParsedAsTheTableSays) {
   }
 }
 
-TEST_P(JsonReplies, EndTheOneCallGetAsTheTableSays) {
+TEST_P(JsonResponses, EndTheOneCallGetAsTheTableSays) {
   const LogCapture log(3);
-  ScriptedPeer peer({Exchange(Served(Reply()))});
+  ScriptedPeer peer({Exchange(Served(Response()))});
   int result = 1;
   RunOnSmallStack(kSmallStack, [&] {
     Json::Value value;
@@ -282,11 +282,11 @@ TEST_P(JsonReplies, EndTheOneCallGetAsTheTableSays) {
                                                      : std::vector<std::string>{failed});
 }
 
-INSTANTIATE_TEST_SUITE_P(OfManyLevels, JsonReplies, ::testing::ValuesIn(DepthTable()), NameOf);
-INSTANTIATE_TEST_SUITE_P(OfOddShapes, JsonReplies, ::testing::ValuesIn(ShapeTable()), NameOf);
-INSTANTIATE_TEST_SUITE_P(WithOddStrings, JsonReplies, ::testing::ValuesIn(StringTable()), NameOf);
-INSTANTIATE_TEST_SUITE_P(WithOddNumbers, JsonReplies, ::testing::ValuesIn(NumberTable()), NameOf);
-INSTANTIATE_TEST_SUITE_P(WithSuccess, JsonReplies, ::testing::ValuesIn(SuccessTable()), NameOf);
+INSTANTIATE_TEST_SUITE_P(OfManyLevels, JsonResponses, ::testing::ValuesIn(DepthTable()), NameOf);
+INSTANTIATE_TEST_SUITE_P(OfOddShapes, JsonResponses, ::testing::ValuesIn(ShapeTable()), NameOf);
+INSTANTIATE_TEST_SUITE_P(WithOddStrings, JsonResponses, ::testing::ValuesIn(StringTable()), NameOf);
+INSTANTIATE_TEST_SUITE_P(WithOddNumbers, JsonResponses, ::testing::ValuesIn(NumberTable()), NameOf);
+INSTANTIATE_TEST_SUITE_P(WithSuccess, JsonResponses, ::testing::ValuesIn(SuccessTable()), NameOf);
 
 // A thread with a usual stack takes as many levels as the parser does.
 TEST(JsonLevels, OfAThousandAreTakenOnAUsualStack) {

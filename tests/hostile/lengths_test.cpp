@@ -12,15 +12,15 @@ namespace {
 
 constexpr char kReadFailed[] = "SendReqBySocketPost: Read data faild.\n";
 
-// The body of a reply, of which a SOAP request reads as much as the reply announces and anything
+// The body of a response, of which a SOAP request reads as much as the response announces and anything
 // else all of it, and libcurl what it makes of the length.
 struct LengthRow {
   const char* name;
   std::string lines;  // of the head
   std::string body;
-  std::string kept;  // what GetHttpContent gives
-  std::string soap;  // the reply; kFails when there is none
-  int curl_code;
+  std::string kept;  // what GetHttpContent returns
+  std::string soap;  // the response; kFails when there is none
+  CURLcode curl_code;
   std::string curl;
 };
 
@@ -38,59 +38,63 @@ std::string Lines(size_t count) {
 }
 
 const LengthRow kLengths[] = {
-    {"TheRightOne", Length("4"), "<a/>", "4", "<a/>", 0, "<a/>"},
-    {"NoLength", "", "<a/>", kNone, kFails, 0, "<a/>"},
+    {"TheRightOne", Length("4"), "<a/>", "4", "<a/>", CURLE_OK, "<a/>"},
+    {"NoLength", "", "<a/>", kNone, kFails, CURLE_OK, "<a/>"},
 
     // What is no number.
-    {"AText", Length("four"), "<a/>", "four", kFails, 8, ""},
-    {"ABlank", "Content-Length: \r\n", "<a/>", "", kFails, 8, ""},
-    {"ASignAlone", Length("-"), "<a/>", "-", kFails, 8, ""},
-    {"AHexadecimalNumber", Length("0x4"), "<a/>", "0x4", kFails, 0, ""},
-    {"ControlBytes", Length("\x01\x02"), "<a/>", "\x01\x02", kFails, 8, ""},
-    {"AZeroByte", Length("\0"s + "4"), "<a/>", "", kFails, 8, ""},
+    {"AText", Length("four"), "<a/>", "four", kFails, CURLE_WEIRD_SERVER_REPLY, ""},
+    {"ABlank", "Content-Length: \r\n", "<a/>", "", kFails, CURLE_WEIRD_SERVER_REPLY, ""},
+    {"ASignAlone", Length("-"), "<a/>", "-", kFails, CURLE_WEIRD_SERVER_REPLY, ""},
+    {"AHexadecimalNumber", Length("0x4"), "<a/>", "0x4", kFails, CURLE_OK, ""},
+    {"ControlBytes", Length("\x01\x02"), "<a/>", "\x01\x02", kFails, CURLE_WEIRD_SERVER_REPLY, ""},
+    {"AZeroByte", Length("\0"s + "4"), "<a/>", "", kFails, CURLE_WEIRD_SERVER_REPLY, ""},
 
     // Numbers with something around them.
-    {"APlusSign", Length("+4"), "<a/>", "+4", "<a/>", 0, "<a/>"},
-    {"BlanksAround", Length("   4   "), "<a/>", "4", "<a/>", 0, "<a/>"},
-    {"ATabInFront", Length("\t4"), "<a/>", "\t4", "<a/>", 0, "<a/>"},
-    {"ZerosInFront", Length("0004"), "<a/>", "0004", "<a/>", 0, "<a/>"},
+    {"APlusSign", Length("+4"), "<a/>", "+4", "<a/>", CURLE_OK, "<a/>"},
+    {"BlanksAround", Length("   4   "), "<a/>", "4", "<a/>", CURLE_OK, "<a/>"},
+    {"ATabInFront", Length("\t4"), "<a/>", "\t4", "<a/>", CURLE_OK, "<a/>"},
+    {"ZerosInFront", Length("0004"), "<a/>", "0004", "<a/>", CURLE_OK, "<a/>"},
     {"AThousandZerosInFront", Length(std::string(1000, '0') + "4"), "<a/>",
-     std::string(1000, '0') + "4", "<a/>", 0, "<a/>"},
-    {"LettersBehind", Length("4 bytes"), "<a/>", "4 bytes", "<a/>", 0, "<a/>"},
-    {"AFraction", Length("4.9"), "<a/>", "4.9", "<a/>", 0, "<a/>"},
-    {"AList", Length("4, 4"), "<a/>", "4, 4", "<a/>", 0, "<a/>"},
-    {"NoColon", "Content-Length 4\r\n", "<a/>", "4", "<a/>", 8, ""},
-    {"ALongerName", "Content-Lengths: 4\r\n", "<a/>", "4", "<a/>", 0, "<a/>"},
+     std::string(1000, '0') + "4", "<a/>", CURLE_OK, "<a/>"},
+    {"LettersBehind", Length("4 bytes"), "<a/>", "4 bytes", "<a/>", CURLE_OK, "<a/>"},
+    {"AFraction", Length("4.9"), "<a/>", "4.9", "<a/>", CURLE_OK, "<a/>"},
+    {"AList", Length("4, 4"), "<a/>", "4, 4", "<a/>", CURLE_OK, "<a/>"},
+    {"NoColon", "Content-Length 4\r\n", "<a/>", "4", "<a/>", CURLE_WEIRD_SERVER_REPLY, ""},
+    {"ALongerName", "Content-Lengths: 4\r\n", "<a/>", "4", "<a/>", CURLE_OK, "<a/>"},
 
     // Numbers out of range.
-    {"Zero", Length("0"), "<a/>", "0", kFails, 0, ""},
-    {"MinusZero", Length("-0"), "<a/>", "-0", kFails, 8, ""},
-    {"Negative", Length("-4"), "<a/>", "-4", kFails, 8, ""},
+    {"Zero", Length("0"), "<a/>", "0", kFails, CURLE_OK, ""},
+    {"MinusZero", Length("-0"), "<a/>", "-0", kFails, CURLE_WEIRD_SERVER_REPLY, ""},
+    {"Negative", Length("-4"), "<a/>", "-4", kFails, CURLE_WEIRD_SERVER_REPLY, ""},
     {"NegativeBeyond64Bits", Length("-9223372036854775812"), "<a/>", "-9223372036854775812", kFails,
-     8, ""},
-    {"AlmostAllOf31Bits", Length("2147483646"), "<a/>", "2147483646", "<a/>", 18, "<a/>"},
-    {"AllOf31Bits", Length("2147483647"), "<a/>", "2147483647", kFails, 18, "<a/>"},
-    {"Beyond31Bits", Length("2147483652"), "<a/>", "2147483652", kFails, 18, "<a/>"},
-    {"Beyond32Bits", Length("4294967300"), "<a/>", "4294967300", kFails, 18, "<a/>"},
-    {"AllOf63Bits", Length("9223372036854775807"), "<a/>", "9223372036854775807", kFails, 18,
+     CURLE_WEIRD_SERVER_REPLY, ""},
+    {"AlmostAllOf31Bits", Length("2147483646"), "<a/>", "2147483646", "<a/>", CURLE_PARTIAL_FILE,
      "<a/>"},
-    {"Beyond64Bits", Length("18446744073709551620"), "<a/>", "18446744073709551620", kFails, 0,
+    {"AllOf31Bits", Length("2147483647"), "<a/>", "2147483647", kFails, CURLE_PARTIAL_FILE, "<a/>"},
+    {"Beyond31Bits", Length("2147483652"), "<a/>", "2147483652", kFails, CURLE_PARTIAL_FILE,
      "<a/>"},
-    {"AThousandDigits", Length(std::string(1000, '4')), "<a/>", std::string(1000, '4'), kFails, 0,
+    {"Beyond32Bits", Length("4294967300"), "<a/>", "4294967300", kFails, CURLE_PARTIAL_FILE,
      "<a/>"},
+    {"AllOf63Bits", Length("9223372036854775807"), "<a/>", "9223372036854775807", kFails,
+     CURLE_PARTIAL_FILE, "<a/>"},
+    {"Beyond64Bits", Length("18446744073709551620"), "<a/>", "18446744073709551620", kFails,
+     CURLE_OK, "<a/>"},
+    {"AThousandDigits", Length(std::string(1000, '4')), "<a/>", std::string(1000, '4'), kFails,
+     CURLE_OK, "<a/>"},
 
     // Several lines: the first counts.
-    {"TwiceTheSame", Length("4") + Length("4"), "<a/>", "4", "<a/>", 0, "<a/>"},
-    {"ASmallerOneFirst", Length("2") + Length("4"), "<a/>", "2", "<a", 0, "<a/>"},
-    {"ALargerOneFirst", Length("4") + Length("2"), "<a/>", "4", "<a/>", 0, "<a"},
-    {"ATextFirst", Length("four") + Length("4"), "<a/>", "four", kFails, 8, ""},
-    {"AsTheLastLineThatIsRead", Lines(28) + Length("4"), "<a/>", "4", "<a/>", 0, "<a/>"},
+    {"TwiceTheSame", Length("4") + Length("4"), "<a/>", "4", "<a/>", CURLE_OK, "<a/>"},
+    {"ASmallerOneFirst", Length("2") + Length("4"), "<a/>", "2", "<a", CURLE_OK, "<a/>"},
+    {"ALargerOneFirst", Length("4") + Length("2"), "<a/>", "4", "<a/>", CURLE_OK, "<a"},
+    {"ATextFirst", Length("four") + Length("4"), "<a/>", "four", kFails, CURLE_WEIRD_SERVER_REPLY,
+     ""},
+    {"AsTheLastLineThatIsRead", Lines(28) + Length("4"), "<a/>", "4", "<a/>", CURLE_OK, "<a/>"},
 
     // Lengths that lie.
-    {"LargerThanTheBody", Length("100"), "<a/>", "100", "<a/>", 18, "<a/>"},
-    {"SmallerThanTheBody", Length("2"), "<a/>", "2", "<a", 0, "<a"},
-    {"AByteMoreThanTheBody", Length("5"), "<a/>", "5", "<a/>", 18, "<a/>"},
-    {"ABodyWithAZeroByte", Length("4"), "<a\0b"s, "4", "<a", 0, "<a\0b"s},
+    {"LargerThanTheBody", Length("100"), "<a/>", "100", "<a/>", CURLE_PARTIAL_FILE, "<a/>"},
+    {"SmallerThanTheBody", Length("2"), "<a/>", "2", "<a", CURLE_OK, "<a"},
+    {"AByteMoreThanTheBody", Length("5"), "<a/>", "5", "<a/>", CURLE_PARTIAL_FILE, "<a/>"},
+    {"ABodyWithAZeroByte", Length("4"), "<a\0b"s, "4", "<a", CURLE_OK, "<a\0b"s},
 };
 
 Outcome GetAndReadBody(ClientProbe& client) {
@@ -101,9 +105,9 @@ Outcome GetAndReadBody(ClientProbe& client) {
 }
 
 Outcome Soap(ClientProbe& client) {
-  std::string reply = kFails;
-  const int result = client.SendReqBySocketPost("<a/>", reply);
-  return OutcomeOf(client, result, reply);
+  std::string response = kFails;
+  const int result = client.SendReqBySocketPost("<a/>", response);
+  return OutcomeOf(client, result, response);
 }
 
 // The text tells whether there is a document.
@@ -123,27 +127,29 @@ Outcome CurlGet(int port) {
   return OutcomeOf(client, result, client.m_strCurlText);
 }
 
-std::string Reply(const std::string& lines, const std::string& body) {
+std::string Response(const std::string& lines, const std::string& body) {
   return "HTTP/1.1 200 OK\r\n" + lines + "\r\n" + body;
 }
 
-std::vector<ReplyScenario> BodyTable() {
-  std::vector<ReplyScenario> table;
+std::vector<ResponseScenario> BodyTable() {
+  std::vector<ResponseScenario> table;
   for (const LengthRow& row : kLengths) {
-    table.push_back({row.name,
-                     Reply(row.lines, row.body),
-                     GetAndReadBody,
-                     {0, 0, 200, row.kept + ": " + row.body}});
+    table.push_back({row.name, Response(row.lines, row.body), GetAndReadBody,
+                     Success(row.kept + ": " + row.body)});
   }
   return table;
 }
 
-std::vector<ReplyScenario> SoapTable() {
-  std::vector<ReplyScenario> table;
+std::vector<ResponseScenario> SoapTable() {
+  std::vector<ResponseScenario> table;
   for (const LengthRow& row : kLengths) {
     const int result = row.soap == kFails ? HTTP_RET_IO_ERROR : HTTP_RET_OK;
-    table.push_back(
-        {row.name, Reply(row.lines, row.body), Soap, {result, 0, 200, row.soap}, {}, true});
+    table.push_back({row.name,
+                     Response(row.lines, row.body),
+                     Soap,
+                     {result, HTTP_RET_OK, 200, row.soap},
+                     {},
+                     true});
   }
   return table;
 }
@@ -151,63 +157,68 @@ std::vector<ReplyScenario> SoapTable() {
 std::vector<Scenario> CurlTable() {
   std::vector<Scenario> table;
   for (const LengthRow& row : kLengths) {
-    const int result = row.curl_code == 0 ? HTTP_RET_OK : HTTP_RET_IO_ERROR;
+    const int result = row.curl_code == CURLE_OK ? HTTP_RET_OK : HTTP_RET_IO_ERROR;
     std::vector<std::string> log;
-    if (row.curl_code != 0) {
+    if (row.curl_code != CURLE_OK) {
       log.push_back("SendRequestByCurl: Failed to make http connection, return value=" +
                     std::to_string(row.curl_code) + "\n");
     }
-    const Script script = {ExpectRequest(), Offer(Reply(row.lines, row.body)), Close()};
+    const Script script = {ExpectRequest(), SendWhileRead(Response(row.lines, row.body)), Close()};
     table.push_back({row.name, {script}, CurlGet, {result, result, 0, row.curl}, log});
   }
   return table;
 }
 
 // Heads that end the reading, and bodies that end before they begin.
-const ReplyScenario kOthers[] = {
+const ResponseScenario kOthers[] = {
     {"NoValueForABody",
-     Reply("Content-Length:\r\n", "<a/>"),
+     Response("Content-Length:\r\n", "<a/>"),
      GetAndReadBody,
-     {3, 1, 200, "(none): "},
+     {HTTP_RET_IO_ERROR, HTTP_RET_NOT_READY, 200, "(none): "},
      {"ReadBody: Read data error\n"}},
-    {"NoValueForSoap", Reply("Content-Length:\r\n", "<a/>"), Soap, {3, 1, 200, kFails}},
-    {"AFoldedValueForSoap", Reply("Content-Length:\r\n 4\r\n", "<a/>"), Soap, {3, 1, 200, kFails}},
-    {"BeyondTheLastLineForSoap", Reply(Lines(30) + Length("4"), "<a/>"), Soap, {3, 0, 200, kFails}},
-    {"BeyondTheLastLineForABody",
-     Reply(Lines(30) + Length("4"), "<a/>"),
-     GetAndReadBody,
-     {0, 0, 200, "(none): Content-Length: 4\r\n\r\n<a/>"}},
-    {"NoBodyForSoap", Reply(Length("4"), ""), Soap, {3, 0, 200, kFails}, {kReadFailed}},
-    {"NoBodyOf2GibibytesForSoap",
-     Reply(Length("2147483646"), ""),
+    {"NoValueForSoap",
+     Response("Content-Length:\r\n", "<a/>"),
      Soap,
-     {3, 0, 200, kFails},
+     {HTTP_RET_IO_ERROR, HTTP_RET_NOT_READY, 200, kFails}},
+    {"AFoldedValueForSoap",
+     Response("Content-Length:\r\n 4\r\n", "<a/>"),
+     Soap,
+     {HTTP_RET_IO_ERROR, HTTP_RET_NOT_READY, 200, kFails}},
+    {"BeyondTheLastLineForSoap", Response(Lines(30) + Length("4"), "<a/>"), Soap,
+     BodyFailed(kFails)},
+    {"BeyondTheLastLineForABody", Response(Lines(30) + Length("4"), "<a/>"), GetAndReadBody,
+     Success("(none): Content-Length: 4\r\n\r\n<a/>")},
+    {"NoBodyForSoap", Response(Length("4"), ""), Soap, BodyFailed(kFails), {kReadFailed}},
+    {"NoBodyOf2GibibytesForSoap",
+     Response(Length("2147483646"), ""),
+     Soap,
+     BodyFailed(kFails),
      {kReadFailed}},
-    {"ABodyOfAZeroByteForSoap", Reply(Length("1"), "\0"s), Soap, {0, 0, 200, ""}},
+    {"ABodyOfAZeroByteForSoap", Response(Length("1"), "\0"s), Soap, Success("")},
     {"AnErrorsBodyForSoap",
      "HTTP/1.1 500 No\r\nContent-Length: 4\r\n\r\n<a/>",
      Soap,
-     {0, 5, 500, "<a/>"},
+     Sent(HTTP_RET_BAD_RESPONSE, 500, "<a/>"),
      {},
      true},
-    {"TheRightOneForXml", Reply(Length("4"), "<a/>"), XmlSoap, {0, 0, 200, "a document"}, {}, true},
+    {"TheRightOneForXml", Response(Length("4"), "<a/>"), XmlSoap, Success("a document"), {}, true},
     {"SmallerThanTheBodyForXml",
-     Reply(Length("3"), "<a/>"),
+     Response(Length("3"), "<a/>"),
      XmlSoap,
-     {0, 0, 200, "no document"},
+     Success("no document"),
      {},
      true},
-    {"NegativeForXml", Reply(Length("-4"), "<a/>"), XmlSoap, {3, 0, 200, kFails}},
+    {"NegativeForXml", Response(Length("-4"), "<a/>"), XmlSoap, BodyFailed(kFails)},
 };
 
 Outcome JsonGet(int port) {
   Json::Value value = "untouched";
   const int result = SendHttpGet("127.0.0.1", port, "a.cgi", value, 5, true);
-  return {result, 0, 0, value.toStyledString()};
+  return OneCall(result, value.toStyledString());
 }
 
-Script Answer(const std::string& reply) {
-  return {ExpectRequest(), Offer(reply), Close()};
+Script Answer(const std::string& response) {
+  return {ExpectRequest(), SendWhileRead(response), Close()};
 }
 
 const char kJson[] = "{\"success\":true}";
@@ -215,27 +226,27 @@ const char kJsonShown[] = "{\n\t\"success\" : true\n}\n";
 
 const Scenario kJsonTable[] = {
     {"SmallerThanTheBodyForJson",
-     {Answer(Reply(Length("2"), kJson))},
+     {Answer(Response(Length("2"), kJson))},
      JsonGet,
-     {0, 0, 0, kJsonShown}},
+     OneCall(0, kJsonShown)},
     {"LargerThanTheBodyForJson",
-     {Answer(Reply(Length("2000"), kJson))},
+     {Answer(Response(Length("2000"), kJson))},
      JsonGet,
-     {0, 0, 0, kJsonShown}},
-    {"NegativeForJson", {Answer(Reply(Length("-1"), kJson))}, JsonGet, {0, 0, 0, kJsonShown}},
+     OneCall(0, kJsonShown)},
+    {"NegativeForJson", {Answer(Response(Length("-1"), kJson))}, JsonGet, OneCall(0, kJsonShown)},
     {"NoValueForJson",
-     {Answer(Reply("Content-Length:\r\n", kJson))},
+     {Answer(Response("Content-Length:\r\n", kJson))},
      JsonGet,
-     {-1, 0, 0, "\"untouched\"\n"},
+     OneCall(-1, "\"untouched\"\n"),
      {"SendHttpGet: Failed to check response[200]: 1\n"}},
     {"NoBodyForJson",
-     {Answer(Reply(Length("16"), ""))},
+     {Answer(Response(Length("16"), ""))},
      JsonGet,
-     {-1, 0, 0, "\"untouched\"\n"},
+     OneCall(-1, "\"untouched\"\n"),
      {"SendHttpGet: Read Buffer Error\n"}},
 };
 
-// A SOAP reply of more than a mebibyte is read as it comes, and whole.
+// A SOAP response of more than a mebibyte is read as it comes, and whole.
 Outcome SoapOfAnySize(int port) {
   ClientProbe client(port);
   return Soap(client);
@@ -245,35 +256,35 @@ const std::string kLarge(3 << 20, 'x');
 
 const Scenario kLargeTable[] = {
     {"ALargeBodyForSoap",
-     {Answer(Reply(Length(std::to_string(kLarge.size())), kLarge))},
+     {Answer(Response(Length(std::to_string(kLarge.size())), kLarge))},
      SoapOfAnySize,
-     {0, 0, 200, kLarge}},
+     Success(kLarge)},
     {"HalfOfALargeBodyForSoap",
-     {Answer(Reply(Length(std::to_string(2 * kLarge.size())), kLarge))},
+     {Answer(Response(Length(std::to_string(2 * kLarge.size())), kLarge))},
      SoapOfAnySize,
-     {0, 0, 200, kLarge}},
+     Success(kLarge)},
     {"MuchMoreThanALargeBodyForSoap",
-     {Answer(Reply(Length("2147483646"), kLarge))},
+     {Answer(Response(Length("2147483646"), kLarge))},
      SoapOfAnySize,
-     {0, 0, 200, kLarge}},
+     Success(kLarge)},
 };
 
 }  // namespace
 
-class Lengths : public ::testing::TestWithParam<ReplyScenario> {};
+class Lengths : public ::testing::TestWithParam<ResponseScenario> {};
 
 TEST_P(Lengths, EndAsTheTableSays) {
-  PlayReply(GetParam());
+  RunInEachWay(GetParam());
 }
 
-INSTANTIATE_TEST_SUITE_P(ReadBody, Lengths, ::testing::ValuesIn(BodyTable()), ReplyName);
-INSTANTIATE_TEST_SUITE_P(Soap, Lengths, ::testing::ValuesIn(SoapTable()), ReplyName);
-INSTANTIATE_TEST_SUITE_P(Others, Lengths, ::testing::ValuesIn(kOthers), ReplyName);
+INSTANTIATE_TEST_SUITE_P(ReadBody, Lengths, ::testing::ValuesIn(BodyTable()), ResponseName);
+INSTANTIATE_TEST_SUITE_P(Soap, Lengths, ::testing::ValuesIn(SoapTable()), ResponseName);
+INSTANTIATE_TEST_SUITE_P(Others, Lengths, ::testing::ValuesIn(kOthers), ResponseName);
 
 class LengthReaders : public ::testing::TestWithParam<Scenario> {};
 
 TEST_P(LengthReaders, EndAsTheTableSays) {
-  PlayScenario(GetParam());
+  RunScenario(GetParam());
 }
 
 INSTANTIATE_TEST_SUITE_P(Curl, LengthReaders, ::testing::ValuesIn(CurlTable()), ScenarioName);

@@ -1,7 +1,7 @@
 // The server's side of TLS, record by record, for scripts of a plain scripted peer.
 //
 //   const auto tls = std::make_shared<ServerTls>(TLS1_3_VERSION);
-//   ScriptedPeer peer({{SendRecords(tls, 1), Reset()}});  // resets behind its ServerHello
+//   ScriptedPeer peer({{SendRecords(tls, 1), Reset()}});  // resets after its ServerHello
 #ifndef TARNWICK_TESTS_HOSTILE_SERVER_TLS_H_
 #define TARNWICK_TESTS_HOSTILE_SERVER_TLS_H_
 
@@ -100,7 +100,7 @@ class ServerTls {
     return output;
   }
 
-  // A record of TLS 1.2 as it travels behind the handshake, whatever its type and content.
+  // A record of TLS 1.2 as it travels after the handshake, whatever its type and content.
   std::string Encrypted(int type, const std::string& content) {
     if (key_.empty()) DeriveKey();
     const std::string sequence = BigEndian(sequence_++, 8);
@@ -238,7 +238,7 @@ inline Step FinishHandshake(const SharedTls& tls) {
   });
 }
 
-// Reads, behind the handshake, up to the end of a request's head.
+// Reads, after the handshake, up to the end of a request's head.
 inline Step ExpectTlsRequest(const SharedTls& tls) {
   return RawStep("ExpectTlsRequest()", [tls](PeerConnection& peer, std::string* error) {
     std::string request;
@@ -252,7 +252,7 @@ inline Step ExpectTlsRequest(const SharedTls& tls) {
   });
 }
 
-// Sends what `make` gives at the time.
+// Sends what `make` returns at the time.
 inline Step SendMade(const SharedTls& tls, std::function<std::string(ServerTls&)> make) {
   return RawStep("SendMade()", [tls, make](PeerConnection& peer, std::string*) {
     return peer.SendRaw(make(*tls));

@@ -1,18 +1,10 @@
 // Servers whose XML is meant to open files, to reach other hosts, to fill memory or to break the
-// parser: in SOAP replies, of which line ends are removed first, and in replies to XML requests.
+// parser: in SOAP responses, of which CR and LF are removed first, and in responses to XML requests.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <libxml/parser.h>
 #include <libxml/tree.h>
-#include <malloc.h>
-#include <poll.h>
-#include <sys/inotify.h>
-#include <sys/socket.h>
-#include <unistd.h>
 
-#include <atomic>
-#include <cstdlib>
-#include <cstring>
 #include <memory>
 #include <string>
 #include <thread>
@@ -20,105 +12,11 @@
 #include <vector>
 
 #include "tests/hostile/hostile_util.h"
-#include "tests/support/files.h"
-#include "tests/support/ports.h"
+#include "tests/hostile/xml_canaries.h"
 
 namespace {
 
-// Counts what libxml2 holds.
-std::atomic<long> held{0};
-std::atomic<long> most_held{0};
-
-void Hold(void* block) {
-  const long now = held += static_cast<long>(malloc_usable_size(block));
-  long most = most_held;
-  while (now > most && !most_held.compare_exchange_weak(most, now)) {
-  }
-}
-
-void LetGo(void* block) {
-  if (block != nullptr) held -= static_cast<long>(malloc_usable_size(block));
-}
-
-void CountedFree(void* block) {
-  LetGo(block);
-  free(block);
-}
-
-void* CountedMalloc(size_t size) {
-  void* const block = malloc(size);
-  if (block != nullptr) Hold(block);
-  return block;
-}
-
-void* CountedRealloc(void* block, size_t size) {
-  LetGo(block);
-  void* const grown = realloc(block, size);
-  if (grown != nullptr) Hold(grown);
-  return grown;
-}
-
-char* CountedStrdup(const char* text) {
-  char* const copy = strdup(text);
-  if (copy != nullptr) Hold(copy);
-  return copy;
-}
-
 void SayNothing(void*, const char*, ...) {}
-
-// A file and a port that nobody may touch.
-class Canaries {
- public:
-  Canaries() : watch_(inotify_init1(IN_NONBLOCK | IN_CLOEXEC)), listener_(BindLoopback(&port_)) {
-    WriteFile(File(), "<!ENTITY canary 'sang'><!ELEMENT a ANY>");
-    EXPECT_GE(inotify_add_watch(watch_, folder_.Path().c_str(), IN_OPEN | IN_ACCESS), 0);
-    EXPECT_EQ(listen(listener_, 16), 0);
-  }
-
-  ~Canaries() {
-    close(watch_);
-    close(listener_);
-  }
-
-  Canaries(const Canaries&) = delete;
-  Canaries& operator=(const Canaries&) = delete;
-
-  std::string File() const { return folder_.File("canary.dtd"); }
-  std::string Url() const { return "http://127.0.0.1:" + std::to_string(port_) + "/canary.dtd"; }
-
-  bool FileWasOpened() const { return IsReadable(watch_); }
-  bool PortWasConnected() const { return IsReadable(listener_); }
-
-  // Waits for a connection and closes it. Results: false when none came.
-  bool RefuseConnection() const {
-    pollfd waiting = {listener_, POLLIN, 0};
-    if (poll(&waiting, 1, 10000) <= 0) return false;
-    return close(accept(listener_, nullptr, nullptr)) == 0;
-  }
-
-  // The document with the canaries' names in place of FILE and URL.
-  std::string Named(std::string document) const {
-    Replace(&document, "FILE", "file://" + File());
-    Replace(&document, "PATH", File());
-    Replace(&document, "URL", Url());
-    return document;
-  }
-
- private:
-  static bool IsReadable(int fd) {
-    pollfd waiting = {fd, POLLIN, 0};
-    return poll(&waiting, 1, 0) > 0;
-  }
-
-  static void Replace(std::string* text, const std::string& mark, const std::string& by) {
-    for (size_t i; (i = text->find(mark)) != std::string::npos;) text->replace(i, mark.size(), by);
-  }
-
-  TempDir folder_;
-  int port_ = 0;
-  int watch_;
-  int listener_;
-};
 
 enum class Parsed { kByBoth, kByNone, kByRestAlone, kBySoapAlone };
 
@@ -417,7 +315,7 @@ class Xml : public ::testing::TestWithParam<XmlCase> {
     EXPECT_LE(held - before_, 65536) << "what libxml2 keeps for its next document";
   }
 
-  std::string Reply() const {
+  std::string Response() const {
     return "HTTP/1.1 200 OK\r\nContent-Length: " + std::to_string(document_.size()) + "\r\n\r\n" +
            document_;
   }
@@ -443,8 +341,8 @@ std::string NameOf(const ::testing::TestParamInfo<XmlCase>& test) {
 
 }  // namespace
 
-TEST_P(Xml, OfASoapReplyIsParsedOrNotAsTheTableSays) {
-  ScriptedPeer peer({Exchange(Reply())});
+TEST_P(Xml, OfASoapResponseIsParsedOrNotAsTheTableSays) {
+  ScriptedPeer peer({Exchange(Response())});
   RunOnSmallStack(kSmallStack, [&] {
     xmlSetGenericErrorFunc(nullptr, SayNothing);
     xmlDoc* doc = nullptr;
@@ -455,11 +353,11 @@ TEST_P(Xml, OfASoapReplyIsParsedOrNotAsTheTableSays) {
   });
 }
 
-TEST_P(Xml, OfAReplyToAnXmlGetIsParsedOrNotAsTheTableSays) {
+TEST_P(Xml, OfAResponseToAnXmlGetIsParsedOrNotAsTheTableSays) {
   const LogCapture log(5);
   const bool parsed =
       GetParam().parsed == Parsed::kByBoth || GetParam().parsed == Parsed::kByRestAlone;
-  ScriptedPeer peer({Exchange(Reply())});
+  ScriptedPeer peer({Exchange(Response())});
   RunOnSmallStack(kSmallStack, [&] {
     xmlSetGenericErrorFunc(nullptr, SayNothing);
     xmlDoc* doc = nullptr;

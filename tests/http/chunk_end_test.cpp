@@ -10,7 +10,7 @@ using Calls = std::vector<std::string>;
 // A client that has read the head of a chunked response.
 class ChunkClient : public TWHttpClient {
  public:
-  ChunkClient(bool buffered, std::vector<IoAnswer> reads)
+  ChunkClient(bool buffered, std::vector<IoResult> reads)
       : socket(new ScriptedSocket(buffered, std::move(reads))) {
     m_pSocket = socket;
     m_connState = 2;
@@ -37,37 +37,38 @@ Calls BufferedReads(size_t count) {
   return calls;
 }
 
-std::vector<IoAnswer> Then(std::vector<IoAnswer> reads, const std::vector<IoAnswer>& more) {
+std::vector<IoResult> Then(std::vector<IoResult> reads, const std::vector<IoResult>& more) {
   reads.insert(reads.end(), more.begin(), more.end());
   return reads;
 }
 
 TEST(ChunkEnd, InBufferedModeAFailureAfterItsFirstByteIsNotFollowedByAnotherRead) {
-  ChunkClient client(true, Then({Gives("3\r\nold\r"), Fails(EAGAIN)}, Times(7, Fails(EAGAIN))));
+  ChunkClient client(true, Then({Returns("3\r\nold\r"), Fails(EAGAIN)}, Times(7, Fails(EAGAIN))));
   EXPECT_EQ(client.Body(), "old");
   EXPECT_EQ(client.socket->calls, BufferedReads(9));  // the buffer, its end, the next size line
 }
 
 TEST(ChunkEnd, InBufferedModeTheByteThatComesAfterAFailureBeginsTheNextSizeLine) {
-  ChunkClient client(true, {Gives("3\r\nold\r"), Fails(EAGAIN), Gives("\n3\r\nnew\r\n0\r\n")});
+  ChunkClient client(true, {Returns("3\r\nold\r"), Fails(EAGAIN), Returns("\n3\r\nnew\r\n0\r\n")});
   EXPECT_EQ(client.Body(), "old");
   EXPECT_EQ(client.socket->Unread(), "3\r\nnew\r\n0\r\n");
 }
 
 TEST(ChunkEnd, InBufferedModeTheEndOfTheStreamAfterItsFirstByteIsReadOnceMoreForTheSizeAlone) {
-  ChunkClient client(true, {Gives("3\r\nold\r"), Ends(), Ends()});
+  ChunkClient client(true, {Returns("3\r\nold\r"), Ends(), Ends()});
   EXPECT_EQ(client.Body(), "old");
   EXPECT_EQ(client.socket->calls, BufferedReads(3));
 }
 
 TEST(ChunkEnd, InBufferedModeItsBytesMayComeInTwoPieces) {
-  ChunkClient client(true, {Gives("3\r\nold\r"), Gives("\n3\r\nnew"), Gives("\r\n0\r\n")});
+  ChunkClient client(true, {Returns("3\r\nold\r"), Returns("\n3\r\nnew"), Returns("\r\n0\r\n")});
   EXPECT_EQ(client.Body(), "oldnew");
 }
 
 TEST(ChunkEnd, InDirectModeAFirstReadOfOneByteIsFollowedByOneMore) {
-  ChunkClient client(false, {Gives("3"), Gives("\r"), Gives("\n"), Gives("old"), Gives("\r"),
-                             Gives("\n"), Gives("0"), Gives("\r"), Gives("\n")});
+  ChunkClient client(false,
+                     {Returns("3"), Returns("\r"), Returns("\n"), Returns("old"), Returns("\r"),
+                      Returns("\n"), Returns("0"), Returns("\r"), Returns("\n")});
   EXPECT_EQ(client.Body(), "old");
   Calls expected;
   for (const char* len : {"1", "1", "1", "3", "2", "1", "1", "1", "1"}) {
@@ -78,9 +79,9 @@ TEST(ChunkEnd, InDirectModeAFirstReadOfOneByteIsFollowedByOneMore) {
 }
 
 TEST(ChunkEnd, InDirectModeAFirstReadThatDeliversNothingIsNotFollowedByAnother) {
-  for (const IoAnswer& nothing : {Fails(EAGAIN), Ends()}) {
-    ChunkClient client(false, {Gives("3"), Gives("\r"), Gives("\n"), Gives("old"), nothing,
-                               Gives("\n"), Gives("3")});
+  for (const IoResult& nothing : {Fails(EAGAIN), Ends()}) {
+    ChunkClient client(false, {Returns("3"), Returns("\r"), Returns("\n"), Returns("old"), nothing,
+                               Returns("\n"), Returns("3")});
     std::string body;
     EXPECT_EQ(client.ReadBody(body), HTTP_RET_OK);
     EXPECT_EQ(body, "old");

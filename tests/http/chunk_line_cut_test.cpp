@@ -1,15 +1,15 @@
-// Size lines of chunks whose length is near that of the buffers they are read into. All of a reply
+// Size lines of chunks whose length is near that of the buffers they are read into. All of a response
 // is buffered at once, so that nothing but the line's length decides.
 #include "tests/http/http_test_util.h"
 #include "tests/net/net_test_util.h"
 
 namespace {
 
-// A client behind a head, whose body comes with one read.
+// A client after a head, whose body comes with one read.
 class BufferedClient : public TWHttpClient {
  public:
   explicit BufferedClient(const std::string& text) {
-    m_pSocket = new ScriptedSocket(true, {Gives(text)});
+    m_pSocket = new ScriptedSocket(true, {Returns(text)});
     m_connState = 2;
     m_strTransferEncoding = "chunked";
   }

@@ -9,7 +9,7 @@ using namespace tarnwick;
 
 using namespace std::string_literals;
 
-TEST(ParseChunkSize, AnExtensionDoesNotCount) {
+TEST(ParseChunkSize, AnExtensionIsIgnored) {
   EXPECT_EQ(ParseChunkSize("1A;ext=1"), 26u);
   EXPECT_EQ(ParseChunkSize("1A ;ext=1"), 26u);
   EXPECT_EQ(ParseChunkSize("a;"), 10u);
@@ -54,6 +54,6 @@ TEST(ParseChunkSize, ThirtyTwoBitsAreUnsignedAndHigherOnesAreLost) {
   EXPECT_EQ(ParseChunkSize(std::string(30, 'f') + "12345678"), 0x12345678u);
 }
 
-TEST(ParseChunkSize, LeadingZerosOfAnyNumberCountNothing) {
+TEST(ParseChunkSize, AnyNumberOfLeadingZerosIsIgnored) {
   EXPECT_EQ(ParseChunkSize(std::string(5000, '0') + "2"), 2u);
 }

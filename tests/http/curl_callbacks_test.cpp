@@ -78,7 +78,7 @@ TEST(CurlStringWrite, MoreThanAStringHoldsEndsTheTransferWithoutAnException) {
   EXPECT_EQ(text, "x");
 }
 
-TEST(CurlFileWrite, GivesTheItemsThatTheFileTook) {
+TEST(CurlFileWrite, ReturnsTheItemsThatTheFileTook) {
   const File file(tmpfile());
   char bytes[] = "abcdef";
   EXPECT_EQ(CurlFileWrite(bytes, 2, 3, file.get()), 3u);
@@ -86,13 +86,13 @@ TEST(CurlFileWrite, GivesTheItemsThatTheFileTook) {
   EXPECT_EQ(ContentOf(file.get()), "abcdefa");
 }
 
-TEST(CurlFileWrite, AFileThatTakesNothingGivesZero) {
+TEST(CurlFileWrite, AFileThatTakesNothingReturnsZero) {
   const File file(fopen("/dev/null", "re"));
   char bytes[] = "abc";
   EXPECT_EQ(CurlFileWrite(bytes, 1, 3, file.get()), 0u);
 }
 
-TEST(CurlFileRead, GivesTheItemsThatTheFileHad) {
+TEST(CurlFileRead, ReturnsTheItemsThatTheFileHad) {
   const File file(tmpfile());
   fputs("abcde", file.get());
   rewind(file.get());
@@ -104,7 +104,7 @@ TEST(CurlFileRead, GivesTheItemsThatTheFileHad) {
   EXPECT_EQ(CurlFileRead(bytes, 1, 4, file.get()), 0u);
 }
 
-TEST(CurlBufferWrite, AppendsAndKeepsAZeroByteBehind) {
+TEST(CurlBufferWrite, AppendsAndKeepsAZeroByteAfterTheData) {
   OwnedBuffer buffer;
   EXPECT_EQ(buffer.Append("abc"), 3u);
   EXPECT_EQ(buffer.size, 3u);
@@ -115,7 +115,7 @@ TEST(CurlBufferWrite, AppendsAndKeepsAZeroByteBehind) {
   EXPECT_STREQ(buffer.data, "abcdefg");
 }
 
-TEST(CurlBufferWrite, AnEmptyPieceMakesAnEmptyText) {
+TEST(CurlBufferWrite, AnEmptyPieceMakesAnEmptyString) {
   OwnedBuffer buffer;
   EXPECT_EQ(buffer.Append(""), 0u);
   ASSERT_NE(buffer.data, nullptr);
@@ -199,7 +199,7 @@ TEST(CurlHeaderToFile, EachLineIsFlushed) {
   EXPECT_STREQ(seen, line);
 }
 
-TEST(CurlHeaderToFile, ItGivesWhatTheFileTookAndBytesForASkippedLine) {
+TEST(CurlHeaderToFile, ItReturnsWhatTheFileTookAndBytesForASkippedLine) {
   const File readable(fopen("/dev/null", "re"));
   char line[] = "A: b\r\n";
   EXPECT_EQ(CurlHeaderToFile(line, 1, 6, readable.get()), 0u);

@@ -41,11 +41,11 @@ bool IsInheritedConnection(int fd) {
 
 int InheritedConnections() {
   int count = 0;
-  DIR* const folder = opendir("/proc/self/fd");
-  while (const dirent* entry = readdir(folder)) {
+  DIR* const directory = opendir("/proc/self/fd");
+  while (const dirent* entry = readdir(directory)) {
     if (IsInheritedConnection(std::atoi(entry->d_name))) ++count;
   }
-  closedir(folder);
+  closedir(directory);
   return count;
 }
 

@@ -1,11 +1,8 @@
 // Basic and Digest authorization lines.
-#define OPENSSL_SUPPRESS_DEPRECATED
 #include "tarnwick/http/digest.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <openssl/evp.h>
-#include <openssl/md5.h>
 #include <sys/time.h>
 #include <unistd.h>
 
@@ -13,6 +10,7 @@
 #include <stdexcept>
 
 #include "tests/http/http_test_util.h"
+#include "tests/model/digest.h"
 #include "tests/support/faults.h"
 
 using namespace tarnwick;
@@ -23,36 +21,6 @@ using ::testing::EndsWith;
 using ::testing::HasSubstr;
 using ::testing::MatchesRegex;
 using ::testing::Not;
-
-std::string Hex(const unsigned char* digest) {
-  static const char digits[] = "0123456789abcdef";
-  std::string hex;
-  for (int i = 0; i < 16; ++i) {
-    hex += digits[digest[i] >> 4];
-    hex += digits[digest[i] & 15];
-  }
-  return hex;
-}
-
-std::string Md5(const std::string& text) {
-  unsigned char digest[EVP_MAX_MD_SIZE];
-  EXPECT_EQ(EVP_Digest(text.data(), text.size(), digest, nullptr, EVP_md5(), nullptr), 1);
-  return Hex(digest);
-}
-
-// The chain of qop "auth-int": a finished context that is fed its own digest and finished again.
-std::string AuthIntHa2(const std::string& method, const std::string& uri) {
-  MD5_CTX context;
-  unsigned char digest[MD5_DIGEST_LENGTH];
-  const std::string start = method + ":" + uri;
-  MD5_Init(&context);
-  MD5_Update(&context, start.data(), start.size());
-  MD5_Final(digest, &context);
-  const std::string more = ":" + Hex(digest);
-  MD5_Update(&context, more.data(), more.size());
-  MD5_Final(digest, &context);
-  return Hex(digest);
-}
 
 DIGEST_ACCESS_AUTH SampleLogin() {
   DIGEST_ACCESS_AUTH login;
@@ -91,12 +59,12 @@ std::string Ha2() {
 
 }  // namespace
 
-TEST(GenBasicAccessAuth, TheLineIsTheBase64OfUserColonPasswordWithoutALineEnd) {
+TEST(GenBasicAccessAuth, TheLineIsTheBase64OfUserColonPasswordWithoutACrlf) {
   ClientProbe client(80, {"", HTTP_VERSION_NONE, "u", "p"});
   EXPECT_EQ(client.GenBasicAccessAuth(), "Authorization: Basic dTpw");
 }
 
-TEST(GenDigestAccessAuth, WithoutQopTheLineEndsBehindTheResponseOfHa1NonceAndHa2) {
+TEST(GenDigestAccessAuth, WithoutQopTheLineEndsAfterTheResponseOfHa1NonceAndHa2) {
   Challenged client(" Digest realm=\"r\", nonce=\"n\"");
   EXPECT_EQ(client.Answer(),
             "Authorization: Digest username=\"u\", realm=\"r\", nonce=\"n\", uri=\"/cgi/a?x=1\", "
@@ -130,14 +98,14 @@ TEST(GenDigestAccessAuth, ValuesSeparatedByCommaAndBlanksComeWithoutBlanksOrQuot
   EXPECT_EQ(values.at("algorithm"), "MD5");
 }
 
-TEST(GenDigestAccessAuth, AnEmptyPathGivesTheUriOfASlash) {
+TEST(GenDigestAccessAuth, AnEmptyPathHasTheUriOfASlash) {
   Challenged client("Digest realm=\"r\", nonce=\"n\"", "");
   const std::string line = client.Answer();
   EXPECT_EQ(ParameterOf(line, "uri"), "/");
   EXPECT_EQ(ParameterOf(line, "response"), Md5(Ha1() + ":n:" + Md5("GET:/")));
 }
 
-TEST(GenBasicAccessAuth, LongAndEmptyLoginsAreEncodedWhole) {
+TEST(GenBasicAccessAuth, LongAndEmptyCredentialsAreEncodedWhole) {
   ClientProbe client(80);
   EXPECT_EQ(client.GenBasicAccessAuth(), "Authorization: Basic Og==");
   client.m_strUser = "Aladdin";
@@ -177,7 +145,7 @@ TEST(DigestResponse, TheExampleOfRfc2069HasItsPublishedResponse) {
             "1949323746fe6a43ef61f9606e7febea");
 }
 
-TEST(DigestResponse, TheMethodCounts) {
+TEST(DigestResponse, TheMethodIsPartOfIt) {
   DIGEST_ACCESS_AUTH login = SampleLogin();
   const std::string ha1 = Md5("Mufasa:testrealm@host.com:w");
   EXPECT_EQ(DigestResponse(login, "w", "POST"),
@@ -216,7 +184,7 @@ TEST(DigestResponse, AnyOtherQopIsLeftOut) {
   }
 }
 
-TEST(DigestResponse, TheAlgorithmDoesNotCount) {
+TEST(DigestResponse, TheAlgorithmIsIgnored) {
   DIGEST_ACCESS_AUTH login = SampleLogin();
   login.algorithm = "MD5-sess";
   EXPECT_EQ(DigestResponse(login, "w", "GET"), DigestResponse(SampleLogin(), "w", "GET"));
@@ -254,7 +222,7 @@ TEST(GenDigestAccessAuth, AnMd5SessChallengeIsComputedAsPlainMd5) {
   EXPECT_THAT(line, EndsWith(", algorithm=\"MD5-sess\""));
 }
 
-TEST(GenDigestAccessAuth, AChallengeWithoutRealmAndNonceGivesEmptyValues) {
+TEST(GenDigestAccessAuth, ForAChallengeWithoutRealmAndNonceTheirValuesAreEmpty) {
   Challenged client("Digest");
   EXPECT_EQ(client.Answer(),
             "Authorization: Digest username=\"u\", realm=\"\", nonce=\"\", uri=\"/cgi/a?x=1\", "
@@ -299,7 +267,7 @@ TEST(ParseChallenge, ANameWithoutAnEqualsSignHasNoValue) {
   EXPECT_EQ(ParseChallenge("Digest qop=auth, stale").at("stale"), "");
 }
 
-TEST(ParseChallenge, BlanksAreStrippedBeforeQuotesAndNotAgainBehindThem) {
+TEST(ParseChallenge, BlanksAreStrippedBeforeQuotesAndNotAgainAfterThem) {
   EXPECT_EQ(ParseChallenge("Digest realm=  \" a \"  ,").at("realm"), " a ");
   EXPECT_EQ(ParseChallenge("Digest realm=\"\"a\"\"").at("realm"), "a");
   EXPECT_EQ(ParseChallenge("Digest realm=\"\t").at("realm"), "\t");
@@ -323,10 +291,10 @@ TEST(MakeClientNonce, ItIsSixteenBytesFromTheProcessIdAndTheTime) {
   unsigned int seed = static_cast<unsigned int>(getpid()) * 1234567890u;
   unsigned char bytes[16];
   for (unsigned char& byte : bytes) byte = static_cast<unsigned char>(rand_r(&seed));
-  EXPECT_EQ(MakeClientNonce(), Hex(bytes));
+  EXPECT_EQ(MakeClientNonce(), HexOf(bytes));
 }
 
-TEST(MakeClientNonce, TwoCallsWithinASecondGiveTheSameAndTheNextSecondGivesAnother) {
+TEST(MakeClientNonce, TwoCallsWithinASecondReturnTheSameAndTheNextSecondReturnsAnother) {
   Faults faults;
   time_t now = 2000000000;  // the product wraps
   faults.Clock([&now] { return timeval{now, 999999}; });

@@ -44,7 +44,7 @@ class PieceSocket : public TWSocket {
   std::mt19937 random_;
 };
 
-// A client behind a head, whose body is what a PieceSocket delivers.
+// A client after a head, whose body is what a PieceSocket delivers.
 class PieceClient : public TWHttpClient {
  public:
   PieceClient(const std::string& text, unsigned seed, const std::string& encoding)
@@ -245,7 +245,7 @@ HeaderLine PlainParse(const std::string& line) {
   return result;
 }
 
-TEST(FastHead, ALineGivesWhatSplittingItGives) {
+TEST(FastHead, ALineHasTheResultOfSplittingIt) {
   std::vector<std::string> words = {"Content-", "Set", "X-Device", "-2", " ",
                                     ":",        ";",   "=",        "\t", "v"};
   for (const KeptField& field : kKeptFields) words.emplace_back(field.name);
@@ -268,12 +268,12 @@ size_t ResidentKilobytes() {
   return strtoul(status.c_str() + status.find("VmRSS:") + 6, nullptr, 10);
 }
 
-// The buffer of 64 KiB counts only as far as the answer used it.
+// The buffer of 64 KiB counts only as far as the response used it.
 TEST(IdleClient, KeepsFewPagesResidentAfterASmallGet) {
 #if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
   GTEST_SKIP() << "the sanitizer's memory is not the library's";
 #endif
-  ReplyServer server("HTTP/1.0 200 OK\r\nContent-Type: text/plain\r\n\r\nsmall");
+  RepeatingPeer server(Exchange("HTTP/1.0 200 OK\r\nContent-Type: text/plain\r\n\r\nsmall"));
   std::vector<std::unique_ptr<ClientProbe>> clients;
   malloc_trim(0);
   const size_t before = ResidentKilobytes();

@@ -65,14 +65,14 @@ TEST(GetRespOutcome, OfAnUploadThatIsNotAnsweredIsAnIoError) {
   ExpectOutcome(client, HTTP_RET_IO_ERROR, 0);
 }
 
-TEST(GetRespOutcome, OfAnUploadThatAsksForALoginIsUnauthorized) {
+TEST(GetRespOutcome, OfAnUploadThatAsksForCredentialsIsUnauthorized) {
   ScriptedPeer peer({Upload("HTTP/1.1 401 No\r\nWWW-Authenticate: Basic x\r\n\r\n")});
   ClientProbe client(peer.Port());
   EXPECT_EQ(UploadWith(client), kErrorText);
   ExpectOutcome(client, HTTP_RET_UNAUTHORIZED, 401);
 }
 
-TEST(GetRespOutcome, BeforeItIsCalledTheEarlierResponseStands) {
+TEST(GetRespOutcome, BeforeItIsCalledTheEarlierResponseIsKept) {
   ScriptedPeer peer({Exchange("HTTP/1.1 302 Found\r\n\r\n"), Upload("HTTP/1.1 200 OK\r\n\r\n")});
   ClientProbe client(peer.Port());
   EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);

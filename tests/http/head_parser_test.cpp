@@ -81,7 +81,7 @@ TEST(ParseStatusLine, AStatusBeyondAnIntNeverBecomesASmallOne) {
   }
 }
 
-TEST(ParseStatusLine, EveryCutOfALineIsAnsweredByItsWords) {
+TEST(ParseStatusLine, EveryCutOfALineHasTheResultOfItsWords) {
   const std::string line = "HTTP/1.1 401 No";
   const int statuses[] = {4, 40, 401, 401, 401, 401};
   for (size_t n = 0; n <= line.size(); ++n) {
@@ -129,7 +129,7 @@ TEST(ParseHeaderLine, LeadingDelimitersAreSkipped) {
   EXPECT_EQ(ValueOf(" :;= Content-Type: x", "Content-Type"), " x");
 }
 
-TEST(ParseHeaderLine, OnlyOneDelimiterIsTakenBehindTheName) {
+TEST(ParseHeaderLine, OnlyOneDelimiterIsTakenAfterTheName) {
   EXPECT_EQ(ValueOf("Content-Type : x", "Content-Type"), ": x");
   EXPECT_EQ(ValueOf("Content-Type:: x ", "Content-Type"), ": x ");
 }

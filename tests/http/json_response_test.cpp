@@ -78,7 +78,7 @@ TEST(JsonParse, SuccessDecides) {
   EXPECT_EQ(ResultOf("{}"), -2);
 }
 
-TEST(JsonParse, AnEmptyTextIsTakenUnparsedAndLeavesTheValue) {
+TEST(JsonParse, AnEmptyStringIsTakenUnparsedAndLeavesTheValue) {
   Json::Value value = "kept";
   EXPECT_EQ(JsonParse("", value), 0);
   EXPECT_EQ(value.asString(), "kept");
@@ -110,7 +110,7 @@ TEST(JsonParse, TheNameHasItsCase) {
   EXPECT_EQ(ResultOf("{\"Success\":true}"), -2);
 }
 
-TEST(JsonParse, TheLastOfTwoMembersCounts) {
+TEST(JsonParse, TheLastOfTwoMembersIsTaken) {
   EXPECT_EQ(ResultOf("{\"success\":true,\"success\":false}"), -2);
 }
 
@@ -121,7 +121,7 @@ TEST(JsonParse, TextThatIsNoJsonIsNotParsable) {
   }
 }
 
-TEST(JsonParse, EveryCutOfAReplyIsNotParsable) {
+TEST(JsonParse, EveryCutOfAResponseIsNotParsable) {
   const std::string whole = "{\"success\" : true, \"d\" : [1, {\"e\" : \"f\\n\"}]}";
   for (size_t n = 1; n < whole.size(); ++n) EXPECT_EQ(ResultOf(whole.substr(0, n)), -1) << n;
   EXPECT_EQ(ResultOf(whole), 0);
@@ -238,7 +238,7 @@ TEST(JsonParse, OnAStackThatIsNotTheThreadsOwn77LevelsParseAndNoMore) {
   });
 }
 
-TEST(JsonParse, AWideReplyIsParsed) {
+TEST(JsonParse, AWideResponseIsParsed) {
   EXPECT_EQ(ResultOf("{\"success\":true,\"x\":[" + Repeat("[],", 20000) + "{}]}"), 0);
 }
 

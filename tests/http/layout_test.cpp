@@ -29,7 +29,7 @@ constexpr Field FieldAt(size_t offset) {
 #pragma GCC diagnostic ignored "-Winvalid-offsetof"
 #define TEST_FIELD(type, name) FieldAt<decltype(type::name)>(offsetof(type, name))
 
-// True when the fields stand one behind the other from `begin` on, with no more room between them
+// True when the fields stand one after the other from `begin` on, with no more room between them
 // than alignment asks for.
 template <size_t kCount>
 constexpr bool StandInOrder(size_t begin, const Field (&fields)[kCount]) {
@@ -45,16 +45,16 @@ constexpr bool StandInOrder(size_t begin, const Field (&fields)[kCount]) {
 constexpr size_t kVtable = sizeof(void*);
 
 constexpr Field kSocketFields[] = {
-    TEST_FIELD(PlainSocket, m_sockFd),    TEST_FIELD(PlainSocket, m_strHost),
-    TEST_FIELD(PlainSocket, m_port),      TEST_FIELD(PlainSocket, m_timeout),
-    TEST_FIELD(PlainSocket, m_bBuffered), TEST_FIELD(PlainSocket, m_bConnected),
-    TEST_FIELD(PlainSocket, m_bEOF),      TEST_FIELD(PlainSocket, m_readBuf),
-    TEST_FIELD(PlainSocket, m_readPos),   TEST_FIELD(PlainSocket, m_readLen),
-    TEST_FIELD(PlainSocket, m_srcAddr)};
+    TEST_FIELD(ExposedSocket, m_sockFd),    TEST_FIELD(ExposedSocket, m_strHost),
+    TEST_FIELD(ExposedSocket, m_port),      TEST_FIELD(ExposedSocket, m_timeout),
+    TEST_FIELD(ExposedSocket, m_bBuffered), TEST_FIELD(ExposedSocket, m_bConnected),
+    TEST_FIELD(ExposedSocket, m_bEOF),      TEST_FIELD(ExposedSocket, m_readBuf),
+    TEST_FIELD(ExposedSocket, m_readPos),   TEST_FIELD(ExposedSocket, m_readLen),
+    TEST_FIELD(ExposedSocket, m_srcAddr)};
 static_assert(StandInOrder(kVtable, kSocketFields));
-static_assert(sizeof(PlainSocket::m_readBuf) == 65536);
+static_assert(sizeof(ExposedSocket::m_readBuf) == 65536);
 
-// The two pointers of TLS are private; they fill what is behind the base.
+// The two pointers of TLS are private; they fill what is after the base.
 static_assert(sizeof(SSLSocket) ==
               (sizeof(TWSocket) + sizeof(void*) - 1) / sizeof(void*) * sizeof(void*) +
                   2 * sizeof(void*));

@@ -1,4 +1,4 @@
-// How SendHttpPost reads the head of the answer: ahead, as a system call a byte would cost too
+// How SendHttpPost reads the head of the response: ahead, as a system call a byte would cost too
 // much.
 #include "tests/http/http_test_util.h"
 #include "tests/support/faults.h"

@@ -19,17 +19,9 @@ int PostTo(int port, const std::string& cookie = "s=1") {
   return SendHttpPost("127.0.0.1", port, "api/set", "a=1", cookie, 5);
 }
 
-int PostOf(const std::string& reply) {
-  ScriptedPeer peer({Exchange(reply)});
+int PostOf(const std::string& response) {
+  ScriptedPeer peer({Exchange(response)});
   return PostTo(peer.Port());
-}
-
-std::vector<LogLine> LinesOf(const LogCapture& log, const std::string& function) {
-  std::vector<LogLine> lines;
-  for (const LogLine& line : log.Lines("http")) {
-    if (line.function == function) lines.push_back(line);
-  }
-  return lines;
 }
 
 }  // namespace
@@ -45,7 +37,7 @@ TEST(SendHttpPost, WithAnEmptyCookieTheRequestIsSentAfterOneWarning) {
               ElementsAre(IsHttpLog("warn", "SendHttpPost", kNoCookie)));
 }
 
-TEST(SendHttpPost, ACookieIsSentBehindTheHostWithoutAWarning) {
+TEST(SendHttpPost, ACookieIsSentAfterTheHostWithoutAWarning) {
   ScriptedPeer peer({Exchange(kOk)});
   LogCapture log;
   EXPECT_EQ(PostTo(peer.Port(), "s=1; t=2"), 0);
@@ -63,7 +55,7 @@ TEST(SendHttpPost, PathAndBodyAreSentAsTheyStandButLeadingSlashes) {
                                   "Content-Length: 5\r\nConnection: close;\r\n\r\nb=3 4");
 }
 
-TEST(SendHttpPost, WhateverTheServerAnswersIsSuccess) {
+TEST(SendHttpPost, AnyResponseIsSuccess) {
   EXPECT_EQ(PostOf("HTTP/1.1 500 Oops\r\nContent-Length: 4\r\n\r\noops"), 0);
   EXPECT_EQ(PostOf("HTTP/1.1 401 No\r\nWWW-Authenticate: Basic x\r\n\r\n"), 0);
   EXPECT_EQ(PostOf("no answer of the protocol\r\n"), 0);
@@ -71,7 +63,7 @@ TEST(SendHttpPost, WhateverTheServerAnswersIsSuccess) {
   EXPECT_EQ(PostTo(silent.Port()), 0);
 }
 
-TEST(SendHttpPost, TheBodyOfTheAnswerIsNotWaitedFor) {
+TEST(SendHttpPost, TheBodyOfTheResponseIsNotWaitedFor) {
   ScriptedPeer peer(
       {{ExpectRequest(), Send("HTTP/1.1 200 OK\r\nContent-Length: 9\r\n\r\n"), ExpectEof()}});
   EXPECT_EQ(PostTo(peer.Port()), 0);

@@ -17,16 +17,16 @@ std::string Ok(const std::string& body) {
   return "HTTP/1.1 200 OK\r\nContent-Length: " + std::to_string(body.size()) + "\r\n\r\n" + body;
 }
 
-// The result of SendHttpGet when the server answers with `reply`.
-int GetOf(const std::string& reply) {
-  ScriptedPeer peer({Exchange(reply)});
+// The result of SendHttpGet when the server answers with `response`.
+int GetOf(const std::string& response) {
+  ScriptedPeer peer({Exchange(response)});
   Json::Value result;
   return SendHttpGet("127.0.0.1", peer.Port(), "api", result, 5, false);
 }
 
-// The result of SendHttpsGet when the server answers with `reply`.
-int HttpsGetOf(const std::string& reply) {
-  TlsScriptedPeer peer({Exchange(reply)});
+// The result of SendHttpsGet when the server answers with `response`.
+int HttpsGetOf(const std::string& response) {
+  TlsScriptedPeer peer({Exchange(response)});
   const TrustedAuthority trusted(peer.CaFile());
   Json::Value result;
   return SendHttpsGet("127.0.0.1", peer.Port(), "api", result, 10);
@@ -39,15 +39,6 @@ std::string TargetOf(const std::string& path, bool encode_query) {
   EXPECT_EQ(SendHttpGet("127.0.0.1", peer.Port(), path, result, 5, encode_query), 0);
   const std::string request = peer.Received(0);
   return request.substr(4, request.find(" HTTP/1.0\r\n") - 4);
-}
-
-// A line of SendHttpGet or SendHttpsGet alone, the parser's and the socket's left out.
-std::vector<LogLine> LinesOf(const LogCapture& log, const std::string& function) {
-  std::vector<LogLine> lines;
-  for (const LogLine& line : log.Lines("http")) {
-    if (line.function == function) lines.push_back(line);
-  }
-  return lines;
 }
 
 }  // namespace
@@ -89,19 +80,20 @@ TEST(SendHttpGet, WithEncodingLineFeedsStayAndTheValuesAreEncoded) {
   EXPECT_EQ(TargetOf("a\nb?x=\n1 2/", true), "/a\nb?x=%201%202%2F");
 }
 
-TEST(SendHttpsGet, AServerWithASelfSignedCertificateGivesMinusTwo) {
-  const SelfSignedServer server;
-  const SelfSignedCertificate other;
-  const TrustedAuthority trusted(other.File());
+TEST(SendHttpsGet, AServerWithASelfSignedCertificateIsMinusTwo) {
+  TlsOptions tls;
+  tls.self_signed = true;
+  TlsScriptedPeer peer({{ExpectRefusedHandshake()}}, tls);
+  const TrustedAuthority trusted(peer.CaFile());
   Json::Value result;
   LogCapture log;
-  EXPECT_EQ(SendHttpsGet("127.0.0.1", server.Port(), "api", result, 10), -2);
+  EXPECT_EQ(SendHttpsGet("127.0.0.1", peer.Port(), "api", result, 10), -2);
   EXPECT_THAT(log.Lines(),
               ElementsAre(IsHttpLog("debug", "SendRequestByCurl",
                                     "Failed to make http connection, return value=60\n")));
 }
 
-TEST(SendHttpGet, TheReplyIsHandedOver) {
+TEST(SendHttpGet, TheResponseIsHandedOver) {
   ScriptedPeer peer({Exchange(Ok("{\"success\":true,\"data\":[1,\"\xc3\xa4\"]}"))});
   Json::Value result;
   EXPECT_EQ(SendHttpGet("127.0.0.1", peer.Port(), "/api?x=1", result, 5, false), 0);
@@ -119,12 +111,12 @@ TEST(SendHttpGet, ABodyOfManyPiecesIsReadToItsEnd) {
   EXPECT_EQ(result["x"].asString().size(), 300000u);
 }
 
-TEST(SendHttpGet, AReplyCutAtEveryByteHasADocumentedResult) {
-  const std::string reply = "HTTP/1.1 200 OK\r\nA: b\r\n\r\n{\"success\":true}";
-  const size_t body_at = reply.find('{');
-  for (size_t n = 0; n <= reply.size(); ++n) {
-    const int expected = n == reply.size() ? 0 : n > body_at ? -2 : -1;
-    EXPECT_EQ(GetOf(reply.substr(0, n)), expected) << n;
+TEST(SendHttpGet, AResponseCutAtEveryByteHasADocumentedResult) {
+  const std::string response = "HTTP/1.1 200 OK\r\nA: b\r\n\r\n{\"success\":true}";
+  const size_t body_at = response.find('{');
+  for (size_t n = 0; n <= response.size(); ++n) {
+    const int expected = n == response.size() ? 0 : n > body_at ? -2 : -1;
+    EXPECT_EQ(GetOf(response.substr(0, n)), expected) << n;
   }
 }
 
@@ -136,7 +128,7 @@ TEST(SendHttpGet, ItReadsAhead) {
   EXPECT_EQ(faults.Sizes(Call::kRead).front(), 64512u);
 }
 
-TEST(SendHttpGet, AReplyByteByByteIsReadWhole) {
+TEST(SendHttpGet, AResponseByteByByteIsReadWhole) {
   ScriptedPeer peer({ExchangeByteByByte(Ok("{\"success\":true}"))});
   Json::Value result;
   EXPECT_EQ(SendHttpGet("127.0.0.1", peer.Port(), "api", result, 5, false), 0);
@@ -161,9 +153,9 @@ TEST(SendHttpGet, AnotherStatusIsLoggedAtInfoWithStatusAndResult) {
       {"HTTP/1.1 401 No\r\n\r\n", "Failed to check response[401]: 4\n"},
       {"HTTP/1.1 200 OK\r\n:\r\n\r\n", "Failed to check response[200]: 1\n"},
       {"HTTP/1.1\r\n\r\n", "Failed to check response[0]: 3\n"}};
-  for (const auto& [reply, message] : table) {
+  for (const auto& [response, message] : table) {
     LogCapture log;
-    EXPECT_EQ(GetOf(reply), -1);
+    EXPECT_EQ(GetOf(response), -1);
     EXPECT_THAT(LinesOf(log, "SendHttpGet"),
                 ElementsAre(IsHttpLog("info", "SendHttpGet", message)));
   }
@@ -183,7 +175,7 @@ TEST(SendHttpGet, AFailedReadIsLoggedAtInfoWithErrno) {
               ElementsAre(IsHttpLog("info", "SendHttpGet", "Failed to read data: 104\n")));
 }
 
-TEST(SendHttpGet, AReadThatFailsBehindAPartOfTheBodyFailsTheCall) {
+TEST(SendHttpGet, AReadThatFailsAfterAPartOfTheBodyFailsTheCall) {
   const std::string start = "HTTP/1.1 200 OK\r\n\r\n{\"success\"";
   ScriptedPeer peer({{ExpectRequest(), Send(start + ":true}"), DiscardUntilEnd()}});
   Json::Value result = "kept";
@@ -220,7 +212,7 @@ TEST(SendHttpGet, ABodyThatIsNoJsonIsLoggedByTheParserAndAtError) {
   EXPECT_THAT(log.Text(), HasSubstr(":JsonParse(): Failed to parse json: [%s no json] with error"));
 }
 
-TEST(SendHttpGet, AMissingSuccessLeavesTheParsedReply) {
+TEST(SendHttpGet, AMissingSuccessLeavesTheParsedResponse) {
   ScriptedPeer peer({Exchange(Ok("{\"error\":7}"))});
   Json::Value result;
   EXPECT_EQ(SendHttpGet("127.0.0.1", peer.Port(), "api", result, 5, false), -2);
@@ -262,7 +254,7 @@ TEST(SendHttpGet, DeepNestingPassesOnASmallStack) {
   });
 }
 
-TEST(SendHttpsGet, TheRequestGoesOutAsAGetWithTheEmptyLogin) {
+TEST(SendHttpsGet, TheRequestIsAGetWithEmptyCredentials) {
   TlsScriptedPeer peer({Exchange(Ok("{\"success\":true,\"d\":5}"))});
   const TrustedAuthority trusted(peer.CaFile());
   Json::Value result;
@@ -277,7 +269,7 @@ TEST(SendHttpsGet, TheRequestGoesOutAsAGetWithTheEmptyLogin) {
   EXPECT_FALSE(faults.HasOption(CURLOPT_SSL_VERIFYHOST));
 }
 
-TEST(SendHttpsGet, AnyOtherFailureGivesMinusOneAndNoLineOfItsOwn) {
+TEST(SendHttpsGet, AnyOtherFailureIsMinusOneWithoutALineOfItsOwn) {
   const ClosedPort port;
   LogCapture log;
   Json::Value result = "kept";
@@ -296,7 +288,7 @@ TEST(SendHttpsGet, ABodyWithoutSuccessIsLoggedAtError) {
                                     "Failed to parse json. Result is [{\"data\":1}]\n")));
 }
 
-TEST(SendHttpsGet, AMissingHandleGivesMinusOne) {
+TEST(SendHttpsGet, AMissingHandleIsMinusOne) {
   Faults faults;
   faults.FailNth(Call::kCurlEasyInit, 1);
   Json::Value result;
@@ -307,7 +299,7 @@ TEST(SendHttpsGet, AMissingHandleGivesMinusOne) {
 
 TEST(SendHttpGetFaults, WhicheverSystemCallFailsTheResultIsDocumentedAndNothingIsLeft) {
   const DescriptorGuard guard;
-  ReplyServer server(Ok("{\"success\":true}"));
+  RepeatingPeer server(Exchange(Ok("{\"success\":true}")));
   const Call calls[] = {Call::kSocket, Call::kGetaddrinfo, Call::kFcntl,         Call::kConnect,
                         Call::kSelect, Call::kGetsockopt,  Call::kSetsockopt,    Call::kIoctl,
                         Call::kWrite,  Call::kRead,        Call::kPthreadSigmask};
@@ -322,7 +314,7 @@ TEST(SendHttpGetFaults, WhicheverSystemCallFailsTheResultIsDocumentedAndNothingI
 }
 
 TEST(SendHttpGetFaults, AFailingSocketLookupConnectWriteOrReadFailsTheCall) {
-  ReplyServer server(Ok("{\"success\":true}"));
+  RepeatingPeer server(Exchange(Ok("{\"success\":true}")));
   for (const Call call :
        {Call::kSocket, Call::kGetaddrinfo, Call::kConnect, Call::kWrite, Call::kRead}) {
     Faults faults;
@@ -335,7 +327,7 @@ TEST(SendHttpGetFaults, AFailingSocketLookupConnectWriteOrReadFailsTheCall) {
 
 TEST(SendHttpGetFaults, WhicheverAllocationFailsTheResultIsDocumentedAndNothingIsThrown) {
   const DescriptorGuard guard;
-  ReplyServer server(Ok("{\"success\":true}"));
+  RepeatingPeer server(Exchange(Ok("{\"success\":true}")));
   for (const Call call : {Call::kMalloc, Call::kCalloc, Call::kRealloc, Call::kStrdup}) {
     ForEachFailingCall(call, [&](Faults& faults) {
       Json::Value result;
@@ -347,7 +339,7 @@ TEST(SendHttpGetFaults, WhicheverAllocationFailsTheResultIsDocumentedAndNothingI
 }
 
 TEST(SendHttpGetFaults, WhicheverCallOfTheLogFailsTheResultIsTheSame) {
-  ReplyServer server(Ok("{\"success\":true}"));
+  RepeatingPeer server(Exchange(Ok("{\"success\":true}")));
   const LogCapture log;
   for (const Call call : {Call::kOpen, Call::kFopen, Call::kFlock, Call::kLocaltimeR}) {
     Faults faults;

@@ -1,13 +1,13 @@
-// ReadBody and GetResp: the body of a reply, with and without its head.
+// ReadBody: the body of a response.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include <cstdio>
 #include <cstring>
 
+#include "tests/http/body_test_util.h"
 #include "tests/http/http_test_util.h"
 #include "tests/support/faults.h"
-#include "tests/support/tls_scripted_peer.h"
 
 using namespace std::string_literals;
 
@@ -15,59 +15,6 @@ namespace {
 
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
-
-constexpr char kErrorText[] = "{\"error\":true}";
-constexpr char kWikipedia[] = "4\r\nWiki\r\n5\r\npedia\r\n0\r\n\r\n";
-
-std::string Plain(const std::string& body) {
-  return "HTTP/1.1 200 OK\r\n\r\n" + body;
-}
-
-std::string Chunked(const std::string& chunks) {
-  return "HTTP/1.1 200 OK\r\nTransfer-Encoding: chunked\r\n\r\n" + chunks;
-}
-
-struct Transport {
-  bool tls;
-  bool buffered;
-};
-
-constexpr Transport kTransports[] = {{false, false}, {false, true}, {true, false}, {true, true}};
-
-void ForEachTransport(const std::function<void(const Transport&)>& test) {
-  for (const Transport& transport : kTransports) {
-    SCOPED_TRACE(std::string(transport.tls ? "TLS, " : "plain, ") +
-                 (transport.buffered ? "buffered" : "direct"));
-    test(transport);
-  }
-}
-
-std::unique_ptr<ScriptedPeer> NewPeer(const Transport& transport, std::vector<Script> scripts) {
-  if (transport.tls) return std::make_unique<TlsScriptedPeer>(std::move(scripts));
-  return std::make_unique<ScriptedPeer>(std::move(scripts));
-}
-
-ClientSettings SettingsOf(const Transport& transport) {
-  ClientSettings settings;
-  settings.https = transport.tls;
-  settings.buffered = transport.buffered;
-  return settings;
-}
-
-// Connects and writes a request, as a caller does who builds it himself.
-void WriteOwnRequest(ClientProbe& client) {
-  const std::string request = "GET /own HTTP/1.1\r\n\r\n";
-  ASSERT_EQ(client.m_pSocket->Connect(), 0);
-  ASSERT_EQ(client.m_pSocket->WriteData(request.data(), static_cast<int>(request.size())),
-            static_cast<int>(request.size()));
-}
-
-std::string GetRespOf(const std::string& reply, const Transport& transport = {false, true}) {
-  const auto peer = NewPeer(transport, {Exchange(reply)});
-  ClientProbe client(peer->Port(), SettingsOf(transport));
-  WriteOwnRequest(client);
-  return client.GetResp();
-}
 
 struct Body {
   int result;
@@ -88,68 +35,29 @@ Body BodyOf(TWHttpClient& client) {
   return body;
 }
 
-// The body that ReadBody gives after a GET.
-Body BodyOfReply(const std::string& reply, const Transport& transport = {false, true}) {
-  const auto peer = NewPeer(transport, {Exchange(reply)});
+// The body that ReadBody returns after a GET.
+Body BodyOfResponse(const std::string& response, const Transport& transport = {false, true}) {
+  const auto peer = NewPeer(transport, {Exchange(response)});
   ClientProbe client(peer->Port(), SettingsOf(transport));
   EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
   return BodyOf(client);
 }
 
-// Makes every read of the body fail once the bytes right behind the head have come. A
+// Makes every read of the body fail once the bytes right after the head have come. A
 // buffered client has it already; a direct one has read just the head.
 void FailReadsBehind(Faults& faults, const Transport& transport) {
   faults.FailFrom(transport.tls ? Call::kSslRead : Call::kRead, transport.buffered ? 1 : 2);
 }
 
-std::vector<LogLine> LinesOf(const LogCapture& log, const std::string& function) {
-  std::vector<LogLine> lines;
-  for (const LogLine& line : log.Lines("http")) {
-    if (line.function == function) lines.push_back(line);
-  }
-  return lines;
-}
-
 }  // namespace
-
-TEST(GetResp, AChunkedBodyIsDecoded) {
-  EXPECT_EQ(GetRespOf(Chunked(kWikipedia)), "Wikipedia");
-}
-
-TEST(GetResp, AChunkExtensionDoesNotCount) {
-  EXPECT_EQ(GetRespOf(Chunked("1A;ext=1\r\nabcdefghijklmnopqrstuvwxyz\r\n0\r\n\r\n")),
-            "abcdefghijklmnopqrstuvwxyz");
-}
-
-TEST(GetResp, ChunkedWithACapitalIsNotDecoded) {
-  EXPECT_EQ(GetRespOf("HTTP/1.1 200 OK\r\nTransfer-Encoding: Chunked\r\n\r\n"s + kWikipedia),
-            kWikipedia);
-}
-
-TEST(GetResp, AStatusThatIsNo2xxGivesTheErrorTextAndLeavesTheBody) {
-  for (const char* status : {"404 No", "302 Found", "401 No", "414 Long", "500 Oops", "199 x"}) {
-    ScriptedPeer peer({Exchange("HTTP/1.1 "s + status + "\r\n\r\nunread")});
-    ClientProbe client(peer.Port());
-    WriteOwnRequest(client);
-    EXPECT_EQ(client.GetResp(), kErrorText) << status;
-    EXPECT_EQ(ReadBody(client), "unread");
-  }
-}
-
-TEST(GetResp, AServerThatClosesInTheMiddleOfAChunkGivesTheBytesThatCame) {
-  ForEachTransport([](const Transport& transport) {
-    EXPECT_EQ(GetRespOf(Chunked("4\r\nWiki\r\n9\r\npedi"), transport), "Wikipedi");
-    EXPECT_EQ(GetRespOf(Chunked("ffff\r\n"), transport), "");
-  });
-}
 
 // Which one to call.
 
 TEST(ReadBody, ItServesAfterEachSenderThatReadsTheHead) {
   ForEachTransport([](const Transport& transport) {
-    for (const std::string& reply : {Plain("Wikipedia"), Chunked(kWikipedia)}) {
-      EXPECT_EQ(BodyOfReply(reply, transport), (Body{HTTP_RET_OK, "Wikipedia"}));
-      const auto peer = NewPeer(transport, {Exchange(reply), Exchange(reply)});
+    for (const std::string& response : {Plain("Wikipedia"), Chunked(kWikipedia)}) {
+      EXPECT_EQ(BodyOfResponse(response, transport), (Body{HTTP_RET_OK, "Wikipedia"}));
+      const auto peer = NewPeer(transport, {Exchange(response), Exchange(response)});
       ClientProbe client(peer->Port(), SettingsOf(transport));
       EXPECT_EQ(client.SendRequest(HTTP_METHOD_GET, "?"), HTTP_RET_OK);
       EXPECT_EQ(BodyOf(client), (Body{HTTP_RET_OK, "Wikipedia"}));
@@ -166,7 +74,7 @@ TEST(ReadBody, WhatTheStringHeldBeforeIsReplaced) {
   EXPECT_EQ(body, "new");
 }
 
-TEST(ReadBody, AfterALoginItGivesTheSecondBody) {
+TEST(ReadBody, AfterAChallengeItReturnsTheSecondBody) {
   ScriptedPeer peer(
       {{ExpectRequest(), Send("HTTP/1.1 401 No\r\nWWW-Authenticate: Basic x\r\n\r\nfirst"),
         DiscardUntilEnd()},
@@ -177,7 +85,7 @@ TEST(ReadBody, AfterALoginItGivesTheSecondBody) {
 }
 
 TEST(ReadBody, TheBodyOfAFailureIsReadAsWell) {
-  EXPECT_EQ(BodyOfReply("HTTP/1.1 500 Oops\r\n\r\nreason"), (Body{HTTP_RET_OK, "reason"}));
+  EXPECT_EQ(BodyOfResponse("HTTP/1.1 500 Oops\r\n\r\nreason"), (Body{HTTP_RET_OK, "reason"}));
 }
 
 TEST(ReadBody, WithoutAHeadItIsAnIoError) {
@@ -185,11 +93,11 @@ TEST(ReadBody, WithoutAHeadItIsAnIoError) {
   EXPECT_EQ(BodyOf(without_socket), (Body{HTTP_RET_IO_ERROR, ""}));
   ClientProbe unconnected(1);
   EXPECT_EQ(BodyOf(unconnected), (Body{HTTP_RET_IO_ERROR, ""}));
-  EXPECT_EQ(BodyOfReply("HTTP/1.1 200 OK\r\nContent-Type:\r\n\r\nbody"),
+  EXPECT_EQ(BodyOfResponse("HTTP/1.1 200 OK\r\nContent-Type:\r\n\r\nbody"),
             (Body{HTTP_RET_IO_ERROR, ""}));
 }
 
-TEST(ReadBody, WithoutAHeadAnEarlierRepliesChunkedCodingDoesNotMakeItSucceed) {
+TEST(ReadBody, WithoutAHeadTheChunkedCodingOfAnEarlierResponseDoesNotMakeItSucceed) {
   ScriptedPeer peer({Exchange(Chunked(kWikipedia)), RequestThenClose()});
   ClientProbe client(peer.Port());
   EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
@@ -198,89 +106,21 @@ TEST(ReadBody, WithoutAHeadAnEarlierRepliesChunkedCodingDoesNotMakeItSucceed) {
   EXPECT_EQ(BodyOf(client), (Body{HTTP_RET_IO_ERROR, ""}));
 }
 
-TEST(GetResp, ItServesAfterARequestThatTheCallerHasWritten) {
-  ForEachTransport([](const Transport& transport) {
-    EXPECT_EQ(GetRespOf(Plain("Wikipedia"), transport), "Wikipedia");
-    EXPECT_EQ(GetRespOf(Chunked(kWikipedia), transport), "Wikipedia");
-  });
-}
-
-TEST(GetResp, ItServesAfterAnUpload) {
-  ForEachTransport([](const Transport& transport) {
-    const auto peer = NewPeer(transport, {{ExpectUntil("\r\n\r\n"), ExpectExactly("multipart"),
-                                           Send(Chunked(kWikipedia)), Close()}});
-    ClientProbe client(peer->Port(), SettingsOf(transport));
-    ASSERT_EQ(client.OpenRawDataUpload(), HTTP_RET_OK);
-    EXPECT_EQ(client.WriteData("multipart", 9), 9);
-    EXPECT_EQ(client.GetResp(), "Wikipedia");
-  });
-}
-
-TEST(GetResp, AfterASenderThatHasReadTheHeadItGivesTheErrorText) {
-  ForEachTransport([](const Transport& transport) {
-    const auto peer = NewPeer(transport, {Exchange(Plain("body")), Exchange(Plain("body"))});
-    ClientProbe client(peer->Port(), SettingsOf(transport));
-    EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
-    EXPECT_EQ(client.GetResp(), kErrorText);
-    EXPECT_EQ(client.SendRequestBySocketPost("a=1"), HTTP_RET_OK);
-    EXPECT_EQ(client.GetResp(), kErrorText);
-  });
-}
-
-TEST(GetResp, WithoutAConnectionItGivesTheErrorText) {
-  ClientProbe without_socket;
-  EXPECT_EQ(without_socket.GetResp(), kErrorText);
-  ClientProbe unconnected(1);
-  EXPECT_EQ(unconnected.GetResp(), kErrorText);
-}
-
-TEST(GetResp, TheHeadIsKeptAsAfterASender) {
-  ScriptedPeer peer({Exchange("HTTP/1.1 206 Part\r\nContent-Type: text/x\r\n\r\nbody")});
-  ClientProbe client(peer.Port());
-  WriteOwnRequest(client);
-  EXPECT_EQ(client.GetResp(), "body");
-  EXPECT_EQ(client.m_statusCode, 206);
-  EXPECT_EQ(client.m_connState, 2);
-  EXPECT_EQ(Content(client, HTTP_CONTENT_TYPE), "text/x");
-}
-
-TEST(GetResp, AHeadThatCannotBeReadIsLoggedAtDebug) {
-  for (const char* reply : {"", "HTTP/1.1\r\n\r\n", "HTTP/2 200\r\n\r\n", "HTTP/1.1 404 No\r\n\r\n",
-                            "HTTP/1.1 200 OK\r\nContent-Type:\r\n\r\n"}) {
-    LogCapture log;
-    EXPECT_EQ(GetRespOf(reply), kErrorText);
-    EXPECT_THAT(LinesOf(log, "GetResp"),
-                ElementsAre(IsHttpLog("debug", "GetResp", "Http Resp error\n")));
-  }
-}
-
-TEST(GetResp, TheBodyIsLoggedAtDebug2) {
-  LogCapture log;
-  log.SetLevel(kHttpCategory, 6);
-  EXPECT_EQ(GetRespOf(Chunked(kWikipedia)), "Wikipedia");
-  EXPECT_EQ(GetRespOf(Plain("%s%n")), "%s%n");
-  EXPECT_THAT(log.Lines("http"), ElementsAre(IsHttpLog("debug2", "GetResp", "strRet = Wikipedia\n"),
-                                             IsHttpLog("debug2", "GetResp", "strRet = %s%n\n")));
-  log.Clear();
-  log.SetLevel(kHttpCategory, 5);
-  GetRespOf(Plain("body"));
-  EXPECT_THAT(log.Lines("http"), IsEmpty());
-}
-
 // A body without chunks.
 
 TEST(ReadBody, ItEndsWhereTheServerClosesWhateverTheLength) {
-  EXPECT_EQ(BodyOfReply("HTTP/1.1 200 OK\r\nContent-Length: 2\r\n\r\nlonger"),
+  EXPECT_EQ(BodyOfResponse("HTTP/1.1 200 OK\r\nContent-Length: 2\r\n\r\nlonger"),
             (Body{HTTP_RET_OK, "longer"}));
-  EXPECT_EQ(BodyOfReply("HTTP/1.1 200 OK\r\nContent-Length: 99\r\n\r\nshort"),
+  EXPECT_EQ(BodyOfResponse("HTTP/1.1 200 OK\r\nContent-Length: 99\r\n\r\nshort"),
             (Body{HTTP_RET_OK, "short"}));
-  EXPECT_EQ(BodyOfReply("HTTP/1.1 200 OK\r\nContent-Length: 0\r\n\r\n"), (Body{HTTP_RET_OK, ""}));
+  EXPECT_EQ(BodyOfResponse("HTTP/1.1 200 OK\r\nContent-Length: 0\r\n\r\n"),
+            (Body{HTTP_RET_OK, ""}));
 }
 
 TEST(ReadBody, ZeroBytesAreKept) {
   ForEachTransport([](const Transport& transport) {
-    EXPECT_EQ(BodyOfReply(Plain("a\0b\0"s), transport), (Body{HTTP_RET_OK, "a\0b\0"s}));
-    EXPECT_EQ(BodyOfReply(Chunked("4\r\na\0b\0\r\n0\r\n\r\n"s), transport),
+    EXPECT_EQ(BodyOfResponse(Plain("a\0b\0"s), transport), (Body{HTTP_RET_OK, "a\0b\0"s}));
+    EXPECT_EQ(BodyOfResponse(Chunked("4\r\na\0b\0\r\n0\r\n\r\n"s), transport),
               (Body{HTTP_RET_OK, "a\0b\0"s}));
   });
 }
@@ -290,11 +130,11 @@ TEST(ReadBody, BodiesAroundThePieceOf8192BytesArriveWhole) {
     for (const size_t size : {8191, 8192, 8193, 100000}) {
       std::string body(size, '.');
       for (size_t i = 0; i < size; ++i) body[i] = static_cast<char>(i * 7);
-      EXPECT_TRUE(BodyOfReply(Plain(body), transport) == (Body{HTTP_RET_OK, body})) << size;
+      EXPECT_TRUE(BodyOfResponse(Plain(body), transport) == (Body{HTTP_RET_OK, body})) << size;
       char line[16];
       snprintf(line, sizeof(line), "%zx\r\n", size);
       const std::string chunks = line + body + "\r\n3\r\nend\r\n0\r\n\r\n";
-      EXPECT_TRUE(BodyOfReply(Chunked(chunks), transport) == (Body{HTTP_RET_OK, body + "end"}))
+      EXPECT_TRUE(BodyOfResponse(Chunked(chunks), transport) == (Body{HTTP_RET_OK, body + "end"}))
           << size;
     }
   });
@@ -316,45 +156,26 @@ TEST(ReadBody, AReadErrorIsAnIoErrorWithWhatCameBefore) {
   });
 }
 
-TEST(GetResp, AReadErrorGivesTheErrorTextAndALine) {
-  const std::string head = Plain("");
-  const int head_size = static_cast<int>(head.size());
-  for (const std::string& reply : {Plain("part"), Chunked("9\r\npart")}) {
-    ScriptedPeer peer({Exchange(reply)});
-    ClientProbe client(peer.Port(), SettingsOf({false, false}));
-    WriteOwnRequest(client);
-    LogCapture log;
-    log.SetLevel(kHttpCategory, 6);
-    {
-      Faults faults;  // a direct client reads the head byte by byte, then "part" at once
-      faults.FailFrom(Call::kRead, static_cast<int>(reply.size()) - 4 + 2);
-      EXPECT_EQ(client.GetResp(), kErrorText);
-      EXPECT_GT(faults.Count(Call::kRead), head_size);
-    }
-    EXPECT_THAT(log.Lines("http"), ElementsAre(IsHttpLog("debug", "GetResp", "Read data error\n")));
-  }
-}
-
 // Chunks.
 
 TEST(ReadBody, ATransferEncodingOfExactlyChunkedIsDecodedAndNoOther) {
   for (const char* value : {"CHUNKED", "gzip, chunked", "chunked, gzip", "chunked;q=1", "chunke",
                             "chunkedd", "identity"}) {
     EXPECT_EQ(
-        BodyOfReply("HTTP/1.1 200 OK\r\nTransfer-Encoding: "s + value + "\r\n\r\n" + kWikipedia),
+        BodyOfResponse("HTTP/1.1 200 OK\r\nTransfer-Encoding: "s + value + "\r\n\r\n" + kWikipedia),
         (Body{HTTP_RET_OK, kWikipedia}))
         << value;
   }
-  EXPECT_EQ(BodyOfReply("HTTP/1.1 200 OK\r\ntransfer-encoding:  chunked \r\n\r\n"s + kWikipedia),
+  EXPECT_EQ(BodyOfResponse("HTTP/1.1 200 OK\r\ntransfer-encoding:  chunked \r\n\r\n"s + kWikipedia),
             (Body{HTTP_RET_OK, "Wikipedia"}));
 }
 
-TEST(ReadBody, AChunkedReplySplitAtAnyByteGivesTheSameBody) {
-  const std::string reply = Chunked(kWikipedia);
-  const size_t first = reply.size() - strlen(kWikipedia) - 2;
-  for (size_t split = first; split < reply.size(); ++split) {
+TEST(ReadBody, AChunkedResponseSplitAtAnyByteHasTheSameBody) {
+  const std::string response = Chunked(kWikipedia);
+  const size_t first = response.size() - strlen(kWikipedia) - 2;
+  for (size_t split = first; split < response.size(); ++split) {
     for (const bool buffered : {false, true}) {
-      ScriptedPeer peer({ExchangeInPieces({reply.substr(0, split), reply.substr(split)})});
+      ScriptedPeer peer({ExchangeInPieces({response.substr(0, split), response.substr(split)})});
       ClientProbe client(peer.Port(), SettingsOf({false, buffered}));
       EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
       EXPECT_EQ(BodyOf(client), (Body{HTTP_RET_OK, "Wikipedia"})) << split;
@@ -363,16 +184,16 @@ TEST(ReadBody, AChunkedReplySplitAtAnyByteGivesTheSameBody) {
   }
 }
 
-TEST(ReadBody, AChunkedReplyReadInPiecesOfAnySizeGivesTheSameBody) {
-  const std::string reply = Chunked(kWikipedia);
-  for (size_t size = 1; size <= reply.size(); ++size) {
+TEST(ReadBody, AChunkedResponseReadInPiecesOfAnySizeHasTheSameBody) {
+  const std::string response = Chunked(kWikipedia);
+  for (size_t size = 1; size <= response.size(); ++size) {
     Faults faults;
     faults.Limit(Call::kRead, size);
-    EXPECT_EQ(BodyOfReply(reply), (Body{HTTP_RET_OK, "Wikipedia"})) << size;
+    EXPECT_EQ(BodyOfResponse(response), (Body{HTTP_RET_OK, "Wikipedia"})) << size;
   }
 }
 
-TEST(ReadBody, AChunkedReplyThatComesByteByByteGivesTheSameBody) {
+TEST(ReadBody, AChunkedResponseThatComesByteByByteHasTheSameBody) {
   ForEachTransport([](const Transport& transport) {
     const auto peer = NewPeer(transport, {ExchangeByteByByte(Chunked(kWikipedia))});
     ClientProbe client(peer->Port(), SettingsOf(transport));
@@ -383,42 +204,42 @@ TEST(ReadBody, AChunkedReplyThatComesByteByByteGivesTheSameBody) {
 }
 
 TEST(ReadBody, AChunkSizeWith0xInFrontEndsTheBody) {
-  EXPECT_EQ(BodyOfReply(Chunked("0x4\r\nWiki\r\n0\r\n\r\n")), (Body{HTTP_RET_OK, ""}));
+  EXPECT_EQ(BodyOfResponse(Chunked("0x4\r\nWiki\r\n0\r\n\r\n")), (Body{HTTP_RET_OK, ""}));
 }
 
 TEST(ReadBody, AChunkSizeOfTheHighestBitsIsReadUntilTheServerCloses) {
   ForEachTransport([](const Transport& transport) {
     for (const char* size : {"80000000", "ffffffff", "7FFFFFFF"}) {
-      EXPECT_EQ(BodyOfReply(Chunked(size + "\r\nWiki"s), transport), (Body{HTTP_RET_OK, "Wiki"}))
+      EXPECT_EQ(BodyOfResponse(Chunked(size + "\r\nWiki"s), transport), (Body{HTTP_RET_OK, "Wiki"}))
           << size;
     }
   });
 }
 
-TEST(ReadBody, OfAChunkSizeTheLast32BitsCount) {
-  EXPECT_EQ(BodyOfReply(Chunked("100000001\r\nW\r\n0\r\n\r\n")), (Body{HTTP_RET_OK, "W"}));
-  EXPECT_EQ(BodyOfReply(Chunked("100000000\r\nW\r\n0\r\n\r\n")), (Body{HTTP_RET_OK, ""}));
+TEST(ReadBody, OfAChunkSizeTheLast32BitsAreTaken) {
+  EXPECT_EQ(BodyOfResponse(Chunked("100000001\r\nW\r\n0\r\n\r\n")), (Body{HTTP_RET_OK, "W"}));
+  EXPECT_EQ(BodyOfResponse(Chunked("100000000\r\nW\r\n0\r\n\r\n")), (Body{HTTP_RET_OK, ""}));
 }
 
 TEST(ReadBody, AnEmptyOrSpacedChunkSizeLineEndsTheBody) {
-  EXPECT_EQ(BodyOfReply(Chunked("1\r\nW\r\n\r\n4\r\nikip\r\n")), (Body{HTTP_RET_OK, "W"}));
-  EXPECT_EQ(BodyOfReply(Chunked("1\r\nW\r\n 4\r\nikip\r\n")), (Body{HTTP_RET_OK, "W"}));
-  EXPECT_EQ(BodyOfReply(Chunked("1\r\nW\r\n")), (Body{HTTP_RET_OK, "W"}));
-  EXPECT_EQ(BodyOfReply(Chunked("")), (Body{HTTP_RET_OK, ""}));
+  EXPECT_EQ(BodyOfResponse(Chunked("1\r\nW\r\n\r\n4\r\nikip\r\n")), (Body{HTTP_RET_OK, "W"}));
+  EXPECT_EQ(BodyOfResponse(Chunked("1\r\nW\r\n 4\r\nikip\r\n")), (Body{HTTP_RET_OK, "W"}));
+  EXPECT_EQ(BodyOfResponse(Chunked("1\r\nW\r\n")), (Body{HTTP_RET_OK, "W"}));
+  EXPECT_EQ(BodyOfResponse(Chunked("")), (Body{HTTP_RET_OK, ""}));
 }
 
 TEST(ReadBody, LineFeedsAloneEndChunkSizeLines) {
-  EXPECT_EQ(BodyOfReply(Chunked("4\nWiki\r\n1\nx\r\n0\n")), (Body{HTTP_RET_OK, "Wikix"}));
+  EXPECT_EQ(BodyOfResponse(Chunked("4\nWiki\r\n1\nx\r\n0\n")), (Body{HTTP_RET_OK, "Wikix"}));
 }
 
-TEST(ReadBody, TheTwoBytesBehindAChunkAreDroppedWhateverTheyAre) {
-  EXPECT_EQ(BodyOfReply(Chunked("4\r\nWikiXY5\r\npediaZZ0\r\n\r\n")),
+TEST(ReadBody, TheTwoBytesAfterAChunkAreDroppedWhateverTheyAre) {
+  EXPECT_EQ(BodyOfResponse(Chunked("4\r\nWikiXY5\r\npediaZZ0\r\n\r\n")),
             (Body{HTTP_RET_OK, "Wikipedia"}));
 }
 
 TEST(ReadBody, AChunkSizeLineEndsAfter8192Bytes) {
   const std::string line = "5;" + std::string(8190, 'x');  // the last byte is lost
-  EXPECT_EQ(BodyOfReply(Chunked(line + "pedia\r\n0\r\n\r\n")), (Body{HTTP_RET_OK, "pedia"}));
+  EXPECT_EQ(BodyOfResponse(Chunked(line + "pedia\r\n0\r\n\r\n")), (Body{HTTP_RET_OK, "pedia"}));
 }
 
 TEST(ReadBody, TrailerLinesAreLeftOnTheConnection) {
@@ -431,7 +252,7 @@ TEST(ReadBody, TrailerLinesAreLeftOnTheConnection) {
   });
 }
 
-TEST(ReadBody, ATransferEncodingStaysForALaterReplyWithoutOne) {
+TEST(ReadBody, ATransferEncodingStaysForALaterResponseWithoutOne) {
   ScriptedPeer peer({Exchange(Chunked(kWikipedia)), Exchange(Plain("3\r\nabc\r\n0\r\n\r\n")),
                      Exchange(Plain("hello"))});
   ClientProbe client(peer.Port());
@@ -461,7 +282,7 @@ TEST(ReadBody, AReadErrorInTheMiddleOfAChunkIsAnIoErrorWithWhatCameBefore) {
   });
 }
 
-TEST(ReadBody, AReadErrorInPlaceOfAChunkSizeEndsTheBodyAsItStands) {
+TEST(ReadBody, AReadErrorInPlaceOfAChunkSizeEndsTheBodyWithSuccess) {
   ForEachTransport([](const Transport& transport) {
     const auto peer = NewPeer(transport, {Exchange(Chunked("4\r\nWiki\r\n"))});
     ClientProbe client(peer->Port(), SettingsOf(transport));
@@ -469,7 +290,7 @@ TEST(ReadBody, AReadErrorInPlaceOfAChunkSizeEndsTheBodyAsItStands) {
     LogCapture log;
     log.SetLevel(kHttpCategory, 5);
     Faults faults;
-    // A direct client: three reads of a line, one of the data, one of the two bytes behind it.
+    // A direct client: three reads of a line, one of the data, one of the two bytes after it.
     faults.FailFrom(transport.tls ? Call::kSslRead : Call::kRead, transport.buffered ? 1 : 6);
     EXPECT_EQ(BodyOf(client), (Body{HTTP_RET_OK, "Wiki"}));
     EXPECT_THAT(log.Lines("http"), IsEmpty());

@@ -94,7 +94,7 @@ TEST(SendRequestByCurl, APostToAnEmptyHostHasTheUrlOfTheSchemeAlone) {
   EXPECT_EQ(faults.OptionGiven(CURLOPT_URL).text, "http://");
 }
 
-TEST(SendRequestByCurl, NoVersionAndNoLoginSchemeIsSet) {
+TEST(SendRequestByCurl, NoVersionAndNoAuthenticationSchemeIsSet) {
   ClientProbe client(80, {"a", HTTP_VERSION_1_0});
   Faults faults;
   faults.FailFrom(Call::kCurlEasyPerform, 1);
@@ -217,7 +217,7 @@ TEST(SendRequestByCurl, BelowDebugOnlyRefusedOptionsAreLogged) {
 
 TEST(SendRequestByCurl, EachFailingCallOfLibcurlIsAnIoErrorAndReleasesTheHandle) {
   const DescriptorGuard guard;
-  ReplyServer server(kOk);
+  RepeatingPeer server(Exchange(kOk));
   for (const Call call : {Call::kCurlEasySetopt, Call::kCurlEasyPerform, Call::kCurlEasyGetinfo}) {
     for (const TW_HTTP_METHOD method : {HTTP_METHOD_GET, HTTP_METHOD_POST}) {
       ForEachFailingCall(call, [&](Faults& faults) {

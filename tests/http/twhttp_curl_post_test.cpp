@@ -39,7 +39,7 @@ UrlAndBody SplitOf(const std::string& path, const std::string& separators) {
   return {faults.OptionGiven(CURLOPT_URL).text, faults.OptionGiven(CURLOPT_POSTFIELDS).text};
 }
 
-ClientSettings WithLogin(HTTP_VERSION version = HTTP_VERSION_NONE) {
+ClientSettings WithCredentials(HTTP_VERSION version = HTTP_VERSION_NONE) {
   ClientSettings settings;
   settings.path = "x.cgi?a=1";
   settings.user = "u";
@@ -48,8 +48,8 @@ ClientSettings WithLogin(HTTP_VERSION version = HTTP_VERSION_NONE) {
   return settings;
 }
 
-int ResultOfReply(const std::string& reply) {
-  ScriptedPeer peer({Exchange(reply)});
+int ResultOfResponse(const std::string& response) {
+  ScriptedPeer peer({Exchange(response)});
   ClientProbe client(peer.Port());
   const int result = client.SendRequestByPost("?");
   EXPECT_EQ(client.m_result, result);
@@ -57,7 +57,7 @@ int ResultOfReply(const std::string& reply) {
   return result;
 }
 
-std::string Reply(const std::string& status) {
+std::string Response(const std::string& status) {
   return "HTTP/1.1 " + status + "\r\nContent-Length: 0\r\n\r\n";
 }
 
@@ -76,11 +76,11 @@ TEST(SendRequestByPost, ThePathIsSplitAtTheSeparatorIntoUrlAndBody) {
 }
 
 TEST(SendRequestByPost, A302OrA404IsAnIoErrorAndA200OrA299IsOk) {
-  EXPECT_EQ(ResultOfReply(Reply("302 Found\r\nLocation: /elsewhere")), HTTP_RET_IO_ERROR);
-  EXPECT_EQ(ResultOfReply(Reply("404 Not Found")), HTTP_RET_IO_ERROR);
-  EXPECT_EQ(ResultOfReply(Reply("300 x")), HTTP_RET_IO_ERROR);
-  EXPECT_EQ(ResultOfReply(Reply("200 OK")), HTTP_RET_OK);
-  EXPECT_EQ(ResultOfReply(Reply("299 Fine")), HTTP_RET_OK);
+  EXPECT_EQ(ResultOfResponse(Response("302 Found\r\nLocation: /elsewhere")), HTTP_RET_IO_ERROR);
+  EXPECT_EQ(ResultOfResponse(Response("404 Not Found")), HTTP_RET_IO_ERROR);
+  EXPECT_EQ(ResultOfResponse(Response("300 x")), HTTP_RET_IO_ERROR);
+  EXPECT_EQ(ResultOfResponse(Response("200 OK")), HTTP_RET_OK);
+  EXPECT_EQ(ResultOfResponse(Response("299 Fine")), HTTP_RET_OK);
 }
 
 TEST(SendRequestByPost, LibcurlCode60IsAnIoErrorToo) {
@@ -112,7 +112,7 @@ TEST(SendRequestByPost, AnEmptyHostLeavesSchemeAndPathAlone) {
 
 TEST(SendRequestByPost, TheOptionsAreSetInOrder) {
   for (const HTTP_VERSION version : {HTTP_VERSION_NONE, HTTP_VERSION_1_0, HTTP_VERSION_1_1}) {
-    ClientProbe client(80, WithLogin(version));
+    ClientProbe client(80, WithCredentials(version));
     Faults faults;
     faults.FailFrom(Call::kCurlEasyPerform, 1);
     client.SendRequestByPost("?");
@@ -133,7 +133,7 @@ TEST(SendRequestByPost, TheOptionsAreSetInOrder) {
 }
 
 TEST(SendRequestByPost, AVersionThatIsNotKnownIsNotHandedOn) {
-  ClientProbe client(80, WithLogin(static_cast<HTTP_VERSION>(3)));
+  ClientProbe client(80, WithCredentials(static_cast<HTTP_VERSION>(3)));
   Faults faults;
   faults.FailFrom(Call::kCurlEasyPerform, 1);
   client.SendRequestByPost("?");
@@ -152,7 +152,7 @@ TEST(SendRequestByPost, EachRefusedOptionHasItsLineAndEndsTheRequest) {
       {CURLOPT_HTTPAUTH, "Failed to set auth, return value=27\n"},
       {CURLOPT_WRITEFUNCTION, "Failed to set WRITEFUNCTION, return value=27\n"}};
   for (const auto& [option, message] : table) {
-    ClientProbe client(port.Port(), WithLogin(HTTP_VERSION_1_1));
+    ClientProbe client(port.Port(), WithCredentials(HTTP_VERSION_1_1));
     LogCapture log;
     Faults faults;
     faults.FailCurlOption(option, CURLE_OUT_OF_MEMORY);
@@ -189,7 +189,7 @@ TEST(SendRequestByPost, AFailedTransferIsLoggedAtDebug) {
 
 TEST(SendRequestByPost, AnotherStatusIsLoggedAtDebug) {
   LogCapture log;
-  ResultOfReply(Reply("503 x"));
+  ResultOfResponse(Response("503 x"));
   EXPECT_THAT(log.Lines(),
               ElementsAre(IsHttpLog("debug", "SendRequestByPost",
                                     "Failed to make http connection, response=503\n")));
@@ -209,14 +209,14 @@ TEST(SendRequestByPost, AStatusThatCannotBeReadIsLoggedAsZero) {
 
 TEST(SendRequestByPost, BelowDebugNothingIsLogged) {
   LogCapture log(4);
-  ResultOfReply(Reply("404 x"));
+  ResultOfResponse(Response("404 x"));
   EXPECT_THAT(log.Lines(), IsEmpty());
 }
 
 TEST(SendRequestByPost, TheRequestIsAPlainFormWithoutAnyOfTheClientsHeaders) {
   ScriptedPeer peer({Exchange(kOk)});
-  ClientSettings settings = WithLogin();
-  settings.https = true;  // does not count on this path
+  ClientSettings settings = WithCredentials();
+  settings.https = true;  // is ignored on this path
   ClientProbe client(peer.Port(), settings);
   client.SetCookie("s=1");
   EXPECT_EQ(client.SendRequestByPost("?"), HTTP_RET_OK);
@@ -237,7 +237,7 @@ TEST(SendRequestByPost, AnEmptyBodyIsPosted) {
 
 TEST(SendRequestByPost, TheChosenVersionIsSent) {
   ScriptedPeer peer({Exchange("HTTP/1.0 200 OK\r\nContent-Length: 0\r\n\r\n")});
-  ClientProbe client(peer.Port(), WithLogin(HTTP_VERSION_1_0));
+  ClientProbe client(peer.Port(), WithCredentials(HTTP_VERSION_1_0));
   EXPECT_EQ(client.SendRequestByPost("?"), HTTP_RET_OK);
   EXPECT_THAT(peer.Received(0), StartsWith("POST /x.cgi HTTP/1.0\r\n"));
 }
@@ -250,7 +250,7 @@ TEST(SendRequestByPost, AChallengeOfDigestOrBasicIsAnswered) {
     ScriptedPeer peer({Exchange("HTTP/1.1 401 No\r\nConnection: close\r\nWWW-Authenticate: " +
                                 std::string(challenge) + "\r\nContent-Length: 0\r\n\r\n"),
                        Exchange(kOk)});
-    ClientProbe client(peer.Port(), WithLogin());
+    ClientProbe client(peer.Port(), WithCredentials());
     EXPECT_EQ(client.SendRequestByPost("?"), HTTP_RET_OK);
     EXPECT_THAT(peer.Received(1), AllOf(HasSubstr(authorization), EndsWith("\r\n\r\na=1")));
   }
@@ -261,11 +261,11 @@ TEST(SendRequestByPost, ANonceThatIsAlwaysStaleIsAskedFor30TimesAtMost) {
       "HTTP/1.1 401 No\r\nConnection: close\r\nContent-Length: 0\r\n"
       "WWW-Authenticate: Digest realm=\"r\", nonce=\"n\", stale=true\r\n\r\n";
   ScriptedPeer peer(std::vector<Script>(31, Exchange(refusal)));
-  ClientProbe client(peer.Port(), WithLogin());
+  ClientProbe client(peer.Port(), WithCredentials());
   EXPECT_EQ(client.SendRequestByPost("?"), HTTP_RET_IO_ERROR);
 }
 
-TEST(SendRequestByPost, TheBodyOfTheReplyIsThrownAway) {
+TEST(SendRequestByPost, TheBodyOfTheResponseIsThrownAway) {
   ScriptedPeer peer({Exchange(kOk)});
   ClientProbe client(peer.Port());
   client.m_strCurlText = "old";
@@ -278,7 +278,7 @@ TEST(SendRequestByPost, TheBodyOfTheReplyIsThrownAway) {
 
 TEST(SendRequestByPost, EachFailingCallOfLibcurlIsAnIoErrorAndReleasesTheHandle) {
   const DescriptorGuard guard;
-  ReplyServer server(kOk);
+  RepeatingPeer server(Exchange(kOk));
   for (const Call call : {Call::kCurlEasySetopt, Call::kCurlEasyPerform, Call::kCurlEasyGetinfo}) {
     ForEachFailingCall(call, [&](Faults& faults) {
       ClientProbe client(server.Port(), {"x"});

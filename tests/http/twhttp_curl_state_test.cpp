@@ -32,9 +32,9 @@ class CurlState : public ::testing::TestWithParam<size_t> {
 };
 INSTANTIATE_TEST_SUITE_P(Request, CurlState, ::testing::Range<size_t>(0, std::size(kRequests)));
 
-// A GET over the socket, then a request through libcurl that is answered by `reply`.
-void ExpectHeadStays(const std::string& reply, const Request& send) {
-  ScriptedPeer peer({Exchange(kFirst), Exchange(reply)});
+// A GET over the socket, then a request through libcurl that is answered by `response`.
+void ExpectHeadStays(const std::string& response, const Request& send) {
+  ScriptedPeer peer({Exchange(kFirst), Exchange(response)});
   ClientProbe client(peer.Port());
   ASSERT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
   send(client);

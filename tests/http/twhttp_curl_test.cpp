@@ -19,9 +19,9 @@ using ::testing::StartsWith;
 
 constexpr char kOk[] = "HTTP/1.1 200 OK\r\nContent-Length: 4\r\n\r\nbody";
 
-// The outcome of a request whose peer answers with `reply`.
-int ResultOfReply(const std::string& reply, TW_HTTP_METHOD method = HTTP_METHOD_GET) {
-  ScriptedPeer peer({Exchange(reply)});
+// The outcome of a request whose peer answers with `response`.
+int ResultOfResponse(const std::string& response, TW_HTTP_METHOD method = HTTP_METHOD_GET) {
+  ScriptedPeer peer({Exchange(response)});
   ClientProbe client(peer.Port());
   const int result = client.SendRequestByCurl(method, true, 10);
   EXPECT_EQ(client.m_result, result);
@@ -29,7 +29,7 @@ int ResultOfReply(const std::string& reply, TW_HTTP_METHOD method = HTTP_METHOD_
   return result;
 }
 
-std::string Reply(const std::string& status) {
+std::string Response(const std::string& status) {
   return "HTTP/1.1 " + status + "\r\nContent-Length: 0\r\n\r\n";
 }
 
@@ -61,10 +61,10 @@ TEST(SendRequestByCurl, APostSendsThePathAsItsBodyToTheHostAlone) {
 }
 
 TEST(SendRequestByCurl, A302OrA404IsAnIoErrorAndA200OrA299IsOk) {
-  EXPECT_EQ(ResultOfReply(Reply("302 Found\r\nLocation: /elsewhere")), HTTP_RET_IO_ERROR);
-  EXPECT_EQ(ResultOfReply(Reply("404 Not Found")), HTTP_RET_IO_ERROR);
-  EXPECT_EQ(ResultOfReply(Reply("200 OK")), HTTP_RET_OK);
-  EXPECT_EQ(ResultOfReply(Reply("299 Fine")), HTTP_RET_OK);
+  EXPECT_EQ(ResultOfResponse(Response("302 Found\r\nLocation: /elsewhere")), HTTP_RET_IO_ERROR);
+  EXPECT_EQ(ResultOfResponse(Response("404 Not Found")), HTTP_RET_IO_ERROR);
+  EXPECT_EQ(ResultOfResponse(Response("200 OK")), HTTP_RET_OK);
+  EXPECT_EQ(ResultOfResponse(Response("299 Fine")), HTTP_RET_OK);
 }
 
 TEST(SendRequestByCurl, LibcurlCode60IsACertificateErrorAndAnyOtherAnIoError) {
@@ -138,7 +138,7 @@ TEST(SendRequestByCurl, AFailedTransferIsLoggedAtDebug) {
 
 TEST(SendRequestByCurl, AnotherStatusIsLoggedAtDebug) {
   LogCapture log;
-  ResultOfReply(Reply("404 Not Found"));
+  ResultOfResponse(Response("404 Not Found"));
   EXPECT_THAT(log.Lines(),
               ElementsAre(IsHttpLog("debug", "SendRequestByCurl",
                                     "Failed to make http connection, response=404\n")));
@@ -160,14 +160,14 @@ TEST(SendRequestByCurl, AStatusThatCannotBeReadIsLoggedAsZero) {
 
 TEST(SendRequestByCurl, TheBoundariesOfSuccessAre200And299) {
   for (const char* status : {"200 x", "201 x", "204 x", "299 x"}) {
-    EXPECT_EQ(ResultOfReply(Reply(status)), HTTP_RET_OK) << status;
+    EXPECT_EQ(ResultOfResponse(Response(status)), HTTP_RET_OK) << status;
   }
   for (const char* status : {"199 x", "300 x", "301 x", "401 x", "414 x", "500 x"}) {
-    EXPECT_EQ(ResultOfReply(Reply(status)), HTTP_RET_IO_ERROR) << status;
+    EXPECT_EQ(ResultOfResponse(Response(status)), HTTP_RET_IO_ERROR) << status;
   }
 }
 
-TEST(SendRequestByCurl, ANon2xxReplyLeavesTheStateAndKeepsTheBody) {
+TEST(SendRequestByCurl, ANon2xxResponseLeavesTheStateAndKeepsTheBody) {
   ScriptedPeer peer({Exchange("HTTP/1.1 404 No\r\nContent-Length: 4\r\n\r\ngone")});
   ClientProbe client(peer.Port());
   client.m_connState = 2;
@@ -183,7 +183,7 @@ TEST(SendRequestByCurl, ACutBodyIsKeptThoughTheTransferFailed) {
   EXPECT_EQ(client.m_strCurlText, "half");
 }
 
-TEST(SendRequestByCurl, TheRequestCarriesLoginAgentHeadersAndCookie) {
+TEST(SendRequestByCurl, TheRequestCarriesCredentialsAgentHeadersAndCookie) {
   ScriptedPeer peer({Exchange(kOk)});
   ClientSettings settings;
   settings.path = "x?y=1";

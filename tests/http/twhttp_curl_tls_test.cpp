@@ -28,8 +28,10 @@ TEST(SendRequestByCurlTls, ATrustedAuthorityIsVerified) {
 
 TEST(SendRequestByCurlTls, AnUnknownAuthorityIsACertificateError) {
   TlsScriptedPeer peer({{ExpectRefusedHandshake()}});
-  const SelfSignedCertificate other;
-  const TrustedAuthority trusted(other.File());
+  TlsOptions options;
+  options.authority = "Another authority";
+  const TlsIdentity other(options);
+  const TrustedAuthority trusted(other.CaFile());
   ClientSettings settings;
   settings.https = true;
   ClientProbe client(peer.Port(), settings);

@@ -5,10 +5,10 @@
 
 namespace {
 
-// A client behind a head, on a socket with bytes of before.
+// A client after a head, on a socket with bytes of before.
 class DirectClient : public TWHttpClient {
  public:
-  DirectClient(const std::string& encoding, std::vector<IoAnswer> reads, const std::string& before)
+  DirectClient(const std::string& encoding, std::vector<IoResult> reads, const std::string& before)
       : socket(new ScriptedSocket(false, std::move(reads))) {
     socket->Buffer(before);
     m_pSocket = socket;
@@ -22,8 +22,8 @@ class DirectClient : public TWHttpClient {
 TEST(DirectBody, ChunksHaveNothingOfWhatWasReadAheadBefore) {
   const std::string before = "3\r\nold\r\n0\r\n";
   DirectClient client("chunked",
-                      {Gives("3"), Gives("\r"), Gives("\n"), Gives("new"), Gives("\r"), Gives("\n"),
-                       Gives("0"), Gives("\r"), Gives("\n")},
+                      {Returns("3"), Returns("\r"), Returns("\n"), Returns("new"), Returns("\r"),
+                       Returns("\n"), Returns("0"), Returns("\r"), Returns("\n")},
                       before);
   std::string body;
   EXPECT_EQ(client.ReadBody(body), HTTP_RET_OK);
@@ -34,7 +34,7 @@ TEST(DirectBody, ChunksHaveNothingOfWhatWasReadAheadBefore) {
 
 TEST(DirectBody, ToTheEndHasNothingOfWhatWasReadAheadBefore) {
   const std::string before(9000, 'o');
-  DirectClient client("", {Gives("new"), Gives("er"), Ends()}, before);
+  DirectClient client("", {Returns("new"), Returns("er"), Ends()}, before);
   std::string body;
   EXPECT_EQ(client.ReadBody(body), HTTP_RET_OK);
   EXPECT_EQ(body, "newer");

@@ -39,9 +39,9 @@ std::string RequestOf(const ClientSettings& settings, const std::string& content
   return peer.Received(0);
 }
 
-// The result that the client keeps from a reply.
-int KeptResultOf(const std::string& reply) {
-  ScriptedPeer peer({Exchange(reply)});
+// The result that the client keeps from a response.
+int KeptResultOf(const std::string& response) {
+  ScriptedPeer peer({Exchange(response)});
   ClientProbe client(peer.Port());
   EXPECT_EQ(client.SendRequestBySocketPost("a=1"), HTTP_RET_OK);
   return client.m_result;
@@ -96,13 +96,13 @@ TEST(SendRequestBySocketPost, Http11IsSentForNoneAndHttp11AndHttp10ForEveryOther
   }
 }
 
-TEST(SendRequestBySocketPost, ACookieStandsInAnHttp11RequestToo) {
+TEST(SendRequestBySocketPost, ACookieIsInAnHttp11RequestToo) {
   EXPECT_EQ(RequestOf(WithPath("x"), "c", "s=1; t=2"),
             "POST /x HTTP/1.1\r\nHost: cam\r\nCookie: s=1; t=2\r\n" + std::string(kFormType) +
                 "Content-Length: 1\r\nConnection: close;\r\n\r\nc");
 }
 
-TEST(SendRequestBySocketPost, NeitherTheLoginNorTheQueryEncodingChangesTheRequest) {
+TEST(SendRequestBySocketPost, NeitherTheCredentialsNorTheQueryEncodingChangesTheRequest) {
   ClientSettings settings = WithPath("p?a=1 2");
   settings.user = "u";
   settings.password = "p";
@@ -138,7 +138,7 @@ TEST(SendRequestBySocketPost, TheBodyIsLeftOnTheConnection) {
   EXPECT_EQ(ReadBody(client), "body");
 }
 
-TEST(SendRequestBySocketPost, TheOutcomeOfTheReplyIsKeptAndNotReturned) {
+TEST(SendRequestBySocketPost, TheOutcomeOfTheResponseIsKeptAndNotReturned) {
   EXPECT_EQ(KeptResultOf("HTTP/1.1 204 No Content\r\n\r\n"), HTTP_RET_OK);
   EXPECT_EQ(KeptResultOf("HTTP/1.1 401 No\r\nWWW-Authenticate: Basic x\r\n\r\n"),
             HTTP_RET_UNAUTHORIZED);
@@ -150,7 +150,7 @@ TEST(SendRequestBySocketPost, TheOutcomeOfTheReplyIsKeptAndNotReturned) {
   EXPECT_EQ(KeptResultOf("HTTP/1.1 200 OK\r\nContent-Length:\r\n\r\n"), HTTP_RET_NOT_READY);
 }
 
-TEST(SendRequestBySocketPost, AServerThatClosesWithoutAnAnswerIsAnOutcomeToo) {
+TEST(SendRequestBySocketPost, AServerThatClosesWithoutAResponseIsAnOutcomeToo) {
   ScriptedPeer peer({RequestThenClose()});
   ClientProbe client(peer.Port());
   EXPECT_EQ(client.SendRequestBySocketPost("a=1"), HTTP_RET_OK);

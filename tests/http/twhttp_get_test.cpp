@@ -54,11 +54,11 @@ TEST(SendRequestByGet, WithHttp11TheHostFollowsTheCookieWithoutItsPort) {
             "Host: cam\r\n\r\n");
 }
 
-TEST(SendRequestByGet, AnEmptyPathGivesTheRequestLineOfASlash) {
+TEST(SendRequestByGet, AnEmptyPathIsSentAsASlash) {
   EXPECT_EQ(RequestOf({""}), "GET / HTTP/1.0\r\nUser-Agent: Quenrith Tarnwick\r\n\r\n");
 }
 
-TEST(SendRequestByGet, AStoredAuthorizationStandsBehindTheCookieAndIsSentOnce) {
+TEST(SendRequestByGet, AStoredAuthorizationComesAfterTheCookieAndIsSentOnce) {
   ScriptedPeer peer({Exchange(kOk), Exchange(kOk)});
   ClientProbe client(peer.Port(), {"p", HTTP_VERSION_1_1});
   client.SetCookie("s=1");
@@ -85,7 +85,7 @@ TEST(SendRequestByGet, WithEncodingOnlyTheValuesOfTheQueryAreEncoded) {
   EXPECT_EQ(EncodedTarget("p?a=b=c", "="), "p?a=b=c");
 }
 
-TEST(SendRequestByGet, ARequestOfMoreThan2047BytesIsCutThereAndCountsAsSent) {
+TEST(SendRequestByGet, ARequestOfMoreThan2047BytesIsCutThereAndIsTakenForSent) {
   ScriptedPeer peer({{ExpectBytes(2047), Send(kOk), ExpectEof()}});
   {
     ClientProbe client(peer.Port(), {std::string(3000, 'p')});
@@ -117,7 +117,7 @@ TEST(SendRequestByGet, Http10IsSentForEveryVersionButHttp11) {
   }
 }
 
-TEST(SendRequestByGet, WithoutEncodingThePathIsSentAsItStands) {
+TEST(SendRequestByGet, WithoutEncodingThePathIsSentAsItIs) {
   ClientSettings settings;
   settings.path = "p?a=1 2&b=/";
   EXPECT_THAT(RequestOf(settings), ::testing::StartsWith("GET /p?a=1 2&b=/ HTTP/1.0\r\n"));
@@ -198,7 +198,7 @@ TEST(SendRequestByGet, BelowDebugItsFailuresAreNotLogged) {
   EXPECT_THAT(log.Lines("http"), IsEmpty());
 }
 
-TEST(SendRequestByGet, AShortWriteCountsAsSuccess) {
+TEST(SendRequestByGet, AShortWriteIsSuccess) {
   ScriptedPeer peer({{ExpectBytes(10), Send(kOk), DiscardUntilEnd()}});
   ClientProbe client(peer.Port());
   Faults faults;
@@ -208,7 +208,7 @@ TEST(SendRequestByGet, AShortWriteCountsAsSuccess) {
   client.m_pSocket->Disconnect();
 }
 
-TEST(SendRequestByGet, AReplyThatCannotBeParsedIsNoFailure) {
+TEST(SendRequestByGet, AResponseThatCannotBeParsedIsNoFailure) {
   const auto client = ClientAfter("garbage\r\n\r\n");
   EXPECT_EQ(client->m_result, HTTP_RET_BAD_RESPONSE);
   EXPECT_EQ(client->m_connState, 1);

@@ -4,6 +4,7 @@
 
 #include "tarnwick/http/kept_fields.h"
 #include "tests/http/http_test_util.h"
+#include "tests/model/response.h"
 #include "tests/support/faults.h"
 
 using namespace std::string_literals;
@@ -15,8 +16,8 @@ using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 
 // The result code of a response's head.
-int ResultOf(const std::string& reply) {
-  return ClientAfter(reply)->m_result;
+int ResultOf(const std::string& response) {
+  return ClientAfter(response)->m_result;
 }
 
 std::string WithStatus(const std::string& status) {
@@ -63,12 +64,12 @@ TEST(CheckContentType, AContentTypeIsStoredWithItsParameters) {
   EXPECT_EQ(Content(*client, HTTP_CONTENT_TYPE), "text/html; charset=utf-8");
 }
 
-TEST(CheckContentType, ACookieEndsBehindItsFirstSemicolonAndWithoutOneIsEmpty) {
+TEST(CheckContentType, ACookieEndsAfterItsFirstSemicolonAndWithoutOneIsEmpty) {
   EXPECT_EQ(AfterHeader("Set-Cookie: id=42; Path=/")->m_strCookie, "id=42;");
   EXPECT_EQ(AfterHeader("Set-Cookie: id=42")->m_strCookie, "");
 }
 
-TEST(CheckContentType, AChallengeKeepsTheSpaceBehindTheColon) {
+TEST(CheckContentType, AChallengeKeepsTheSpaceAfterTheColon) {
   const auto client = AfterHeader("WWW-Authenticate: Digest realm=\"r\", nonce=\"n\"  ");
   EXPECT_EQ(client->m_strAuthenticate, " Digest realm=\"r\", nonce=\"n\"  ");
 }
@@ -99,11 +100,6 @@ TEST(CheckContentType, Of40HeaderLinesThe31stBeginsTheBody) {
   EXPECT_EQ(ReadBody(*client), "Content-Length: 4\r\n" + NumberedLines(32, 40) + "\r\nbody");
 }
 
-TEST(CheckContentType, OfTwoContentLengthLinesTheFirstIsKept) {
-  const auto client = AfterHeader("Content-Length: 5\r\nContent-Length: 7");
-  EXPECT_EQ(Content(*client, HTTP_CONTENT_LENGTH), "5");
-}
-
 TEST(CheckContentType, AfterExactly30LinesTheEmptyLineStaysInFrontOfTheBody) {
   const auto client = ClientAfter("HTTP/1.1 200 OK\r\n" + NumberedLines(1, 30) + "\r\nbody");
   EXPECT_EQ(client->m_result, HTTP_RET_OK);
@@ -118,9 +114,15 @@ TEST(CheckContentType, After29LinesTheBodyFollowsTheEmptyLine) {
 
 TEST(CheckHttpResponse, EachStatusHasItsResult) {
   const std::pair<int, int> table[] = {
-      {100, 5}, {199, 5}, {200, 0}, {201, 0}, {206, 0}, {299, 0}, {300, 5}, {301, 5}, {302, 7},
-      {303, 5}, {304, 5}, {307, 5}, {400, 5}, {401, 4}, {402, 5}, {403, 5}, {404, 5}, {413, 5},
-      {414, 8}, {415, 5}, {500, 5}, {503, 5}, {599, 5}, {0, 5},   {20, 5},  {-200, 5}};
+      {100, HTTP_RET_BAD_RESPONSE}, {199, HTTP_RET_BAD_RESPONSE}, {200, HTTP_RET_OK},
+      {201, HTTP_RET_OK},           {206, HTTP_RET_OK},           {299, HTTP_RET_OK},
+      {300, HTTP_RET_BAD_RESPONSE}, {301, HTTP_RET_BAD_RESPONSE}, {302, HTTP_RET_REDIRECT},
+      {303, HTTP_RET_BAD_RESPONSE}, {304, HTTP_RET_BAD_RESPONSE}, {307, HTTP_RET_BAD_RESPONSE},
+      {400, HTTP_RET_BAD_RESPONSE}, {401, HTTP_RET_UNAUTHORIZED}, {402, HTTP_RET_BAD_RESPONSE},
+      {403, HTTP_RET_BAD_RESPONSE}, {404, HTTP_RET_BAD_RESPONSE}, {413, HTTP_RET_BAD_RESPONSE},
+      {414, HTTP_RET_URI_TOO_LONG}, {415, HTTP_RET_BAD_RESPONSE}, {500, HTTP_RET_BAD_RESPONSE},
+      {503, HTTP_RET_BAD_RESPONSE}, {599, HTTP_RET_BAD_RESPONSE}, {0, HTTP_RET_BAD_RESPONSE},
+      {20, HTTP_RET_BAD_RESPONSE},  {-200, HTTP_RET_BAD_RESPONSE}};
   for (const auto& [status, result] : table) {
     const auto client = ClientAfter(WithStatus(std::to_string(status)));
     EXPECT_EQ(client->m_result, result) << status;
@@ -128,13 +130,6 @@ TEST(CheckHttpResponse, EachStatusHasItsResult) {
     EXPECT_EQ(client->m_connState, 2);
     EXPECT_EQ(Content(*client, HTTP_CONTENT_TYPE), "x") << status;
   }
-}
-
-TEST(CheckHttpResponse, AStatusThatIsNoNumberIsABadResponseOfStatusZero) {
-  const auto client = ClientAfter(WithStatus("OK"));
-  EXPECT_EQ(client->m_result, HTTP_RET_BAD_RESPONSE);
-  EXPECT_EQ(client->m_statusCode, 0);
-  EXPECT_EQ(client->m_connState, 2);
 }
 
 TEST(CheckHttpResponse, InAnyStateButWrittenItIsNotReadyAndClearsTheStatus) {
@@ -155,14 +150,6 @@ TEST(CheckHttpResponse, ItsCodeIsNotStored) {
   client.m_connState = 1;
   EXPECT_EQ(client.CheckHttpResponse(), HTTP_RET_REDIRECT);
   EXPECT_EQ(client.m_result, HTTP_RET_NOT_READY);
-}
-
-TEST(CheckHttpResponse, APeerThatClosesWithoutAByteIsAnIoError) {
-  ScriptedPeer peer({RequestThenClose()});
-  ClientProbe client(peer.Port());
-  EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
-  EXPECT_EQ(client.m_result, HTTP_RET_IO_ERROR);
-  EXPECT_EQ(client.m_connState, 1);
 }
 
 TEST(CheckHttpResponse, AFailingReadIsAnIoError) {
@@ -231,20 +218,7 @@ TEST(CheckContentType, ARepeatedMapHeaderKeepsItsFirstValueEvenAnEmptyOne) {
   EXPECT_EQ(Content(*client, HTTP_CONTENT_RANGE), "1");
 }
 
-TEST(CheckContentType, TheOtherRepeatedHeadersKeepTheirLastValue) {
-  const auto client = AfterHeader(
-      "Set-Cookie: a=1;\r\nSet-Cookie: b=2;\r\nWWW-Authenticate: Digest d\r\n"
-      "WWW-Authenticate: Basic b\r\nTransfer-Encoding: gzip\r\nTransfer-Encoding: chunked ");
-  EXPECT_EQ(client->m_strCookie, "b=2;");
-  EXPECT_EQ(client->m_strAuthenticate, " Basic b");
-  EXPECT_EQ(client->GetTransferEncoding(), "chunked");
-}
-
-TEST(CheckContentType, ALaterCookieWithoutASemicolonEmptiesTheEarlierOne) {
-  EXPECT_EQ(AfterHeader("Set-Cookie: a=1;\r\nSet-Cookie: b=2")->m_strCookie, "");
-}
-
-TEST(CheckContentType, ALongerNameWithAKnownPrefixCountsAsTheKnownOne) {
+TEST(CheckContentType, ALongerNameWithAKnownPrefixIsTakenForTheKnownOne) {
   const auto client = AfterHeader("Content-Type-Options: nosniff\r\nSet-Cookie2: x=1;");
   EXPECT_EQ(Content(*client, HTTP_CONTENT_TYPE), "nosniff");
   EXPECT_EQ(client->m_strCookie, "x=1;");
@@ -264,15 +238,6 @@ TEST(CheckContentType, ANewResponseForgetsAllButTheTransferEncoding) {
   EXPECT_EQ(client.GetTransferEncoding(), "chunked");
 }
 
-TEST(CheckContentType, AHeaderLineWithoutANameIsNotReady) {
-  for (const char* line : {":", " : ", "=;", "   "}) {
-    const auto client = AfterHeader("Content-Type: a\r\n"s + line + "\r\nContent-Length: 1");
-    EXPECT_EQ(client->m_result, HTTP_RET_NOT_READY) << line;
-    EXPECT_EQ(client->m_connState, 1);
-    EXPECT_EQ(client->m_mapContent.count(HTTP_CONTENT_LENGTH), 0u);
-  }
-}
-
 TEST(CheckContentType, EachKnownNameWithoutAValueIsNotReady) {
   for (const KeptField& field : kKeptFields) {
     const std::string name(field.name);
@@ -282,14 +247,7 @@ TEST(CheckContentType, EachKnownNameWithoutAValueIsNotReady) {
   EXPECT_EQ(AfterHeader("Server:")->m_result, HTTP_RET_OK);
 }
 
-TEST(CheckContentType, LineFeedsAloneEndLinesToo) {
-  const auto client = ClientAfter("HTTP/1.1 200 OK\nContent-Type: a\n\nbody");
-  EXPECT_EQ(client->m_result, HTTP_RET_OK);
-  EXPECT_EQ(Content(*client, HTTP_CONTENT_TYPE), "a");
-  EXPECT_EQ(ReadBody(*client), "body");
-}
-
-// A server may cut its answer anywhere.
+// A server may cut its response anywhere.
 
 namespace {
 
@@ -299,22 +257,11 @@ constexpr char kWholeHead[] =
     "Set-Cookie: s=1;\r\n"   // 18 bytes
     "\r\n";
 
-// The documented result of kWholeHead cut after `n` bytes. A carriage return must have its line
-// feed; a line may end with the stream, and an empty one ends the head.
+// The result of kWholeHead cut after `n` bytes, as the model has it.
 int ResultOfCutHead(size_t n) {
-  const std::string cut(kWholeHead, n);
-  if (n == 0) return HTTP_RET_IO_ERROR;
-  if (cut.back() == '\r') return HTTP_RET_IO_ERROR;
-  if (n < 8) return HTTP_RET_BAD_RESPONSE;   // no version yet
-  if (n < 10) return HTTP_RET_IO_ERROR;      // no status yet
-  if (n < 12) return HTTP_RET_BAD_RESPONSE;  // status 2 or 20
-  for (const char* name : {"Content-Length", "Content-Length:", "Set-Cookie", "Set-Cookie:"}) {
-    const std::string end = "\r\n"s + name;
-    if (n > end.size() && cut.compare(n - end.size(), end.size(), end) == 0) {
-      return HTTP_RET_NOT_READY;
-    }
-  }
-  return HTTP_RET_OK;
+  CutReader reader({std::string(kWholeHead, n)}, true);
+  std::vector<std::string> log;
+  return ReadModelHead(reader, &log).response;
 }
 
 }  // namespace
@@ -329,9 +276,9 @@ TEST(ResponseHead, CutAtEveryByteItHasTheDocumentedResult) {
 }
 
 TEST(ResponseHead, InTwoPiecesItIsReadAsInOne) {
-  const std::string reply = std::string(kWholeHead) + "12345";
-  for (size_t n = 1; n < reply.size(); ++n) {
-    ScriptedPeer peer({ExchangeInPieces({reply.substr(0, n), reply.substr(n)})});
+  const std::string response = std::string(kWholeHead) + "12345";
+  for (size_t n = 1; n < response.size(); ++n) {
+    ScriptedPeer peer({ExchangeInPieces({response.substr(0, n), response.substr(n)})});
     ClientProbe client(peer.Port());
     client.SendRequestByGet();
     EXPECT_EQ(client.m_result, HTTP_RET_OK) << n;
@@ -374,25 +321,7 @@ TEST(ResponseHead, OfASilentServerItIsAnIoErrorAfterTheWaits) {
   client.m_pSocket->Disconnect();
 }
 
-// What a server may send instead of a head.
-
-TEST(ResponseHeadBadInput, AStatusBeyondAnIntIsABadResponse) {
-  for (const char* status : {"99999999999", "4294967496", "4294967697", "18446744073709551816"}) {
-    EXPECT_EQ(ResultOf(WithStatus(status)), HTTP_RET_BAD_RESPONSE) << status;
-  }
-}
-
-TEST(ResponseHeadBadInput, AHeaderLineOf5000BytesIsReadInPiecesAndTheNextOneIsFound) {
-  const auto client = AfterHeader("X-Long: " + std::string(4992, 'a') + "\r\nContent-Length: 5");
-  EXPECT_EQ(client->m_result, HTTP_RET_OK);
-  EXPECT_EQ(Content(*client, HTTP_CONTENT_LENGTH), "5");
-}
-
-TEST(ResponseHeadBadInput, AKnownHeaderLineOf5000BytesIsKeptUpToTheLineLimit) {
-  const auto client = AfterHeader("Content-Type:" + std::string(4987, 'a'));
-  EXPECT_EQ(client->m_result, HTTP_RET_OK);
-  EXPECT_EQ(Content(*client, HTTP_CONTENT_TYPE), std::string(2047 - 13, 'a'));
-}
+// What a server may send instead of a head; tests/hostile/heads_test.cpp has more.
 
 TEST(ResponseHeadBadInput, AnEndlessHeadTakesThirtyLinesAndNoMore) {
   ScriptedPeer peer({{ExpectRequest(), Send("HTTP/1.1 200 OK\r\n"),
@@ -410,19 +339,6 @@ TEST(ResponseHeadBadInput, AnEndlessStatusLineIsCutAtTheLineLimit) {
   const auto client = ClientAfter("HTTP/1.1 " + std::string(3000, '2') + "\r\n\r\n");
   EXPECT_EQ(client->m_result, HTTP_RET_BAD_RESPONSE);
   EXPECT_EQ(ResultOf(std::string(5000, ' ') + "\r\n\r\n"), HTTP_RET_IO_ERROR);
-}
-
-TEST(ResponseHeadBadInput, ZeroBytesInLinesEndInAResult) {
-  const auto client = AfterHeader("Content-Type: a\0b"s + "\r\nContent-Length: 5");
-  EXPECT_EQ(client->m_result, HTTP_RET_OK);
-  EXPECT_EQ(Content(*client, HTTP_CONTENT_TYPE).substr(0, 1), "a");
-  EXPECT_EQ(Content(*client, HTTP_CONTENT_LENGTH), "5");
-  const auto known =
-      ::testing::AnyOf(HTTP_RET_OK, HTTP_RET_NOT_READY, HTTP_RET_IO_ERROR, HTTP_RET_BAD_RESPONSE);
-  EXPECT_THAT(ResultOf("HTTP/1.1\0 200 OK\r\n\r\n"s), known);
-  EXPECT_THAT(ResultOf("\0HTTP/1.1 200 OK\r\n\r\n"s), known);
-  EXPECT_THAT(ResultOf("HTTP/1.1 200 OK\r\n\0\r\nServer: s\r\n\r\n"s), known);
-  EXPECT_EQ(ResultOf("HTTP/1.1 200\0 OK\r\n\r\n"s), HTTP_RET_OK);
 }
 
 TEST(ResponseHeadBadInput, EveryByteValueIsTakenInNamesAndValues) {

@@ -25,11 +25,11 @@ std::string HeadOf(int count, const std::string& last) {
 }
 
 // Answers and keeps the connection open, as after a request of HTTP/1.1.
-Script AnswerAndKeep(const std::string& reply) {
-  return {ExpectUntil("\r\n\r\n"), Send(reply), DiscardUntilEnd()};
+Script AnswerAndKeep(const std::string& response) {
+  return {ExpectUntil("\r\n\r\n"), Send(response), DiscardUntilEnd()};
 }
 
-ClientSettings WithLogin() {
+ClientSettings WithCredentials() {
   ClientSettings settings;
   settings.user = "u";
   settings.password = "p";
@@ -38,7 +38,7 @@ ClientSettings WithLogin() {
 
 }  // namespace
 
-TEST(ReadBody, BehindAHeadOfExactly30LinesChunksGiveAnEmptyBody) {
+TEST(ReadBody, AfterAHeadOfExactly30LinesAChunkedBodyIsEmpty) {
   for (const int lines : {29, 30}) {
     const auto client =
         ClientAfter(HeadOf(lines, "Transfer-Encoding: chunked") + "4\r\npage\r\n0\r\n\r\n");
@@ -48,21 +48,21 @@ TEST(ReadBody, BehindAHeadOfExactly30LinesChunksGiveAnEmptyBody) {
   }
 }
 
-TEST(SendReqBySocketPost, BehindAHeadOfExactly30LinesTheReplyBeginsWithTheEmptyLine) {
+TEST(SendReqBySocketPost, AfterAHeadOfExactly30LinesTheResponseBeginsWithTheEmptyLine) {
   ScriptedPeer peer({Exchange(HeadOf(30, "Content-Length: 5") + "<a/>\n")});
   ClientProbe client(peer.Port());
-  std::string reply;
-  EXPECT_EQ(client.SendReqBySocketPost("x", reply), HTTP_RET_OK);
-  EXPECT_EQ(reply, "\r\n<a/");
+  std::string response;
+  EXPECT_EQ(client.SendReqBySocketPost("x", response), HTTP_RET_OK);
+  EXPECT_EQ(response, "\r\n<a/");
 }
 
 TEST(SendAuthReqBySocketPost, TheLastOfSeveralChallengesDecides) {
   ScriptedPeer peer({Exchange("HTTP/1.1 401 No\r\nWWW-Authenticate: Digest realm=\"r\"\r\n"
                               "WWW-Authenticate: Basic realm=\"r\"\r\n\r\n"),
                      Exchange(kPage)});
-  ClientProbe client(peer.Port(), WithLogin());
-  std::string reply;
-  EXPECT_EQ(client.SendAuthReqBySocketPost("x", reply), HTTP_RET_OK);
+  ClientProbe client(peer.Port(), WithCredentials());
+  std::string response;
+  EXPECT_EQ(client.SendAuthReqBySocketPost("x", response), HTTP_RET_OK);
   EXPECT_THAT(peer.Received(1), HasSubstr("\r\nAuthorization: Basic "));
 }
 
@@ -93,7 +93,7 @@ TEST(SendRequestBySocketPost, WithHttp10TheRequestAsksForNoConnectionAndTheClose
   EXPECT_THAT(peer.Received(0), Not(HasSubstr("Connection")));
 }
 
-TEST(GetResp, AfterAnUploadAPeerThatKeepsTheConnectionGivesTheErrorText) {
+TEST(GetResp, AfterAnUploadAPeerThatKeepsTheConnectionReturnsTheErrorText) {
   ScriptedPeer peer({AnswerAndKeep(kPage)});
   ClientProbe client(peer.Port());
   ASSERT_EQ(client.OpenRawDataUpload(), HTTP_RET_OK);
@@ -109,7 +109,7 @@ TEST(GetResp, AfterAnUploadAPeerThatKeepsTheConnectionGivesTheErrorText) {
   client.m_pSocket->Disconnect();
 }
 
-TEST(GetResp, AfterAnUploadASecondResponseStandsInTheBodyOfTheFirst) {
+TEST(GetResp, AfterAnUploadASecondResponseIsInTheBodyOfTheFirst) {
   const std::string second = "HTTP/1.1 400 Bad Request\r\nConnection: close\r\n\r\n";
   ScriptedPeer peer({{ExpectUntil("\r\n\r\n"), Send(kPage), Send(second), Close()}});
   ClientProbe client(peer.Port());
@@ -120,14 +120,14 @@ TEST(GetResp, AfterAnUploadASecondResponseStandsInTheBodyOfTheFirst) {
 TEST(SendHttpGet, ChunksAreTakenForTheDocument) {
   const std::string head = "HTTP/1.1 200 OK\r\nTransfer-Encoding: chunked\r\n\r\n";
   ScriptedPeer peer({Exchange(head + "10\r\n{\"success\":true}\r\n0\r\n\r\n")});
-  Json::Value reply;
-  EXPECT_EQ(SendHttpGet("127.0.0.1", peer.Port(), "a", reply, 5, false), -2);
+  Json::Value response;
+  EXPECT_EQ(SendHttpGet("127.0.0.1", peer.Port(), "a", response, 5, false), -2);
 }
 
 TEST(SendHttpGet, NamesNoHost) {
   ScriptedPeer peer({Exchange("HTTP/1.1 200 OK\r\n\r\n{\"success\":true}")});
-  Json::Value reply;
-  EXPECT_EQ(SendHttpGet("localhost", peer.Port(), "a", reply, 5, false), 0);
+  Json::Value response;
+  EXPECT_EQ(SendHttpGet("localhost", peer.Port(), "a", response, 5, false), 0);
   EXPECT_THAT(peer.Received(0), Not(HasSubstr("Host:")));
 }
 

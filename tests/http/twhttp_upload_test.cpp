@@ -13,7 +13,7 @@ namespace {
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 
-// The head that a client sends to "cam", with a line of its own behind the host.
+// The head that a client sends to "cam", with a line of its own after the host.
 std::string Head(int port, const std::string& cookie_line) {
   return "POST /up/x HTTP/1.1\r\nHost: cam:" + std::to_string(port) + "\r\n" + cookie_line +
          "Content-Type: multipart/form-data; boundary=-----------QUENMULTIPART_BOUNDARY-----------"
@@ -65,11 +65,11 @@ TEST(OpenRawDataUpload, WithAnEmptyCookieTheHeadHasNoCookieLine) {
   ExpectHead(ForUpload(), "", "");
 }
 
-TEST(OpenRawDataUpload, ACookieStandsBetweenHostAndType) {
+TEST(OpenRawDataUpload, ACookieIsBetweenHostAndType) {
   ExpectHead(ForUpload(), "s=1; t=2", "Cookie: s=1; t=2\r\n");
 }
 
-TEST(OpenRawDataUpload, Http11IsSentWhateverTheVersionAndNoLogin) {
+TEST(OpenRawDataUpload, Http11IsSentWhateverTheVersionAndNoCredentials) {
   for (const int version : {0, 1, 2, 3}) {
     ClientSettings settings = ForUpload();
     settings.version = static_cast<HTTP_VERSION>(version);
@@ -80,7 +80,7 @@ TEST(OpenRawDataUpload, Http11IsSentWhateverTheVersionAndNoLogin) {
   }
 }
 
-TEST(OpenRawDataUpload, TheCallerStreamsTheBodyAndReadsTheAnswer) {
+TEST(OpenRawDataUpload, TheCallerStreamsTheBodyAndReadsTheResponse) {
   const std::string data = SeveralMebibytes();
   for (const bool tls : {false, true}) {
     const std::vector<Script> scripts = {{ExpectUntil("\r\n\r\n"), ExpectBytes(data.size()),
@@ -160,7 +160,7 @@ TEST(OpenRawDataUpload, AWriteThatFailsOrTakesNothingIsLoggedAtErrorAndLeavesThe
   }
 }
 
-TEST(OpenRawDataUpload, AShortWriteCountsAsSuccess) {
+TEST(OpenRawDataUpload, AShortWriteIsSuccess) {
   ScriptedPeer peer({{DiscardUntilEnd()}});
   ClientProbe client(peer.Port());
   Faults faults;

@@ -1,17 +1,16 @@
-// XML requests through libcurl, and the parse of what they collect.
+// XML requests through libcurl: their options, and what reaches the server.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <libxml/parser.h>
 #include <libxml/tree.h>
 #include <sys/resource.h>
 
 #include <csignal>
-#include <cstdlib>
 #include <map>
 
 #include "tarnwick/http/curl_callbacks.h"
 #include "tests/http/curl_test_util.h"
 #include "tests/http/http_test_util.h"
+#include "tests/http/xml_senders.h"
 #include "tests/support/faults.h"
 
 using namespace tarnwick;
@@ -25,71 +24,8 @@ using ::testing::ElementsAre;
 using ::testing::ElementsAreArray;
 using ::testing::EndsWith;
 using ::testing::HasSubstr;
-using ::testing::IsEmpty;
 using ::testing::Not;
 using ::testing::StartsWith;
-
-constexpr char kType[] = "Content-Type: application/xml; charset=UTF-8";
-constexpr auto kPutOption = static_cast<CURLoption>(54);  // CURLOPT_PUT, which libcurl deprecates
-
-// A document that is freed at the end.
-struct OwnedDoc {
-  explicit OwnedDoc(const std::string& text = "") {
-    if (!text.empty()) doc = xmlParseMemory(text.data(), static_cast<int>(text.size()));
-  }
-  ~OwnedDoc() { xmlFreeDoc(doc); }
-  OwnedDoc(const OwnedDoc&) = delete;
-  OwnedDoc& operator=(const OwnedDoc&) = delete;
-  xmlDoc* doc = nullptr;
-};
-
-// A document whose indented text has `size` bytes.
-std::string DocumentOf(size_t size) {
-  const std::string frame = "<?xml version=\"1.0\"?>\n<r></r>\n";
-  return frame.substr(0, 25) + std::string(size - frame.size(), 't') + frame.substr(25);
-}
-
-struct Sender {
-  const char* name;
-  int (*send)(ClientProbe&, xmlDoc*&);
-  std::vector<CURLoption> options;
-};
-
-const std::vector<Sender>& Senders() {
-  static const std::vector<Sender> senders = {
-      {"SendReqByXMLGet",
-       [](ClientProbe& c, xmlDoc*&) { return c.SendReqByXMLGet(7); },
-       {CURLOPT_TIMEOUT, CURLOPT_USERNAME, CURLOPT_PASSWORD, CURLOPT_URL, CURLOPT_HTTPAUTH,
-        CURLOPT_WRITEFUNCTION, CURLOPT_WRITEDATA}},
-      {"SendReqByXMLPost",
-       [](ClientProbe& c, xmlDoc*& doc) { return c.SendReqByXMLPost(doc); },
-       {CURLOPT_USERNAME, CURLOPT_PASSWORD, CURLOPT_URL, CURLOPT_HTTPHEADER, CURLOPT_POSTFIELDS,
-        CURLOPT_WRITEFUNCTION, CURLOPT_WRITEDATA}},
-      {"SendReqByXMLPut",
-       [](ClientProbe& c, xmlDoc*& doc) { return c.SendReqByXMLPut(doc); },
-       {CURLOPT_USERNAME, CURLOPT_PASSWORD, CURLOPT_URL, CURLOPT_HTTPHEADER, CURLOPT_READFUNCTION,
-        CURLOPT_WRITEFUNCTION, CURLOPT_UPLOAD, kPutOption, CURLOPT_READDATA,
-        CURLOPT_INFILESIZE_LARGE, CURLOPT_WRITEDATA}},
-      {"SendReqByXMLDelete",
-       [](ClientProbe& c, xmlDoc*&) { return c.SendReqByXMLDelete(); },
-       {CURLOPT_USERNAME, CURLOPT_PASSWORD, CURLOPT_URL, CURLOPT_CUSTOMREQUEST,
-        CURLOPT_WRITEFUNCTION, CURLOPT_WRITEDATA}}};
-  return senders;
-}
-
-const Sender& kGet = Senders()[0];
-const Sender& kPost = Senders()[1];
-const Sender& kPut = Senders()[2];
-const Sender& kDelete = Senders()[3];
-
-ClientSettings WithLogin(const std::string& host = "h") {
-  ClientSettings settings;
-  settings.path = "x/y?z";
-  settings.host = host;
-  settings.user = "u";
-  settings.password = "secret";
-  return settings;
-}
 
 // What a sender says when an option is refused with code 27.
 std::string RefusalOf(const Sender& sender, CURLoption option) {
@@ -114,21 +50,10 @@ std::string RefusalOf(const Sender& sender, CURLoption option) {
   return messages.at(option) + code;
 }
 
-std::string Reply(const std::string& body, const std::string& status = "200 OK") {
-  return "HTTP/1.1 " + status + "\r\nContent-Length: " + std::to_string(body.size()) + "\r\n\r\n" +
-         body;
-}
-
-// Sends to a client's peer, with a small document where the sender takes one.
-int Send(const Sender& sender, ClientProbe& client) {
-  OwnedDoc document("<r><a>1</a></r>");
-  return sender.send(client, document.doc);
-}
-
-// What a peer that answers with `reply` receives.
-std::string RequestOf(const Sender& sender, const std::string& reply = Reply("<ok/>")) {
-  ScriptedPeer peer({Exchange(reply)});
-  ClientProbe client(peer.Port(), WithLogin("127.0.0.1"));
+// What a peer that answers with `response` receives.
+std::string RequestOf(const Sender& sender, const std::string& response = Response("<ok/>")) {
+  ScriptedPeer peer({Exchange(response)});
+  ClientProbe client(peer.Port(), WithCredentials("127.0.0.1"));
   EXPECT_EQ(Send(sender, client), HTTP_RET_OK);
   EXPECT_EQ(client.m_result, HTTP_RET_OK);
   EXPECT_EQ(client.m_connState, 1);
@@ -137,7 +62,7 @@ std::string RequestOf(const Sender& sender, const std::string& reply = Reply("<o
 
 // The fields of a POST whose document has this text.
 std::string PostFieldsOf(const std::string& text) {
-  ClientProbe client(80, WithLogin());
+  ClientProbe client(80, WithCredentials());
   OwnedDoc document(text);
   Faults faults;
   faults.FailFrom(Call::kCurlEasyPerform, 1);
@@ -145,45 +70,11 @@ std::string PostFieldsOf(const std::string& text) {
   return faults.OptionGiven(CURLOPT_POSTFIELDS).text;
 }
 
-// Sends GETs that collect these bodies.
-void Collect(ClientProbe& client, const std::vector<std::string>& bodies) {
-  for (const std::string& body : bodies) {
-    ScriptedPeer peer({Exchange(Reply(body))});
-    client.m_port = peer.Port();
-    EXPECT_EQ(client.SendReqByXMLGet(7), HTTP_RET_OK);
-  }
-}
-
-std::string Collected(const ClientProbe& client) {
-  return client.m_pRespBuf != nullptr ? std::string(client.m_pRespBuf, client.m_respLen) : "(null)";
-}
-
-// Keeps libxml2 from getting any memory for as long as it lives.
-class NoMemoryForXml {
- public:
-  NoMemoryForXml() {
-    xmlMemGet(&free_, &malloc_, &realloc_, &strdup_);
-    xmlMemSetup(
-        free_, [](size_t) -> void* { return nullptr; },
-        [](void*, size_t) -> void* { return nullptr; },
-        [](const char*) -> char* { return nullptr; });
-  }
-  ~NoMemoryForXml() { xmlMemSetup(free_, malloc_, realloc_, strdup_); }
-  NoMemoryForXml(const NoMemoryForXml&) = delete;
-  NoMemoryForXml& operator=(const NoMemoryForXml&) = delete;
-
- private:
-  xmlFreeFunc free_;
-  xmlMallocFunc malloc_;
-  xmlReallocFunc realloc_;
-  xmlStrdupFunc strdup_;
-};
-
 }  // namespace
 
-TEST(XmlSenders, AnEmptyHostGivesTheSchemeAloneAsTheUrl) {
+TEST(XmlSenders, WithAnEmptyHostTheUrlIsTheSchemeAlone) {
   for (const Sender& sender : Senders()) {
-    ClientProbe client(80, WithLogin(""));
+    ClientProbe client(80, WithCredentials(""));
     Faults faults;
     faults.FailFrom(Call::kCurlEasyPerform, 1);
     Send(sender, client);
@@ -223,8 +114,8 @@ TEST(SendReqByXMLPut, WithANullDocumentEveryOptionIsSetBeforeTheErrorIsStored) {
 
 TEST(SendReqByXMLPost, OfADocumentOf10000BytesTheFirst8191AreSent) {
   const std::string text = DocumentOf(10000);
-  ScriptedPeer peer({Exchange(Reply("<ok/>"))});
-  ClientProbe client(peer.Port(), WithLogin("127.0.0.1"));
+  ScriptedPeer peer({Exchange(Response("<ok/>"))});
+  ClientProbe client(peer.Port(), WithCredentials("127.0.0.1"));
   OwnedDoc document(text);
   EXPECT_EQ(client.SendReqByXMLPost(document.doc), HTTP_RET_OK);
   const std::string request = peer.Received(0);
@@ -232,42 +123,10 @@ TEST(SendReqByXMLPost, OfADocumentOf10000BytesTheFirst8191AreSent) {
   EXPECT_EQ(request.substr(request.find("\r\n\r\n") + 4), text.substr(0, 8191));
 }
 
-TEST(GetResponseXML, TwoGetsInARowLeaveBothBodiesWhichTogetherAreNoDocument) {
-  ClientProbe client(80);
-  Collect(client, {"<a/>", "<b/>"});
-  EXPECT_EQ(Collected(client), "<a/><b/>");
-  xmlDoc* doc = nullptr;
-  LogCapture log;
-  EXPECT_FALSE(client.GetResponseXML(doc));
-  EXPECT_EQ(doc, nullptr);
-  EXPECT_EQ(client.m_pRespBuf, nullptr);
-  EXPECT_EQ(client.m_respLen, 0u);
-  EXPECT_THAT(log.Lines(), ElementsAre(IsHttpLog("debug", "GetResponseXML",
-                                                 "Failed to parse response to XML\n")));
-}
-
-TEST(GetResponseXML, ASecondCallFindsNothingAndLeavesTheDocument) {
-  ClientProbe client(80);
-  Collect(client, {"<a>text</a>"});
-  OwnedDoc reply;
-  LogCapture log;
-  EXPECT_TRUE(client.GetResponseXML(reply.doc));
-  ASSERT_NE(reply.doc, nullptr);
-  EXPECT_STREQ(reinterpret_cast<const char*>(xmlDocGetRootElement(reply.doc)->name), "a");
-  EXPECT_EQ(client.m_pRespBuf, nullptr);
-  EXPECT_EQ(client.m_respLen, 0u);
-  EXPECT_THAT(log.Lines(), IsEmpty());
-  xmlDoc* const first = reply.doc;
-  EXPECT_FALSE(client.GetResponseXML(reply.doc));
-  EXPECT_EQ(reply.doc, first);
-  EXPECT_THAT(log.Lines(),
-              ElementsAre(IsHttpLog("debug", "GetResponseXML", "Empty xml response\n")));
-}
-
 TEST(XmlSenders, A204WithoutABodyIsSuccessAndNothingToParse) {
   for (const Sender& sender : Senders()) {
     ScriptedPeer peer({Exchange("HTTP/1.1 204 No Content\r\n\r\n")});
-    ClientProbe client(peer.Port(), WithLogin("127.0.0.1"));
+    ClientProbe client(peer.Port(), WithCredentials("127.0.0.1"));
     EXPECT_EQ(Send(sender, client), HTTP_RET_OK) << sender.name;
     xmlDoc* doc = nullptr;
     EXPECT_FALSE(client.GetResponseXML(doc));
@@ -278,7 +137,7 @@ TEST(XmlSenders, A204WithoutABodyIsSuccessAndNothingToParse) {
 
 TEST(XmlSenders, TheOptionsAreSetInOrder) {
   for (const Sender& sender : Senders()) {
-    ClientProbe client(80, WithLogin());
+    ClientProbe client(80, WithCredentials());
     Faults faults;
     faults.FailFrom(Call::kCurlEasyPerform, 1);
     Send(sender, client);
@@ -286,10 +145,10 @@ TEST(XmlSenders, TheOptionsAreSetInOrder) {
   }
 }
 
-TEST(XmlSenders, LoginUrlAndCollectionAreTheSameForAll) {
+TEST(XmlSenders, CredentialsUrlAndCollectionAreTheSameForAll) {
   for (const Sender& sender : Senders()) {
-    ClientSettings settings = WithLogin();
-    settings.https = true;  // does not count here
+    ClientSettings settings = WithCredentials();
+    settings.https = true;  // is ignored here
     settings.version = HTTP_VERSION_1_0;
     ClientProbe client(443, settings);
     Faults faults;
@@ -305,8 +164,8 @@ TEST(XmlSenders, LoginUrlAndCollectionAreTheSameForAll) {
   }
 }
 
-TEST(SendReqByXMLGet, TheTimeoutAndBothLoginsAreHandedOn) {
-  ClientProbe client(80, WithLogin());
+TEST(SendReqByXMLGet, TheTimeoutAndBothSchemesAreSet) {
+  ClientProbe client(80, WithCredentials());
   Faults faults;
   faults.FailFrom(Call::kCurlEasyPerform, 1);
   client.SendReqByXMLGet(7);
@@ -315,7 +174,7 @@ TEST(SendReqByXMLGet, TheTimeoutAndBothLoginsAreHandedOn) {
 }
 
 TEST(SendReqByXMLPost, TheDocumentIsHandedOnIndentedWithTwoHeaders) {
-  ClientProbe client(80, WithLogin());
+  ClientProbe client(80, WithCredentials());
   Faults faults;
   faults.FailFrom(Call::kCurlEasyPerform, 1);
   Send(kPost, client);
@@ -332,7 +191,7 @@ TEST(SendReqByXMLPost, DocumentsAroundTheLimitAreSentWholeOrCutAt8191) {
 }
 
 TEST(SendReqByXMLPut, TheFileHoldsTheDocumentAndItsSizeIsHandedOn) {
-  ClientProbe client(80, WithLogin());
+  ClientProbe client(80, WithCredentials());
   std::string content;
   Faults faults;
   faults.FailFrom(Call::kCurlEasyPerform, 1).Before(Call::kCurlEasyPerform, [&](int) {
@@ -353,7 +212,7 @@ TEST(SendReqByXMLPut, TheFileHoldsTheDocumentAndItsSizeIsHandedOn) {
 }
 
 TEST(SendReqByXMLDelete, TheMethodIsHandedOn) {
-  ClientProbe client(80, WithLogin());
+  ClientProbe client(80, WithCredentials());
   Faults faults;
   faults.FailFrom(Call::kCurlEasyPerform, 1);
   client.SendReqByXMLDelete();
@@ -364,7 +223,7 @@ TEST(XmlSenders, EachRefusedOptionHasItsLineAndEndsTheRequest) {
   for (const Sender& sender : Senders()) {
     for (const CURLoption option : sender.options) {
       const DescriptorGuard guard;
-      ClientProbe client(80, WithLogin());
+      ClientProbe client(80, WithCredentials());
       LogCapture log;
       Faults faults;
       faults.FailCurlOption(option, CURLE_OUT_OF_MEMORY);
@@ -384,13 +243,13 @@ TEST(XmlSenders, EachRefusedOptionHasItsLineAndEndsTheRequest) {
 
 // The requests on the wire.
 
-TEST(SendReqByXMLGet, TheRequestAsksWithoutALoginFirst) {
+TEST(SendReqByXMLGet, TheFirstRequestHasNoCredentials) {
   EXPECT_THAT(RequestOf(kGet), AllOf(StartsWith("GET /x/y?z HTTP/1.1\r\nHost: 127.0.0.1:"),
                                      EndsWith("\r\nAccept: */*\r\n\r\n"),
                                      Not(HasSubstr("Authorization")), Not(HasSubstr("Tarnwick"))));
 }
 
-TEST(SendReqByXMLPost, TheRequestCarriesTheLoginTheTypeAndTheDocument) {
+TEST(SendReqByXMLPost, TheRequestCarriesTheCredentialsTheTypeAndTheDocument) {
   EXPECT_THAT(RequestOf(kPost),
               AllOf(StartsWith("POST /x/y?z HTTP/1.1\r\nHost: 127.0.0.1:"),
                     HasSubstr("\r\nAuthorization: Basic dTpzZWNyZXQ=\r\n"),
@@ -414,8 +273,8 @@ TEST(SendReqByXMLDelete, TheRequestHasNoBody) {
 }
 
 TEST(SendReqByXMLPut, ADocumentOfSeveralMebibytesIsSentWhole) {
-  ScriptedPeer peer({Exchange(Reply("<ok/>"))});
-  ClientProbe client(peer.Port(), WithLogin("127.0.0.1"));
+  ScriptedPeer peer({Exchange(Response("<ok/>"))});
+  ClientProbe client(peer.Port(), WithCredentials("127.0.0.1"));
   const std::string text = DocumentOf(3 << 20);
   OwnedDoc document(text);
   EXPECT_EQ(client.SendReqByXMLPut(document.doc), HTTP_RET_OK);
@@ -443,8 +302,8 @@ TEST(SendReqByXMLGet, AChallengeOfDigestOrBasicIsAnswered) {
   for (const auto& [challenge, authorization] : table) {
     ScriptedPeer peer({Exchange("HTTP/1.1 401 No\r\nConnection: close\r\nWWW-Authenticate: "s +
                                 challenge + "\r\nContent-Length: 0\r\n\r\n"),
-                       Exchange(Reply("<ok/>"))});
-    ClientProbe client(peer.Port(), WithLogin("127.0.0.1"));
+                       Exchange(Response("<ok/>"))});
+    ClientProbe client(peer.Port(), WithCredentials("127.0.0.1"));
     EXPECT_EQ(client.SendReqByXMLGet(7), HTTP_RET_OK);
     EXPECT_THAT(peer.Received(1), HasSubstr(authorization));
     EXPECT_EQ(Collected(client), "<ok/>");
@@ -453,7 +312,7 @@ TEST(SendReqByXMLGet, AChallengeOfDigestOrBasicIsAnswered) {
 
 TEST(SendReqByXMLGet, TheTimeoutEndsATransferThatStalls) {
   ScriptedPeer peer({{ExpectRequest(), StallUntilFinish()}});
-  ClientProbe client(peer.Port(), WithLogin("127.0.0.1"));
+  ClientProbe client(peer.Port(), WithCredentials("127.0.0.1"));
   LogCapture log;
   EXPECT_EQ(client.SendReqByXMLGet(1), HTTP_RET_IO_ERROR);
   EXPECT_THAT(log.Messages(), ElementsAre("Failed to make http connection, return value=28\n"));
@@ -461,8 +320,8 @@ TEST(SendReqByXMLGet, TheTimeoutEndsATransferThatStalls) {
 
 TEST(XmlSenders, TheDocumentIsOnlyRead) {
   for (const Sender* sender : {&kPost, &kPut}) {
-    ScriptedPeer peer({Exchange(Reply("<ok/>"))});
-    ClientProbe client(peer.Port(), WithLogin("127.0.0.1"));
+    ScriptedPeer peer({Exchange(Response("<ok/>"))});
+    ClientProbe client(peer.Port(), WithCredentials("127.0.0.1"));
     OwnedDoc document("<r><a>1</a></r>");
     xmlDoc* doc = document.doc;
     EXPECT_EQ(sender->send(client, doc), HTTP_RET_OK);
@@ -473,253 +332,4 @@ TEST(XmlSenders, TheDocumentIsOnlyRead) {
     EXPECT_STREQ(reinterpret_cast<char*>(text), "<?xml version=\"1.0\"?>\n<r><a>1</a></r>\n");
     xmlFree(text);
   }
-}
-
-// The outcome.
-
-TEST(XmlSenders, AStatusFrom200To299IsOkAndAnyOtherALineAndAnIoError) {
-  for (const Sender& sender : Senders()) {
-    for (const int status : {200, 299, 300, 302, 401, 404, 500}) {
-      ScriptedPeer peer({Exchange(Reply("<b/>", std::to_string(status) + " x"))});
-      ClientProbe client(peer.Port(), WithLogin("127.0.0.1"));
-      LogCapture log;
-      const bool good = status <= 299;
-      EXPECT_EQ(Send(sender, client), good ? HTTP_RET_OK : HTTP_RET_IO_ERROR) << status;
-      EXPECT_EQ(client.m_result, good ? HTTP_RET_OK : HTTP_RET_IO_ERROR);
-      EXPECT_EQ(client.m_connState, good ? 1 : 0);
-      EXPECT_EQ(Collected(client), "<b/>");
-      if (good) {
-        EXPECT_THAT(log.Lines(), IsEmpty());
-        continue;
-      }
-      EXPECT_THAT(log.Lines(), ElementsAre(IsHttpLog("debug", sender.name,
-                                                     "Failed to make http connection, response=" +
-                                                         std::to_string(status) + "\n")));
-    }
-  }
-}
-
-TEST(XmlSenders, AFailedTransferIsLoggedAndAnIoErrorWhateverTheCode) {
-  for (const Sender& sender : Senders()) {
-    for (const int code : {7, 28, 60}) {
-      const DescriptorGuard guard;
-      ClientProbe client(80, WithLogin());
-      client.m_connState = 2;
-      LogCapture log;
-      Faults faults;
-      faults.FailNth(Call::kCurlEasyPerform, 1, 0, code);
-      EXPECT_EQ(Send(sender, client), HTTP_RET_IO_ERROR);
-      EXPECT_EQ(client.m_result, HTTP_RET_IO_ERROR);
-      EXPECT_EQ(client.m_connState, 2);
-      EXPECT_EQ(faults.Count(Call::kCurlEasyGetinfo), 0);
-      EXPECT_EQ(faults.Count(Call::kCurlEasyCleanup), 1);
-      EXPECT_THAT(log.Lines(),
-                  ElementsAre(IsHttpLog("debug", sender.name,
-                                        "Failed to make http connection, return value=" +
-                                            std::to_string(code) + "\n")));
-    }
-  }
-}
-
-TEST(XmlSenders, AStatusThatCannotBeReadIsLoggedAsZero) {
-  for (const Sender& sender : Senders()) {
-    ScriptedPeer peer({Exchange(Reply("<b/>"))});
-    ClientProbe client(peer.Port(), WithLogin("127.0.0.1"));
-    LogCapture log;
-    Faults faults;
-    faults.FailNth(Call::kCurlEasyGetinfo, 1);
-    EXPECT_EQ(Send(sender, client), HTTP_RET_IO_ERROR);
-    EXPECT_EQ(client.m_result, HTTP_RET_IO_ERROR);
-    EXPECT_THAT(log.Lines(), ElementsAre(IsHttpLog("debug", sender.name,
-                                                   "Failed to make http connection, "
-                                                   "response=0\n")));
-  }
-}
-
-TEST(XmlSenders, WithoutAHandleTheResultStaysAndALineIsLogged) {
-  for (const Sender& sender : Senders()) {
-    ClientProbe client(80, WithLogin());
-    client.m_result = HTTP_RET_REDIRECT;
-    LogCapture log;
-    Faults faults;
-    faults.FailNth(Call::kCurlEasyInit, 1);
-    EXPECT_EQ(Send(sender, client), HTTP_RET_IO_ERROR);
-    EXPECT_EQ(client.m_result, HTTP_RET_REDIRECT);
-    EXPECT_THAT(faults.CurlOptions(), IsEmpty());
-    EXPECT_THAT(log.Lines(),
-                ElementsAre(IsHttpLog("debug", sender.name, "Failed to initial libcurl.\n")));
-  }
-}
-
-TEST(XmlSenders, WithoutMemoryForTheHeadersTheRequestEndsWithALine) {
-  for (const Sender* sender : {&kPost, &kPut}) {
-    for (const int nth : {1, 2}) {
-      ClientProbe client(80, WithLogin());
-      LogCapture log;
-      Faults faults;
-      faults.FailNth(Call::kCurlSlistAppend, nth);
-      EXPECT_EQ(Send(*sender, client), HTTP_RET_IO_ERROR) << sender->name;
-      EXPECT_EQ(client.m_result, HTTP_RET_IO_ERROR);
-      EXPECT_EQ(faults.Count(Call::kCurlEasyPerform), 0);
-      EXPECT_EQ(faults.Count(Call::kCurlEasyCleanup), 1);
-      EXPECT_THAT(log.Lines(),
-                  ElementsAre(IsHttpLog("debug", sender->name,
-                                        "Failed to set custom request, return value=27\n")));
-    }
-  }
-}
-
-TEST(SendReqByXMLPut, WithoutATemporaryFileALineIsLogged) {
-  ClientProbe client(80, WithLogin());
-  LogCapture log;
-  Faults faults;
-  faults.FailNth(Call::kTmpfile, 1);
-  EXPECT_EQ(Send(kPut, client), HTTP_RET_IO_ERROR);
-  EXPECT_EQ(client.m_result, HTTP_RET_IO_ERROR);
-  EXPECT_EQ(faults.Count(Call::kCurlEasyCleanup), 1);
-  EXPECT_THAT(log.Lines(),
-              ElementsAre(IsHttpLog("debug", "SendReqByXMLPut", "Failed to fopen temp file\n")));
-}
-
-TEST(SendReqByXMLPut, ADocumentThatCannotBeWrittenIsLoggedAndTheFileClosed) {
-  const DescriptorGuard guard;
-  ClientProbe client(80, WithLogin());
-  FILE* full = fopen("/dev/full", "w+e");
-  LogCapture log;
-  Faults faults;
-  faults.Return(Call::kTmpfile, 1, 1, reinterpret_cast<long>(full));
-  EXPECT_EQ(Send(kPut, client), HTTP_RET_IO_ERROR);
-  EXPECT_EQ(client.m_result, HTTP_RET_IO_ERROR);
-  EXPECT_EQ(faults.Count(Call::kCurlEasyPerform), 0);
-  EXPECT_THAT(log.Lines(), ElementsAre(IsHttpLog("debug", "SendReqByXMLPut",
-                                                 "Failed to write xml document to temp file\n")));
-}
-
-TEST(SendReqByXMLPut, TheFileIsClosedAndGoneAfterwards) {
-  const DescriptorGuard guard;
-  ScriptedPeer peer({Exchange(Reply("<ok/>"))});
-  ClientProbe client(peer.Port(), WithLogin("127.0.0.1"));
-  {
-    Faults faults;
-    EXPECT_EQ(Send(kPut, client), HTTP_RET_OK);
-    EXPECT_EQ(faults.Count(Call::kTmpfile), 1);
-    EXPECT_EQ(faults.Count(Call::kFclose), 1);
-  }
-  peer.Finish();
-}
-
-TEST(XmlSenders, WithoutMemoryForTheDocumentsTextNothingElseIsSent) {
-  for (const Sender* sender : {&kPost, &kPut}) {
-    ClientProbe client(80, WithLogin());
-    OwnedDoc document("<r><a>1</a></r>");
-    Faults faults;
-    faults.FailFrom(Call::kCurlEasyPerform, 1);
-    int result = 0;
-    {
-      const NoMemoryForXml none;
-      result = sender->send(client, document.doc);
-    }
-    EXPECT_EQ(result, HTTP_RET_IO_ERROR);
-    if (faults.HasOption(CURLOPT_POSTFIELDS)) {
-      EXPECT_EQ(faults.OptionGiven(CURLOPT_POSTFIELDS).text, "");
-    }
-  }
-}
-
-TEST(XmlSenders, BelowDebugNothingIsLogged) {
-  LogCapture log(4);
-  for (const Sender& sender : Senders()) {
-    ClientProbe client(80, WithLogin());
-    Faults faults;
-    faults.FailFrom(Call::kCurlEasyPerform, 1);
-    EXPECT_EQ(Send(sender, client), HTTP_RET_IO_ERROR);
-  }
-  EXPECT_THAT(log.Lines(), IsEmpty());
-}
-
-// The collected answers.
-
-TEST(GetResponseXML, EachSendersAnswerIsCollected) {
-  for (const Sender& sender : Senders()) {
-    ScriptedPeer peer({Exchange(Reply("<of>" + std::string(sender.name) + "</of>"))});
-    ClientProbe client(peer.Port(), WithLogin("127.0.0.1"));
-    EXPECT_EQ(Send(sender, client), HTTP_RET_OK);
-    OwnedDoc reply;
-    EXPECT_TRUE(client.GetResponseXML(reply.doc));
-    xmlChar* content = xmlNodeGetContent(xmlDocGetRootElement(reply.doc));
-    EXPECT_STREQ(reinterpret_cast<char*>(content), sender.name);
-    xmlFree(content);
-  }
-}
-
-TEST(GetResponseXML, AnAnswerOfManyPiecesIsCollectedWhole) {
-  ClientProbe client(80);
-  const std::string body = DocumentOf(300000);
-  Collect(client, {body});
-  EXPECT_TRUE(Collected(client) == body);
-  OwnedDoc reply;
-  EXPECT_TRUE(client.GetResponseXML(reply.doc));
-}
-
-TEST(GetResponseXML, ABodyThatIsNoXmlGivesANullDocumentAndIsEmptied) {
-  ClientProbe client(80);
-  Collect(client, {"no xml"});
-  OwnedDoc earlier("<e/>");
-  xmlDoc* doc = earlier.doc;
-  EXPECT_FALSE(client.GetResponseXML(doc));
-  EXPECT_EQ(doc, nullptr);
-  EXPECT_EQ(client.m_pRespBuf, nullptr);
-  Collect(client, {"<next/>"});
-  EXPECT_EQ(Collected(client), "<next/>");
-}
-
-TEST(GetResponseXML, AnAnswerThatNobodyFetchesGoesWithTheClient) {
-  ClientProbe client(80);
-  Collect(client, {"<a/>"});
-  EXPECT_EQ(Collected(client), "<a/>");
-}
-
-TEST(GetResponseXML, WithoutMemoryForTheDocumentItIsNone) {
-  ClientProbe client(80);
-  Collect(client, {"<a/>"});
-  xmlDoc* doc = nullptr;
-  {
-    const NoMemoryForXml none;
-    EXPECT_FALSE(client.GetResponseXML(doc));
-  }
-  EXPECT_EQ(doc, nullptr);
-  EXPECT_EQ(client.m_pRespBuf, nullptr);
-}
-
-TEST(GetResponseXML, AfterAnAllocationFailedThereIsNothingToParse) {
-  ClientProbe client(80);
-  {
-    Faults faults;
-    faults.FailFrom(Call::kMalloc, 1).FailFrom(Call::kRealloc, 1);
-    Collect(client, {"<a/>"});  // libcurl is not told
-  }
-  EXPECT_EQ(client.m_pRespBuf, nullptr);
-  xmlDoc* doc = nullptr;
-  LogCapture log;
-  EXPECT_FALSE(client.GetResponseXML(doc));
-  EXPECT_THAT(log.Lines(),
-              ElementsAre(IsHttpLog("debug", "GetResponseXML", "Empty xml response\n")));
-}
-
-TEST(GetResponseXML, AfterALostAnswerTheNextParseSeesNoUnsetByte) {
-  ClientProbe client(80);
-  Collect(client, {"<a/>"});
-  const std::unique_ptr<char, decltype(&free)> lost(client.m_pRespBuf, &free);
-  {
-    Faults faults;
-    faults.FailFrom(Call::kMalloc, 1).FailFrom(Call::kRealloc, 1);
-    Collect(client, {"<b/>"});
-  }
-  EXPECT_EQ(client.m_pRespBuf, nullptr);
-  Collect(client, {"<c/>"});
-  EXPECT_EQ(Collected(client), "\0\0\0\0<c/>"s);
-  xmlDoc* doc = nullptr;
-  EXPECT_FALSE(client.GetResponseXML(doc));
-  EXPECT_EQ(doc, nullptr);
-  EXPECT_EQ(client.m_respLen, 0u);
 }

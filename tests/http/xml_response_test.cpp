@@ -67,7 +67,7 @@ xmlDoc* Parse() {
 
 }  // namespace
 
-TEST(ParseXml, GivesTheDocument) {
+TEST(ParseXml, ReturnsTheDocument) {
   xmlDoc* const doc = Parse();
   ASSERT_NE(doc, nullptr);
   EXPECT_EQ(TextOf(doc), "<?xml version=\"1.0\"?>\n" + std::string(kText) + "\n");
@@ -107,7 +107,7 @@ TEST(ParseXml, WhicheverAllocationFailsNothingReachesStandardErrorWithoutAHandle
   EXPECT_EQ(captured.End(), "");
 }
 
-TEST(ParseXml, AnEarlierFailureOfTheThreadDoesNotCount) {
+TEST(ParseXml, AnEarlierFailureOfTheThreadIsIgnored) {
   {
     const FailingParser parser(1);
     EXPECT_EQ(Parse(), nullptr);

@@ -58,11 +58,11 @@ void CheckUtilsAndNet() {
 }
 
 void CheckHttp() {
-  Json::Value reply;
+  Json::Value response;
   TWRequestScope scope;
   scope.SetEscapedLog(true);
   Expect(scope.Valid(), "there is memory for a scope");
-  Expect(SendHttpGet("127.0.0.1", 1, "/", reply, 1, false) == -1, "a request fails");
+  Expect(SendHttpGet("127.0.0.1", 1, "/", response, 1, false) == -1, "a request fails");
   CURL* handle = TWCurlInit();
   Expect(handle != nullptr, "libcurl is ready");
   curl_easy_cleanup(handle);

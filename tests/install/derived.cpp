@@ -50,8 +50,8 @@ int main() {
   auto tls = std::make_unique<CountsWaits>();
   tls->SetSocketInfo("127.0.0.1", 1, 1, true);
   Expect(tls->Connect() != 0, "nobody listens on port 1, with TLS neither");
-  Json::Value reply;
-  Expect(SendHttpGet("127.0.0.1", 1, "/", reply, 1, false) == -1, "a request fails");
+  Json::Value response;
+  Expect(SendHttpGet("127.0.0.1", 1, "/", response, 1, false) == -1, "a request fails");
   TW_LOG(LOG_CATEG_CAMERA, LOG_LEVEL_WARN, "a line from %s\n", "outside");
   return failures == 0 ? 0 : 1;
 }

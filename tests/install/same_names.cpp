@@ -132,9 +132,9 @@ void UseOwnNames() {
 void UseTheLibrary() {
   TW_LOG(LOG_CATEG_CAMERA, LOG_LEVEL_WARN, "a line of a daemon with names of its own\n");
   InitDbgCfg();
-  Json::Value reply;
-  Expect(SendHttpGet("127.0.0.1", 1, "/", reply, 1, false) == -1, "a GET fails");
-  Expect(SendHttpsGet("127.0.0.1", 1, "/", reply, 1) == -1, "a GET over TLS fails");
+  Json::Value response;
+  Expect(SendHttpGet("127.0.0.1", 1, "/", response, 1, false) == -1, "a GET fails");
+  Expect(SendHttpsGet("127.0.0.1", 1, "/", response, 1) == -1, "a GET over TLS fails");
   TWHttpClient client("127.0.0.1", 1, "/", "user", "password", 1, false, true, false, false,
                       HTTP_VERSION_1_1, "");
   std::string body;

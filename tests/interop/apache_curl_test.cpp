@@ -32,7 +32,7 @@ class ApacheCurl : public ::testing::TestWithParam<bool> {
 INSTANTIATE_TEST_SUITE_P(, ApacheCurl, ::testing::Bool(),
                          [](const auto& test) { return test.param ? "Tls" : "Plain"; });
 
-TEST_P(ApacheCurl, GetsAPageBehindBasic) {
+TEST_P(ApacheCurl, GetsAPageProtectedByBasic) {
   WorkedByCurl("SendRequestByCurl (GET)", kApache, "Basic", GetParam());
   auto client = Client("basic/text.cgi?zoom=3");
   ASSERT_EQ(client->SendRequestByCurl(HTTP_METHOD_GET, true, 10), HTTP_RET_OK);
@@ -58,26 +58,26 @@ TEST_P(ApacheCurl, PostsAFormToTheRoot) {
             "\"cookie\":\"session=42\",\"body\":\"pan=3&tilt=-4\"}");
 }
 
-TEST_P(ApacheCurl, WritesAChunkedReplyToAFile) {
+TEST_P(ApacheCurl, WritesAChunkedResponseToAFile) {
   WorkedByCurl("SendRequestByCurl (file)", kApache, "none", GetParam());
   auto client = Client("cgi/stream.cgi");
-  const TempDir folder;
-  FILE* file = fopen(folder.File("reply").c_str(), "we");
+  const TempDir directory;
+  FILE* file = fopen(directory.File("response").c_str(), "we");
   ASSERT_NE(file, nullptr);
   client->SetCurlRespFile(file);
   EXPECT_EQ(client->SendRequestByCurl(HTTP_METHOD_GET, true, 10), HTTP_RET_OK);
   fclose(file);
-  const std::string reply = ReadFile(folder.File("reply"));
-  EXPECT_THAT(reply, HasSubstr("Content-Type: text/plain\r\n"));
-  EXPECT_THAT(reply, Not(HasSubstr("Transfer-Encoding")));
-  ASSERT_NE(reply.find("\r\n\r\nline 01"), std::string::npos);
-  EXPECT_EQ(reply.size() - reply.find("line 01"), 20 * 9 + 100u * 210);
+  const std::string response = ReadFile(directory.File("response"));
+  EXPECT_THAT(response, HasSubstr("Content-Type: text/plain\r\n"));
+  EXPECT_THAT(response, Not(HasSubstr("Transfer-Encoding")));
+  ASSERT_NE(response.find("\r\n\r\nline 01"), std::string::npos);
+  EXPECT_EQ(response.size() - response.find("line 01"), 20 * 9 + 100u * 210);
 }
 
-// ---- a POST with a login
+// ---- a POST with credentials
 
 struct LoginCase {
-  const char* folder;
+  const char* directory;
   const char* login;
 };
 
@@ -88,7 +88,8 @@ TEST(ApacheCurlPost, LogsInAsTheServerAsks) {
   for (const LoginCase& c : kLogins) {
     for (const char* operation : {"SendRequestByPost", "SendRequest (POST)"}) {
       WorkedByCurl(operation, kApache, c.login, false);
-      auto client = NewClient(Apache(), LoginTo(kPlain, c.folder + std::string("/json.cgi?pan=3")));
+      auto client =
+          NewClient(Apache(), LoginTo(kPlain, c.directory + std::string("/json.cgi?pan=3")));
       const int result = operation == std::string("SendRequestByPost")
                              ? client->SendRequestByPost("?")
                              : client->SendRequest(HTTP_METHOD_POST, "?");
@@ -106,10 +107,10 @@ TEST(ApacheCurlPost, FailsWithAWrongPassword) {
 
 // ---- XML
 
-// The attribute of the reply's root; "(no reply)" without a document.
+// The attribute of the response's root; "(no response)" without a document.
 std::string Attribute(TWHttpClient* client, const char* name) {
   xmlDoc* doc = nullptr;
-  if (!client->GetResponseXML(doc)) return "(no reply)";
+  if (!client->GetResponseXML(doc)) return "(no response)";
   const xmlChar* key = reinterpret_cast<const xmlChar*>(name);
   xmlChar* value = xmlGetProp(xmlDocGetRootElement(doc), key);
   const std::string text = value != nullptr ? reinterpret_cast<const char*>(value) : "(none)";
@@ -147,13 +148,13 @@ INSTANTIATE_TEST_SUITE_P(, ApacheXml, ::testing::ValuesIn(kXmlCases),
                          [](const auto& test) { return test.param.method; });
 
 TEST_P(ApacheXml, IsAnswered) {
-  for (const char* folder : {"cgi", "basic"}) {
-    const bool basic = std::string(folder) == "basic";
+  for (const char* directory : {"cgi", "basic"}) {
+    const bool basic = std::string(directory) == "basic";
     WorkedByCurl(GetParam().operation + std::string(" with GetResponseXML"), kApache,
                  basic ? "Basic" : "none", false);
-    auto client = NewClient(Apache(), LoginTo(kPlain, std::string(folder) + "/xml.cgi"));
-    ASSERT_EQ(SendXml(client.get(), GetParam().operation, doc_), HTTP_RET_OK) << folder;
-    EXPECT_EQ(Attribute(client.get(), "method"), GetParam().method) << folder;
+    auto client = NewClient(Apache(), LoginTo(kPlain, std::string(directory) + "/xml.cgi"));
+    ASSERT_EQ(SendXml(client.get(), GetParam().operation, doc_), HTTP_RET_OK) << directory;
+    EXPECT_EQ(Attribute(client.get(), "method"), GetParam().method) << directory;
   }
 }
 
@@ -173,10 +174,11 @@ TEST_P(ApacheXml, LogsInByDigestWithAGetAlone) {
 
 TEST(ApacheOneCall, GetsJson) {
   AddRow({"SendHttpGet", kApache, "none", "plain", "buffered", "passed"});
-  Json::Value reply;
+  Json::Value response;
   ASSERT_EQ(
-      SendHttpGet("127.0.0.1", Apache().Port(), "cgi/json.cgi?name=a b&x=1/2", reply, 10, true), 0);
-  EXPECT_EQ(reply["query"].asString(), "name=a%20b&x=1%2F2");
+      SendHttpGet("127.0.0.1", Apache().Port(), "cgi/json.cgi?name=a b&x=1/2", response, 10, true),
+      0);
+  EXPECT_EQ(response["query"].asString(), "name=a%20b&x=1%2F2");
 }
 
 TEST(ApacheOneCall, PostsAForm) {
@@ -188,10 +190,10 @@ TEST(ApacheOneCall, PostsAForm) {
 TEST(ApacheOneCall, GetsJsonOverTls) {
   WorkedByCurl("SendHttpsGet", kApache, "none", true);
   const TrustedAuthority trusted(Certificates().CaFile());
-  Json::Value reply;
-  ASSERT_EQ(SendHttpsGet("127.0.0.1", Apache().Port("TLS_PORT"), "cgi/json.cgi?zoom=3", reply, 10),
-            0);
-  EXPECT_EQ(reply["query"].asString(), "zoom=3");
+  Json::Value response;
+  ASSERT_EQ(
+      SendHttpsGet("127.0.0.1", Apache().Port("TLS_PORT"), "cgi/json.cgi?zoom=3", response, 10), 0);
+  EXPECT_EQ(response["query"].asString(), "zoom=3");
 }
 
 }  // namespace

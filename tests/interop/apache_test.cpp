@@ -1,4 +1,4 @@
-// Apache httpd: logins, and replies of every shape, over the client's socket.
+// Apache httpd: credentials, and responses of every shape, over the client's socket.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <libxml/tree.h>
@@ -58,7 +58,7 @@ TEST_P(ApacheTest, ReadsABodyThatOnlyTheCloseEnds) {
   EXPECT_EQ(BodyOf(client.get()).size(), 20 * 9 + 100u * 210);
 }
 
-TEST_P(ApacheTest, LeavesTheHeadersBehindTheThirtiethInFrontOfTheBody) {
+TEST_P(ApacheTest, LeavesTheHeadersAfterTheThirtiethInFrontOfTheBody) {
   Worked("SendRequestByGet (100 headers)", kApache, "none", GetParam());
   auto client = Client("cgi/headers.cgi");
   ASSERT_EQ(client->SendRequestByGet(), HTTP_RET_OK);
@@ -80,7 +80,7 @@ TEST_P(ApacheTest, SendsTheLastCookieBack) {
   EXPECT_EQ(BodyOf(client.get()), "cookie session=42;");
 }
 
-TEST_P(ApacheTest, TellsARedirectAndDoesNotFollow) {
+TEST_P(ApacheTest, ReportsARedirectAndDoesNotFollow) {
   Worked("SendRequestByGet (302)", kApache, "none", GetParam());
   auto client = Client("moved");
   ASSERT_EQ(client->SendRequest(HTTP_METHOD_GET, ""), HTTP_RET_OK);
@@ -89,7 +89,7 @@ TEST_P(ApacheTest, TellsARedirectAndDoesNotFollow) {
   EXPECT_EQ(status, 302);
 }
 
-TEST_P(ApacheTest, TellsThatAPathIsTooLong) {
+TEST_P(ApacheTest, ReportsThatAPathIsTooLong) {
   Worked("SendRequestByGet (414)", kApache, "none", GetParam());
   auto client = Client("cgi/text.cgi?" + std::string(1500, 'x'));
   ASSERT_EQ(client->SendRequest(HTTP_METHOD_GET, ""), HTTP_RET_OK);
@@ -98,7 +98,7 @@ TEST_P(ApacheTest, TellsThatAPathIsTooLong) {
   EXPECT_EQ(status, 414);
 }
 
-// ---- logins
+// ---- credentials
 
 TEST_P(ApacheTest, LogsInByDigestWithQop) {
   Worked("SendRequest (GET)", kApache, "Digest, qop auth", GetParam());
@@ -134,7 +134,7 @@ TEST_P(ApacheTest, LogsInByBasicAtOnce) {
   EXPECT_THAT(BodyOf(client.get()), HasSubstr("user operator\n"));
 }
 
-TEST_P(ApacheTest, GivesUpWhenTheLoginIsRefusedAgain) {
+TEST_P(ApacheTest, GivesUpWhenTheCredentialsAreRefusedAgain) {
   Worked("SendRequest (GET), refused", kApache, "wrong password", GetParam());
   for (const char* path : {"basic/text.cgi", "digest/text.cgi", "cgi/oldlogin.cgi"}) {
     ClientSettings settings = LoginTo(GetParam(), path);
@@ -163,51 +163,51 @@ TEST_P(ApacheTest, PostsAForm) {
 TEST_P(ApacheTest, PostsAnEnvelope) {
   Worked("SendReqBySocketPost", kApache, "none", GetParam());
   auto client = Client("cgi/xml.cgi");
-  std::string reply;
-  ASSERT_EQ(client->SendReqBySocketPost(kSoap, reply), HTTP_RET_OK);
+  std::string response;
+  ASSERT_EQ(client->SendReqBySocketPost(kSoap, response), HTTP_RET_OK);
   EXPECT_EQ(StatusOf(client.get()), 200);
-  EXPECT_THAT(reply, HasSubstr(kSoap));
+  EXPECT_THAT(response, HasSubstr(kSoap));
 }
 
 TEST_P(ApacheTest, ReadsTheEnvelopeOfAFault) {
   Worked("SendReqBySocketPost (500)", kApache, "none", GetParam());
   auto client = Client("cgi/xml.cgi?fault");
-  std::string reply;
-  ASSERT_EQ(client->SendReqBySocketPost(kSoap, reply), HTTP_RET_OK);
+  std::string response;
+  ASSERT_EQ(client->SendReqBySocketPost(kSoap, response), HTTP_RET_OK);
   EXPECT_EQ(StatusOf(client.get()), 500);
-  EXPECT_THAT(reply, HasSubstr(kSoap));
+  EXPECT_THAT(response, HasSubstr(kSoap));
 }
 
 TEST_P(ApacheTest, CannotReadAnEnvelopeWithoutALength) {
-  AddRow({"SendReqBySocketPost (chunked reply)", kApache, "none", GetParam().tls ? "TLS" : "plain",
-          GetParam().buffered ? "buffered" : "direct",
-          "not possible: the reply must announce its Content-Length"});
+  AddRow({"SendReqBySocketPost (chunked response)", kApache, "none",
+          GetParam().tls ? "TLS" : "plain", GetParam().buffered ? "buffered" : "direct",
+          "not possible: the response must announce its Content-Length"});
   auto client = Client("cgi/stream.cgi");
-  std::string reply = "old";
-  EXPECT_EQ(client->SendReqBySocketPost(kSoap, reply), HTTP_RET_IO_ERROR);
+  std::string response = "old";
+  EXPECT_EQ(client->SendReqBySocketPost(kSoap, response), HTTP_RET_IO_ERROR);
   EXPECT_EQ(StatusOf(client.get()), 200);
-  EXPECT_EQ(reply, "old");
+  EXPECT_EQ(response, "old");
 }
 
 TEST_P(ApacheTest, LogsInToPostAnEnvelope) {
   const std::pair<const char*, const char*> cases[] = {
       {"digest", "Digest, qop auth"}, {"basic", "Basic"}, {"cgi", "none"}};
-  for (const auto& [folder, login] : cases) {
+  for (const auto& [directory, login] : cases) {
     Worked("SendAuthReqBySocketPost", kApache, login, GetParam());
-    auto client = Client(folder + std::string("/xml.cgi"));
-    std::string reply;
-    EXPECT_EQ(client->SendAuthReqBySocketPost(kSoap, reply), HTTP_RET_OK) << folder;
-    EXPECT_THAT(reply, HasSubstr(kSoap)) << folder;
+    auto client = Client(directory + std::string("/xml.cgi"));
+    std::string response;
+    EXPECT_EQ(client->SendAuthReqBySocketPost(kSoap, response), HTTP_RET_OK) << directory;
+    EXPECT_THAT(response, HasSubstr(kSoap)) << directory;
   }
 }
 
-TEST_P(ApacheTest, TellsThatTheLoginForAnEnvelopeIsRefused) {
+TEST_P(ApacheTest, ReportsThatTheCredentialsForAnEnvelopeAreRefused) {
   Worked("SendAuthReqBySocketPost, refused", kApache, "wrong password", GetParam());
   ClientSettings settings = LoginTo(GetParam(), "digest/xml.cgi");
   settings.password = "gate-8";
   auto client = NewClient(Apache(), settings);
-  std::string reply;
-  EXPECT_EQ(client->SendAuthReqBySocketPost(kSoap, reply), HTTP_RET_UNAUTHORIZED);
+  std::string response;
+  EXPECT_EQ(client->SendAuthReqBySocketPost(kSoap, response), HTTP_RET_UNAUTHORIZED);
 }
 
 TEST_P(ApacheTest, ParsesTheEnvelopeWithItsLinesJoined) {
@@ -223,9 +223,9 @@ TEST_P(ApacheTest, ParsesTheEnvelopeWithItsLinesJoined) {
   xmlFreeDoc(doc);
 }
 
-// ---- a whole reply, its head included
+// ---- a whole response, its head included
 
-TEST_P(ApacheTest, AnswersASecondRequestOnTheSameConnection) {
+TEST_P(ApacheTest, RespondsToASecondRequestOnTheSameConnection) {
   if (GetParam().tls) return;  // the port that keeps connections is a plain one
   Worked("GetResp", kApache, "none", GetParam());
   ClientSettings settings = LoginTo(GetParam(), "cgi/cookies.cgi");

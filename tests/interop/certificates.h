@@ -12,13 +12,13 @@ class CertificateFolder {
   CertificateFolder();
 
   // A PEM file with the authority's certificate.
-  std::string CaFile() const { return folder_.File("ca.pem"); }
+  std::string CaFile() const { return directory_.File("ca.pem"); }
 
   // A PEM file with key and certificate. `kind`: good, expired, wrong-host or self-signed.
-  std::string File(const std::string& kind) const { return folder_.File(kind + ".pem"); }
+  std::string File(const std::string& kind) const { return directory_.File(kind + ".pem"); }
 
  private:
-  TempDir folder_;
+  TempDir directory_;
 };
 
 // Made on the first call; one for the program.

@@ -30,7 +30,7 @@ TEST_P(LighttpdTest, LogsInByDigestWithMd5) {
   EXPECT_THAT(BodyOf(client.get()), HasSubstr("query zoom=3\n"));
 }
 
-TEST_P(LighttpdTest, GivesUpWhenTheLoginIsRefusedAgain) {
+TEST_P(LighttpdTest, GivesUpWhenTheCredentialsAreRefusedAgain) {
   Worked("SendRequest (GET), refused", kLighttpd, "wrong password", GetParam());
   ClientSettings settings = LoginTo(GetParam(), "digest/text.cgi");
   settings.password = "gate-8";
@@ -52,12 +52,12 @@ TEST_P(LighttpdTest, PostsAForm) {
 TEST_P(LighttpdTest, LogsInToPostAnEnvelope) {
   Worked("SendAuthReqBySocketPost", kLighttpd, "Digest, MD5", GetParam());
   auto client = Client("digest/xml.cgi");
-  std::string reply;
-  ASSERT_EQ(client->SendAuthReqBySocketPost("<envelope/>", reply), HTTP_RET_OK);
-  EXPECT_THAT(reply, HasSubstr("<envelope/>"));
+  std::string response;
+  ASSERT_EQ(client->SendAuthReqBySocketPost("<envelope/>", response), HTTP_RET_OK);
+  EXPECT_THAT(response, HasSubstr("<envelope/>"));
 }
 
-TEST_P(LighttpdTest, PostsWithLibcurlBehindDigest) {
+TEST_P(LighttpdTest, PostsWithLibcurlAfterDigest) {
   if (GetParam().tls || !GetParam().buffered) return;  // plain alone, and libcurl reads by itself
   WorkedByCurl("SendRequestByPost", kLighttpd, "Digest, MD5", false);
   auto client = Client("digest/text.cgi?pan=3");

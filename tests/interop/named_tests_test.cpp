@@ -10,7 +10,7 @@ namespace {
 
 namespace fs = std::filesystem;
 
-// The sources of all tests, one behind the other.
+// The sources of all tests, one after the other.
 std::string AllTests() {
   std::string text;
   for (const auto& entry : fs::recursive_directory_iterator(TARNWICK_INTEROP_FOLDER "/..")) {

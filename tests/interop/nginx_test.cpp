@@ -56,7 +56,7 @@ class NginxTest : public ::testing::TestWithParam<Access> {
 
 INSTANTIATE_TEST_SUITE_P(, NginxTest, ::testing::ValuesIn(kAccesses), NameOfAccess);
 
-TEST_P(NginxTest, GivesFilesOfAllSizes) {
+TEST_P(NginxTest, SendsFilesOfAllSizes) {
   WorkedHere("SendRequestByGet (0 B, 1 B, 64 MiB)", "none");
   EXPECT_EQ(Get("empty"), "");
   EXPECT_EQ(Get("byte"), "x");
@@ -72,7 +72,7 @@ TEST_P(NginxTest, SpeaksTheWantedProtocol) {
   EXPECT_EQ(Get("protocol"), protocol);
 }
 
-TEST_P(NginxTest, HandsAChunkedReplyThrough) {
+TEST_P(NginxTest, HandsAChunkedResponseThrough) {
   WorkedHere("ReadBody (chunked, proxied)", "none");
   auto client = Client("upstream/stream.cgi", HTTP_VERSION_1_1);
   ASSERT_EQ(client->SendRequestByGet(), HTTP_RET_OK);
@@ -98,9 +98,9 @@ TEST_P(NginxTest, PostsAFormThroughTheProxy) {
 TEST_P(NginxTest, PostsAnEnvelopeThroughTheProxy) {
   WorkedHere("SendReqBySocketPost (proxied)", "none");
   auto client = Client("upstream/xml.cgi");
-  std::string reply;
-  ASSERT_EQ(client->SendReqBySocketPost("<envelope/>", reply), HTTP_RET_OK);
-  EXPECT_THAT(reply, HasSubstr("<envelope/>"));
+  std::string response;
+  ASSERT_EQ(client->SendReqBySocketPost("<envelope/>", response), HTTP_RET_OK);
+  EXPECT_THAT(response, HasSubstr("<envelope/>"));
 }
 
 TEST_P(NginxTest, RefusesTheHeadOfAnUpload) {
@@ -112,7 +112,7 @@ TEST_P(NginxTest, RefusesTheHeadOfAnUpload) {
   EXPECT_EQ(StatusOf(client.get()), 400);
 }
 
-TEST_P(NginxTest, GivesWithLibcurl) {
+TEST_P(NginxTest, SendsToLibcurl) {
   if (!GetParam().mode.buffered) return;  // libcurl reads by itself
   AddRow({"SendRequestByCurl (GET)", kNginx, "none", GetParam().transport, "libcurl", "passed"});
   auto client = Client("byte");
@@ -133,21 +133,21 @@ TEST(NginxStore, TakesAPutAndADelete) {
   EXPECT_EQ(ReadFile(file), "<?xml version=\"1.0\"?>\n<preset id=\"7\"/>\n");
   EXPECT_EQ(client.SendReqByXMLDelete(), HTTP_RET_OK);
   EXPECT_FALSE(FileExists(file));
-  xmlDoc* reply = nullptr;
-  EXPECT_FALSE(client.GetResponseXML(reply)) << "201 and 204 have no body";
+  xmlDoc* response = nullptr;
+  EXPECT_FALSE(client.GetResponseXML(response)) << "201 and 204 have no body";
   xmlFreeDoc(doc);
 }
 
-TEST(NginxStore, TellsThatThereIsNothingToDelete) {
+TEST(NginxStore, ReportsThatThereIsNothingToDelete) {
   ClientProbe client(Nginx().Port(), LoginTo(kModes[0], "store/nothing.xml"));
   EXPECT_EQ(client.SendReqByXMLDelete(), HTTP_RET_IO_ERROR);
 }
 
 TEST(NginxOneCall, GetsJson) {
   AddRow({"SendHttpGet", kNginx, "none", "plain", "buffered", "passed"});
-  Json::Value reply;
-  ASSERT_EQ(SendHttpGet("127.0.0.1", Nginx().Port(), "success.json", reply, 10, false), 0);
-  EXPECT_EQ(reply["server"].asString(), "nginx");
+  Json::Value response;
+  ASSERT_EQ(SendHttpGet("127.0.0.1", Nginx().Port(), "success.json", response, 10, false), 0);
+  EXPECT_EQ(response["server"].asString(), "nginx");
 }
 
 }  // namespace

@@ -15,7 +15,7 @@ namespace {
 
 constexpr char kServer[] = "openssl s_server";
 
-// With "-WWW" in `options` it serves the files of its folder, and closes with a notice. Without, it
+// With "-WWW" in `options` it serves the files of its directory, and closes with a notice. Without, it
 // sends what Say is given, and closes without a notice when it is killed.
 class TlsServer {
  public:
@@ -25,7 +25,7 @@ class TlsServer {
     EXPECT_EQ(pipe2(input_, O_CLOEXEC), 0);
     std::vector<std::string> command = {"/usr/bin/env",
                                         "-C",
-                                        folder_.Path(),
+                                        directory_.Path(),
                                         "/usr/bin/openssl",
                                         "s_server",
                                         "-accept",
@@ -45,7 +45,7 @@ class TlsServer {
 
   int Port() const { return port_; }
   void Serve(const std::string& name, const std::string& text) {
-    WriteFile(folder_.File(name), text);
+    WriteFile(directory_.File(name), text);
   }
   void Say(const std::string& text) {
     EXPECT_EQ(write(input_[1], text.data(), text.size()), static_cast<ssize_t>(text.size()));
@@ -59,9 +59,9 @@ class TlsServer {
   }
 
  private:
-  std::string Log() const { return folder_.File("output.log"); }
+  std::string Log() const { return directory_.File("output.log"); }
 
-  TempDir folder_;
+  TempDir directory_;
   int port_ = 0;
   int input_[2] = {-1, -1};
   std::unique_ptr<ServerProcess> process_;
@@ -174,8 +174,9 @@ TEST_P(SServerCertificate, IsVerifiedByLibcurl) {
   AddCertificateRow("SendHttpsGet", "libcurl", GetParam().one_call == 0);
   ClientProbe client(server_.Port(), Settings());
   EXPECT_EQ(client.SendRequestByCurl(HTTP_METHOD_GET, true, 10), GetParam().by_curl);
-  Json::Value reply;
-  EXPECT_EQ(SendHttpsGet("127.0.0.1", server_.Port(), "info.json", reply, 10), GetParam().one_call);
+  Json::Value response;
+  EXPECT_EQ(SendHttpsGet("127.0.0.1", server_.Port(), "info.json", response, 10),
+            GetParam().one_call);
 }
 
 TEST_P(SServerCertificate, DoesNotMatterWithoutVerification) {

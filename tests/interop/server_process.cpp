@@ -117,7 +117,7 @@ int WebServer::Port(const std::string& name) const {
 
 std::vector<std::string> WebServer::FillTemplates(const WebServerSetup& setup) {
   std::map<std::string, std::string> values = setup.values;
-  values["ROOT"] = folder_.Path();
+  values["ROOT"] = directory_.Path();
   values["FOLDER"] = TARNWICK_INTEROP_FOLDER;
   std::vector<int> taken;  // all at once, so that no port is given twice
   for (const std::string& port : setup.ports) {

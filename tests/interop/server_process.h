@@ -45,7 +45,7 @@ struct WebServerSetup {
   std::map<std::string, std::string> values;  // further names of command and templates
 };
 
-// A web server, configured from templates in servers/, with a folder of its own. It accepts
+// A web server, configured from templates in servers/, with a directory of its own. It accepts
 // connections on all its ports when the constructor returns.
 class WebServer {
  public:
@@ -54,14 +54,14 @@ class WebServer {
   const std::string& Name() const { return name_; }
   int Port(const std::string& name = "PORT") const;
 
-  // The path of `name` in the server's folder; "www/" in there is its document root.
-  std::string File(const std::string& name) const { return folder_.File(name); }
+  // The path of `name` in the server's directory; "www/" in there is its document root.
+  std::string File(const std::string& name) const { return directory_.File(name); }
 
  private:
   std::vector<std::string> FillTemplates(const WebServerSetup& setup);
 
   std::string name_;
-  TempDir folder_;
+  TempDir directory_;
   std::map<std::string, int> ports_;
   std::unique_ptr<ServerProcess> process_;
 };

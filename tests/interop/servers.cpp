@@ -36,11 +36,11 @@ void FillNginx(const WebServer& server) {
   WriteFile(server.File("www/large"), large);
 }
 
-// Files in the open and with a login by Basic, and for busybox the programs of the cgi folder.
+// Files in the open and with credentials by Basic, and for busybox the programs of the cgi directory.
 void FillSmall(const WebServer& server) {
   mkdir(server.File("www/basic").c_str(), 0755);
-  for (const char* folder : {"www/", "www/basic/"}) {
-    WriteFile(server.File(folder + std::string("info.json")), "{\"success\":true}");
+  for (const char* directory : {"www/", "www/basic/"}) {
+    WriteFile(server.File(directory + std::string("info.json")), "{\"success\":true}");
   }
   WriteFile(server.File("www/info.xml"), "<response method=\"GET\"/>");
   EXPECT_EQ(symlink(TARNWICK_INTEROP_FOLDER "/cgi", server.File("www/cgi-bin").c_str()), 0);

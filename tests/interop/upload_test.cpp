@@ -53,7 +53,7 @@ void ForgetCounts(const WebServer& server) {
   for (const char* name : {"count", "count.first"}) remove(server.File(name).c_str());
 }
 
-// What the program behind the server has counted.
+// What the server's program has counted.
 std::string Counted(const WebServer& server) {
   const std::string file = server.File("count");
   WaitUntilTrue(
@@ -66,7 +66,7 @@ class UploadTest : public ::testing::TestWithParam<Mode> {};
 INSTANTIATE_TEST_SUITE_P(, UploadTest, ::testing::ValuesIn(kModes),
                          [](const auto& test) { return NameOf(test.param); });
 
-TEST_P(UploadTest, IsAnsweredBehindTheClosingBoundary) {
+TEST_P(UploadTest, IsAnsweredAfterTheClosingBoundary) {
   Worked("OpenRawDataUpload with GetResp", kLenient, "none", GetParam());
   ClientSettings settings = LoginTo(GetParam(), "cgi/count.cgi");
   settings.timeout = 2;

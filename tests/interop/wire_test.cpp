@@ -13,8 +13,8 @@
 
 namespace {
 
-constexpr char kReply[] = "HTTP/1.1 200 OK\r\nContent-Length: 4\r\n\r\n<a/>";
-// The peer closes behind it, and says so: libcurl would else send the login over this connection.
+constexpr char kResponse[] = "HTTP/1.1 200 OK\r\nContent-Length: 4\r\n\r\n<a/>";
+// The peer closes after it, and says so: libcurl would else send the credentials over this connection.
 constexpr char kLoginHead[] =
     "HTTP/1.1 401 Unauthorized\r\nContent-Length: 0\r\nConnection: close\r\nWWW-Authenticate: ";
 constexpr char kDigestQop[] =
@@ -42,8 +42,8 @@ void FormPost(ClientProbe* client) {
 }
 
 void SoapPost(ClientProbe* client) {
-  std::string reply;
-  client->SendAuthReqBySocketPost("<envelope/>", reply);
+  std::string response;
+  client->SendAuthReqBySocketPost("<envelope/>", response);
 }
 
 void XmlSocketPost(ClientProbe* client) {
@@ -91,8 +91,8 @@ void Upload(ClientProbe* client) {
 }
 
 void OneCallGet(ClientProbe* client) {
-  Json::Value reply;
-  SendHttpGet(client->m_strHost, client->m_port, client->m_strPath, reply, 5, true);
+  Json::Value response;
+  SendHttpGet(client->m_strHost, client->m_port, client->m_strPath, response, 5, true);
 }
 
 void OneCallPost(ClientProbe* client) {
@@ -139,7 +139,7 @@ const std::vector<WireCase>& Cases() {
   return cases;
 }
 
-// The blocks of the document: fenced, "text NAME" behind the opening fence.
+// The blocks of the document: fenced, "text NAME" after the opening fence.
 const std::map<std::string, std::string>& Blocks() {
   static const std::map<std::string, std::string> blocks = [] {
     const std::string text = ReadFile(TARNWICK_DOCS_FOLDER "/wire.md");
@@ -153,7 +153,7 @@ const std::map<std::string, std::string>& Blocks() {
   return blocks;
 }
 
-// Bytes as the document shows them: line ends in letters, each at the end of its line, and names
+// Bytes as the document shows them: CR and LF in letters, each at the end of its line, and names
 // for what differs from run to run.
 std::string Shown(const std::string& bytes, int port) {
   std::string text;
@@ -171,8 +171,8 @@ Script UploadScript() {
 
 std::vector<Script> ScriptsFor(const WireCase& c) {
   if (std::string(c.name) == "upload") return {UploadScript()};
-  if (c.challenge == nullptr) return {Exchange(kReply)};
-  return {Exchange(kLoginHead + std::string(c.challenge) + "\r\n\r\n"), Exchange(kReply)};
+  if (c.challenge == nullptr) return {Exchange(kResponse)};
+  return {Exchange(kLoginHead + std::string(c.challenge) + "\r\n\r\n"), Exchange(kResponse)};
 }
 
 class Wire : public ::testing::TestWithParam<WireCase> {};

@@ -1,4 +1,4 @@
-// The macro in a source file that gives no name of its own.
+// The macro in a source file that sets no name of its own.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 

@@ -1,4 +1,4 @@
-// The macro that every log call goes through, in a source file that gives its own bare name.
+// The macro that every log call goes through, in a source file that sets its own bare name.
 #define TW_LOG_SOURCE "camerad"
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -109,7 +109,7 @@ TEST(Gate, IsOneStatementInsideIfAndElse) {
   EXPECT_THAT(log.Messages(), ElementsAre("then\n", "else\n"));
 }
 
-TEST(Gate, ACategoryOutsideTheTableIsUnknownAndStandsAtNotice) {
+TEST(Gate, ACategoryOutsideTheTableIsUnknownAndIsAtNotice) {
   LogCapture log(7);
   const auto outside = static_cast<LOG_CATEG>(74);
   TW_LOG(outside, LOG_LEVEL_NOTICE, "notice\n");
@@ -125,7 +125,7 @@ TEST(Gate, ALevelOutsideTheTableIsUnknown) {
   EXPECT_THAT(log.Lines(), ElementsAre(IsLog("http", "unknown", "camerad", "TestBody", "below\n")));
 }
 
-TEST(Gate, AnAdministratorsChangeCountsAtOnce) {
+TEST(Gate, AnAdministratorsChangeTakesEffectAtOnce) {
   LogCapture log(3);
   TW_LOG(LOG_CATEG_HTTP, LOG_LEVEL_DEBUG, "before\n");
   log.SetLevel(LOG_CATEG_HTTP, 5);

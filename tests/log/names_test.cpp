@@ -67,7 +67,7 @@ TEST(Enum2String, ANameStaysWhereItIs) {
   EXPECT_EQ(Enum2String(Categ(26)), Enum2String(Categ(26)));
 }
 
-TEST(Enum2String, AnEmptyMapGivesUnknown) {
+TEST(Enum2String, AnEmptyMapReturnsUnknown) {
   EXPECT_STREQ(FindName(std::map<LOG_LEVEL, const char*>(), Level(3)), "unknown");
 }
 

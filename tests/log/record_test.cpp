@@ -171,7 +171,7 @@ TEST_F(Record, InitAttachesAndFreeDetaches) {
   EXPECT_EQ(record.Attachments(), 0);
 }
 
-TEST_F(Record, EachFailureOfAttachingGivesNullWithoutAMessage) {
+TEST_F(Record, EachFailureOfAttachingReturnsNullWithoutAMessage) {
   const SharedRecord record;
   for (const Call call : {Call::kShmget, Call::kShmat}) {
     EXPECT_EQ(ForEachFailingCall(call,

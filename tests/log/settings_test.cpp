@@ -122,7 +122,7 @@ TEST_F(Settings, All74LevelsAreLoadedInTheirOrder) {
 TEST_F(Settings, NumbersAfterThe74thAreIgnored) {
   Start(Joined("4", 74) + "," + Joined("9", 60), "no");
   EXPECT_EQ(Record().Init(0), 0);
-  ExpectLevels(0, 74, 4);  // and the memory behind the record is checked at the end
+  ExpectLevels(0, 74, 4);  // and the memory after the record is checked at the end
 }
 
 TEST_F(Settings, TextThatIsNoNumberIsZeroAndTrailingTextIsIgnored) {
@@ -173,7 +173,7 @@ TEST_F(Settings, EmptyValuesCountAsMissing) {
   EXPECT_EQ(Level(0), 5);
 }
 
-TEST_F(Settings, AFileThatCannotBeReadGivesMinusOneAndLeavesTheRecord) {
+TEST_F(Settings, AFileThatCannotBeReadReturnsMinusOneAndLeavesTheRecord) {
   Start("5", "yes");
   EXPECT_EQ(
       ForEachFailingCall(Call::kOpen,
@@ -218,7 +218,7 @@ TEST_F(Settings, TheFlagIsSavedAlsoWhenTheLevelsWereNot) {
   EXPECT_EQ(ReadFile(kPath), "tw_dbglog_time_scale=\"no\"\n");
 }
 
-TEST_F(Settings, EachFailingCallOfSavingGivesMinusOneAndKeepsTheRecord) {
+TEST_F(Settings, EachFailingCallOfSavingReturnsMinusOneAndKeepsTheRecord) {
   Record().Init(0);
   Record().SetLevel(LOG_CATEG_HTTP, 6);
   DescriptorGuard descriptors;
@@ -248,7 +248,7 @@ TEST(SplitToIntList, SkipsEmptyFields) {
   EXPECT_THAT(SplitToIntList(",,,", ","), IsEmpty());
 }
 
-TEST(SplitToIntList, AnEmptyTextOrNoDelimitersGiveNothing) {
+TEST(SplitToIntList, AnEmptyStringOrNoDelimitersReturnAnEmptyList) {
   EXPECT_THAT(SplitToIntList("", ","), IsEmpty());
   EXPECT_THAT(SplitToIntList("1,2", ""), IsEmpty());
 }
@@ -258,7 +258,7 @@ TEST(SplitToIntList, ReadsSignedDecimalNumbersLeniently) {
   EXPECT_THAT(SplitToIntList("2147483647,-2147483648", ","), ElementsAre(INT_MAX, INT_MIN));
 }
 
-TEST(SplitToIntList, WithoutMemoryGivesNothing) {
+TEST(SplitToIntList, WithoutMemoryReturnsAnEmptyList) {
   EXPECT_EQ(ForEachFailingCall(Call::kStrdup,
                                [](Faults& faults) {
                                  const std::vector<int> list = SplitToIntList("1,2", ",");
@@ -332,15 +332,15 @@ TEST_F(WriteSetting, WithoutTheLockNothingIsWritten) {
   EXPECT_EQ(ReadFile(kPath), "a=\"1\"\n");
 }
 
-TEST_F(WriteSetting, AnUnwritableFolderGivesMinusOne) {
+TEST_F(WriteSetting, AnUnwritableDirectoryReturnsMinusOne) {
   EXPECT_EQ(WriteSettingValue("/var/packages/none/settings.conf", "name", "v", kFormat), -1);
 }
 
-TEST_F(WriteSetting, GivesWhatThePlatformsFunctionGives) {
+TEST_F(WriteSetting, ReturnsWhatThePlatformsFunctionReturns) {
   EXPECT_EQ(WriteSettingValue(kPath, "not a key", "v", kFormat), -1);
 }
 
-TEST(ReadSetting, GivesTheLengthZeroOrMinusOne) {
+TEST(ReadSetting, ReturnsTheLengthZeroOrMinusOne) {
   char value[16];
   EXPECT_EQ(ReadSettingValue(kPath, "name", value, sizeof(value)), -1);
   WriteFile(kPath, "name=\"value\"\n");

@@ -58,7 +58,7 @@ class WriterFailure : public ::testing::Test {
   SyslogCapture syslog_;
 };
 
-TEST_F(WriterFailure, Type2GivesJustTheOpenMessageAndNoFileAccess) {
+TEST_F(WriterFailure, Type2HasJustTheOpenMessageAndNoFileAccess) {
   Faults faults;
   Write(static_cast<LOG_TYPE>(2));
   EXPECT_EQ(faults.Count(Call::kOpen) + faults.Count(Call::kFopencookie), 0);
@@ -85,8 +85,8 @@ TEST_F(WriterFailure, AFileThatCannotBeOpenedIsReportedToTheSystemLog) {
   EXPECT_EQ(faults.Count(Call::kFopencookie) + faults.Count(Call::kFlock), 0);
 }
 
-TEST_F(WriterFailure, AMissingFolderIsReportedWithItsErrno) {
-  ASSERT_EQ(mkdir(kMainLog, 0700), 0);  // a folder where the file should be
+TEST_F(WriterFailure, AMissingDirectoryIsReportedWithItsErrno) {
+  ASSERT_EQ(mkdir(kMainLog, 0700), 0);  // a directory where the file should be
   Write();
   ExpectOneReport(
       "twdebuglog:[0-9]+:TWPrintf\\(\\): open twlog file failed with errno \\[21\\]\\.");
@@ -152,7 +152,7 @@ TEST_F(WriterFailure, ErrnoStaysOnEveryPath) {
   }
 }
 
-TEST_F(WriterFailure, AClockThatCannotBeReadStandsAtItsStart) {
+TEST_F(WriterFailure, WithoutAClockTheLineHasTheEpoch) {
   Faults faults;
   faults.FailNth(Call::kGettimeofday, 1);
   Write();

@@ -74,7 +74,7 @@ class LogOfOthers : public ::testing::Test {
 
 class PlantedLog : public LogOfOthers, public ::testing::WithParamInterface<PlantedKind> {};
 
-// An empty folder above the logs' one, in which this process alone sees what it makes.
+// An empty directory above the logs' one, in which this process alone sees what it makes.
 bool CoverTheFolderAbove() {
   return unshare(CLONE_NEWNS) == 0 &&
          mount(nullptr, "/", nullptr, MS_REC | MS_PRIVATE, nullptr) == 0 &&
@@ -91,7 +91,7 @@ int WriteBelow(const PlantedKind& kind) {
   return 0;
 }
 
-TEST_P(PlantedLog, InThePlaceOfTheFolderItIsReportedAndNeitherWaitedForNorWritten) {
+TEST_P(PlantedLog, InThePlaceOfTheDirectoryItIsReportedAndNeitherWaitedForNorWritten) {
   const ChildResult result = RunInChild([] { return WriteBelow(GetParam()); }, seconds(10));
   ASSERT_FALSE(result.timed_out) << "a line waits";
   if (result.code == kSkipped) GTEST_SKIP() << "it cannot be made here";
@@ -101,7 +101,7 @@ TEST_P(PlantedLog, InThePlaceOfTheFolderItIsReportedAndNeitherWaitedForNorWritte
 
 INSTANTIATE_TEST_SUITE_P(Kinds, PlantedLog, ::testing::ValuesIn(PlantedKinds()));
 
-TEST_F(LogOfOthers, AMissingFolderIsReportedAndNotMade) {
+TEST_F(LogOfOthers, AMissingDirectoryIsReportedAndNotMade) {
   const ChildResult result = RunInChild([] {
     if (!CoverTheFolderAbove()) return kSkipped;
     WriteBoth();
@@ -119,7 +119,7 @@ TEST_F(LogOfOthers, LinksInACircleAreReported) {
   ExpectReports(1, ELOOP);
 }
 
-TEST_F(LogOfOthers, ALinkIntoAMissingFolderIsReported) {
+TEST_F(LogOfOthers, ALinkIntoAMissingDirectoryIsReported) {
   ASSERT_EQ(symlink("/no/such/folder/file", kMainLog), 0);
   Write();
   ExpectReports(1, ENOENT);

@@ -12,7 +12,7 @@
 
 namespace {
 
-// Where the line's own names begin: behind the time, the process and the tags.
+// Where the line's own names begin: after the time, the process and the tags.
 std::string WithoutTime(const std::string& text) {
   constexpr size_t kTimeLength = sizeof("Mar  5 14:03:09");
   return text.size() < kTimeLength ? text : text.substr(kTimeLength);

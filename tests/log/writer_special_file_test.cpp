@@ -120,12 +120,12 @@ TEST_P(SpecialLog, ALinkToADeviceIsNotWritten) {
   ExpectRefused(ENXIO);
 }
 
-// A folder with a pseudo-terminal of its own, made when the folder's ptmx is opened.
+// A directory with a pseudo-terminal of its own, made when the directory's ptmx is opened.
 class Terminals {
  public:
   Terminals()
       : mounted_(mount("devpts", Folder(), "devpts", 0, "newinstance,ptmxmode=0600") == 0),
-        leader_(open(folder_.File("ptmx").c_str(), O_RDWR | O_NOCTTY | O_NONBLOCK | O_CLOEXEC)) {
+        leader_(open(directory_.File("ptmx").c_str(), O_RDWR | O_NOCTTY | O_NONBLOCK | O_CLOEXEC)) {
     int lock = 0;
     EXPECT_TRUE(mounted_ && ioctl(leader_.Get(), TIOCSPTLCK, &lock) == 0);
   }
@@ -135,7 +135,7 @@ class Terminals {
   Terminals(const Terminals&) = delete;
   Terminals& operator=(const Terminals&) = delete;
 
-  std::string Path() const { return folder_.File("0"); }
+  std::string Path() const { return directory_.File("0"); }
 
   // What was written to the terminal.
   std::string Written() const {
@@ -145,9 +145,9 @@ class Terminals {
   }
 
  private:
-  const char* Folder() const { return folder_.Path().c_str(); }
+  const char* Folder() const { return directory_.Path().c_str(); }
 
-  TempDir folder_;
+  TempDir directory_;
   bool mounted_;
   UniqueFd leader_;
 };
@@ -172,10 +172,10 @@ TEST(SpecialLogTerminal, IsNeitherWrittenNorTaken) {
 }
 
 TEST_P(SpecialLog, ALinkToARegularFileIsWritten) {
-  const TempDir folder;
-  ASSERT_EQ(symlink(folder.File("log").c_str(), Path()), 0);
+  const TempDir directory;
+  ASSERT_EQ(symlink(directory.File("log").c_str(), Path()), 0);
   WriteInChild();
-  EXPECT_THAT(ParseLog(ReadFile(folder.File("log"))), SizeIs(1));
+  EXPECT_THAT(ParseLog(ReadFile(directory.File("log"))), SizeIs(1));
 }
 
 // Opens the log and leases it; then tells through `ready` and gives the lease back when the kernel

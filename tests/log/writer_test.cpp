@@ -131,7 +131,7 @@ TEST_F(Writer, Type1GoesToTheNotificationLogAlone) {
   EXPECT_FALSE(FileExists(kMainLog));
 }
 
-TEST_F(Writer, AppendsAndAddsNoLineEnd) {
+TEST_F(Writer, AppendsAndAddsNoLineFeed) {
   WriteFile(kMainLog, "before\n");
   TWPrintf(LOG_TYPE_MAIN, "c", "l", "n", 1, "F", "x");
   TWPrintf(LOG_TYPE_MAIN, "c", "l", "n", 1, "F", "y\n");
@@ -187,7 +187,7 @@ TEST_F(Writer, ASourceThatEndsInASeparatorIsEmpty) {
   EXPECT_EQ(Main(), "Mar  5 14:03:09 " + Pid() + "[c][l] :1:F(): x\n");
 }
 
-TEST(GetFileBaseName, GivesThePartAfterTheLastSeparatorOfEitherKind) {
+TEST(GetFileBaseName, ReturnsThePartAfterTheLastSeparatorOfEitherKind) {
   EXPECT_EQ(GetFileBaseName("name"), "name");
   EXPECT_EQ(GetFileBaseName("dir/name"), "name");
   EXPECT_EQ(GetFileBaseName("dir\\name"), "name");
@@ -196,7 +196,7 @@ TEST(GetFileBaseName, GivesThePartAfterTheLastSeparatorOfEitherKind) {
   EXPECT_EQ(GetFileBaseName("/name"), "name");
 }
 
-TEST(GetFileBaseName, APathThatEndsInASeparatorGivesAnEmptyText) {
+TEST(GetFileBaseName, APathThatEndsInASeparatorReturnsAnEmptyString) {
   EXPECT_EQ(GetFileBaseName("dir/"), "");
   EXPECT_EQ(GetFileBaseName("dir\\"), "");
   EXPECT_EQ(GetFileBaseName("/"), "");

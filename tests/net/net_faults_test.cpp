@@ -59,7 +59,7 @@ INSTANTIATE_TEST_SUITE_P(Net, FailingDialog,
 
 TEST_P(FailingDialog, IsReportedAndTheNextOneWorks) {
   const FailingCall& failing = GetParam();
-  PlainSocket socket("127.0.0.1", server_.Port(), 5, true);
+  ExposedSocket socket("127.0.0.1", server_.Port(), 5, true);
   const int runs = ForEachFailingCall(
       failing.call,
       [&](Faults& faults) {
@@ -74,7 +74,7 @@ TEST_P(FailingDialog, IsReportedAndTheNextOneWorks) {
 TEST(FailingSelect, OfAnyStepIsLogged) {
   LogCapture log;
   PongServer server;
-  PlainSocket socket("127.0.0.1", server.Port(), 5, true);
+  ExposedSocket socket("127.0.0.1", server.Port(), 5, true);
   const int runs = ForEachFailingCall(
       Call::kSelect,
       [&](Faults& faults) {
@@ -92,7 +92,7 @@ TEST(FailingSelect, OfAnyStepIsLogged) {
 
 TEST(FailingMemory, DoesNotTouchADialogOverASmallDescriptor) {
   PongServer server;
-  PlainSocket socket("127.0.0.1", server.Port(), 5, true);
+  ExposedSocket socket("127.0.0.1", server.Port(), 5, true);
   for (const Call call : {Call::kMalloc, Call::kCalloc, Call::kRealloc}) {
     Faults faults;
     EXPECT_TRUE(Dialog(socket));

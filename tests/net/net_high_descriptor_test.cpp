@@ -52,7 +52,7 @@ class HighDescriptor : public ::testing::Test {
 TEST_F(HighDescriptor, ConnectsWritesAndReads) {
   LogCapture log;
   ScriptedPeer peer({{ExpectExactly("ping\n"), Send("pong\n"), ExpectEof()}});
-  PlainSocket socket("127.0.0.1", peer.Port(), 5, true);
+  ExposedSocket socket("127.0.0.1", peer.Port(), 5, true);
   ASSERT_EQ(socket.Connect(), 0);
   EXPECT_GT(socket.m_sockFd, 1024);
   EXPECT_EQ(socket.WriteData("ping\n", 5), 5);
@@ -64,7 +64,7 @@ TEST_F(HighDescriptor, ConnectsWritesAndReads) {
 
 TEST_F(HighDescriptor, ConnectsWritesAndReadsOverTls) {
   TlsScriptedPeer peer({{ExpectExactly("ping\n"), Send("pong\n"), ExpectEof()}});
-  TlsSocket socket("127.0.0.1", peer.Port(), 5, true);
+  ExposedTlsSocket socket("127.0.0.1", peer.Port(), 5, true);
   ASSERT_EQ(socket.Connect(), 0);
   EXPECT_GT(socket.m_sockFd, 1024);
   EXPECT_EQ(socket.WriteData("ping\n", 5), 5);
@@ -74,7 +74,7 @@ TEST_F(HighDescriptor, ConnectsWritesAndReadsOverTls) {
 
 TEST_F(HighDescriptor, TheConnectTimeOutIsFound) {
   const BlackHolePort hole;
-  PlainSocket socket("127.0.0.1", hole.Port(), 0, true);
+  ExposedSocket socket("127.0.0.1", hole.Port(), 0, true);
   EXPECT_EQ(socket.Connect(), -1);
   EXPECT_EQ(errno, ETIMEDOUT);
 }
@@ -82,7 +82,7 @@ TEST_F(HighDescriptor, TheConnectTimeOutIsFound) {
 TEST_F(HighDescriptor, ARefusalIsFound) {
   LogCapture log;
   const ClosedPort port;
-  PlainSocket socket("127.0.0.1", port.Port(), 5, true);
+  ExposedSocket socket("127.0.0.1", port.Port(), 5, true);
   EXPECT_EQ(socket.Connect(), -1);
   EXPECT_THAT(log.Messages(), ElementsAre("Socket connection failed with error [111].\n",
                                           "Socket connect timeout (5)\n"));
@@ -129,7 +129,7 @@ TEST_F(HighDescriptor, NoMemoryForTheSetsFailsAConnect) {
       int port = 0;
       const int listener = BindLoopback(&port);
       listen(listener, 1);
-      PlainSocket socket("127.0.0.1", port, 5, true);
+      ExposedSocket socket("127.0.0.1", port, 5, true);
       const int result = socket.Connect();
       EXPECT_EQ(result, faults.Struck() ? -1 : 0);
       EXPECT_EQ(socket.IsConnected(), !faults.Struck());

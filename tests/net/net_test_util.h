@@ -23,7 +23,7 @@
 
 // A socket with its fields in the open.
 template <typename Base>
-class Open : public Base {
+class Exposed : public Base {
  public:
   using Base::Base;
   using Base::m_bBuffered;
@@ -50,13 +50,13 @@ class Open : public Base {
   }
 };
 
-using PlainSocket = Open<TWSocket>;
-using TlsSocket = Open<SSLSocket>;
+using ExposedSocket = Exposed<TWSocket>;
+using ExposedTlsSocket = Exposed<SSLSocket>;
 
 // A socket that is connected to the test itself. Its own descriptor is closed by the socket.
-class PairedSocket : public PlainSocket {
+class PairedSocket : public ExposedSocket {
  public:
-  PairedSocket(int timeout, bool buffered) : PlainSocket("pair", 0, timeout, buffered) {
+  PairedSocket(int timeout, bool buffered) : ExposedSocket("pair", 0, timeout, buffered) {
     int ends[2] = {-1, -1};
     EXPECT_EQ(socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0, ends), 0);
     m_sockFd = ends[0];
@@ -102,25 +102,25 @@ class PairedSocket : public PlainSocket {
 };
 
 // One answer of a scripted _Read or _Write.
-struct IoAnswer {
+struct IoResult {
   int result;
   int error;
   std::string bytes;
 };
 
-inline IoAnswer Gives(const std::string& bytes) {
+inline IoResult Returns(const std::string& bytes) {
   return {static_cast<int>(bytes.size()), 0, bytes};
 }
-inline IoAnswer Fails(int error) {
+inline IoResult Fails(int error) {
   return {-1, error, ""};
 }
-inline IoAnswer Ends() {
+inline IoResult Ends() {
   return {0, 0, ""};
 }
 
 // `count` times the same answer.
-inline std::vector<IoAnswer> Times(size_t count, const IoAnswer& answer) {
-  return std::vector<IoAnswer>(count, answer);
+inline std::vector<IoResult> Times(size_t count, const IoResult& answer) {
+  return std::vector<IoResult>(count, answer);
 }
 
 // Bytes of which each tells its place.
@@ -133,12 +133,12 @@ inline std::string Pattern(size_t count, size_t from = 0) {
 }
 
 // A connected socket whose waits, reads and writes are scripted. It records their order.
-class ScriptedSocket : public PlainSocket {
+class ScriptedSocket : public ExposedSocket {
  public:
   static constexpr int kFd = 7777;
 
-  ScriptedSocket(bool buffered, std::vector<IoAnswer> reads)
-      : PlainSocket("script", 0, 5, buffered), reads_(std::move(reads)) {
+  ScriptedSocket(bool buffered, std::vector<IoResult> reads)
+      : ExposedSocket("script", 0, 5, buffered), reads_(std::move(reads)) {
     m_sockFd = kFd;
     m_bConnected = true;
   }
@@ -146,7 +146,7 @@ class ScriptedSocket : public PlainSocket {
 
   // Makes the n-th wait, counted from 1, give `result`; the others are positive.
   void AnswerWait(size_t n, int result) { waits_.emplace_back(n, result); }
-  void AnswerWrite(IoAnswer answer) { write_ = std::move(answer); }
+  void AnswerWrite(IoResult answer) { write_ = std::move(answer); }
 
   int DoSelect(SELECT_TYPE type) override {
     calls.emplace_back(type == SELECT_READ ? "wait to read" : "wait to write");
@@ -163,7 +163,7 @@ class ScriptedSocket : public PlainSocket {
       ADD_FAILURE() << "a read that the script does not have";
       return 0;
     }
-    const IoAnswer& answer = reads_[next_read_++];
+    const IoResult& answer = reads_[next_read_++];
     EXPECT_LE(answer.bytes.size(), len) << "the script gives more than was asked for";
     answer.bytes.copy(static_cast<char*>(buf), len);
     errno = answer.error;
@@ -181,11 +181,11 @@ class ScriptedSocket : public PlainSocket {
   std::vector<std::string> calls;
 
  private:
-  std::vector<IoAnswer> reads_;
+  std::vector<IoResult> reads_;
   size_t next_read_ = 0;
   std::vector<std::pair<size_t, int>> waits_;
   size_t wait_count_ = 0;
-  IoAnswer write_ = {0, 0, ""};
+  IoResult write_ = {0, 0, ""};
 };
 
 // The result of a read and the bytes that it delivered.
@@ -219,7 +219,7 @@ inline Delivered ReadLine(TWSocket& socket, size_t len = 128) {
 }
 
 inline std::string Fd(const TWSocket& socket) {
-  return std::to_string(static_cast<const PlainSocket&>(socket).m_sockFd);
+  return std::to_string(static_cast<const ExposedSocket&>(socket).m_sockFd);
 }
 
 inline bool IsNonBlocking(int fd) {

@@ -29,14 +29,14 @@ TlsOptions WithVersion(int version) {
 
 TEST(TlsClientCertificate, WithTls12TheConnectFails) {
   TlsScriptedPeer peer({{RefuseHandshake(), StallUntilFinish()}}, WithVersion(TLS1_2_VERSION));
-  TlsSocket socket("127.0.0.1", peer.Port(), 5, true);
+  ExposedTlsSocket socket("127.0.0.1", peer.Port(), 5, true);
   EXPECT_EQ(socket.Connect(), -1);
   EXPECT_FALSE(socket.IsConnected());
 }
 
 TEST(TlsClientCertificate, WithTls13TheConnectSucceedsAndTheFirstReadMeetsTheEnd) {
   TlsScriptedPeer peer({{RefuseHandshake(), StallUntilFinish()}}, WithVersion(TLS1_3_VERSION));
-  TlsSocket socket("127.0.0.1", peer.Port(), 5, true);
+  ExposedTlsSocket socket("127.0.0.1", peer.Port(), 5, true);
   EXPECT_EQ(socket.Connect(), 0);
   EXPECT_EQ(ReadSome(socket, 5), (Delivered{0, ""}));
   EXPECT_TRUE(socket.IsEOF());

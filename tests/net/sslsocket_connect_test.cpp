@@ -1,41 +1,35 @@
-// The TLS handshake, the end of a connection, and the next one on the same object.
+// The TLS handshake.
 #include <openssl/err.h>
 #include <openssl/ssl.h>
 
-#include <memory>
 #include <thread>
 
 #include "tests/net/net_test_util.h"
+#include "tests/net/tls_test_util.h"
 #include "tests/support/faults.h"
 #include "tests/support/ports.h"
-#include "tests/support/process.h"
 #include "tests/support/tls_scripted_peer.h"
 
 namespace {
 
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
-using ::testing::MatchesRegex;
-using ::testing::StartsWith;
-
-constexpr char kLoopback[] = "127.0.0.1";
-constexpr char kHandshakeFailed[] =
-    "Failed to established SSL conn. with error \\[[0-9]+\\] \\[error:[0-9A-F]+:.*\\].\n";
-
-// One line about a failed handshake.
-void ExpectHandshakeLine(const std::vector<LogLine>& lines) {
-  ASSERT_EQ(lines.size(), 1u);
-  EXPECT_THAT(lines[0], TlsLine("error", "Connect", lines[0].message));
-  EXPECT_THAT(lines[0].message, MatchesRegex(kHandshakeFailed));
-}
 
 class TlsBothWays : public ::testing::TestWithParam<int> {};
+
+// The line with the error code and the text that OpenSSL has for an empty queue.
+std::string WithoutReason(const std::string& start, int code) {
+  char text[256];
+  ERR_error_string_n(0, text, sizeof(text));
+  return start + " [" + std::to_string(code) + "] [" + text + "].\n";
+}
+
 INSTANTIATE_TEST_SUITE_P(Tls, TlsBothWays, ::testing::Values(5, -1));
 
 TEST_P(TlsBothWays, ConnectsWithoutALogLine) {
   LogCapture log;
   TlsScriptedPeer peer({{ExpectExactly("hello"), Send("world"), ExpectCloseNotice()}});
-  TlsSocket socket(kLoopback, peer.Port(), GetParam(), true);
+  ExposedTlsSocket socket(kLoopback, peer.Port(), GetParam(), true);
   EXPECT_EQ(socket.Connect(), 0);
   EXPECT_TRUE(socket.IsConnected());
   EXPECT_EQ(socket.WriteData("hello", 5), 5);
@@ -49,7 +43,7 @@ TEST_P(TlsBothWays, ConnectsWithoutALogLine) {
 
 TEST_P(TlsBothWays, MakesTheHandshakeOnABlockingDescriptorAndThenSetsTheMode) {
   TlsScriptedPeer peer({{Handshake(), DiscardUntilEnd()}});
-  TlsSocket socket(kLoopback, peer.Port(), GetParam(), true);
+  ExposedTlsSocket socket(kLoopback, peer.Port(), GetParam(), true);
   Faults faults;
   bool blocking = false;
   faults.Before(Call::kSslConnect, [&](int) { blocking = !IsNonBlocking(socket.m_sockFd); });
@@ -62,7 +56,7 @@ TEST_P(TlsBothWays, MakesTheHandshakeOnABlockingDescriptorAndThenSetsTheMode) {
 TEST(TlsConnect, TheHandshakeHasNoTimeOut) {
   const Flag go;
   TlsScriptedPeer peer({{WaitFor(go), Handshake(), DiscardUntilEnd()}});
-  TlsSocket socket(kLoopback, peer.Port(), 0, true);
+  ExposedTlsSocket socket(kLoopback, peer.Port(), 0, true);
   std::thread later([&] {
     usleep(300000);
     go.Set();
@@ -72,10 +66,10 @@ TEST(TlsConnect, TheHandshakeHasNoTimeOut) {
   socket.Disconnect();
 }
 
-TEST(TlsConnect, DoesNotAskWhoAnswers) {
+TEST(TlsConnect, DoesNotVerifyTheServer) {
   for (const TlsOptions& tls : {TlsOptions{true, false, 0}, TlsOptions{false, true, 0}}) {
     TlsScriptedPeer peer({{Handshake(), DiscardUntilEnd()}}, tls);
-    TlsSocket socket(kLoopback, peer.Port(), 5, true);
+    ExposedTlsSocket socket(kLoopback, peer.Port(), 5, true);
     EXPECT_EQ(socket.Connect(), 0);
     socket.Disconnect();
   }
@@ -83,7 +77,7 @@ TEST(TlsConnect, DoesNotAskWhoAnswers) {
 
 TEST(TlsConnect, DoesNotNameTheServerItWants) {
   ScriptedPeer peer({{ExpectBytes(200), Reset()}});
-  TlsSocket socket("localhost", peer.Port(), 5, true);
+  ExposedTlsSocket socket("localhost", peer.Port(), 5, true);
   EXPECT_EQ(socket.Connect(), -1);
   const std::string hello = peer.Received(0);
   EXPECT_EQ(hello.substr(0, 2), "\x16\x03");  // it is the client's first message
@@ -92,7 +86,7 @@ TEST(TlsConnect, DoesNotNameTheServerItWants) {
 
 TEST(TlsConnect, NegotiatesTheProtocol) {
   TlsScriptedPeer peer({{Send("old"), ExpectEof()}}, {false, false, TLS1_2_VERSION});
-  TlsSocket socket(kLoopback, peer.Port(), 5, true);
+  ExposedTlsSocket socket(kLoopback, peer.Port(), 5, true);
   EXPECT_EQ(socket.Connect(), 0);
   EXPECT_EQ(ReadSome(socket, 3), (Delivered{3, "old"}));
   socket.Disconnect();
@@ -101,7 +95,7 @@ TEST(TlsConnect, NegotiatesTheProtocol) {
 TEST(TlsConnect, AFailedTcpConnectionIsReturnedWithoutAHandshake) {
   LogCapture log;
   const ClosedPort port;
-  TlsSocket socket(kLoopback, port.Port(), -1, true);
+  ExposedTlsSocket socket(kLoopback, port.Port(), -1, true);
   Faults faults;
   EXPECT_EQ(socket.Connect(), -1);
   EXPECT_EQ(faults.Count(Call::kSslConnect), 0);
@@ -113,7 +107,7 @@ TEST(TlsConnect, AFailedTcpConnectionIsReturnedWithoutAHandshake) {
 TEST(TlsConnect, GarbageInsteadOfAHandshakeIsLoggedWithItsReason) {
   LogCapture log;
   TlsScriptedPeer peer({{SendRaw("this is not TLS\r\n"), StallUntilFinish()}});
-  TlsSocket socket(kLoopback, peer.Port(), 5, true);
+  ExposedTlsSocket socket(kLoopback, peer.Port(), 5, true);
   EXPECT_EQ(socket.Connect(), -1);
   EXPECT_FALSE(socket.IsConnected());
   ExpectHandshakeLine(log.Lines());
@@ -125,7 +119,7 @@ TEST(TlsConnect, AHandshakeThatThePeerBreaksOffFails) {
   for (const Step& end : {Close(), Reset()}) {
     LogCapture log;
     TlsScriptedPeer peer({{ExpectRawBytes(1), end}});
-    TlsSocket socket(kLoopback, peer.Port(), 5, true);
+    ExposedTlsSocket socket(kLoopback, peer.Port(), 5, true);
     EXPECT_EQ(socket.Connect(), -1) << end.name;
     EXPECT_FALSE(socket.IsConnected());
     EXPECT_EQ(socket.m_sockFd, -1);
@@ -136,7 +130,7 @@ TEST(TlsConnect, AHandshakeThatThePeerBreaksOffFails) {
 TEST(TlsConnect, APeerThatClosesAtOnceFailsTheHandshake) {
   LogCapture log;
   ScriptedPeer peer({{Reset()}});
-  TlsSocket socket(kLoopback, peer.Port(), -1, true);
+  ExposedTlsSocket socket(kLoopback, peer.Port(), -1, true);
   Faults faults;
   faults.Before(Call::kSslConnect, [](int) { usleep(50000); });
   EXPECT_EQ(socket.Connect(), -1);
@@ -144,17 +138,10 @@ TEST(TlsConnect, APeerThatClosesAtOnceFailsTheHandshake) {
   ExpectHandshakeLine(log.Lines());
 }
 
-// The line with the error code and the text that OpenSSL has for an empty queue.
-std::string WithoutReason(const std::string& start, int code) {
-  char text[256];
-  ERR_error_string_n(0, text, sizeof(text));
-  return start + " [" + std::to_string(code) + "] [" + text + "].\n";
-}
-
 TEST(TlsConnect, LogsTheErrorCodeAndTheTextOfTheQueue) {
   LogCapture log;
   ScriptedPeer peer({{ExpectEof()}});
-  TlsSocket socket(kLoopback, peer.Port(), 5, true);
+  ExposedTlsSocket socket(kLoopback, peer.Port(), 5, true);
   {
     Faults faults;
     faults.FailNth(Call::kSslConnect, 1, ECONNRESET);
@@ -169,7 +156,7 @@ TEST(TlsConnect, LogsTheErrorCodeAndTheTextOfTheQueue) {
 TEST(TlsConnect, AnyResultBut1IsAFailure) {
   for (const int result : {0, -1, 2}) {
     ScriptedPeer peer({{ExpectEof()}});
-    TlsSocket socket(kLoopback, peer.Port(), 5, true);
+    ExposedTlsSocket socket(kLoopback, peer.Port(), 5, true);
     Faults faults;
     faults.FailNth(Call::kSslConnect, 1, 0, result);
     EXPECT_EQ(socket.Connect(), -1) << result;
@@ -180,7 +167,7 @@ TEST(TlsConnect, AnyResultBut1IsAFailure) {
 TEST(TlsConnect, ADescriptorThatTlsDoesNotTakeIsAFailure) {
   LogCapture log;
   ScriptedPeer peer({{ExpectEof()}});
-  TlsSocket socket(kLoopback, peer.Port(), 5, true);
+  ExposedTlsSocket socket(kLoopback, peer.Port(), 5, true);
   Faults faults;
   faults.FailNth(Call::kSslSetFd, 1);
   EXPECT_EQ(socket.Connect(), -1);
@@ -192,7 +179,7 @@ TEST(TlsConnect, ADescriptorThatTlsDoesNotTakeIsAFailure) {
 TEST(TlsConnect, AnOldErrorInTheQueueDoesNotDisturbIt) {
   LogCapture log;
   TlsScriptedPeer peer({{Handshake(), ExpectCloseNotice()}});
-  TlsSocket socket(kLoopback, peer.Port(), 5, true);
+  ExposedTlsSocket socket(kLoopback, peer.Port(), 5, true);
   ERR_raise(ERR_LIB_USER, 7);
   EXPECT_EQ(socket.Connect(), 0);
   socket.Disconnect();
@@ -204,238 +191,11 @@ TEST(TlsConnect, AnOldErrorInTheQueueDoesNotDisturbIt) {
 TEST(TlsConnect, AnOldErrorInTheQueueIsNotTheReasonOfAFailure) {
   LogCapture log;
   TlsScriptedPeer peer({{SendRaw("this is not TLS\r\n"), StallUntilFinish()}});
-  TlsSocket socket(kLoopback, peer.Port(), 5, true);
+  ExposedTlsSocket socket(kLoopback, peer.Port(), 5, true);
   ERR_raise(ERR_LIB_USER, 7);
   EXPECT_EQ(socket.Connect(), -1);
   ERR_clear_error();
   EXPECT_THAT(log.Text(), ::testing::HasSubstr("wrong version number"));
-}
-
-// The end of a connection.
-
-TEST(TlsDisconnect, SendsTheCloseNoticeAndDoesNotWaitForThePeers) {
-  TlsScriptedPeer peer({{Handshake(), ExpectCloseNotice(), StallUntilFinish()}});
-  TlsSocket socket(kLoopback, peer.Port(), 5, true);
-  ASSERT_EQ(socket.Connect(), 0);
-  Faults faults;
-  const Stopwatch watch;
-  socket.Disconnect();
-  EXPECT_LT(watch.Seconds(), 2.0);
-  EXPECT_EQ(faults.Count(Call::kSslShutdown), 1);
-  EXPECT_EQ(faults.Count(Call::kSslClear), 1);
-  EXPECT_EQ(faults.Count(Call::kClose), 1);
-}
-
-TEST(TlsDisconnect, WithoutAConnectionTheBaseAloneRuns) {
-  TlsScriptedPeer peer({{Handshake(), DiscardUntilEnd()}});
-  TlsSocket socket(kLoopback, peer.Port(), 5, true);
-  ASSERT_EQ(socket.Connect(), 0);
-  socket.m_bConnected = false;
-  socket.Buffer("old", 3);
-  Faults faults;
-  socket.Disconnect();
-  EXPECT_EQ(faults.Count(Call::kSslShutdown), 0);
-  EXPECT_EQ(faults.Count(Call::kClose), 1);
-  EXPECT_EQ(socket.m_sockFd, -1);
-  EXPECT_EQ(socket.m_readLen, 0);
-}
-
-TEST(TlsDisconnect, TheDestructorClosesWithoutANotice) {
-  TlsScriptedPeer peer({{Handshake(), DiscardUntilEnd()}});
-  auto socket = std::make_unique<TlsSocket>(kLoopback, peer.Port(), 5, true);
-  ASSERT_EQ(socket->Connect(), 0);
-  const int fd = socket->m_sockFd;
-  Faults faults;
-  socket.reset();
-  EXPECT_EQ(faults.Count(Call::kSslShutdown), 0);
-  EXPECT_EQ(faults.Count(Call::kClose), 1);
-  EXPECT_FALSE(IsOpenFd(fd));
-}
-
-// The same object connects again, however the last connection ended.
-
-void ExpectDialog(TlsSocket& socket) {
-  ASSERT_EQ(socket.Connect(), 0);
-  EXPECT_EQ(socket.WriteData("ping\n", 5), 5);
-  EXPECT_EQ(ReadLine(socket), (Delivered{4, "pong"}));
-  socket.Disconnect();
-}
-
-const Script& Dialog() {
-  static const Script script = {ExpectExactly("ping\n"), Send("pong\r\n"), ExpectEof()};
-  return script;
-}
-
-class TlsReconnect : public ::testing::TestWithParam<bool> {};
-INSTANTIATE_TEST_SUITE_P(Tls, TlsReconnect, ::testing::Bool());
-
-TEST_P(TlsReconnect, WorksAfterADisconnect) {
-  TlsScriptedPeer peer({Dialog(), Dialog(), Dialog()});
-  TlsSocket socket(kLoopback, peer.Port(), 5, GetParam());
-  for (int i = 0; i < 3; ++i) ExpectDialog(socket);
-}
-
-TEST_P(TlsReconnect, ShutsDownAnOpenConnectionFirst) {
-  TlsScriptedPeer peer({{Handshake(), ExpectCloseNotice()}, Dialog()});
-  TlsSocket socket(kLoopback, peer.Port(), 5, GetParam());
-  ASSERT_EQ(socket.Connect(), 0);
-  ExpectDialog(socket);
-}
-
-TEST_P(TlsReconnect, WorksAfterAFailedRead) {
-  for (const Step& end : {SendRaw("no TLS record at all"), Reset(), CloseWithoutNotice()}) {
-    SCOPED_TRACE(end.name);
-    TlsScriptedPeer peer({{Handshake(), end}, Dialog()});
-    TlsSocket socket(kLoopback, peer.Port(), 5, GetParam());
-    ASSERT_EQ(socket.Connect(), 0);
-    EXPECT_LE(ReadSome(socket, 10).result, 0);
-    ExpectDialog(socket);
-  }
-}
-
-TEST_P(TlsReconnect, WorksAfterAFailedHandshake) {
-  TlsScriptedPeer peer({{SendRaw("this is not TLS\r\n")}, Dialog()});
-  TlsSocket socket(kLoopback, peer.Port(), 5, GetParam());
-  EXPECT_EQ(socket.Connect(), -1);
-  ExpectDialog(socket);
-}
-
-TEST_P(TlsReconnect, WorksAfterNewSettings) {
-  TlsScriptedPeer first({{Handshake(), DiscardUntilEnd()}});
-  TlsScriptedPeer second({Dialog()});
-  TlsSocket socket(kLoopback, first.Port(), 5, GetParam());
-  ASSERT_EQ(socket.Connect(), 0);
-  socket.SetSocketInfo(kLoopback, second.Port(), 5, GetParam());
-  ExpectDialog(socket);
-}
-
-TEST_P(TlsReconnect, WorksAfterARefusedConnection) {
-  const ClosedPort port;
-  TlsScriptedPeer peer({Dialog()});
-  TlsSocket socket(kLoopback, port.Port(), 5, GetParam());
-  EXPECT_EQ(socket.Connect(), -1);
-  socket.SetSocketInfo(kLoopback, peer.Port(), 5, GetParam());
-  ExpectDialog(socket);
-}
-
-TEST_P(TlsReconnect, WorksAfterATimeOut) {
-  TlsScriptedPeer peer({{Handshake(), DiscardUntilEnd()}, Dialog()});
-  TlsSocket socket(kLoopback, peer.Port(), 0, GetParam());
-  ASSERT_EQ(socket.Connect(), 0);
-  EXPECT_EQ(ReadSome(socket, 10).result, -1);
-  socket.m_timeout = 5;
-  ExpectDialog(socket);
-}
-
-// When OpenSSL has no objects to give.
-
-class TlsWithoutObjects : public ::testing::TestWithParam<Call> {
- protected:
-  TlsWithoutObjects() {
-    Faults faults;
-    faults.FailNth(GetParam(), 1);
-    listener_ = BindLoopback(&port_);
-    listen(listener_, 8);
-    socket_ = std::make_unique<TlsSocket>(kLoopback, port_, 1, true);
-  }
-  ~TlsWithoutObjects() override { close(listener_); }
-
-  LogCapture log_;
-  std::unique_ptr<TlsSocket> socket_;
-
- private:
-  int listener_;
-  int port_ = 0;
-};
-INSTANTIATE_TEST_SUITE_P(Tls, TlsWithoutObjects, ::testing::Values(Call::kSslCtxNew, Call::kSslNew),
-                         [](const auto& instance) {
-                           return std::string(CallName(instance.param)) + "Failed";
-                         });
-
-TEST_P(TlsWithoutObjects, TheConstructorLogsIt) {
-  const auto no_object = TlsLine("error", "InitSSL", "Failed to create SSL object.\n");
-  if (GetParam() == Call::kSslNew) {
-    EXPECT_THAT(log_.Lines(), ElementsAre(no_object));
-    return;
-  }
-  EXPECT_THAT(log_.Lines(),
-              ElementsAre(TlsLine("error", "InitSSL", "Failed to create SSL context object.\n"),
-                          no_object));
-}
-
-TEST_P(TlsWithoutObjects, ConnectFailsAndIsLogged) {
-  for (int i = 0; i < 2; ++i) {
-    log_.Clear();
-    EXPECT_EQ(socket_->Connect(), -1);
-    EXPECT_FALSE(socket_->IsConnected());
-    EXPECT_EQ(socket_->m_sockFd, -1);
-    ExpectHandshakeLine(log_.Lines());
-  }
-}
-
-TEST_P(TlsWithoutObjects, RawReadsAndWritesFailAndAreLogged) {
-  const PairedSocket pair(1, true);
-  socket_->m_sockFd = dup(pair.m_sockFd);
-  log_.Clear();
-  char buf[4] = {};
-  EXPECT_EQ(socket_->_Read(buf, sizeof(buf)), -1);
-  EXPECT_EQ(socket_->_Write(buf, sizeof(buf)), -1);
-  const auto lines = log_.Lines();
-  ASSERT_EQ(lines.size(), 2u);
-  EXPECT_THAT(lines[0], TlsLine("error", "_Read", lines[0].message));
-  EXPECT_THAT(lines[0].message, StartsWith("Read error ["));
-  EXPECT_THAT(lines[1], TlsLine("error", "_Write", lines[1].message));
-  EXPECT_THAT(lines[1].message, StartsWith("Write error ["));
-  EXPECT_EQ(socket_->_Write(buf, 0), 0);
-}
-
-TEST_P(TlsWithoutObjects, EveryOtherCallFailsWithoutACrash) {
-  const PairedSocket pair(0, true);
-  socket_->m_timeout = 0;
-  for (const bool buffered : {false, true}) {
-    socket_->m_sockFd = dup(pair.m_sockFd);
-    socket_->m_bConnected = true;
-    socket_->m_bBuffered = buffered;
-    EXPECT_EQ(socket_->DoSelect(TWSocket::SELECT_READ), 0);
-    EXPECT_FALSE(socket_->HasDataToRead(0));
-    EXPECT_EQ(ReadSome(*socket_, 10).result, -1);
-    EXPECT_EQ(ReadSome(*socket_, 2000).result, -1);
-    EXPECT_EQ(ReadLine(*socket_).result, -1);
-    EXPECT_EQ(socket_->WriteData("hello", 5), -1);
-    socket_->m_bConnected = true;
-    socket_->Disconnect();
-    EXPECT_EQ(socket_->m_sockFd, -1);
-    EXPECT_FALSE(socket_->IsConnected());
-  }
-}
-
-TEST(TlsObject, StartsAsThePlainSocketDoes) {
-  TlsSocket socket("host", 443, 9, true);
-  EXPECT_EQ(socket.m_sockFd, -1);
-  EXPECT_EQ(socket.m_strHost, "host");
-  EXPECT_EQ(socket.m_port, 443);
-  EXPECT_EQ(socket.m_timeout, 9);
-  EXPECT_TRUE(socket.m_bBuffered);
-  TlsSocket bare;
-  EXPECT_EQ(bare.m_port, -1);
-  EXPECT_EQ(bare.m_timeout, -1);
-}
-
-TEST(TlsObject, LeavesNoDescriptorBehind) {
-  const DescriptorGuard guard;
-  TlsScriptedPeer peer({Dialog(), {SendRaw("garbage, not TLS")}, Dialog()});
-  TlsSocket socket(kLoopback, peer.Port(), 5, true);
-  ExpectDialog(socket);
-  EXPECT_EQ(socket.Connect(), -1);
-  ExpectDialog(socket);
-}
-
-TEST(TlsObject, ItsDescriptorIsClosedByExec) {
-  TlsScriptedPeer peer({{Handshake(), DiscardUntilEnd()}});
-  TlsSocket socket(kLoopback, peer.Port(), 5, true);
-  ASSERT_EQ(socket.Connect(), 0);
-  EXPECT_NE(fcntl(socket.m_sockFd, F_GETFD) & FD_CLOEXEC, 0);
-  socket.Disconnect();
 }
 
 }  // namespace

@@ -12,28 +12,28 @@ using ::testing::ElementsAre;
 
 constexpr char kLoopback[] = "127.0.0.1";
 
-class WatchedTlsSocket : public TlsSocket {
+class WatchedTlsSocket : public ExposedTlsSocket {
  public:
-  using TlsSocket::TlsSocket;
+  using ExposedTlsSocket::ExposedTlsSocket;
 
   int PostConnect() override {
     steps.emplace_back("PostConnect");
-    TlsSocket::PostConnect();
+    ExposedTlsSocket::PostConnect();
     return -5;
   }
   void Disconnect() override {
     steps.emplace_back("Disconnect");
-    TlsSocket::Disconnect();
+    ExposedTlsSocket::Disconnect();
   }
   int DoSelect(SELECT_TYPE type) override {
     steps.emplace_back(type == SELECT_READ ? "wait to read" : "wait to write");
-    return TlsSocket::DoSelect(type);
+    return ExposedTlsSocket::DoSelect(type);
   }
 
   std::vector<std::string> steps;
 };
 
-TEST(DerivedTlsSocket, IsDisconnectedFirstAndPostConnectsResultDoesNotCount) {
+TEST(DerivedTlsSocket, IsDisconnectedFirstAndPostConnectsResultIsIgnored) {
   TlsScriptedPeer peer({{Handshake(), DiscardUntilEnd()}});
   WatchedTlsSocket socket(kLoopback, peer.Port(), 5, true);
   EXPECT_EQ(socket.Connect(), 0);

@@ -9,7 +9,7 @@ using ::testing::ElementsAre;
 
 TEST(TlsEdges, PendingBytesAreNotDataToReadAndAreReadWithoutAWait) {
   TlsScriptedPeer peer({{Send("hello world"), ExpectEof()}});
-  TlsSocket socket("127.0.0.1", peer.Port(), 5, false);
+  ExposedTlsSocket socket("127.0.0.1", peer.Port(), 5, false);
   ASSERT_EQ(socket.Connect(), 0);
   ASSERT_EQ(ReadSome(socket, 5), (Delivered{5, "hello"}));
   {
@@ -21,10 +21,10 @@ TEST(TlsEdges, PendingBytesAreNotDataToReadAndAreReadWithoutAWait) {
   socket.Disconnect();
 }
 
-TEST(TlsEdges, ACleanCloseGivesZeroAndIsTheEndOfTheStream) {
+TEST(TlsEdges, ACleanCloseReturnsZeroAndIsTheEndOfTheStream) {
   LogCapture log;
   TlsScriptedPeer peer({{Handshake(), Close()}});
-  TlsSocket socket("127.0.0.1", peer.Port(), 5, false);
+  ExposedTlsSocket socket("127.0.0.1", peer.Port(), 5, false);
   ASSERT_EQ(socket.Connect(), 0);
   char byte;
   EXPECT_EQ(socket._Read(&byte, 1), 0);
@@ -37,7 +37,7 @@ TEST(TlsEdges, ALargeWriteGoesOutInPiecesOf32000Bytes) {
   const std::string bytes = Pattern(100000);
   const Flag arrived;
   TlsScriptedPeer peer({{ExpectExactly(bytes), SetFlag(arrived), DiscardUntilEnd()}});
-  TlsSocket socket("127.0.0.1", peer.Port(), -1, true);
+  ExposedTlsSocket socket("127.0.0.1", peer.Port(), -1, true);
   ASSERT_EQ(socket.Connect(), 0);
   Faults faults;
   EXPECT_EQ(socket.WriteData(bytes.data(), 100000), 100000);
@@ -48,7 +48,7 @@ TEST(TlsEdges, ALargeWriteGoesOutInPiecesOf32000Bytes) {
 
 TEST(TlsEdges, AFailedHandshakeDisconnects) {
   TlsScriptedPeer peer({{SendRaw("this is not TLS\r\n"), StallUntilFinish()}});
-  TlsSocket socket("127.0.0.1", peer.Port(), 5, true);
+  ExposedTlsSocket socket("127.0.0.1", peer.Port(), 5, true);
   EXPECT_EQ(socket.Connect(), -1);
   EXPECT_FALSE(socket.IsConnected());
   EXPECT_EQ(socket.m_sockFd, -1);

@@ -10,16 +10,16 @@ using namespace tarnwick;
 namespace {
 
 // The fields of a socket that is of no derived class.
-struct Inside : TWSocket {
-  static char* Buffer(TWSocket* socket) { return socket->*(&Inside::m_readBuf); }
-  static int& Fd(TWSocket* socket) { return socket->*(&Inside::m_sockFd); }
+struct Fields : TWSocket {
+  static char* Buffer(TWSocket* socket) { return socket->*(&Fields::m_readBuf); }
+  static int& Fd(TWSocket* socket) { return socket->*(&Fields::m_sockFd); }
   static size_t Used(TWSocket* socket) {
-    return static_cast<size_t>(socket->*(&Inside::m_readPos) + socket->*(&Inside::m_readLen));
+    return static_cast<size_t>(socket->*(&Fields::m_readPos) + socket->*(&Fields::m_readLen));
   }
 };
 
 bool IsZeroFrom(TWSocket* socket, size_t from) {
-  const char* const begin = Inside::Buffer(socket);
+  const char* const begin = Fields::Buffer(socket);
   return std::all_of(begin + from, begin + 65536, [](char byte) { return byte == 0; });
 }
 
@@ -27,7 +27,7 @@ bool IsZeroFrom(TWSocket* socket, size_t from) {
 int ConnectToPeer(TWSocket* socket) {
   int ends[2] = {-1, -1};
   EXPECT_EQ(socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0, ends), 0);
-  Inside::Fd(socket) = ends[0];
+  Fields::Fd(socket) = ends[0];
   socket->PostConnect();
   return ends[1];
 }
@@ -47,14 +47,14 @@ TEST(Clearing, SetSocketInfoLeavesNothingOfAnEarlierConnection) {
   close(peer);
 }
 
-TEST(Clearing, WhatDirectModeLeftBehindGoesWithTheNextBufferedConnection) {
+TEST(Clearing, WhatDirectModeLeftGoesWithTheNextBufferedConnection) {
   const auto socket = std::make_unique<TWSocket>("pair", 0, 0, true);
   const int peer = ConnectToPeer(socket.get());
   PeerSends(peer, std::string(5000, 's'));
   EXPECT_EQ(ReadSome(*socket, 10).result, 10);
   socket->SetSocketInfo("direct", 1, 2, false);
   socket->Disconnect();
-  EXPECT_EQ(Inside::Buffer(socket.get())[4999], 's');
+  EXPECT_EQ(Fields::Buffer(socket.get())[4999], 's');
   socket->SetSocketInfo("buffered", 1, 2, true);
   EXPECT_TRUE(IsZeroFrom(socket.get(), 0));
   close(peer);
@@ -80,16 +80,16 @@ TEST(Clearing, IsOfTheWholeBuffer) {
 
 TEST(Clearing, TheClientsSocketForgetsWhatItReadThoughNothingIsCleared) {
   const std::unique_ptr<TWSocket> socket(SocketAccess::MakePlain());
-  const PlainSocket fresh;
-  EXPECT_EQ(Inside::Fd(socket.get()), fresh.m_sockFd);
-  EXPECT_EQ(Inside::Used(socket.get()), 0u);
+  const ExposedSocket fresh;
+  EXPECT_EQ(Fields::Fd(socket.get()), fresh.m_sockFd);
+  EXPECT_EQ(Fields::Used(socket.get()), 0u);
   EXPECT_FALSE(socket->IsConnected() || socket->IsEOF());
   socket->SetSocketInfo("pair", 0, 0, true);
   const int peer = ConnectToPeer(socket.get());
   PeerSends(peer, std::string(3000, 's'));
   EXPECT_EQ(ReadSome(*socket, 10).result, 10);
   socket->Disconnect();
-  EXPECT_EQ(Inside::Used(socket.get()), 0u);
+  EXPECT_EQ(Fields::Used(socket.get()), 0u);
   close(peer);
 }
 

@@ -16,7 +16,7 @@ using ::testing::IsEmpty;
 TEST(ConnectEdges, ATimeOutOfZeroFailsUnlessTheConnectionCompletesAtOnce) {
   LogCapture log;
   const BlackHolePort hole;
-  PlainSocket socket("127.0.0.1", hole.Port(), 0, true);
+  ExposedSocket socket("127.0.0.1", hole.Port(), 0, true);
   Faults faults;
   EXPECT_EQ(socket.Connect(), -1);
   EXPECT_EQ(errno, ETIMEDOUT);
@@ -30,7 +30,7 @@ TEST(ConnectEdges, ATimeOutOfZeroFailsUnlessTheConnectionCompletesAtOnce) {
 TEST(ConnectEdges, ATimeOutOfZeroSetsNonBlockingModeAfterAConnectionThatCompletedAtOnce) {
   LogCapture log;
   ScriptedPeer peer({{ExpectEof()}});
-  PlainSocket socket("127.0.0.1", peer.Port(), 0, true);
+  ExposedSocket socket("127.0.0.1", peer.Port(), 0, true);
   ASSERT_EQ(socket.Connect(), 0);  // on the loopback interface it does
   EXPECT_TRUE(socket.IsConnected());
   EXPECT_TRUE(IsNonBlocking(socket.m_sockFd));
@@ -41,7 +41,7 @@ TEST(ConnectEdges, ATimeOutOfZeroSetsNonBlockingModeAfterAConnectionThatComplete
 TEST(ConnectEdges, ASourceAddressThatCannotBeBoundIsLoggedAndTheConnectionProceeds) {
   LogCapture log;
   ScriptedPeer peer({{ExpectEof()}});
-  PlainSocket socket("127.0.0.1", peer.Port(), 5, true);
+  ExposedSocket socket("127.0.0.1", peer.Port(), 5, true);
   const in_addr_t foreign = inet_addr("192.0.2.1");
   socket.SetRemoteAddr(foreign);
   EXPECT_EQ(socket.Connect(), 0);
@@ -56,9 +56,9 @@ TEST(ConnectEdges, ASourceAddressThatCannotBeBoundIsLoggedAndTheConnectionProcee
   socket.Disconnect();
 }
 
-TEST(ConnectEdges, AnUnresolvableHostGivesMinusOneAndIsNotConnected) {
+TEST(ConnectEdges, AnUnresolvableHostReturnsMinusOneAndIsNotConnected) {
   LogCapture log;
-  PlainSocket socket("no-such-host.invalid", 80, 5, true);
+  ExposedSocket socket("no-such-host.invalid", 80, 5, true);
   EXPECT_EQ(socket.Connect(), -1);
   EXPECT_FALSE(socket.IsConnected());
   EXPECT_THAT(log.Lines(),
@@ -68,7 +68,7 @@ TEST(ConnectEdges, AnUnresolvableHostGivesMinusOneAndIsNotConnected) {
 TEST(ConnectEdges, ARefusedConnectionWithATimeOutLogsTheErrorAndThenTheTimeOut) {
   LogCapture log;
   const ClosedPort port;
-  PlainSocket socket("127.0.0.1", port.Port(), 5, true);
+  ExposedSocket socket("127.0.0.1", port.Port(), 5, true);
   EXPECT_EQ(socket.Connect(), -1);
   EXPECT_FALSE(socket.IsConnected());
   EXPECT_THAT(log.Lines(),
@@ -80,7 +80,7 @@ TEST(ConnectEdges, ARefusedConnectionWithATimeOutLogsTheErrorAndThenTheTimeOut) 
 TEST(ConnectEdges, AConnectionThatIsRefusedAtOnceIsLoggedAsConnected) {
   LogCapture log;
   const ClosedPort port;
-  PlainSocket socket("127.0.0.1", port.Port(), 5, true);
+  ExposedSocket socket("127.0.0.1", port.Port(), 5, true);
   Faults faults;
   faults.FailNth(Call::kConnect, 1, ECONNREFUSED);
   EXPECT_EQ(socket.Connect(), -1);
@@ -93,7 +93,7 @@ TEST(ConnectEdges, AConnectionThatIsRefusedAtOnceIsLoggedAsConnected) {
 
 TEST(ConnectEdges, KeepAliveWithEnableZeroIsSwitchedOffWithoutTouchingTheThreeOptions) {
   ScriptedPeer peer({{ExpectEof()}});
-  PlainSocket socket("127.0.0.1", peer.Port(), 5, true);
+  ExposedSocket socket("127.0.0.1", peer.Port(), 5, true);
   ASSERT_EQ(socket.Connect(), 0);
   ASSERT_EQ(socket.SetKeepAliveOpt(1, 11, 12, 13), 0);
   {
@@ -110,7 +110,7 @@ TEST(ConnectEdges, KeepAliveWithEnableZeroIsSwitchedOffWithoutTouchingTheThreeOp
 
 TEST(ConnectEdges, ConnectingTwiceClosesTheFirstSocketBeforeOpeningTheSecond) {
   ScriptedPeer peer({{ExpectEof()}, {ExpectEof()}});
-  PlainSocket socket("127.0.0.1", peer.Port(), 5, true);
+  ExposedSocket socket("127.0.0.1", peer.Port(), 5, true);
   ASSERT_EQ(socket.Connect(), 0);
   std::vector<std::string> order;
   Faults faults;

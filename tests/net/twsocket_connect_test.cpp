@@ -1,11 +1,9 @@
-// Connecting: the sequence, its two ways, and what each failure leaves behind.
+// Connecting: the sequence, its two ways, and what each failure leaves.
 #include <arpa/inet.h>
 #include <netdb.h>
 #include <netinet/in.h>
-#include <netinet/tcp.h>
 #include <sys/mount.h>
 
-#include "tarnwick/log/twdebuglog.h"
 #include "tests/net/net_test_util.h"
 #include "tests/support/faults.h"
 #include "tests/support/files.h"
@@ -22,12 +20,53 @@ constexpr char kLoopback[] = "127.0.0.1";
 
 // The two ways to connect: with and without a time-out.
 class BothWays : public ::testing::TestWithParam<int> {};
+
+// Gives the process a hosts file of its own.
+class HostsFile {
+ public:
+  explicit HostsFile(const std::string& content) {
+    WriteFile(directory_.File("hosts"), content);
+    EXPECT_EQ(mount(directory_.File("hosts").c_str(), "/etc/hosts", nullptr, MS_BIND, nullptr), 0);
+  }
+  ~HostsFile() { umount("/etc/hosts"); }
+
+ private:
+  TempDir directory_;
+};
+
+size_t CountAddresses(const char* name) {
+  addrinfo hints = {};
+  hints.ai_family = AF_INET;
+  hints.ai_socktype = SOCK_STREAM;
+  addrinfo* list = nullptr;
+  if (getaddrinfo(name, "80", &hints, &list) != 0) return 0;
+  size_t count = 0;
+  for (const addrinfo* entry = list; entry != nullptr; entry = entry->ai_next) ++count;
+  freeaddrinfo(list);
+  return count;
+}
+
+// The steps that a derived socket sees.
+class WatchedSocket : public ExposedSocket {
+ public:
+  using ExposedSocket::ExposedSocket;
+  int PostConnect() override {
+    steps.emplace_back("PostConnect");
+    return -5;
+  }
+  void Disconnect() override {
+    steps.emplace_back("Disconnect");
+    ExposedSocket::Disconnect();
+  }
+  std::vector<std::string> steps;
+};
+
 INSTANTIATE_TEST_SUITE_P(Connect, BothWays, ::testing::Values(5, -1));
 
 TEST_P(BothWays, ReachesTheHostAndThePort) {
   LogCapture log;
   ScriptedPeer peer({{ExpectExactly("hello"), ExpectEof()}});
-  PlainSocket socket(kLoopback, peer.Port(), GetParam(), true);
+  ExposedSocket socket(kLoopback, peer.Port(), GetParam(), true);
   EXPECT_EQ(socket.Connect(), 0);
   EXPECT_TRUE(socket.IsConnected());
   EXPECT_EQ(socket.WriteData("hello", 5), 5);
@@ -38,14 +77,14 @@ TEST_P(BothWays, ReachesTheHostAndThePort) {
 
 TEST_P(BothWays, ResolvesAName) {
   ScriptedPeer peer({{ExpectEof()}});
-  PlainSocket socket("localhost", peer.Port(), GetParam(), true);
+  ExposedSocket socket("localhost", peer.Port(), GetParam(), true);
   EXPECT_EQ(socket.Connect(), 0);
   socket.Disconnect();
 }
 
 TEST_P(BothWays, SetsTheModeOfTheTimeOut) {
   ScriptedPeer peer({{ExpectEof()}});
-  PlainSocket socket(kLoopback, peer.Port(), GetParam(), true);
+  ExposedSocket socket(kLoopback, peer.Port(), GetParam(), true);
   ASSERT_EQ(socket.Connect(), 0);
   EXPECT_EQ(IsNonBlocking(socket.m_sockFd), GetParam() >= 0);
   socket.Disconnect();
@@ -53,7 +92,7 @@ TEST_P(BothWays, SetsTheModeOfTheTimeOut) {
 
 TEST_P(BothWays, ConnectSocketAloneLeavesTheDescriptorBlocking) {
   ScriptedPeer peer({{ExpectEof()}});
-  PlainSocket socket(kLoopback, peer.Port(), GetParam(), true);
+  ExposedSocket socket(kLoopback, peer.Port(), GetParam(), true);
   Faults faults;
   ASSERT_EQ(socket.ConnectSocket(), 0);
   EXPECT_EQ(faults.Count(Call::kIoctl), 0);
@@ -64,7 +103,7 @@ TEST_P(BothWays, ConnectSocketAloneLeavesTheDescriptorBlocking) {
 
 TEST_P(BothWays, OpensADescriptorThatExecCloses) {
   ScriptedPeer peer({{ExpectEof()}});
-  PlainSocket socket(kLoopback, peer.Port(), GetParam(), true);
+  ExposedSocket socket(kLoopback, peer.Port(), GetParam(), true);
   ASSERT_EQ(socket.Connect(), 0);
   EXPECT_NE(fcntl(socket.m_sockFd, F_GETFD) & FD_CLOEXEC, 0);
   socket.Disconnect();
@@ -72,7 +111,7 @@ TEST_P(BothWays, OpensADescriptorThatExecCloses) {
 
 TEST_P(BothWays, FailsWithoutASocket) {
   LogCapture log;
-  PlainSocket socket(kLoopback, 80, GetParam(), true);
+  ExposedSocket socket(kLoopback, 80, GetParam(), true);
   Faults faults;
   faults.FailNth(Call::kSocket, 1, EMFILE);
   EXPECT_EQ(socket.Connect(), -1);
@@ -85,7 +124,7 @@ TEST_P(BothWays, FailsWithoutASocket) {
 
 TEST_P(BothWays, ANameThatIsNotResolvedLeavesTheDescriptorOpenUntilDisconnect) {
   LogCapture log;
-  PlainSocket socket(kLoopback, 80, GetParam(), true);
+  ExposedSocket socket(kLoopback, 80, GetParam(), true);
   {
     Faults faults;
     faults.FailNth(Call::kGetaddrinfo, 1, Faults::kUsual, EAI_AGAIN);
@@ -103,14 +142,14 @@ TEST_P(BothWays, ANameThatIsNotResolvedLeavesTheDescriptorOpenUntilDisconnect) {
 
 TEST_P(BothWays, KnowsIpv4Only) {
   LogCapture log;
-  PlainSocket socket("::1", 80, GetParam(), true);
+  ExposedSocket socket("::1", 80, GetParam(), true);
   EXPECT_EQ(socket.Connect(), -1);
   EXPECT_THAT(log.Messages(), ElementsAre("Scoket getaddrinfo incomplete.\n"));
 }
 
 TEST_P(BothWays, ARefusalLeavesTheDescriptorOpenAndUnconnected) {
   const ClosedPort port;
-  PlainSocket socket(kLoopback, port.Port(), GetParam(), true);
+  ExposedSocket socket(kLoopback, port.Port(), GetParam(), true);
   EXPECT_EQ(socket.Connect(), -1);
   EXPECT_FALSE(socket.IsConnected());
   EXPECT_TRUE(IsOpenFd(socket.m_sockFd));
@@ -120,7 +159,7 @@ TEST_P(BothWays, ARefusalLeavesTheDescriptorOpenAndUnconnected) {
 TEST_P(BothWays, TheDescriptorOfARefusalIsClosedByTheNextConnect) {
   const ClosedPort port;
   const DescriptorGuard guard;
-  PlainSocket socket(kLoopback, port.Port(), GetParam(), true);
+  ExposedSocket socket(kLoopback, port.Port(), GetParam(), true);
   for (int i = 0; i < 5; ++i) EXPECT_EQ(socket.Connect(), -1);
   const size_t open = OpenDescriptors().size();
   EXPECT_EQ(socket.Connect(), -1);
@@ -132,14 +171,14 @@ TEST_P(BothWays, TheDescriptorOfARefusalIsClosedByTheNextConnect) {
 TEST_P(BothWays, TheDescriptorOfARefusalIsClosedByTheDestructor) {
   const ClosedPort port;
   const DescriptorGuard guard;
-  PlainSocket socket(kLoopback, port.Port(), GetParam(), true);
+  ExposedSocket socket(kLoopback, port.Port(), GetParam(), true);
   EXPECT_EQ(socket.Connect(), -1);
 }
 
 TEST_P(BothWays, ConnectsAgainAfterARefusal) {
   const ClosedPort port;
   ScriptedPeer peer({{ExpectEof()}});
-  PlainSocket socket(kLoopback, port.Port(), GetParam(), true);
+  ExposedSocket socket(kLoopback, port.Port(), GetParam(), true);
   EXPECT_EQ(socket.Connect(), -1);
   socket.SetSocketInfo(kLoopback, peer.Port(), GetParam(), true);
   EXPECT_EQ(socket.Connect(), 0);
@@ -147,36 +186,11 @@ TEST_P(BothWays, ConnectsAgainAfterARefusal) {
   socket.Disconnect();
 }
 
-// Gives the process a hosts file of its own.
-class HostsFile {
- public:
-  explicit HostsFile(const std::string& content) {
-    WriteFile(folder_.File("hosts"), content);
-    EXPECT_EQ(mount(folder_.File("hosts").c_str(), "/etc/hosts", nullptr, MS_BIND, nullptr), 0);
-  }
-  ~HostsFile() { umount("/etc/hosts"); }
-
- private:
-  TempDir folder_;
-};
-
-size_t CountAddresses(const char* name) {
-  addrinfo hints = {};
-  hints.ai_family = AF_INET;
-  hints.ai_socktype = SOCK_STREAM;
-  addrinfo* list = nullptr;
-  if (getaddrinfo(name, "80", &hints, &list) != 0) return 0;
-  size_t count = 0;
-  for (const addrinfo* entry = list; entry != nullptr; entry = entry->ai_next) ++count;
-  freeaddrinfo(list);
-  return count;
-}
-
 TEST_P(BothWays, TriesTheFirstAddressAlone) {
   const ClosedPort port;
   const HostsFile hosts("127.0.0.1 twin.test\n127.0.0.2 twin.test\n");
   ASSERT_EQ(CountAddresses("twin.test"), 2u);
-  PlainSocket socket("twin.test", port.Port(), GetParam(), true);
+  ExposedSocket socket("twin.test", port.Port(), GetParam(), true);
   Faults faults;
   EXPECT_EQ(socket.Connect(), -1);
   EXPECT_EQ(faults.Count(Call::kConnect), 1);
@@ -185,7 +199,7 @@ TEST_P(BothWays, TriesTheFirstAddressAlone) {
 TEST_P(BothWays, BindsTheSourceAddress) {
   LogCapture log;
   ScriptedPeer peer({{ExpectEof()}});
-  PlainSocket socket(kLoopback, peer.Port(), GetParam(), true);
+  ExposedSocket socket(kLoopback, peer.Port(), GetParam(), true);
   socket.SetRemoteAddr(inet_addr("127.0.0.9"));
   ASSERT_EQ(socket.Connect(), 0);
   sockaddr_in local = {};
@@ -199,7 +213,7 @@ TEST_P(BothWays, BindsTheSourceAddress) {
 
 TEST_P(BothWays, BindsNothingForASourceAddressOfZero) {
   ScriptedPeer peer({{ExpectEof()}});
-  PlainSocket socket(kLoopback, peer.Port(), GetParam(), true);
+  ExposedSocket socket(kLoopback, peer.Port(), GetParam(), true);
   socket.SetRemoteAddr(inet_addr("127.0.0.9"));
   socket.SetRemoteAddr(0);
   Faults faults;
@@ -209,28 +223,13 @@ TEST_P(BothWays, BindsNothingForASourceAddressOfZero) {
 }
 
 TEST_P(BothWays, AnEmptyAddressListIsAFailure) {
-  PlainSocket socket(kLoopback, 80, GetParam(), true);
+  ExposedSocket socket(kLoopback, 80, GetParam(), true);
   Faults faults;
   faults.Return(Call::kGetaddrinfo, 1, 1, 0);
   EXPECT_EQ(socket.Connect(), -1);
   EXPECT_EQ(faults.Count(Call::kConnect), 0);
   EXPECT_FALSE(socket.IsConnected());
 }
-
-// The steps that a derived socket sees.
-class WatchedSocket : public PlainSocket {
- public:
-  using PlainSocket::PlainSocket;
-  int PostConnect() override {
-    steps.emplace_back("PostConnect");
-    return -5;
-  }
-  void Disconnect() override {
-    steps.emplace_back("Disconnect");
-    PlainSocket::Disconnect();
-  }
-  std::vector<std::string> steps;
-};
 
 TEST_P(BothWays, CallsTheDerivedDisconnectFirstAndIgnoresPostConnectsResult) {
   ScriptedPeer peer({{ExpectEof()}});
@@ -249,7 +248,7 @@ TEST_P(BothWays, DoesNotCallPostConnectAfterAFailure) {
 
 TEST_P(BothWays, KeepsEndOfFileOfTheConnectionBefore) {
   ScriptedPeer peer({{ExpectEof()}});
-  PlainSocket socket(kLoopback, peer.Port(), GetParam(), true);
+  ExposedSocket socket(kLoopback, peer.Port(), GetParam(), true);
   socket.m_bEOF = true;
   EXPECT_EQ(socket.Connect(), 0);
   EXPECT_TRUE(socket.IsEOF());
@@ -258,270 +257,9 @@ TEST_P(BothWays, KeepsEndOfFileOfTheConnectionBefore) {
 
 TEST(Connect, ASocketWithoutAHostIsNotResolved) {
   LogCapture log;
-  PlainSocket socket;
+  ExposedSocket socket;
   EXPECT_EQ(socket.Connect(), -1);
   EXPECT_THAT(log.Messages(), ElementsAre("Scoket getaddrinfo incomplete.\n"));
-}
-
-TEST(ConnectBlocking, WaitsInConnectAndNotInSelect) {
-  ScriptedPeer peer({{ExpectEof()}});
-  PlainSocket socket(kLoopback, peer.Port(), -1, true);
-  Faults faults;
-  EXPECT_EQ(socket.Connect(), 0);
-  EXPECT_EQ(faults.Count(Call::kSelect), 0);
-  EXPECT_EQ(faults.Count(Call::kFcntl), 0);
-  socket.Disconnect();
-}
-
-TEST(ConnectBlocking, LogsOneLineForARefusal) {
-  LogCapture log;
-  const ClosedPort port;
-  PlainSocket socket(kLoopback, port.Port(), -1, true);
-  EXPECT_EQ(socket.Connect(), -1);
-  EXPECT_EQ(errno, ECONNREFUSED);
-  EXPECT_THAT(log.Lines(),
-              ElementsAre(SocketLine("info", "ConnectSocket", "Socket connect failed.\n")));
-}
-
-// The failures of the way with a time-out: the step's own line, and the summary behind it.
-auto StepAndSummary(const char* level, const std::string& message, int timeout) {
-  return ElementsAre(SocketLine(level, "ConnectWithTimeout", message),
-                     SocketLine("info", "ConnectSocket",
-                                "Socket connect timeout (" + std::to_string(timeout) + ")\n"));
-}
-
-TEST(ConnectWithTimeout, GivesUpAfterTheTimeOut) {
-  LogCapture log;
-  const BlackHolePort hole;
-  PlainSocket socket(kLoopback, hole.Port(), 1, true);
-  const Stopwatch watch;
-  EXPECT_EQ(socket.Connect(), -1);
-  EXPECT_EQ(errno, ETIMEDOUT);
-  EXPECT_GE(watch.Seconds(), 0.95);
-  EXPECT_LT(watch.Seconds(), 3.0);
-  EXPECT_FALSE(socket.IsConnected());
-  EXPECT_TRUE(IsOpenFd(socket.m_sockFd));
-  EXPECT_FALSE(IsNonBlocking(socket.m_sockFd));
-  EXPECT_THAT(log.Lines(), StepAndSummary("info", "Socket connect timeout.\n", 1));
-}
-
-TEST(ConnectWithTimeout, SignalsNeitherEndNorProlongTheWait) {
-  if (IsEmulated()) GTEST_SKIP() << kNoCountdown;
-  LogCapture log;
-  const BlackHolePort hole;
-  PlainSocket socket(kLoopback, hole.Port(), 1, true);
-  Faults faults;
-  const SignalStorm storm;
-  const Stopwatch watch;
-  EXPECT_EQ(socket.Connect(), -1);
-  EXPECT_EQ(errno, ETIMEDOUT);
-  EXPECT_GE(watch.Seconds(), 0.9);
-  EXPECT_LT(watch.Seconds(), 3.0);
-  EXPECT_GT(faults.Count(Call::kSelect), 3);
-  EXPECT_THAT(log.Lines(), StepAndSummary("info", "Socket connect timeout.\n", 1));
-}
-
-TEST(ConnectWithTimeout, AnInterruptedWaitIsRepeatedSilently) {
-  LogCapture log;
-  ScriptedPeer peer({{ExpectEof()}});
-  PlainSocket socket(kLoopback, peer.Port(), 5, true);
-  Faults faults;
-  faults.FailRange(Call::kSelect, 1, 3, EINTR);
-  EXPECT_EQ(socket.Connect(), 0);
-  EXPECT_EQ(faults.Count(Call::kSelect), 4);
-  EXPECT_THAT(log.Lines(), IsEmpty());
-  socket.Disconnect();
-}
-
-TEST(ConnectWithTimeout, AConnectionThatSucceedsAtOnceNeedsNoWait) {
-  LogCapture log;
-  PlainSocket socket(kLoopback, 80, 5, true);
-  Faults faults;
-  faults.Return(Call::kConnect, 1, 1, 0);
-  EXPECT_EQ(socket.Connect(), 0);
-  EXPECT_TRUE(socket.IsConnected());
-  EXPECT_EQ(faults.Count(Call::kSelect), 0);
-  EXPECT_EQ(faults.Count(Call::kGetsockopt), 0);
-  EXPECT_THAT(log.Lines(), IsEmpty());
-}
-
-TEST(ConnectWithTimeout, AnUnreachableNetworkIsLoggedAsConnected) {
-  LogCapture log;
-  PlainSocket socket("192.0.2.1", 80, 3, true);
-  EXPECT_EQ(socket.Connect(), -1);
-  EXPECT_FALSE(IsNonBlocking(socket.m_sockFd));
-  EXPECT_THAT(log.Lines(), StepAndSummary("info", "Socket connected.\n", 3));
-}
-
-TEST(ConnectWithTimeout, AFailedSelectIsAFailure) {
-  LogCapture log;
-  ScriptedPeer peer({{ExpectEof()}});
-  PlainSocket socket(kLoopback, peer.Port(), 5, true);
-  {
-    Faults faults;
-    faults.FailNth(Call::kSelect, 1, ENOMEM);
-    EXPECT_EQ(socket.Connect(), -1);
-  }
-  EXPECT_FALSE(socket.IsConnected());
-  EXPECT_FALSE(IsNonBlocking(socket.m_sockFd));
-  EXPECT_THAT(log.Lines(), StepAndSummary("info", "Select failed with errno [12].\n", 5));
-  socket.Disconnect();
-}
-
-TEST(ConnectWithTimeout, ASelectThatFindsNothingIsAFailure) {
-  LogCapture log;
-  ScriptedPeer peer({{ExpectEof()}});
-  PlainSocket socket(kLoopback, peer.Port(), 5, true);
-  {
-    Faults faults;
-    faults.Return(Call::kSelect, 1, 1, 1);
-    EXPECT_EQ(socket.Connect(), -1);
-  }
-  EXPECT_FALSE(IsNonBlocking(socket.m_sockFd));
-  EXPECT_THAT(log.Lines(), StepAndSummary("info", "Socket strange bug.\n", 5));
-  socket.Disconnect();
-}
-
-TEST(ConnectWithTimeout, AnErrorThatCannotBeAskedForIsAFailure) {
-  LogCapture log;
-  ScriptedPeer peer({{ExpectEof()}});
-  PlainSocket socket(kLoopback, peer.Port(), 5, true);
-  {
-    Faults faults;
-    faults.FailNth(Call::kGetsockopt, 1);
-    EXPECT_EQ(socket.Connect(), -1);
-  }
-  EXPECT_FALSE(IsNonBlocking(socket.m_sockFd));
-  EXPECT_THAT(log.Lines(), StepAndSummary("info", "getsockopt error!\n", 5));
-  socket.Disconnect();
-}
-
-TEST(ConnectWithTimeout, APendingErrorIsAFailure) {
-  LogCapture log;
-  ScriptedPeer peer({{ExpectEof()}});
-  PlainSocket socket(kLoopback, peer.Port(), 5, true);
-  {
-    Faults faults;
-    faults.SocketError(EHOSTUNREACH);
-    EXPECT_EQ(socket.Connect(), -1);
-  }
-  EXPECT_FALSE(IsNonBlocking(socket.m_sockFd));
-  EXPECT_THAT(log.Lines(),
-              StepAndSummary("info", "Socket connection failed with error [113].\n", 5));
-  socket.Disconnect();
-}
-
-TEST(ConnectWithTimeout, AnEmptyAddressListIsAnInvalidParameter) {
-  LogCapture log;
-  PlainSocket socket(kLoopback, 80, 5, true);
-  Faults faults;
-  faults.Return(Call::kGetaddrinfo, 1, 1, 0);
-  EXPECT_EQ(socket.Connect(), -1);
-  EXPECT_EQ(faults.Count(Call::kFcntl), 0);
-  EXPECT_THAT(log.Lines(), StepAndSummary("error", "Invalid parameters!\n", 5));
-}
-
-TEST(ConnectWithTimeout, CarriesOnWhenNonBlockingModeCannotBeSet) {
-  LogCapture log;
-  ScriptedPeer peer({{ExpectEof()}});
-  PlainSocket socket(kLoopback, peer.Port(), 5, true);
-  Faults faults;
-  faults.FailNth(Call::kFcntl, 2);
-  EXPECT_EQ(socket.Connect(), 0);
-  EXPECT_TRUE(socket.IsConnected());
-  EXPECT_THAT(log.Lines(), ElementsAre(SocketLine("error", "ConnectWithTimeout",
-                                                  "Set nonblock flag failed.\n")));
-  socket.Disconnect();
-}
-
-TEST(ConnectWithTimeout, CarriesOnWhenBlockingModeCannotBeSetBack) {
-  LogCapture log;
-  ScriptedPeer peer({{ExpectEof()}});
-  PlainSocket socket(kLoopback, peer.Port(), 5, true);
-  Faults faults;
-  faults.FailNth(Call::kFcntl, 3);
-  EXPECT_EQ(socket.Connect(), 0);
-  EXPECT_TRUE(socket.IsConnected());
-  EXPECT_THAT(log.Lines(), ElementsAre(SocketLine("error", "ConnectWithTimeout",
-                                                  "Set back blocking flag failed.\n")));
-  socket.Disconnect();
-}
-
-TEST(ConnectWithTimeout, TimesOutWithTheErrnoOfATimeOutWhenBlockingModeCannotBeSetBack) {
-  LogCapture log;
-  const BlackHolePort hole;
-  PlainSocket socket(kLoopback, hole.Port(), 0, true);
-  Faults faults;
-  faults.FailNth(Call::kFcntl, 3);
-  EXPECT_EQ(socket.Connect(), -1);
-  EXPECT_EQ(errno, ETIMEDOUT);
-  EXPECT_THAT(log.Messages(),
-              ElementsAre("Socket connect timeout.\n", "Set back blocking flag failed.\n",
-                          "Socket connect timeout (0)\n"));
-}
-
-TEST(ConnectWithTimeout, LogsItsErrorsAtTheDefaultLevelAndItsInformationNot) {
-  LogCapture log(LOG_LEVEL_NOTICE);
-  PlainSocket socket(kLoopback, 80, 5, true);
-  Faults faults;
-  faults.Return(Call::kGetaddrinfo, 1, 1, 0);
-  EXPECT_EQ(socket.Connect(), -1);
-  EXPECT_THAT(log.Messages(), ElementsAre("Invalid parameters!\n"));
-}
-
-// A TCP socket that is not connected: options can be set on it as well.
-class TcpSocket : public PlainSocket {
- public:
-  TcpSocket() { m_sockFd = socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0); }
-};
-
-TEST(SetKeepAliveOpt, SetsAllFourOptions) {
-  LogCapture log;
-  TcpSocket socket;
-  EXPECT_EQ(socket.SetKeepAliveOpt(1, 31, 32, 33), 0);
-  EXPECT_EQ(SocketOption(socket.m_sockFd, SOL_SOCKET, SO_KEEPALIVE), 1);
-  EXPECT_EQ(SocketOption(socket.m_sockFd, IPPROTO_TCP, TCP_KEEPIDLE), 31);
-  EXPECT_EQ(SocketOption(socket.m_sockFd, IPPROTO_TCP, TCP_KEEPINTVL), 32);
-  EXPECT_EQ(SocketOption(socket.m_sockFd, IPPROTO_TCP, TCP_KEEPCNT), 33);
-  EXPECT_THAT(log.Lines(), IsEmpty());
-}
-
-TEST(SetKeepAliveOpt, EachRefusedOptionHasItsLineAndEndsTheCall) {
-  const char* const messages[] = {"keepalive", "keepidle", "keepintvl", "keepcnt"};
-  for (int n = 1; n <= 4; ++n) {
-    LogCapture log;
-    TcpSocket socket;
-    Faults faults;
-    faults.FailNth(Call::kSetsockopt, n);
-    EXPECT_EQ(socket.SetKeepAliveOpt(1, 31, 32, 33), -1);
-    EXPECT_EQ(faults.Count(Call::kSetsockopt), n);
-    EXPECT_THAT(log.Lines(), ElementsAre(SocketLine(
-                                 "info", "SetKeepAliveOpt",
-                                 std::string("Failed to set ") + messages[n - 1] + " option.\n")));
-    EXPECT_EQ(SocketOption(socket.m_sockFd, SOL_SOCKET, SO_KEEPALIVE), n > 1 ? 1 : 0);
-    EXPECT_EQ(SocketOption(socket.m_sockFd, IPPROTO_TCP, TCP_KEEPIDLE) == 31, n > 2);
-    EXPECT_EQ(SocketOption(socket.m_sockFd, IPPROTO_TCP, TCP_KEEPINTVL) == 32, n > 3);
-  }
-}
-
-TEST(SetKeepAliveOpt, ValuesThatTheSystemRefusesEndTheCall) {
-  LogCapture log;
-  TcpSocket socket;
-  EXPECT_EQ(socket.SetKeepAliveOpt(1, 0, 32, 33), -1);
-  EXPECT_EQ(socket.SetKeepAliveOpt(1, 31, 0, 33), -1);
-  EXPECT_EQ(socket.SetKeepAliveOpt(1, 31, 32, 0), -1);
-  EXPECT_THAT(log.Messages(),
-              ElementsAre("Failed to set keepidle option.\n", "Failed to set keepintvl option.\n",
-                          "Failed to set keepcnt option.\n"));
-}
-
-TEST(SetKeepAliveOpt, WithoutASocketIsRefused) {
-  LogCapture log;
-  PlainSocket socket;
-  EXPECT_EQ(socket.SetKeepAliveOpt(1, 31, 32, 33), -1);
-  EXPECT_EQ(socket.SetKeepAliveOpt(0, 0, 0, 0), -1);
-  EXPECT_THAT(log.Messages(), ElementsAre("Failed to set keepalive option.\n",
-                                          "Failed to set keepalive option.\n"));
 }
 
 }  // namespace

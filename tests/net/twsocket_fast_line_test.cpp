@@ -43,15 +43,15 @@ class Random {
   }
 
   // `text` in pieces, with reads that fail in between, and the end of the stream or a failure.
-  std::vector<IoAnswer> Answers(const std::string& text) {
-    std::vector<IoAnswer> answers;
+  std::vector<IoResult> Answers(const std::string& text) {
+    std::vector<IoResult> answers;
     for (size_t at = 0; at < text.size();) {
       const size_t size = std::min(1 + Below(Below(2) == 0 ? 3 : 900), text.size() - at);
-      answers.push_back(Gives(text.substr(at, size)));
+      answers.push_back(Returns(text.substr(at, size)));
       at += size;
       if (Below(8) == 0) answers.push_back(Fails(Below(2) == 0 ? EAGAIN : ECONNRESET));
     }
-    const IoAnswer last = Below(2) == 0 ? Ends() : Fails(ECONNRESET);
+    const IoResult last = Below(2) == 0 ? Ends() : Fails(ECONNRESET);
     answers.insert(answers.end(), 400, last);
     return answers;
   }
@@ -81,7 +81,7 @@ void ReadLineInBoth(ScriptedSocket* fast, ScriptedSocket* plain, int bufLen) {
   const int plainResult = PlainReadToLineEnd(plain, plainLine.data(), bufLen);
   ASSERT_EQ(fastResult, plainResult);
   ASSERT_EQ(fastError, errno);
-  // Behind a line that was cut, what the lost byte was is nobody's business.
+  // After a line that was cut, what the lost byte was is nobody's business.
   const size_t certain = fastResult < 0 ? fastLine.size() : static_cast<size_t>(fastResult) + 1;
   ASSERT_EQ(fastLine.substr(0, certain), plainLine.substr(0, certain));
 }
@@ -123,7 +123,7 @@ TEST(FastLines, AreTheLinesThatReadsOfOneByteGive) {
 }
 
 TEST(FastLines, OfADirectSocketAreReadByteByByte) {
-  ScriptedSocket socket(false, {Gives("a"), Gives("b"), Gives("\r"), Gives("\n")});
+  ScriptedSocket socket(false, {Returns("a"), Returns("b"), Returns("\r"), Returns("\n")});
   EXPECT_EQ(ReadLine(socket), (Delivered{2, "ab"}));
   EXPECT_TRUE(socket.ScriptEnded());
 }

@@ -7,7 +7,7 @@ namespace {
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 
-TEST(IoEdges, ABufferedReadOfNoBytesGivesZeroWithoutWaiting) {
+TEST(IoEdges, ABufferedReadOfNoBytesReturnsZeroWithoutWaiting) {
   LogCapture log;
   ScriptedSocket socket(true, {});
   EXPECT_EQ(ReadSome(socket, 0), (Delivered{0, ""}));
@@ -15,7 +15,7 @@ TEST(IoEdges, ABufferedReadOfNoBytesGivesZeroWithoutWaiting) {
   EXPECT_THAT(log.Lines(), IsEmpty());
 }
 
-TEST(IoEdges, APeerThatClosesAfterAPartGivesTheShortCountAndEndOfFile) {
+TEST(IoEdges, APeerThatClosesAfterAPartReturnsTheShortCountAndEndOfFile) {
   PairedSocket socket(5, true);
   socket.PeerSends(Pattern(700));
   socket.ClosePeer();

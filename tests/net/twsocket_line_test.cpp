@@ -36,7 +36,7 @@ TEST_P(ReadToLineEnd, ACarriageReturnDropsTheNextByteWhateverItIs) {
   EXPECT_EQ(ReadLine(socket_), (Delivered{3, "end"}));
 }
 
-TEST_P(ReadToLineEnd, AnEmptyLineGivesZeroAndAnEmptyText) {
+TEST_P(ReadToLineEnd, AnEmptyLineReturnsZeroAndAnEmptyString) {
   socket_.PeerSends("\n\r\nx");
   EXPECT_EQ(ReadLine(socket_), (Delivered{0, ""}));
   EXPECT_EQ(ReadLine(socket_), (Delivered{0, ""}));
@@ -53,14 +53,14 @@ TEST_P(ReadToLineEnd, TheEndOfTheStreamEndsTheLine) {
   EXPECT_TRUE(socket_.IsEOF());
 }
 
-TEST_P(ReadToLineEnd, AFailedReadGivesMinusOneAndDoesNotTerminate) {
+TEST_P(ReadToLineEnd, AFailedReadReturnsMinusOneAndDoesNotTerminate) {
   socket_.PeerSends("ab");
   char buf[] = "#######";
   EXPECT_EQ(socket_.ReadToLineEnd(buf, sizeof(buf)), -1);
   EXPECT_EQ(std::string(buf, sizeof(buf) - 1).find('\0'), std::string::npos);
 }
 
-TEST_P(ReadToLineEnd, AFailedReadBehindACarriageReturnGivesMinusOne) {
+TEST_P(ReadToLineEnd, AFailedReadAfterACarriageReturnReturnsMinusOne) {
   socket_.PeerSends("ab\r");
   EXPECT_EQ(ReadLine(socket_).result, -1);
 }
@@ -123,29 +123,29 @@ TEST_P(ReadToLineEnd, ANullBufferOrALengthWithoutRoomIsRefused) {
 }
 
 TEST(ReadToLineEndDirect, ReadsOneByteAtATime) {
-  ScriptedSocket socket(false, {Gives("a"), Gives("\n")});
+  ScriptedSocket socket(false, {Returns("a"), Returns("\n")});
   EXPECT_EQ(ReadLine(socket), (Delivered{1, "a"}));
   EXPECT_THAT(socket.calls, ElementsAre("wait to read", "read 1", "wait to read", "read 1"));
 }
 
 TEST(ReadToLineEndBuffered, ReadsALineWithOneRead) {
-  ScriptedSocket socket(true, {Gives("first\r\nsecond\n")});
+  ScriptedSocket socket(true, {Returns("first\r\nsecond\n")});
   EXPECT_EQ(ReadLine(socket), (Delivered{5, "first"}));
   EXPECT_EQ(ReadLine(socket), (Delivered{6, "second"}));
   EXPECT_THAT(socket.calls, ElementsAre("wait to read", "read 64512"));
 }
 
 TEST(ReadToLineEndBuffered, GoesOnWhenThePeerPausesInTheLine) {
-  ScriptedSocket socket(true,
-                        {Gives("a"), Fails(EAGAIN), Gives("b\r"), Fails(EAGAIN), Gives("\nrest")});
+  ScriptedSocket socket(
+      true, {Returns("a"), Fails(EAGAIN), Returns("b\r"), Fails(EAGAIN), Returns("\nrest")});
   EXPECT_EQ(ReadLine(socket), (Delivered{2, "ab"}));
   EXPECT_EQ(socket.Unread(), "rest");
 }
 
 // Push-back.
 
-TEST(RestoreData, GoesBeforeNothing) {
-  PlainSocket socket("host", 1, 0, true);
+TEST(RestoreData, IntoAnEmptyBufferStartsAtItsFirstByte) {
+  ExposedSocket socket("host", 1, 0, true);
   socket.m_readPos = 77;
   char data[] = "abc";
   EXPECT_EQ(socket.RestoreData(data, 3), 0);
@@ -155,7 +155,7 @@ TEST(RestoreData, GoesBeforeNothing) {
 
 TEST(RestoreData, MovesTheUnreadBytesWhicheverWayTheyLie) {
   for (const int pos : {0, 3, 500, 5000}) {
-    auto socket = std::make_unique<PlainSocket>("host", 1, 0, true);
+    auto socket = std::make_unique<ExposedSocket>("host", 1, 0, true);
     socket->Buffer(Pattern(60000, 500), pos);
     std::string data = Pattern(500);
     EXPECT_EQ(socket->RestoreData(data.data(), 500), 0);
@@ -165,7 +165,7 @@ TEST(RestoreData, MovesTheUnreadBytesWhicheverWayTheyLie) {
 }
 
 TEST(RestoreData, RepeatedPushBacksComeOutInReverse) {
-  PlainSocket socket("host", 1, 0, true);
+  ExposedSocket socket("host", 1, 0, true);
   char first[] = "first";
   char second[] = "second";
   EXPECT_EQ(socket.RestoreData(first, 5), 0);
@@ -174,7 +174,7 @@ TEST(RestoreData, RepeatedPushBacksComeOutInReverse) {
 }
 
 TEST(RestoreData, AtLeast1024BytesFitAfterAFill) {
-  ScriptedSocket socket(true, {Gives(Pattern(64512, 1023))});
+  ScriptedSocket socket(true, {Returns(Pattern(64512, 1023))});
   ASSERT_EQ(ReadSome(socket, 1).result, 1);
   std::string data = Pattern(1024);
   EXPECT_EQ(socket.RestoreData(data.data(), 1024), 0);
@@ -182,7 +182,7 @@ TEST(RestoreData, AtLeast1024BytesFitAfterAFill) {
 }
 
 TEST(RestoreData, FillsTheBufferToItsLastByte) {
-  auto socket = std::make_unique<PlainSocket>("host", 1, 0, true);
+  auto socket = std::make_unique<ExposedSocket>("host", 1, 0, true);
   socket->Buffer(Pattern(65535, 1));
   char first[] = {Pattern(1)[0]};
   EXPECT_EQ(socket->RestoreData(first, 1), 0);
@@ -191,14 +191,14 @@ TEST(RestoreData, FillsTheBufferToItsLastByte) {
 }
 
 TEST(RestoreData, TakesAWholeBufferAtOnce) {
-  auto socket = std::make_unique<PlainSocket>("host", 1, 0, true);
+  auto socket = std::make_unique<ExposedSocket>("host", 1, 0, true);
   std::string data = Pattern(65536);
   EXPECT_EQ(socket->RestoreData(data.data(), 65536), 0);
   EXPECT_TRUE(socket->Unread() == data);
 }
 
 TEST(RestoreData, MoreThanTheBufferHoldsIsRefusedAndChangesNothing) {
-  auto socket = std::make_unique<PlainSocket>("host", 1, 0, true);
+  auto socket = std::make_unique<ExposedSocket>("host", 1, 0, true);
   socket->Buffer(Pattern(1000), 7);
   const std::string before(socket->m_readBuf, 65536);
   std::string data(70000, 'x');
@@ -213,7 +213,7 @@ TEST(RestoreData, MoreThanTheBufferHoldsIsRefusedAndChangesNothing) {
 }
 
 TEST(RestoreData, ANullPointerOrANegativeLengthIsRefused) {
-  PlainSocket socket("host", 1, 0, true);
+  ExposedSocket socket("host", 1, 0, true);
   socket.Buffer("kept", 7);
   char data[] = "abc";
   EXPECT_EQ(socket.RestoreData(nullptr, 3), -1);
@@ -224,7 +224,7 @@ TEST(RestoreData, ANullPointerOrANegativeLengthIsRefused) {
 }
 
 TEST(RestoreData, NoBytesLeaveTheUnreadOnes) {
-  PlainSocket socket("host", 1, 0, true);
+  ExposedSocket socket("host", 1, 0, true);
   socket.Buffer("kept", 7);
   char data[] = "";
   EXPECT_EQ(socket.RestoreData(data, 0), 0);
@@ -232,7 +232,7 @@ TEST(RestoreData, NoBytesLeaveTheUnreadOnes) {
 }
 
 TEST(RestoreData, DoesNothingInDirectMode) {
-  PlainSocket socket("host", 1, 0, false);
+  ExposedSocket socket("host", 1, 0, false);
   socket.Buffer("kept", 7);
   char data[] = "abc";
   EXPECT_EQ(socket.RestoreData(data, 3), 0);
@@ -241,7 +241,7 @@ TEST(RestoreData, DoesNothingInDirectMode) {
 }
 
 TEST(RestoreData, WorksBeforeAConnection) {
-  PlainSocket socket;
+  ExposedSocket socket;
   socket.SetSocketInfo("host", 1, 0, true);
   char data[] = "line\n";
   EXPECT_EQ(socket.RestoreData(data, 5), 0);

@@ -3,15 +3,15 @@
 #include "tests/net/net_test_util.h"
 
 TEST(DirectMode, ALineHasNothingOfWhatWasReadAheadBefore) {
-  ScriptedSocket socket(false, {Gives("n"), Gives("e"), Gives("w"), Gives("\n")});
+  ScriptedSocket socket(false, {Returns("n"), Returns("e"), Returns("w"), Returns("\n")});
   socket.Buffer("old\nolder\n");
   EXPECT_EQ(ReadLine(socket), (Delivered{3, "new"}));
   EXPECT_TRUE(socket.ScriptEnded());
   EXPECT_EQ(socket.Unread(), "old\nolder\n");
 }
 
-TEST(DirectMode, ALineEndReadAheadBeforeDoesNotEndALine) {
-  ScriptedSocket socket(false, {Gives("a"), Gives("\r"), Gives("\n")});
+TEST(DirectMode, ACrlfThatWasReadAheadBeforeDoesNotEndALine) {
+  ScriptedSocket socket(false, {Returns("a"), Returns("\r"), Returns("\n")});
   socket.Buffer("\r\n\r\n");
   EXPECT_EQ(ReadLine(socket), (Delivered{1, "a"}));
   EXPECT_EQ(socket.Unread(), "\r\n\r\n");

@@ -18,15 +18,15 @@ using ::testing::IsEmpty;
 template <typename... Args>
 class SocketInDirtyMemory {
  public:
-  explicit SocketInDirtyMemory(Args... args) : memory_(sizeof(PlainSocket), '\xaa') {
-    socket_ = new (memory_.data()) PlainSocket(args...);
+  explicit SocketInDirtyMemory(Args... args) : memory_(sizeof(ExposedSocket), '\xaa') {
+    socket_ = new (memory_.data()) ExposedSocket(args...);
   }
-  ~SocketInDirtyMemory() { socket_->~PlainSocket(); }
-  PlainSocket* operator->() const { return socket_; }
+  ~SocketInDirtyMemory() { socket_->~ExposedSocket(); }
+  ExposedSocket* operator->() const { return socket_; }
 
  private:
   std::vector<char> memory_;
-  PlainSocket* socket_;
+  ExposedSocket* socket_;
 };
 
 template <typename Socket>
@@ -36,7 +36,7 @@ bool ReadBufferIsZero(Socket& socket) {
 }
 
 TEST(SocketObject, StartsWithoutASocketAHostAPortOrATimeOut) {
-  PlainSocket socket;
+  ExposedSocket socket;
   EXPECT_EQ(socket.m_sockFd, -1);
   EXPECT_EQ(socket.m_strHost, "");
   EXPECT_EQ(socket.m_port, -1);
@@ -48,7 +48,7 @@ TEST(SocketObject, StartsWithoutASocketAHostAPortOrATimeOut) {
 }
 
 TEST(SocketObject, StoresTheFourValuesThatItIsMadeWith) {
-  PlainSocket socket("camera.example", 554, 7, true);
+  ExposedSocket socket("camera.example", 554, 7, true);
   EXPECT_EQ(socket.m_sockFd, -1);
   EXPECT_EQ(socket.m_strHost, "camera.example");
   EXPECT_EQ(socket.m_port, 554);
@@ -71,13 +71,13 @@ TEST(SocketObject, StartsWithAZeroedReadBuffer) {
 }
 
 TEST(SocketObject, HoldsABufferOf65536BytesInline) {
-  EXPECT_EQ(sizeof(PlainSocket::m_readBuf), 65536u);
+  EXPECT_EQ(sizeof(ExposedSocket::m_readBuf), 65536u);
   EXPECT_GT(sizeof(TWSocket), 65536u);
   EXPECT_LT(sizeof(TWSocket), 65536u + 128u);
 }
 
 TEST(SocketObject, KeepsItsFieldsInTheDeclaredOrder) {
-  PlainSocket socket;
+  ExposedSocket socket;
   const std::vector<const void*> fields = {
       &socket.m_sockFd,    &socket.m_strHost,    &socket.m_port,   &socket.m_timeout,
       &socket.m_bBuffered, &socket.m_bConnected, &socket.m_bEOF,   &socket.m_readBuf,
@@ -85,12 +85,12 @@ TEST(SocketObject, KeepsItsFieldsInTheDeclaredOrder) {
   EXPECT_TRUE(std::is_sorted(fields.begin(), fields.end()));
 }
 
-TEST(SocketObject, KeepsTheTlsFieldsBehindTheBase) {
+TEST(SocketObject, KeepsTheTlsFieldsAfterTheBase) {
   EXPECT_GE(sizeof(SSLSocket), sizeof(TWSocket) + 2 * sizeof(void*));
   EXPECT_LE(sizeof(SSLSocket), sizeof(TWSocket) + 3 * sizeof(void*));
 }
 
-// The slot of a virtual function, from the representation that the C++ ABI gives its pointer.
+// The slot of a virtual function, from the representation that the C++ ABI has for its pointer.
 template <typename Pointer>
 size_t Slot(Pointer function) {
   uintptr_t word;
@@ -112,8 +112,8 @@ TEST(SocketObject, KeepsTheVirtualCallsOfTlsInTheSameSlots) {
   EXPECT_THAT(slots, ElementsAre(2, 4, 5, 6, 7));
 }
 
-TEST(SocketObject, AnswersWithItsFlags) {
-  PlainSocket socket;
+TEST(SocketObject, ReturnsItsFlags) {
+  ExposedSocket socket;
   socket.m_bConnected = true;
   EXPECT_TRUE(socket.IsConnected());
   EXPECT_FALSE(socket.IsEOF());
@@ -124,7 +124,7 @@ TEST(SocketObject, AnswersWithItsFlags) {
 }
 
 TEST(SetRemoteAddr, StoresTheSourceAddress) {
-  PlainSocket socket;
+  ExposedSocket socket;
   socket.SetRemoteAddr(0x0100007f);
   EXPECT_EQ(socket.m_srcAddr, 0x0100007fu);
   socket.SetRemoteAddr(0);
@@ -132,7 +132,7 @@ TEST(SetRemoteAddr, StoresTheSourceAddress) {
 }
 
 TEST(SetSocketInfo, StoresTheNewSettings) {
-  PlainSocket socket("old", 1, 2, false);
+  ExposedSocket socket("old", 1, 2, false);
   socket.SetSocketInfo("new", 3, 4, true);
   EXPECT_EQ(socket.m_strHost, "new");
   EXPECT_EQ(socket.m_port, 3);
@@ -152,14 +152,14 @@ TEST(SetSocketInfo, ClearsTheFlagsAndClosesAnOpenSocket) {
 }
 
 TEST(SetSocketInfo, KeepsTheSourceAddress) {
-  PlainSocket socket;
+  ExposedSocket socket;
   socket.SetRemoteAddr(0x0200007f);
   socket.SetSocketInfo("new", 3, 4, true);
   EXPECT_EQ(socket.m_srcAddr, 0x0200007fu);
 }
 
 TEST(SetSocketInfo, ZeroesTheReadBufferOfABufferedSocket) {
-  auto socket = std::make_unique<PlainSocket>("old", 1, 2, false);
+  auto socket = std::make_unique<ExposedSocket>("old", 1, 2, false);
   socket->Buffer("left over", 3);
   socket->SetSocketInfo("new", 3, 4, true);
   EXPECT_TRUE(ReadBufferIsZero(socket));
@@ -168,7 +168,7 @@ TEST(SetSocketInfo, ZeroesTheReadBufferOfABufferedSocket) {
 }
 
 TEST(SetSocketInfo, LeavesTheReadBufferAloneForADirectSocket) {
-  PlainSocket socket("old", 1, 2, true);
+  ExposedSocket socket("old", 1, 2, true);
   socket.Buffer("left over", 3);
   socket.SetSocketInfo("new", 3, 4, false);
   EXPECT_EQ(socket.m_readPos, 3);
@@ -176,7 +176,7 @@ TEST(SetSocketInfo, LeavesTheReadBufferAloneForADirectSocket) {
 }
 
 TEST(SetSocketInfo, WithoutAnOpenSocketClosesNothing) {
-  PlainSocket socket;
+  ExposedSocket socket;
   Faults faults;
   socket.SetSocketInfo("new", 3, 4, true);
   EXPECT_EQ(faults.Count(Call::kClose), 0);
@@ -217,7 +217,7 @@ TEST(Disconnect, LeavesTheReadBufferOfADirectSocketAlone) {
 }
 
 TEST(Disconnect, WithoutASocketClosesNothing) {
-  PlainSocket socket;
+  ExposedSocket socket;
   socket.m_bConnected = true;
   Faults faults;
   socket.Disconnect();
@@ -227,7 +227,7 @@ TEST(Disconnect, WithoutASocketClosesNothing) {
 
 TEST(Disconnect, ClosesDescriptorZeroToo) {
   const ChildResult child = RunInChild([] {
-    PlainSocket socket;
+    ExposedSocket socket;
     socket.m_sockFd = 0;
     socket.Disconnect();
     EXPECT_EQ(socket.m_sockFd, -1);
@@ -246,7 +246,7 @@ TEST(SocketDestructor, ClosesTheDescriptor) {
 
 TEST(SocketDestructor, WithoutASocketClosesNothing) {
   Faults faults;
-  { PlainSocket socket; }
+  { ExposedSocket socket; }
   EXPECT_EQ(faults.Count(Call::kClose), 0);
 }
 
@@ -270,13 +270,13 @@ TEST(PostConnect, MakesASocketWithoutATimeOutBlocking) {
   }
 }
 
-TEST(PostConnect, GivesZeroWhenTheModeCannotBeSet) {
+TEST(PostConnect, ReturnsZeroWhenTheModeCannotBeSet) {
   LogCapture log;
   PairedSocket socket(5, true);
   Faults faults;
   faults.FailFrom(Call::kIoctl, 1);
   EXPECT_EQ(socket.PostConnect(), 0);
-  EXPECT_EQ(PlainSocket().PostConnect(), 0);
+  EXPECT_EQ(ExposedSocket().PostConnect(), 0);
   EXPECT_THAT(log.Lines(), IsEmpty());
 }
 

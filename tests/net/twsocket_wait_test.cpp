@@ -25,9 +25,9 @@ TEST(SelectType, HasFixedValues) {
   EXPECT_EQ(TWSocket::SELECT_WRITE, 1);
 }
 
-TEST(DoSelect, WithoutASocketGivesMinusOneSilently) {
+TEST(DoSelect, WithoutASocketReturnsMinusOneSilently) {
   LogCapture log;
-  PlainSocket socket;
+  ExposedSocket socket;
   for (const int timeout : {-1, 0, 5}) {
     socket.m_timeout = timeout;
     EXPECT_EQ(socket.DoSelect(kRead), -1);
@@ -63,7 +63,7 @@ TEST(DoSelect, WaitsForTheKindThatIsAskedFor) {
   EXPECT_GT(socket.DoSelect(kRead), 0);
 }
 
-TEST(DoSelect, GivesZeroSilentlyAfterTheTimeOut) {
+TEST(DoSelect, ReturnsZeroSilentlyAfterTheTimeOut) {
   LogCapture log;
   PairedSocket socket(1, true);
   const Stopwatch watch;
@@ -114,7 +114,7 @@ TEST(DoSelect, SignalsDoNotProlongTheWait) {
   EXPECT_THAT(log.Lines(), AllOf(Not(IsEmpty()), Each(line)));
 }
 
-TEST(DoSelect, LogsAnyOtherFailureAndGivesMinusOne) {
+TEST(DoSelect, LogsAnyOtherFailureAndReturnsMinusOne) {
   LogCapture log;
   PairedSocket socket(5, true);
   for (const auto type : {kRead, kWrite}) {
@@ -154,9 +154,9 @@ TEST(DoSelect, TriesAgainWhenTheDescriptorIsInNoSet) {
 }
 
 // A TCP connection with an urgent byte waiting: an exceptional condition, and nothing to read.
-class UrgentSocket : public PlainSocket {
+class UrgentSocket : public ExposedSocket {
  public:
-  UrgentSocket() : PlainSocket("127.0.0.1", 0, 5, true) {
+  UrgentSocket() : ExposedSocket("127.0.0.1", 0, 5, true) {
     listener_ = BindLoopback(&m_port);
     EXPECT_EQ(listen(listener_, 1), 0);
     EXPECT_EQ(Connect(), 0);
@@ -233,7 +233,7 @@ TEST(HasDataToRead, WaitsOnABlockingConnectionToo) {
   EXPECT_EQ(socket.m_timeout, -1);
 }
 
-TEST(HasDataToRead, DoesNotCountTheReadAheadBuffer) {
+TEST(HasDataToRead, IgnoresTheReadAheadBuffer) {
   PairedSocket socket(5, true);
   socket.PeerSends("abc");
   ASSERT_EQ(ReadSome(socket, 1), (Delivered{1, "a"}));
@@ -256,7 +256,7 @@ TEST(HasDataToRead, IsFalseForAFailedWaitOrNoSocket) {
   faults.FailNth(Call::kSelect, 1, ENOMEM);
   EXPECT_FALSE(socket.HasDataToRead(1));
   EXPECT_EQ(socket.m_timeout, 5);
-  EXPECT_FALSE(PlainSocket().HasDataToRead(1));
+  EXPECT_FALSE(ExposedSocket().HasDataToRead(1));
 }
 
 TEST(HasDataToRead, AsksTheDerivedWait) {

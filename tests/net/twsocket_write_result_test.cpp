@@ -11,7 +11,7 @@ TEST(WriteResult, AWriteThatTookNothingOrAPartLeavesConnected) {
   }
 }
 
-TEST(WriteResult, APlainWriteToAPeerThatIsGoneGivesZeroAndLeavesConnected) {
+TEST(WriteResult, APlainWriteToAPeerThatIsGoneReturnsZeroAndLeavesConnected) {
   PairedSocket socket(5, true);
   socket.ClosePeer();
   EXPECT_EQ(socket.WriteData("hello", 5), 0);

@@ -40,7 +40,7 @@ TEST(WriteData, NothingToWriteIsRefused) {
 
 TEST(WriteData, WithoutASocketIsRefused) {
   LogCapture log;
-  PlainSocket socket("host", 1, 5, true);
+  ExposedSocket socket("host", 1, 5, true);
   EXPECT_EQ(socket.WriteData("hello", 5), -1);
   EXPECT_THAT(log.Lines(), ElementsAre(SocketLine("info", "WriteData", "Invalid socket fd!\n")));
 }
@@ -91,7 +91,7 @@ TEST(WriteData, GoesOnWhileThePeerTakesTheBytesSlowly) {
   }
 }
 
-TEST(WriteData, AFailedWriteGivesTheBytesWrittenSoFarAndIsLogged) {
+TEST(WriteData, AFailedWriteReturnsTheBytesWrittenSoFarAndIsLogged) {
   LogCapture log;
   PairedSocket socket(5, true);
   Faults faults;

@@ -1,9 +1,9 @@
 """What the tests of packaging/ share. They run as root inside scripts/sandbox, where the record of
-levels, the log folder and the settings file belong to the run:
+levels, the log directory and the settings file belong to the run:
 
     scripts/sandbox python3 -m pytest tests/packaging -q
 
-TARNWICK_TOOLS_DIR is the build's folder of tools, build/debug/tools when it is unset.
+TARNWICK_TOOLS_DIR is the build's directory of tools, build/debug/tools when it is unset.
 """
 
 import os
@@ -17,9 +17,9 @@ import pytest
 ROOT = pathlib.Path(__file__).resolve().parents[2]
 PACKAGING = ROOT / "packaging"
 TOOLS = pathlib.Path(os.environ.get("TARNWICK_TOOLS_DIR", ROOT / "build/debug/tools")).resolve()
-LOG_FOLDER = pathlib.Path("/var/log/tarnwick")
+LOG_DIRECTORY = pathlib.Path("/var/log/tarnwick")
 LOGS = ("tarnwick.log", "twnotification.log")
-SETTINGS_FOLDER = pathlib.Path("/var/packages/Tarnwick/etc")
+SETTINGS_DIRECTORY = pathlib.Path("/var/packages/Tarnwick/etc")
 RECORD_KEY = "0x18180004"
 
 # A guard against a hang; no test waits for it to pass.
@@ -27,14 +27,16 @@ HANG = 240
 
 
 def pytest_sessionstart(session):
+    if session.config.getoption("dist", "no") != "no":
+        return  # this process hands the tests to workers, each in a sandbox of its own
     if not os.environ.get("TARNWICK_SANDBOX"):
         pytest.exit("these tests write system paths: run them in scripts/sandbox", returncode=3)
 
 
-def empty(folder):
-    os.chown(folder, 0, 0)
-    folder.chmod(0o755)
-    for entry in folder.iterdir():
+def empty(directory):
+    os.chown(directory, 0, 0)
+    directory.chmod(0o755)
+    for entry in directory.iterdir():
         entry.unlink()
 
 
@@ -44,8 +46,8 @@ def clean_product():
 
     def clean():
         subprocess.run(["ipcrm", "-M", RECORD_KEY], stderr=subprocess.DEVNULL, check=False)
-        empty(LOG_FOLDER)
-        empty(SETTINGS_FOLDER)
+        empty(LOG_DIRECTORY)
+        empty(SETTINGS_DIRECTORY)
 
     clean()
     yield

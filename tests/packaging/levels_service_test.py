@@ -7,7 +7,7 @@ import subprocess
 
 import pytest
 
-from conftest import HANG, PACKAGING, RECORD_KEY, SETTINGS_FOLDER, TOOLS
+from conftest import HANG, PACKAGING, RECORD_KEY, SETTINGS_DIRECTORY, TOOLS
 
 UNIT = PACKAGING / "tarnwick-levels.service"
 TWLOGCTL = str(TOOLS / "twlogctl/twlogctl")

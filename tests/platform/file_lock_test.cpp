@@ -16,29 +16,29 @@ using namespace tarnwick;
 
 namespace {
 
-int OpenFile(const TempDir& folder) {
-  return open(folder.File("lock").c_str(), O_RDWR | O_CREAT | O_CLOEXEC, 0600);
+int OpenFile(const TempDir& directory) {
+  return open(directory.File("lock").c_str(), O_RDWR | O_CREAT | O_CLOEXEC, 0600);
 }
 
-bool CanLock(const TempDir& folder) {
-  const UniqueFd other(OpenFile(folder));
+bool CanLock(const TempDir& directory) {
+  const UniqueFd other(OpenFile(directory));
   return flock(other.Get(), LOCK_EX | LOCK_NB) == 0;
 }
 
 TEST(FileLock, ExcludesOthersUntilTheScopeEnds) {
-  TempDir folder;
-  const UniqueFd fd(OpenFile(folder));
+  TempDir directory;
+  const UniqueFd fd(OpenFile(directory));
   {
     const FileLock lock(fd.Get());
     EXPECT_TRUE(lock.Held());
-    EXPECT_FALSE(CanLock(folder));
+    EXPECT_FALSE(CanLock(directory));
   }
-  EXPECT_TRUE(CanLock(folder));
+  EXPECT_TRUE(CanLock(directory));
 }
 
 TEST(FileLock, AnInterruptedWaitGoesOn) {
-  TempDir folder;
-  const UniqueFd fd(OpenFile(folder));
+  TempDir directory;
+  const UniqueFd fd(OpenFile(directory));
   Faults faults;
   faults.FailRange(Call::kFlock, 1, 3, EINTR);
   const FileLock lock(fd.Get());
@@ -47,8 +47,8 @@ TEST(FileLock, AnInterruptedWaitGoesOn) {
 }
 
 TEST(FileLock, ALockThatCannotBeHadIsNotReleased) {
-  TempDir folder;
-  const UniqueFd fd(OpenFile(folder));
+  TempDir directory;
+  const UniqueFd fd(OpenFile(directory));
   Faults faults;
   faults.FailNth(Call::kFlock, 1, ENOLCK);
   {
@@ -59,8 +59,8 @@ TEST(FileLock, ALockThatCannotBeHadIsNotReleased) {
 }
 
 TEST(FileLock, ReleasingLeavesErrno) {
-  TempDir folder;
-  const UniqueFd fd(OpenFile(folder));
+  TempDir directory;
+  const UniqueFd fd(OpenFile(directory));
   FileLock lock(fd.Get());
   Faults faults;
   faults.FailNth(Call::kFlock, 1, ENOLCK);
@@ -70,8 +70,8 @@ TEST(FileLock, ReleasingLeavesErrno) {
 }
 
 TEST(UniqueFd, ClosesOnceAndLeavesErrno) {
-  TempDir folder;
-  const int fd = OpenFile(folder);
+  TempDir directory;
+  const int fd = OpenFile(directory);
   Faults faults;
   faults.FailNth(Call::kClose, 1, EIO);
   errno = ETIMEDOUT;

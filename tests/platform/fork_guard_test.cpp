@@ -31,9 +31,10 @@ using namespace tarnwick;
 
 namespace {
 
-int OpenIn(const std::string& folder) {
+int OpenIn(const std::string& directory) {
   int count = 0;
-  for (const auto& [fd, target] : OpenDescriptors()) count += target.rfind(folder, 0) == 0 ? 1 : 0;
+  for (const auto& [fd, target] : OpenDescriptors())
+    count += target.rfind(directory, 0) == 0 ? 1 : 0;
   return count;
 }
 
@@ -86,7 +87,7 @@ TEST(ForkGuard, AForkInAnotherThreadWaitsForItsEnd) {
 
 std::atomic<bool> g_is_forking{false};
 
-// This thread has forked before, too, which leaves nothing behind.
+// This thread has forked before, too, which leaves nothing.
 TEST(ForkGuard, AHoldThatBeginsDuringAForkOfAnotherThreadWaitsForItsEnd) {
   static const int registered = pthread_atfork([] { g_is_forking = true; }, nullptr, nullptr);
   ASSERT_EQ(registered, 0);
@@ -175,17 +176,17 @@ TEST(ForkGuard, ThreadsMayForkAndHoldAtOnce) {
 }
 
 TEST(ForkClosedFile, OpensCreatesAndClosesAsOpenDoes) {
-  const TempDir folder;
+  const TempDir directory;
   const DescriptorGuard descriptors;
   {
-    const ForkClosedFile file(folder.File("log").c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
+    const ForkClosedFile file(directory.File("log").c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
     ASSERT_TRUE(file.Valid());
     EXPECT_EQ(write(file.Get(), "text", 4), 4);
   }
-  EXPECT_EQ(ReadFile(folder.File("log")), "text");
+  EXPECT_EQ(ReadFile(directory.File("log")), "text");
 }
 
-TEST(ForkClosedFile, WithoutAPathOrAFolderItIsNotValidAndErrnoTellsWhy) {
+TEST(ForkClosedFile, WithoutAPathOrADirectoryItIsNotValidAndErrnoIsSet) {
   errno = 0;
   EXPECT_FALSE(ForkClosedFile(nullptr, O_RDONLY, 0).Valid());
   EXPECT_EQ(errno, EFAULT);
@@ -194,19 +195,19 @@ TEST(ForkClosedFile, WithoutAPathOrAFolderItIsNotValidAndErrnoTellsWhy) {
 }
 
 TEST(ForkClosedFile, AChildHasNoneOfThoseThatAreOpen) {
-  const TempDir folder;
+  const TempDir directory;
   std::unique_ptr<ForkClosedFile> files[3];
   for (int i = 0; i < 3; ++i) {
-    const std::string path = folder.File(std::to_string(i));
+    const std::string path = directory.File(std::to_string(i));
     files[i] = std::make_unique<ForkClosedFile>(path.c_str(), O_WRONLY | O_CREAT, 0600);
   }
-  EXPECT_EQ(RunInChild([&] { return OpenIn(folder.Path()); }).code, 0);
+  EXPECT_EQ(RunInChild([&] { return OpenIn(directory.Path()); }).code, 0);
   files[1].reset();
-  EXPECT_EQ(RunInChild([&] { return OpenIn(folder.Path()); }).code, 0);
-  EXPECT_EQ(OpenIn(folder.Path()), 2);
+  EXPECT_EQ(RunInChild([&] { return OpenIn(directory.Path()); }).code, 0);
+  EXPECT_EQ(OpenIn(directory.Path()), 2);
   files[2].reset();
   files[0].reset();
-  EXPECT_EQ(OpenIn(folder.Path()), 0);
+  EXPECT_EQ(OpenIn(directory.Path()), 0);
 }
 
 std::atomic<int> g_signals{0};
@@ -223,8 +224,8 @@ void ForkInAHandler(int /*signal*/) {
 }
 
 TEST(ForkClosedFile, ASignalHandlerMayForkAtAnyMomentOfAnOpenOrAClose) {
-  const TempDir folder;
-  const std::string path = folder.File("file");
+  const TempDir directory;
+  const std::string path = directory.File("file");
   struct sigaction action = {};
   struct sigaction before = {};
   action.sa_handler = ForkInAHandler;
@@ -244,16 +245,16 @@ TEST(ForkClosedFile, ASignalHandlerMayForkAtAnyMomentOfAnOpenOrAClose) {
 }
 
 TEST(ForkClosedFile, ADescriptorThatWasClosedIsNotTakenFromAChild) {
-  const TempDir folder;
-  const std::string path = folder.File("file");
+  const TempDir directory;
+  const std::string path = directory.File("file");
   { const ForkClosedFile closed(path.c_str(), O_WRONLY | O_CREAT, 0600); }
   const UniqueFd same_number(open(path.c_str(), O_RDONLY | O_CLOEXEC));
-  EXPECT_EQ(RunInChild([&] { return OpenIn(folder.Path()); }).code, 1);
+  EXPECT_EQ(RunInChild([&] { return OpenIn(directory.Path()); }).code, 1);
 }
 
 TEST(ForkClosedFile, TheParentKeepsItsLockWhenAChildStarts) {
-  const TempDir folder;
-  const std::string path = folder.File("file");
+  const TempDir directory;
+  const std::string path = directory.File("file");
   const ForkClosedFile file(path.c_str(), O_WRONLY | O_CREAT, 0600);
   ASSERT_EQ(flock(file.Get(), LOCK_EX), 0);
   EXPECT_EQ(RunInChild([] { return 0; }).code, 0);
@@ -262,15 +263,15 @@ TEST(ForkClosedFile, TheParentKeepsItsLockWhenAChildStarts) {
 }
 
 TEST(ForkClosedFile, ItsStreamWritesWhenItIsFlushedAndIsClosedWithIt) {
-  const TempDir folder;
+  const TempDir directory;
   const DescriptorGuard descriptors;
   char buffer[1024];
-  ForkClosedFile file(folder.File("log").c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
+  ForkClosedFile file(directory.File("log").c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
   ASSERT_TRUE(file.MakeStream(buffer, sizeof(buffer)));
   fprintf(file.Stream(), "%s", "text");
-  EXPECT_EQ(ReadFile(folder.File("log")), "");
+  EXPECT_EQ(ReadFile(directory.File("log")), "");
   EXPECT_TRUE(file.Flush());
-  EXPECT_EQ(ReadFile(folder.File("log")), "text");
+  EXPECT_EQ(ReadFile(directory.File("log")), "text");
 }
 
 TEST(ForkClosedFile, WhatCannotBeWrittenIsDropped) {
@@ -283,13 +284,13 @@ TEST(ForkClosedFile, WhatCannotBeWrittenIsDropped) {
 }
 
 TEST(ForkClosedFile, AChildThatEndsWritesNothingOfItsStream) {
-  const TempDir folder;
+  const TempDir directory;
   char buffer[1024];
-  ForkClosedFile file(folder.File("log").c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
+  ForkClosedFile file(directory.File("log").c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
   ASSERT_TRUE(file.MakeStream(buffer, sizeof(buffer)));
   fprintf(file.Stream(), "%s", "text");
   // The number of the closed descriptor is the next one that the child opens.
-  const std::string other = folder.File("other");
+  const std::string other = directory.File("other");
   const auto open_and_exit = [&]() -> int {
     open(other.c_str(), O_WRONLY | O_CREAT, 0600);
     std::exit(0);
@@ -297,16 +298,16 @@ TEST(ForkClosedFile, AChildThatEndsWritesNothingOfItsStream) {
   EXPECT_EQ(RunInChild(open_and_exit).code, 0);
   EXPECT_EQ(ReadFile(other), "");
   EXPECT_TRUE(file.Flush());
-  EXPECT_EQ(ReadFile(folder.File("log")), "text");
+  EXPECT_EQ(ReadFile(directory.File("log")), "text");
 }
 
 TEST(ForkClosedFile, AStreamThatCannotBeMadeLeavesTheDescriptorToItsOwner) {
-  const TempDir folder;
+  const TempDir directory;
   const DescriptorGuard descriptors;
   Faults faults;
   faults.FailNth(Call::kFopencookie, 1, ENOMEM);
   char buffer[1024];
-  ForkClosedFile file(folder.File("log").c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
+  ForkClosedFile file(directory.File("log").c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
   EXPECT_FALSE(file.MakeStream(buffer, sizeof(buffer)));
   EXPECT_EQ(errno, ENOMEM);
 }

@@ -31,7 +31,7 @@ constexpr char kFormat[] = "%s=\"%s\"\n";
 constexpr char kOld[] = "# settings\nname=\"old\"\nother=\"x\"\n";
 constexpr char kNew[] = "# settings\nname=\"new\"\nother=\"x\"\n";
 
-// Inside the sandbox this folder lies in memory, so that thousands of rewrites are quick.
+// Inside the sandbox this directory lies in memory, so that thousands of rewrites are quick.
 constexpr char kFolder[] = "/var/packages/Tarnwick/etc";
 constexpr char kPath[] = "/var/packages/Tarnwick/etc/settings.conf";
 
@@ -52,7 +52,7 @@ std::string Get(const char* key) {
 }
 
 // Fails each call of one kind: the text is the old or the new one, as the result says, and nothing
-// is left behind.
+// is left.
 int ExpectAllOrNothing(Call call, bool may_succeed) {
   DescriptorGuard descriptors;
   return ForEachFailingCall(call, [&](Faults& faults) {
@@ -92,7 +92,7 @@ TEST_F(SettingsFile, TheModeMayBeRefused) {
 TEST_F(SettingsFile, TheRenamingMayFail) {
   EXPECT_GE(ExpectAllOrNothing(Call::kRename, false), 1);
 }
-// The folder's synchronisation comes after the renaming, which cannot be taken back.
+// The directory's synchronisation comes after the renaming, which cannot be taken back.
 TEST_F(SettingsFile, EachSynchronisationMayFail) {
   EXPECT_GE(ExpectAllOrNothing(Call::kFsync, true), 1);
 }
@@ -100,8 +100,8 @@ TEST_F(SettingsFile, TheRemovalOfALeftoverMayFail) {
   ExpectAllOrNothing(Call::kUnlink, true);
 }
 TEST_F(SettingsFile, ALinkMayBeUnreadable) {
-  const TempDir folder;
-  const std::string link = folder.File("link");
+  const TempDir directory;
+  const std::string link = directory.File("link");
   ASSERT_EQ(symlink(kPath, link.c_str()), 0);
   const int runs = ForEachFailingCall(Call::kReadlinkat, [&](Faults& faults) {
     WriteFile(kPath, kOld);
@@ -249,11 +249,11 @@ TEST_F(SettingsFile, AMissingFileAndConcurrentWritersLoseNoKey) {
 
 TEST_F(SettingsFile, AReaderDoesNotWaitForAWriter) {
   const int fd = open(kPath, O_RDONLY | O_CLOEXEC);
-  const int folder = open(kFolder, O_RDONLY | O_DIRECTORY | O_CLOEXEC);
+  const int directory = open(kFolder, O_RDONLY | O_DIRECTORY | O_CLOEXEC);
   ASSERT_EQ(flock(fd, LOCK_EX), 0);
-  ASSERT_EQ(flock(folder, LOCK_EX), 0);
+  ASSERT_EQ(flock(directory, LOCK_EX), 0);
   EXPECT_EQ(Get("name"), "old");
-  close(folder);
+  close(directory);
   close(fd);
 }
 

@@ -4,7 +4,9 @@
 
 #include <cerrno>
 #include <cstring>
+#include <ostream>
 #include <string>
+#include <vector>
 
 #include "tarnwick/platform/qlibcfile.h"
 #include "tests/support/faults.h"
@@ -13,18 +15,18 @@
 
 namespace {
 
-// What a read of `key` from a file with this text gives.
+// What a read of `key` from a file with this text returns.
 struct Got {
   int result;
   std::string value;
 };
 
 Got Get(const std::string& text, const char* key, int size = 64) {
-  TempDir folder;
-  WriteFile(folder.File("conf"), text);
+  TempDir directory;
+  WriteFile(directory.File("conf"), text);
   char value[64];
   memset(value, '#', sizeof(value));
-  const int result = QLIBCFileGetKeyValue(folder.File("conf").c_str(), key, value, size, 0);
+  const int result = QLIBCFileGetKeyValue(directory.File("conf").c_str(), key, value, size, 0);
   return {result, result < 0 ? "" : value};
 }
 
@@ -35,60 +37,45 @@ void ExpectGot(const std::string& text, const char* key, const std::string& expe
   EXPECT_EQ(got.value, expected);
 }
 
-TEST(GetKeyValue, GivesTheLengthAndTheTextBetweenTheQuotes) {
-  ExpectGot("first=\"1\"\nname=\"value\"\nlast=\"2\"\n", "name", "value");
+// A file, and what it has for the key "name". The first column says why.
+struct NameCase {
+  const char* why;
+  const char* text;
+  const char* value;
+};
+
+std::ostream& operator<<(std::ostream& out, const NameCase& test) {
+  return out << test.why;
 }
 
-TEST(GetKeyValue, AMissingKeyGivesZeroAndAnEmptyText) {
-  ExpectGot("other=\"x\"\n", "name", "");
-  ExpectGot("", "name", "");
+class GetName : public ::testing::TestWithParam<NameCase> {};
+
+TEST_P(GetName, HasTheValueOfTheTable) {
+  ExpectGot(GetParam().text, "name", GetParam().value);
 }
 
-TEST(GetKeyValue, AnEmptyValueGivesZeroAndAnEmptyText) {
-  ExpectGot("name=\"\"\n", "name", "");
-  ExpectGot("name=\n", "name", "");
-}
-
-TEST(GetKeyValue, AKeyThatBeginsOrEndsAnotherIsNotThatKey) {
-  ExpectGot("names=\"x\"\nmy_name=\"y\"\nname=\"z\"\n", "name", "z");
-  ExpectGot("Name=\"x\"\n", "name", "");
-}
-
-TEST(GetKeyValue, TheFirstOfSeveralLinesCounts) {
-  ExpectGot("name=\"1\"\nname=\"2\"\n", "name", "1");
-}
-
-TEST(GetKeyValue, BlanksAroundTheKeyAndTheValueDoNotCount) {
-  ExpectGot(" \tname \t= \"value\" \n", "name", "value");
-}
-
-TEST(GetKeyValue, BlanksInsideTheQuotesCount) {
-  ExpectGot("name=\" a b \"\n", "name", " a b ");
-}
-
-TEST(GetKeyValue, AValueWithoutQuotesIsAccepted) {
-  ExpectGot("name=value\n", "name", "value");
-}
-
-TEST(GetKeyValue, ACarriageReturnBeforeTheLineEndDoesNotCount) {
-  ExpectGot("name=\"value\"\r\n", "name", "value");
-}
-
-TEST(GetKeyValue, AValueMayHoldQuotesAndEqualsSigns) {
-  ExpectGot("name=\"a\"b=c\"\n", "name", "a\"b=c");
-}
-
-TEST(GetKeyValue, ALastLineWithoutItsEndCounts) {
-  ExpectGot("other=\"x\"\nname=\"value\"", "name", "value");
-}
-
-TEST(GetKeyValue, ACommentIsNotAKey) {
-  ExpectGot("#name=\"x\"\n# name=\"y\"\nname=\"z\"\n", "name", "z");
-}
-
-TEST(GetKeyValue, LinesOfAnyOtherShapeAreSkipped) {
-  ExpectGot("name\n\n[section]\n=\"x\"\nname: y\nname=\"z\"\n", "name", "z");
-}
+INSTANTIATE_TEST_SUITE_P(
+    Platform, GetName,
+    ::testing::ValuesIn(std::vector<NameCase>{
+        {"TheValueIsBetweenTheQuotes", "first=\"1\"\nname=\"value\"\nlast=\"2\"\n", "value"},
+        {"AMissingKeyIsEmpty", "other=\"x\"\n", ""},
+        {"AnEmptyFileHasNoKey", "", ""},
+        {"AnEmptyValueIsEmpty", "name=\"\"\n", ""},
+        {"NoValueIsEmpty", "name=\n", ""},
+        {"AKeyThatBeginsOrEndsAnotherIsNotThatKey", "names=\"x\"\nmy_name=\"y\"\nname=\"z\"\n",
+         "z"},
+        {"KeysHaveTheirCase", "Name=\"x\"\n", ""},
+        {"TheFirstOfSeveralLinesIsTaken", "name=\"1\"\nname=\"2\"\n", "1"},
+        {"BlanksAroundTheKeyAndTheValueAreIgnored", " \tname \t= \"value\" \n", "value"},
+        {"BlanksInsideTheQuotesAreKept", "name=\" a b \"\n", " a b "},
+        {"AValueWithoutQuotesIsAccepted", "name=value\n", "value"},
+        {"ACarriageReturnBeforeTheLineFeedIsIgnored", "name=\"value\"\r\n", "value"},
+        {"AValueMayHoldQuotesAndEqualsSigns", "name=\"a\"b=c\"\n", "a\"b=c"},
+        {"ALastLineWithoutALineFeedIsReadToo", "other=\"x\"\nname=\"value\"", "value"},
+        {"ACommentIsNotAKey", "#name=\"x\"\n# name=\"y\"\nname=\"z\"\n", "z"},
+        {"LinesOfAnyOtherShapeAreSkipped", "name\n\n[section]\n=\"x\"\nname: y\nname=\"z\"\n", "z"},
+    }),
+    [](const auto& test) { return std::string(test.param.why); });
 
 TEST(GetKeyValue, ASmallBufferGetsTheStartAndTheWholeLengthIsToldToTheCaller) {
   const Got got = Get("name=\"value\"\n", "name", 4);
@@ -102,43 +89,43 @@ TEST(GetKeyValue, ABufferOfOneByteGetsTheZeroByteAlone) {
   EXPECT_EQ(got.value, "");
 }
 
-TEST(GetKeyValue, NothingIsStoredBehindTheBuffer) {
-  TempDir folder;
-  WriteFile(folder.File("conf"), "name=\"value\"\n");
+TEST(GetKeyValue, NothingIsStoredAfterTheBuffer) {
+  TempDir directory;
+  WriteFile(directory.File("conf"), "name=\"value\"\n");
   char value[8] = "#######";
-  QLIBCFileGetKeyValue(folder.File("conf").c_str(), "name", value, 4, 0);
+  QLIBCFileGetKeyValue(directory.File("conf").c_str(), "name", value, 4, 0);
   EXPECT_EQ(std::string(value, sizeof(value)), std::string("val\0###\0", 8));
 }
 
 TEST(GetKeyValue, TheFlagsChangeNothing) {
-  TempDir folder;
-  WriteFile(folder.File("conf"), "name=\"value\"\n");
+  TempDir directory;
+  WriteFile(directory.File("conf"), "name=\"value\"\n");
   for (const int flags : {0, 1, -1}) {
     char value[8];
-    EXPECT_EQ(QLIBCFileGetKeyValue(folder.File("conf").c_str(), "name", value, 8, flags), 5);
+    EXPECT_EQ(QLIBCFileGetKeyValue(directory.File("conf").c_str(), "name", value, 8, flags), 5);
   }
 }
 
-TEST(GetKeyValue, AMissingFileGivesMinusOneAndLeavesTheBufferAlone) {
-  TempDir folder;
+TEST(GetKeyValue, AMissingFileReturnsMinusOneAndLeavesTheBufferAlone) {
+  TempDir directory;
   char value[8] = "before";
   errno = 0;
-  EXPECT_EQ(QLIBCFileGetKeyValue(folder.File("none").c_str(), "name", value, 8, 0), -1);
+  EXPECT_EQ(QLIBCFileGetKeyValue(directory.File("none").c_str(), "name", value, 8, 0), -1);
   EXPECT_EQ(errno, ENOENT);
   EXPECT_STREQ(value, "before");
 }
 
-TEST(GetKeyValue, AFolderInPlaceOfTheFileGivesMinusOne) {
-  TempDir folder;
+TEST(GetKeyValue, ADirectoryInPlaceOfTheFileReturnsMinusOne) {
+  TempDir directory;
   char value[8] = "before";
-  EXPECT_EQ(QLIBCFileGetKeyValue(folder.Path().c_str(), "name", value, 8, 0), -1);
+  EXPECT_EQ(QLIBCFileGetKeyValue(directory.Path().c_str(), "name", value, 8, 0), -1);
   EXPECT_STREQ(value, "before");
 }
 
 TEST(GetKeyValue, ArgumentsThatAreNullEmptyOrNotPositiveAreRefused) {
-  TempDir folder;
-  WriteFile(folder.File("conf"), "name=\"value\"\n");
-  const std::string path = folder.File("conf");
+  TempDir directory;
+  WriteFile(directory.File("conf"), "name=\"value\"\n");
+  const std::string path = directory.File("conf");
   char value[8] = "before";
   errno = 0;
   EXPECT_EQ(QLIBCFileGetKeyValue(nullptr, "name", value, 8, 0), -1);
@@ -164,24 +151,24 @@ TEST(GetKeyValue, AFileOfSeveralReadsIsReadWhole) {
 }
 
 TEST(GetKeyValue, ShortAndInterruptedReadsAreContinued) {
-  TempDir folder;
-  WriteFile(folder.File("conf"), "other=\"x\"\nname=\"value\"\n");
+  TempDir directory;
+  WriteFile(directory.File("conf"), "other=\"x\"\nname=\"value\"\n");
   Faults faults;
   faults.Limit(Call::kRead, 1).FailNth(Call::kRead, 2, EINTR);
   char value[8];
-  EXPECT_EQ(QLIBCFileGetKeyValue(folder.File("conf").c_str(), "name", value, 8, 0), 5);
+  EXPECT_EQ(QLIBCFileGetKeyValue(directory.File("conf").c_str(), "name", value, 8, 0), 5);
   EXPECT_STREQ(value, "value");
 }
 
-TEST(GetKeyValue, EachSystemCallMayFailAndNothingIsLeftBehind) {
-  TempDir folder;
-  WriteFile(folder.File("conf"), "name=\"value\"\n");
+TEST(GetKeyValue, EachSystemCallMayFailAndNothingIsLeft) {
+  TempDir directory;
+  WriteFile(directory.File("conf"), "name=\"value\"\n");
   DescriptorGuard descriptors;
   for (const Call call : {Call::kOpen, Call::kRead}) {
     const int runs = ForEachFailingCall(call, [&](Faults& faults) {
       char value[8] = "before";
       errno = 0;
-      const int result = QLIBCFileGetKeyValue(folder.File("conf").c_str(), "name", value, 8, 0);
+      const int result = QLIBCFileGetKeyValue(directory.File("conf").c_str(), "name", value, 8, 0);
       EXPECT_EQ(result, faults.Struck() ? -1 : 5);
       EXPECT_STREQ(value, faults.Struck() ? "before" : "value");
       EXPECT_NE(faults.Struck() && errno == 0, true);

@@ -28,14 +28,14 @@ class PlantedSettings : public ::testing::TestWithParam<PlantedKind> {
  protected:
   PlantedSettings() { WriteFile(Target(), kTarget); }
 
-  std::string Target() const { return folder_.File("target"); }
-  std::string Conf() const { return folder_.File("conf"); }
+  std::string Target() const { return directory_.File("target"); }
+  std::string Conf() const { return directory_.File("conf"); }
   std::string NewConf() const { return Conf() + ".tarnwick-new"; }
 
   // At `path`; false where it cannot be made.
   bool Plant(const std::string& path) const { return GetParam().plant(path, Target()); }
 
-  TempDir folder_;
+  TempDir directory_;
 };
 
 // In a child, which is ended when the call waits.
@@ -75,7 +75,7 @@ TEST_P(PlantedSettings, WhatHasTheNewTextsNameIsPutAwayUnwritten) {
   ExpectWritten(Conf());
   EXPECT_EQ(ReadFile(Conf()), kNewText);
   EXPECT_EQ(ReadFile(Target()), kTarget);
-  EXPECT_THAT(ListFolder(folder_.Path()), ElementsAre("conf", "target"));
+  EXPECT_THAT(ListFolder(directory_.Path()), ElementsAre("conf", "target"));
 }
 
 TEST_P(PlantedSettings, NewSettingsAreMadeBesideIt) {
@@ -85,9 +85,9 @@ TEST_P(PlantedSettings, NewSettingsAreMadeBesideIt) {
   EXPECT_EQ(ReadFile(Target()), kTarget);
 }
 
-TEST_P(PlantedSettings, InThePlaceOfTheirFolderItIsRefused) {
-  if (!Plant(folder_.File("etc"))) GTEST_SKIP() << "it cannot be made here";
-  ExpectRefused(folder_.File("etc/conf"), GetParam().below);
+TEST_P(PlantedSettings, InThePlaceOfTheirDirectoryItIsRefused) {
+  if (!Plant(directory_.File("etc"))) GTEST_SKIP() << "it cannot be made here";
+  ExpectRefused(directory_.File("etc/conf"), GetParam().below);
   EXPECT_EQ(ReadFile(Target()), kTarget);
 }
 
@@ -95,10 +95,10 @@ INSTANTIATE_TEST_SUITE_P(Kinds, PlantedSettings, ::testing::ValuesIn(PlantedKind
 
 class OddSettings : public ::testing::Test {
  protected:
-  std::string Conf() const { return folder_.File("conf"); }
+  std::string Conf() const { return directory_.File("conf"); }
   std::string NewConf() const { return Conf() + ".tarnwick-new"; }
 
-  TempDir folder_;
+  TempDir directory_;
 };
 
 TEST_F(OddSettings, ADirectoryOfTheNewTextsNameKeepsTheOldText) {
@@ -111,10 +111,10 @@ TEST_F(OddSettings, ADirectoryOfTheNewTextsNameKeepsTheOldText) {
 
 TEST_F(OddSettings, ASecondNameOfTheFileKeepsTheOldText) {
   WriteFile(Conf(), kText);
-  ASSERT_EQ(link(Conf().c_str(), folder_.File("second").c_str()), 0);
+  ASSERT_EQ(link(Conf().c_str(), directory_.File("second").c_str()), 0);
   ExpectWritten(Conf());
   EXPECT_EQ(ReadFile(Conf()), kNewText);
-  EXPECT_EQ(ReadFile(folder_.File("second")), kText);
+  EXPECT_EQ(ReadFile(directory_.File("second")), kText);
 }
 
 }  // namespace

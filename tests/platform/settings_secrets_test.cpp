@@ -18,7 +18,7 @@ namespace {
 
 constexpr char kFormat[] = "%s=\"%s\"\n";
 constexpr char kSecret[] = "admin_password=\"SECRET\"\n";
-// Inside the sandbox this folder lies in memory, so that thousands of rewrites are quick.
+// Inside the sandbox this directory lies in memory, so that thousands of rewrites are quick.
 constexpr char kPath[] = "/var/packages/Tarnwick/etc/settings.conf";
 constexpr char kNewPath[] = "/var/packages/Tarnwick/etc/settings.conf.tarnwick-new";
 constexpr uid_t kOther = 65534;

@@ -16,13 +16,13 @@ namespace {
 
 constexpr char kFormat[] = "%s=\"%s\"\n";
 
-// A file "conf" in a folder of its own.
+// A file "conf" in a directory of its own.
 class SetKeyValue : public ::testing::Test {
  protected:
   int Set(const char* key, const char* value, const char* format = kFormat) {
     return QLIBCFileSetKeyValue(Path().c_str(), key, value, format);
   }
-  std::string Path() const { return folder_.File("conf"); }
+  std::string Path() const { return directory_.File("conf"); }
   std::string Text() const { return ReadFile(Path()); }
   void Start(const std::string& text) { WriteFile(Path(), text); }
   mode_t Mode() const {
@@ -31,10 +31,10 @@ class SetKeyValue : public ::testing::Test {
     return status.st_mode & 07777;
   }
 
-  TempDir folder_;
+  TempDir directory_;
 };
 
-TEST_F(SetKeyValue, ReplacesTheKeysLineWhereItStands) {
+TEST_F(SetKeyValue, ReplacesTheKeysLineWhereItIs) {
   Start("a=\"1\"\nname=\"old\"\nb=\"2\"\n");
   EXPECT_EQ(Set("name", "new"), 0);
   EXPECT_EQ(Text(), "a=\"1\"\nname=\"new\"\nb=\"2\"\n");
@@ -172,13 +172,13 @@ TEST_F(SetKeyValue, TheOwnerStays) {
 }
 
 TEST_F(SetKeyValue, ASymbolicLinkStaysALink) {
-  WriteFile(folder_.File("real"), "name=\"old\"\n");
+  WriteFile(directory_.File("real"), "name=\"old\"\n");
   ASSERT_EQ(symlink("real", Path().c_str()), 0);
   EXPECT_EQ(Set("name", "new"), 0);
   struct stat status = {};
   ASSERT_EQ(lstat(Path().c_str(), &status), 0);
   EXPECT_TRUE(S_ISLNK(status.st_mode));
-  EXPECT_EQ(ReadFile(folder_.File("real")), "name=\"new\"\n");
+  EXPECT_EQ(ReadFile(directory_.File("real")), "name=\"new\"\n");
 }
 
 TEST_F(SetKeyValue, ALinkToNowhereIsRefusedAndStays) {
@@ -191,30 +191,30 @@ TEST_F(SetKeyValue, ALinkToNowhereIsRefusedAndStays) {
   EXPECT_TRUE(S_ISLNK(status.st_mode));
 }
 
-TEST_F(SetKeyValue, AMissingFolderGivesMinusOne) {
+TEST_F(SetKeyValue, AMissingDirectoryReturnsMinusOne) {
   errno = 0;
-  EXPECT_EQ(QLIBCFileSetKeyValue(folder_.File("none/conf").c_str(), "name", "v", kFormat), -1);
+  EXPECT_EQ(QLIBCFileSetKeyValue(directory_.File("none/conf").c_str(), "name", "v", kFormat), -1);
   EXPECT_EQ(errno, ENOENT);
 }
 
-TEST_F(SetKeyValue, AFolderInPlaceOfTheFileGivesMinusOneAndStays) {
-  EXPECT_EQ(QLIBCFileSetKeyValue(folder_.Path().c_str(), "name", "v", kFormat), -1);
-  EXPECT_TRUE(ListFolder(folder_.Path()).empty());
+TEST_F(SetKeyValue, ADirectoryInPlaceOfTheFileReturnsMinusOneAndStays) {
+  EXPECT_EQ(QLIBCFileSetKeyValue(directory_.Path().c_str(), "name", "v", kFormat), -1);
+  EXPECT_TRUE(ListFolder(directory_.Path()).empty());
 }
 
-TEST_F(SetKeyValue, APathWithoutAFolderIsInTheCurrentOne) {
+TEST_F(SetKeyValue, APathWithoutADirectoryIsInTheCurrentOne) {
   const ChildResult result = RunInChild([&] {
-    if (chdir(folder_.Path().c_str()) != 0) return 1;
+    if (chdir(directory_.Path().c_str()) != 0) return 1;
     return -QLIBCFileSetKeyValue("conf", "name", "v", kFormat);
   });
   EXPECT_EQ(result.code, 0);
   EXPECT_EQ(Text(), "name=\"v\"\n");
 }
 
-TEST_F(SetKeyValue, NothingButTheFileIsLeftInTheFolder) {
+TEST_F(SetKeyValue, NothingButTheFileIsLeftInTheDirectory) {
   EXPECT_EQ(Set("name", "1"), 0);
   EXPECT_EQ(Set("name", "2"), 0);
-  EXPECT_EQ(ListFolder(folder_.Path()), std::vector<std::string>{"conf"});
+  EXPECT_EQ(ListFolder(directory_.Path()), std::vector<std::string>{"conf"});
 }
 
 TEST_F(SetKeyValue, NoDescriptorIsLeftOpen) {

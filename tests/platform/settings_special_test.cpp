@@ -73,7 +73,7 @@ void ExpectAllRefused(const std::string& path, int error) {
 
 class SpecialSettings : public ::testing::Test {
  protected:
-  std::string Path() const { return folder_.File("conf"); }
+  std::string Path() const { return directory_.File("conf"); }
   std::string Target() const { return target_folder_.File("target"); }
 
   // At the path, a link of this user to `target`.
@@ -88,7 +88,7 @@ class SpecialSettings : public ::testing::Test {
     return lstat(Path().c_str(), &attributes) == 0 && S_ISLNK(attributes.st_mode);
   }
 
-  TempDir folder_;
+  TempDir directory_;
   TempDir target_folder_;
 };
 
@@ -165,11 +165,11 @@ TEST_F(SpecialSettings, AnotherUsersLinkMakesNoFile) {
   EXPECT_FALSE(FileExists(Target()));
 }
 
-TEST_F(SpecialSettings, AnotherUsersLinkBehindAnOwnOneIsRefused) {
+TEST_F(SpecialSettings, AnotherUsersLinkAfterAnOwnOneIsRefused) {
   WriteFile(Target(), kText);
   if (!LinkOfAnother(Target())) GTEST_SKIP() << "only one user in this namespace";
-  ASSERT_EQ(symlink("conf", folder_.File("own").c_str()), 0);
-  ExpectRefused(Set(folder_.File("own")), ELOOP);
+  ASSERT_EQ(symlink("conf", directory_.File("own").c_str()), 0);
+  ExpectRefused(Set(directory_.File("own")), ELOOP);
   EXPECT_EQ(ReadFile(Target()), kText);
 }
 
@@ -182,7 +182,7 @@ TEST_F(SpecialSettings, ReadingFollowsALinkWhoeverMadeIt) {
 TEST_F(SpecialSettings, RootsLinkIsFollowedForAnotherUser) {
   WriteFile(Target(), kText);
   Link(Target());
-  for (const std::string& path : {folder_.Path(), target_folder_.Path(), Target()}) {
+  for (const std::string& path : {directory_.Path(), target_folder_.Path(), Target()}) {
     if (chown(path.c_str(), kOther, kOther) != 0) GTEST_SKIP() << "only one user here";
   }
   const ChildResult result = RunInChild([&] {
@@ -193,7 +193,7 @@ TEST_F(SpecialSettings, RootsLinkIsFollowedForAnotherUser) {
   EXPECT_EQ(ReadFile(Target()), kNewText);
 }
 
-TEST_F(SpecialSettings, AnOwnLinkToAnotherFolderStaysALink) {
+TEST_F(SpecialSettings, AnOwnLinkToAnotherDirectoryStaysALink) {
   WriteFile(Target(), kText);
   Link(Target());
   EXPECT_EQ(Set(Path()).result, 0);
@@ -211,13 +211,13 @@ TEST_F(SpecialSettings, FortyLinksAreFollowedAndOneMoreIsRefused) {
   WriteFile(Target(), kText);
   std::string last = Path();
   for (int links = 1; links <= 40; ++links) {
-    const std::string next = links < 40 ? folder_.File(std::to_string(links)) : Target();
+    const std::string next = links < 40 ? directory_.File(std::to_string(links)) : Target();
     ASSERT_EQ(symlink(next.c_str(), last.c_str()), 0);
     last = next;
   }
   EXPECT_EQ(Set(Path()).result, 0);
   EXPECT_EQ(ReadFile(Target()), kNewText);
-  const std::string longer = folder_.File("longer");
+  const std::string longer = directory_.File("longer");
   ASSERT_EQ(symlink(Path().c_str(), longer.c_str()), 0);
   ExpectRefused(Set(longer), ELOOP);
 }

@@ -9,7 +9,7 @@ using namespace tarnwick;
 
 namespace {
 
-TEST(FindSettingsLine, GivesWhereTheLineStands) {
+TEST(FindSettingsLine, ReturnsWhereTheLineIs) {
   const std::string text = "a=\"1\"\nname=\"value\"\nb=\"2\"\n";
   const SettingsLine line = FindSettingsLine(text, "name");
   ASSERT_TRUE(line.found);
@@ -23,13 +23,13 @@ TEST(FindSettingsLine, AKeyThatIsNotThereIsNotFound) {
   EXPECT_FALSE(FindSettingsLine("name", "name").found);
 }
 
-TEST(FindSettingsLine, AnUnclosedQuoteGivesTheRestOfTheLine) {
+TEST(FindSettingsLine, AnUnclosedQuoteReturnsTheRestOfTheLine) {
   EXPECT_EQ(FindSettingsLine("name=\"value\n", "name").value, "value");
   EXPECT_EQ(FindSettingsLine("name=\"\n", "name").value, "");
 }
 
 // A writer may have been cut at any byte on a file system that lost power.
-TEST(FindSettingsLine, TextCutAtAnyByteGivesAPrefixOfTheValueOrNothing) {
+TEST(FindSettingsLine, TextCutAtAnyByteReturnsAPrefixOfTheValueOrNothing) {
   const std::string text = "name=\"value\"\n";
   for (size_t cut = 0; cut <= text.size(); ++cut) {
     const SettingsLine line = FindSettingsLine(std::string_view(text).substr(0, cut), "name");

@@ -77,7 +77,7 @@ class Faults {
   // The clock that gettimeofday and time show.
   Faults& Clock(std::function<struct timeval()> clock);
 
-  // The value that getsockopt gives for SO_ERROR.
+  // The value that getsockopt returns for SO_ERROR.
   Faults& SocketError(int error);
 
   // True once a rule has decided about a call.

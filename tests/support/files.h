@@ -13,10 +13,10 @@ void WriteFile(const std::string& path, const std::string& content);
 
 bool FileExists(const std::string& path);
 
-// The names in a folder without "." and "..", sorted.
+// The names in a directory without "." and "..", sorted.
 std::vector<std::string> ListFolder(const std::string& path);
 
-// A new empty folder that goes away with the object, with all that it holds.
+// A new empty directory that goes away with the object, with all that it holds.
 class TempDir {
  public:
   TempDir();

@@ -22,7 +22,7 @@ inline constexpr int kRecordSize = 300;
 
 // One log line, taken apart.
 struct LogLine {
-  std::string time;  // "Mar  5 14:03:09", with ".417" behind it when it carries milliseconds
+  std::string time;  // "Mar  5 14:03:09", with ".417" after it when it carries milliseconds
   int pid = 0;
   int tid = 0;           // 0: the main thread
   std::string category;  // empty when the line has no tags

@@ -296,12 +296,12 @@ Step SendRecordByteByByte(const std::string& bytes) {
           }};
 }
 
-Script Exchange(const std::string& reply) {
-  return {ExpectRequest(), Send(reply), Close()};
+Script Exchange(const std::string& response) {
+  return {ExpectRequest(), Send(response), Close()};
 }
 
-Script ExchangeByteByByte(const std::string& reply) {
-  return {ExpectRequest(), SendByteByByte(reply), Close()};
+Script ExchangeByteByByte(const std::string& response) {
+  return {ExpectRequest(), SendByteByByte(response), Close()};
 }
 
 Script ExchangeInPieces(const std::vector<std::string>& pieces) {

@@ -1,6 +1,6 @@
 // The steps of a scripted peer.
 //
-// A step that reads leaves what came behind its part for the next step. Every step has the peer's
+// A step that reads leaves what came after its part for the next step. Every step has the peer's
 // deadline; one that cannot be played fails the test.
 #ifndef TARNWICK_TESTS_SUPPORT_PEER_STEPS_H_
 #define TARNWICK_TESTS_SUPPORT_PEER_STEPS_H_
@@ -88,14 +88,14 @@ Step ExpectRawBytes(size_t count);
 // Over TLS: one record, whose raw bytes go out one at a time. At most 16,384 bytes.
 Step SendRecordByteByByte(const std::string& bytes);
 
-// A whole exchange: reads a request, sends `reply`, closes.
-Script Exchange(const std::string& reply);
+// A whole exchange: reads a request, sends `response`, closes.
+Script Exchange(const std::string& response);
 
-// As Exchange, with the reply sent byte by byte or in pieces.
-Script ExchangeByteByByte(const std::string& reply);
+// As Exchange, with the response sent byte by byte or in pieces.
+Script ExchangeByteByByte(const std::string& response);
 Script ExchangeInPieces(const std::vector<std::string>& pieces);
 
-// Reads a request and closes without an answer.
+// Reads a request and closes without a response.
 Script RequestThenClose();
 
 // Sends `bytes` without waiting for anything, closes.

@@ -143,7 +143,7 @@ std::vector<std::string> Runnable(const std::vector<std::string>& command) {
   if (!IsEmulated() || MachineOf(command[0]) != MachineOf("/proc/self/exe")) return command;
   std::vector<std::string> words = Emulator();
   words.insert(words.end(), command.begin(), command.end());
-  // For the emulator, /proc/self would be its own folder.
+  // For the emulator, /proc/self would be its own directory.
   words[Emulator().size()] = std::filesystem::canonical(command[0]);
   return words;
 }
@@ -179,17 +179,17 @@ void RunOnSmallStack(size_t bytes, const std::function<void()>& body) {
 
 std::map<int, std::string> OpenDescriptors() {
   std::map<int, std::string> open;
-  DIR* folder = opendir("/proc/self/fd");
-  if (folder == nullptr) return open;
-  while (const dirent* entry = readdir(folder)) {
+  DIR* directory = opendir("/proc/self/fd");
+  if (directory == nullptr) return open;
+  while (const dirent* entry = readdir(directory)) {
     const int fd = atoi(entry->d_name);
-    if (entry->d_name[0] == '.' || fd == dirfd(folder)) continue;
+    if (entry->d_name[0] == '.' || fd == dirfd(directory)) continue;
     char target[256];
     const std::string link = std::string("/proc/self/fd/") + entry->d_name;
     const ssize_t length = readlink(link.c_str(), target, sizeof(target));
     open[fd] = std::string(target, length > 0 ? static_cast<size_t>(length) : 0);
   }
-  closedir(folder);
+  closedir(directory);
   return open;
 }
 

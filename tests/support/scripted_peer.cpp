@@ -89,6 +89,10 @@ void ScriptedPeer::Fail(const std::string& message) {
 
 void ScriptedPeer::Run() {
   running_.Set();
+  if (options_.repeat) {
+    RepeatTheScript();
+    return;
+  }
   for (size_t i = 0; i < scripts_.size(); ++i) {
     const int fd = Accept();
     if (fd < 0) {
@@ -103,6 +107,15 @@ void ScriptedPeer::Run() {
     progress_.notify_all();
   }
   RefuseUnexpected();
+}
+
+void ScriptedPeer::RepeatTheScript() {
+  for (int fd; (fd = Accept()) >= 0;) {
+    Transcript unread;
+    const auto peer = connect_(fd, &unread, [this] { return stopped_.load(); });
+    Play(0, *peer);
+  }
+  failures_.clear();  // a client may break off at any step
 }
 
 // Waits for the next connection; -1 when the test has ended without one.

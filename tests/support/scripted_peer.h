@@ -24,6 +24,7 @@
 #include <mutex>
 #include <string>
 #include <thread>
+#include <utility>
 #include <vector>
 
 #include "tests/support/flag.h"
@@ -35,6 +36,7 @@ struct PeerOptions {
   int backlog = 16;
   int receive_buffer = 0;                     // SO_RCVBUF in bytes; 0 leaves the system's
   std::chrono::milliseconds deadline{10000};  // of each step
+  bool repeat = false;                        // see RepeatingPeer
 };
 
 // Threads: the test's thread makes it and asks it; it plays on a thread of its own.
@@ -67,6 +69,7 @@ class ScriptedPeer {
  private:
   void Listen();
   void Run();
+  void RepeatTheScript();
   int Accept();
   void RefuseUnexpected();
   void Play(size_t i, PeerConnection& peer);
@@ -91,6 +94,21 @@ class ScriptedPeer {
   std::vector<std::string> failures_;
   Flag running_;
   std::thread thread_;
+};
+
+// Plays one script for each of any number of connections. For the tests in which calls fail: a
+// client may break off at any step, and no step or missing connection fails the test.
+class RepeatingPeer : public ScriptedPeer {
+ public:
+  explicit RepeatingPeer(Script script) : ScriptedPeer({std::move(script)}, Options()) {}
+
+ private:
+  static PeerOptions Options() {
+    PeerOptions options;
+    options.backlog = 64;
+    options.repeat = true;
+    return options;
+  }
 };
 
 #endif  // TARNWICK_TESTS_SUPPORT_SCRIPTED_PEER_H_

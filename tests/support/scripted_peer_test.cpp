@@ -155,6 +155,16 @@ TEST(ScriptedPeer, FailsTheTestWhenAConnectionComesThatHasNoScript) {
       "there is no script");
 }
 
+TEST(RepeatingPeer, ServesAnyNumberOfClientsOfWhichSomeBreakOff) {
+  RepeatingPeer peer({ExpectUntil("\n"), Send("pong\n"), Close()});
+  for (int i = 0; i < 3; ++i) {
+    const Client client(peer.Port());
+    client.Write("ping\n");
+    EXPECT_EQ(client.ReadToEnd(), "pong\n");
+    Client(peer.Port()).Write("pi");
+  }
+}
+
 TEST(Ports, AClosedPortRefuses) {
   ClosedPort port;
   Client client(port.Port());

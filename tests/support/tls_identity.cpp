@@ -4,66 +4,75 @@
 #include <openssl/ec.h>
 #include <openssl/evp.h>
 #include <openssl/pem.h>
-#include <openssl/x509v3.h>
 
+#include <atomic>
 #include <cstdio>
 
-namespace {
+EVP_PKEY* NewEcKey() {
+  return EVP_EC_gen("P-256");
+}
 
-constexpr long kDay = 24L * 60 * 60;
+Certificate::Certificate(const CertificateOptions& options, const Certificate* issuer)
+    : key_(options.new_key()), certificate_(X509_new()) {
+  static std::atomic<long> serial{0};
+  X509* const certificate = certificate_.get();
+  X509_set_version(certificate, options.version);
+  ASN1_INTEGER_set(X509_get_serialNumber(certificate), ++serial);
+  X509_gmtime_adj(X509_getm_notBefore(certificate), options.from);
+  X509_gmtime_adj(X509_getm_notAfter(certificate), options.to);
+  X509_NAME_add_entry_by_txt(X509_get_subject_name(certificate), "CN", MBSTRING_ASC,
+                             reinterpret_cast<const unsigned char*>(options.common_name.data()),
+                             static_cast<int>(options.common_name.size()), -1, 0);
+  X509_set_pubkey(certificate, key_.get());
+  if (options.authority) AddExtension(NID_basic_constraints, "critical,CA:TRUE");
+  if (!options.hosts.empty()) AddExtension(NID_subject_alt_name, options.hosts);
+  const Certificate& signer = issuer != nullptr ? *issuer : *this;
+  X509_set_issuer_name(certificate, X509_get_subject_name(signer.certificate_.get()));
+  if (X509_sign(certificate, signer.key_.get(), options.digest()) == 0) {
+    ADD_FAILURE() << "no certificate";
+  }
+}
 
-void AddExtension(X509* certificate, X509* issuer, int kind, const char* value) {
-  X509V3_CTX context;
-  X509V3_set_ctx(&context, issuer, certificate, nullptr, nullptr, 0);
-  X509_EXTENSION* extension = X509V3_EXT_conf_nid(nullptr, &context, kind, value);
-  X509_add_ext(certificate, extension, -1);
+void Certificate::AddExtension(int kind, const std::string& value) {
+  X509_EXTENSION* extension = X509V3_EXT_conf_nid(nullptr, nullptr, kind, value.c_str());
+  X509_add_ext(certificate_.get(), extension, -1);
   X509_EXTENSION_free(extension);
 }
 
-X509* NewCertificate(EVP_PKEY* key, const char* name, long serial, bool expired) {
-  X509* certificate = X509_new();
-  X509_set_version(certificate, X509_VERSION_3);
-  ASN1_INTEGER_set(X509_get_serialNumber(certificate), serial);
-  X509_gmtime_adj(X509_getm_notBefore(certificate), -10 * kDay);
-  X509_gmtime_adj(X509_getm_notAfter(certificate), expired ? -kDay : kDay);
-  X509_NAME_add_entry_by_txt(X509_get_subject_name(certificate), "CN", MBSTRING_ASC,
-                             reinterpret_cast<const unsigned char*>(name), -1, -1, 0);
-  X509_set_pubkey(certificate, key);
-  return certificate;
+void Certificate::UseIn(SSL_CTX* context) const {
+  EXPECT_EQ(SSL_CTX_use_certificate(context, certificate_.get()), 1);
+  EXPECT_EQ(SSL_CTX_use_PrivateKey(context, key_.get()), 1);
 }
 
-void WriteCertificate(const std::string& path, X509* certificate) {
+void Certificate::Write(const std::string& path) const {
   FILE* file = fopen(path.c_str(), "we");
-  PEM_write_X509(file, certificate);
+  PEM_write_X509(file, certificate_.get());
   fclose(file);
 }
 
-}  // namespace
-
-TlsIdentity::TlsIdentity(const TlsOptions& options)
-    : ca_file_(folder_.File("ca.pem")), options_(options), key_(EVP_EC_gen("P-256")) {
-  EVP_PKEY* ca_key = EVP_EC_gen("P-256");
-  X509* ca = NewCertificate(ca_key, options.authority, 1, false);
-  X509_set_issuer_name(ca, X509_get_subject_name(ca));
-  AddExtension(ca, ca, NID_basic_constraints, "critical,CA:TRUE");
-  X509_sign(ca, ca_key, EVP_sha256());
-  WriteCertificate(ca_file_, ca);
-
-  certificate_ = NewCertificate(key_, "Test server", 2, options.expired);
-  X509_set_issuer_name(certificate_, X509_get_subject_name(ca));
-  AddExtension(certificate_, ca, NID_subject_alt_name,
-               options.wrong_host ? "DNS:elsewhere.invalid" : "IP:127.0.0.1,DNS:localhost");
-  if (X509_sign(certificate_, ca_key, EVP_sha256()) == 0) ADD_FAILURE() << "no certificate";
-  X509_free(ca);
-  EVP_PKEY_free(ca_key);
+void Certificate::WriteWithKey(const std::string& path) const {
+  FILE* file = fopen(path.c_str(), "we");
+  PEM_write_PrivateKey(file, key_.get(), nullptr, nullptr, 0, nullptr, nullptr);
+  PEM_write_X509(file, certificate_.get());
+  fclose(file);
 }
 
-TlsIdentity::~TlsIdentity() {
-  X509_free(certificate_);
-  EVP_PKEY_free(key_);
+CertificateOptions AuthorityOptions(const std::string& name) {
+  CertificateOptions options;
+  options.common_name = name;
+  options.hosts = "";
+  options.authority = true;
+  return options;
 }
 
 namespace {
+
+CertificateOptions ServerOptions(const TlsOptions& tls) {
+  CertificateOptions options;
+  if (tls.expired) options.to = -kDay;
+  if (tls.wrong_host) options.hosts = "DNS:elsewhere.invalid";
+  return options;
+}
 
 int TakeHttp2(SSL*, const unsigned char** taken, unsigned char* length,
               const unsigned char* offered, unsigned int size, void*) {
@@ -77,12 +86,19 @@ int TakeHttp2(SSL*, const unsigned char** taken, unsigned char* length,
 
 }  // namespace
 
+TlsIdentity::TlsIdentity(const TlsOptions& options)
+    : ca_file_(directory_.File("ca.pem")),
+      options_(options),
+      authority_(AuthorityOptions(options.authority)),
+      certificate_(ServerOptions(options), options.self_signed ? nullptr : &authority_) {
+  authority_.Write(ca_file_);
+}
+
 SSL_CTX* TlsIdentity::NewServerContext() const {
   SSL_CTX* context = SSL_CTX_new(TLS_server_method());
   // 20,480 sessions would be kept, which nobody resumes.
   if (context != nullptr) SSL_CTX_set_session_cache_mode(context, SSL_SESS_CACHE_OFF);
-  SSL_CTX_use_certificate(context, certificate_);
-  SSL_CTX_use_PrivateKey(context, key_);
+  certificate_.UseIn(context);
   if (options_.max_version != 0) SSL_CTX_set_max_proto_version(context, options_.max_version);
   if (options_.client_certificate) {
     SSL_CTX_set_verify(context, SSL_VERIFY_PEER | SSL_VERIFY_FAIL_IF_NO_PEER_CERT, nullptr);

@@ -9,9 +9,9 @@ import subprocess
 
 import pytest
 
-from conftest import HANG, LOG_FOLDER, ROOT, SETTINGS_FOLDER, TOOLS
+from conftest import HANG, LOG_DIRECTORY, ROOT, SETTINGS_DIRECTORY, TOOLS
 
-SETTINGS = SETTINGS_FOLDER / "settings.conf"
+SETTINGS = SETTINGS_DIRECTORY / "settings.conf"
 
 
 # Versions
@@ -102,7 +102,7 @@ def test_a_span_is_told_by_its_two_largest_units(start, record, typed, told):
     ],
 )
 def test_a_size_has_the_unit_that_fits(ctl, size, told):
-    with open(LOG_FOLDER / "tarnwick.log", "wb") as log:
+    with open(LOG_DIRECTORY / "tarnwick.log", "wb") as log:
         log.truncate(size)
     findings = map(json.loads, ctl("doctor", "--json").stdout.splitlines())
     assert [f["text"] for f in findings if f["check"] == "file"][0].endswith(f", {told}")

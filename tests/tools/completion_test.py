@@ -1,6 +1,7 @@
 """The completion scripts of the tools, in the shells themselves."""
 
 import os
+import shlex
 import shutil
 import subprocess
 
@@ -8,6 +9,8 @@ import pexpect
 import pytest
 
 from conftest import HANG
+
+pytestmark = pytest.mark.native
 
 CATEGORIES = 74
 LEVELS = ["alarm", "error", "warn", "notice", "info", "debug", "debug2", "debug3"]
@@ -41,14 +44,25 @@ CASES = {
 
 @pytest.fixture(scope="session")
 def scripts(run, tmp_path_factory):
-    """The folder of the scripts, each under the name by which its shell finds it."""
-    folder = tmp_path_factory.mktemp("completion")
+    """The directory of the scripts, each under the name by which its shell finds it."""
+    directory = tmp_path_factory.mktemp("completion")
     for shell, name in (("bash", "twlogctl"), ("zsh", "_twlogctl"), ("fish", "twlogctl.fish")):
         result = run("twlogctl", "--completion", shell)
         assert result.returncode == 0
-        (folder / shell).mkdir()
-        (folder / shell / name).write_text(result.stdout)
-    return folder
+        (directory / shell).mkdir()
+        (directory / shell / name).write_text(result.stdout)
+    return directory
+
+
+@pytest.fixture(autouse=True)
+def tool_on_path(command, tmp_path, monkeypatch):
+    """The scripts ask the tool that PATH leads to."""
+    directory = tmp_path / "bin"
+    directory.mkdir()
+    program = directory / "twlogctl"
+    program.write_text(f'#!/bin/sh\nexec {shlex.join(command("twlogctl"))} "$@"\n')
+    program.chmod(0o755)
+    monkeypatch.setenv("PATH", f"{directory}:{os.environ['PATH']}")
 
 
 def need(shell):
@@ -69,8 +83,8 @@ source "$1"
 COMP_LINE=$2 COMP_POINT=${#2}
 _twlogctl
 whole=${2##* }
-for reply in "${COMPREPLY[@]}"; do
-  printf '%s\\n' "${whole%"${whole##*[=:]}"}$reply"
+for candidate in "${COMPREPLY[@]}"; do
+  printf '%s\\n' "${whole%"${whole##*[=:]}"}$candidate"
 done
 """
 

@@ -1,9 +1,11 @@
 """What the tools' tests share. They run inside scripts/sandbox, where the record of levels, the log
-folder and the settings file belong to the run:
+directory and the settings file belong to the run:
 
     scripts/sandbox python3 -m pytest tests/tools -q
 
-TARNWICK_TOOLS_DIR is the build's folder of tools, build/debug/tools when it is unset.
+With pytest-xdist, each worker has a sandbox and process numbers of its own (run_tools in ./dev).
+
+TARNWICK_TOOLS_DIR is the build's directory of tools, build/debug/tools when it is unset.
 TARNWICK_TEST_EMULATOR is a command that runs a tool of another architecture ("qemu-arm -L root").
 """
 
@@ -21,8 +23,8 @@ import shared_record
 
 ROOT = pathlib.Path(__file__).resolve().parents[2]
 TOOLS = ("twlogctl", "twhttp", "twcamsim")
-LOG_FOLDER = pathlib.Path("/var/log/tarnwick")
-SETTINGS_FOLDER = pathlib.Path("/var/packages/Tarnwick/etc")
+LOG_DIRECTORY = pathlib.Path("/var/log/tarnwick")
+SETTINGS_DIRECTORY = pathlib.Path("/var/packages/Tarnwick/etc")
 RECORD_KEY = "0x18180004"
 
 # A guard against a hang; no test waits for it to pass.
@@ -39,6 +41,10 @@ def end_by_signals_again():
 
 def pytest_sessionstart(session):
     end_by_signals_again()
+    if session.config.getoption("dist", "no") != "no":  # this process hands the tests to workers
+        if os.environ.get("TARNWICK_SANDBOX"):
+            pytest.exit("workers need a sandbox each: see run_tools in ./dev", returncode=3)
+        return
     if not os.environ.get("TARNWICK_SANDBOX"):
         pytest.exit("these tests write system paths: run them in scripts/sandbox", returncode=3)
     provide_terminals()
@@ -66,8 +72,8 @@ def plain_environment():
 def tools():
     """The path of each built tool."""
     named = os.environ.get("TARNWICK_TOOLS_DIR", ROOT / "build/debug/tools")
-    folder = pathlib.Path(named).resolve()
-    return {name: str(folder / name / name) for name in TOOLS}
+    directory = pathlib.Path(named).resolve()
+    return {name: str(directory / name / name) for name in TOOLS}
 
 
 @pytest.fixture(scope="session")
@@ -168,9 +174,9 @@ def remove_record():
     subprocess.run(["ipcrm", "-M", RECORD_KEY], stderr=subprocess.DEVNULL, check=False)
 
 
-def empty(folder):
-    folder.chmod(0o755)
-    for entry in folder.iterdir():
+def empty(directory):
+    directory.chmod(0o755)
+    for entry in directory.iterdir():
         if entry.is_dir() and not entry.is_symlink():
             shutil.rmtree(entry)
         else:
@@ -183,8 +189,8 @@ def clean_product():
 
     def clean():
         remove_record()
-        empty(LOG_FOLDER)
-        empty(SETTINGS_FOLDER)
+        empty(LOG_DIRECTORY)
+        empty(SETTINGS_DIRECTORY)
 
     clean()
     yield
@@ -192,7 +198,7 @@ def clean_product():
 
 
 def wait_until(condition, what):
-    """Waits until `condition` gives something true, which it returns."""
+    """Waits until `condition` returns something true, which it returns."""
     deadline = time.monotonic() + HANG
     while time.monotonic() < deadline:
         found = condition()

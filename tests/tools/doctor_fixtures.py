@@ -7,24 +7,24 @@ import subprocess
 
 import pytest
 
-from conftest import HANG, LOG_FOLDER, SETTINGS_FOLDER
+from conftest import HANG, LOG_DIRECTORY, SETTINGS_DIRECTORY
 
-SETTINGS = SETTINGS_FOLDER / "settings.conf"
-LOG = LOG_FOLDER / "tarnwick.log"
-NOTIFICATIONS = LOG_FOLDER / "twnotification.log"
+SETTINGS = SETTINGS_DIRECTORY / "settings.conf"
+LOG = LOG_DIRECTORY / "tarnwick.log"
+NOTIFICATIONS = LOG_DIRECTORY / "twnotification.log"
 ROTATION = pathlib.Path("/etc/logrotate.d")
 
 AS_NOBODY = ["setpriv", "--reuid=65534", "--regid=65534", "--clear-groups"]
 
 
 @contextlib.contextmanager
-def mounted(folder, *options):
-    """An empty file system over a folder, for a while."""
-    subprocess.run(["mount", "-t", "tmpfs", *options, "tmpfs", folder], check=True)
+def mounted(directory, *options):
+    """An empty file system over a directory, for a while."""
+    subprocess.run(["mount", "-t", "tmpfs", *options, "tmpfs", directory], check=True)
     try:
         yield
     finally:
-        subprocess.run(["umount", folder], check=True)
+        subprocess.run(["umount", directory], check=True)
 
 
 @pytest.fixture
@@ -42,7 +42,7 @@ def healthy(run, rotation):
     assert run("twlogctl", "create").returncode == 0
     assert run("twlogctl", "save").returncode == 0
     (rotation / "product").write_text("/var/log/tarnwick/*.log {\n  weekly\n}\n")
-    LOG_FOLDER.chmod(0o750)
+    LOG_DIRECTORY.chmod(0o750)
     LOG.touch()
 
 
@@ -118,7 +118,7 @@ time.sleep(1000)
 
 @pytest.fixture
 def library():
-    # The sandbox's scratch space: other users do not reach pytest's temporary folders.
+    # The sandbox's scratch space: other users do not reach pytest's temporary directories.
     path = pathlib.Path("/mnt/libtarnwick.so.1")
     path.write_bytes(b"\x7fELF" + b"x" * 4096)
     yield path
@@ -129,5 +129,5 @@ def library():
 def as_nobody(library):
     """The words in front of a command that another user runs."""
     if subprocess.run([*AS_NOBODY, "test", "-r", library], check=False).returncode != 0:
-        pytest.skip("there is no other user here, or the folder is out of that user's reach")
+        pytest.skip("there is no other user here, or the directory is out of that user's reach")
     return AS_NOBODY

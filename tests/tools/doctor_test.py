@@ -1,4 +1,4 @@
-"""twlogctl doctor: it finds what stops logging, names the culprit and gives one fix each."""
+"""twlogctl doctor: it finds what stops logging, names the culprit and one fix each."""
 
 import fcntl
 import os
@@ -11,7 +11,7 @@ import time
 import pytest
 
 import shared_record
-from conftest import HANG, LOG_FOLDER, wait_until
+from conftest import HANG, LOG_DIRECTORY, wait_until
 from doctor_fixtures import (
     AS_NOBODY,
     HAVE_LIBRARY,
@@ -40,7 +40,7 @@ def test_a_healthy_machine_has_no_findings(run, healthy):
 
 
 def test_each_finding_has_one_fix_below_it(run, rotation):
-    LOG_FOLDER.chmod(0o750)
+    LOG_DIRECTORY.chmod(0o750)
     result = run("twlogctl", "doctor")
     assert result.returncode == 1
     assert re.search(r"^wrong  record    there is no record", result.stdout, re.MULTILINE)
@@ -58,30 +58,30 @@ def test_findings_are_coloured_on_a_terminal_alone(spawn, rotation):
     assert "\x1b" not in spawn("twlogctl", "doctor", env={"NO_COLOR": "1"}).read()
 
 
-# The folder and its disk
+# The directory and its disk
 
 
-def test_a_missing_log_folder(doctor, healthy):
-    with mounted(LOG_FOLDER.parent):
+def test_a_missing_log_directory(doctor, healthy):
+    with mounted(LOG_DIRECTORY.parent):
         finding = only(doctor(), "folder")
-    assert finding["text"] == f"{LOG_FOLDER}: No such file or directory"
-    assert finding["fix"] == f"install -d -m 0750 {LOG_FOLDER}"
+    assert finding["text"] == f"{LOG_DIRECTORY}: No such file or directory"
+    assert finding["fix"] == f"install -d -m 0750 {LOG_DIRECTORY}"
 
 
-def test_the_fix_for_the_missing_folder_is_one(doctor, healthy):
-    with mounted(LOG_FOLDER.parent):
+def test_the_fix_for_the_missing_directory_is_one(doctor, healthy):
+    with mounted(LOG_DIRECTORY.parent):
         subprocess.run(doctor()["folder"][0]["fix"], shell=True, check=True)
         assert doctor() == {}
 
 
-def test_a_file_in_the_place_of_the_log_folder(doctor, healthy):
-    with mounted(LOG_FOLDER.parent):
-        LOG_FOLDER.touch()
-        assert only(doctor(), "folder")["text"] == f"{LOG_FOLDER} is no folder"
+def test_a_file_in_the_place_of_the_log_directory(doctor, healthy):
+    with mounted(LOG_DIRECTORY.parent):
+        LOG_DIRECTORY.touch()
+        assert only(doctor(), "folder")["text"] == f"{LOG_DIRECTORY} is no directory"
 
 
-def test_a_log_folder_that_its_owner_may_not_write(doctor, healthy):
-    LOG_FOLDER.chmod(0o550)
+def test_a_log_directory_that_its_owner_may_not_write(doctor, healthy):
+    LOG_DIRECTORY.chmod(0o550)
     finding = only(doctor(), "folder")
     assert "mode 0550" in finding["text"]
     subprocess.run(finding["fix"], shell=True, check=True)
@@ -89,17 +89,17 @@ def test_a_log_folder_that_its_owner_may_not_write(doctor, healthy):
 
 
 def test_a_disk_that_is_almost_full(doctor, healthy):
-    with mounted(LOG_FOLDER, "-o", "size=512k,mode=0750"):
+    with mounted(LOG_DIRECTORY, "-o", "size=512k,mode=0750"):
         assert "only 512.0 KiB left" in only(doctor(), "space")["text"]
 
 
 def test_a_disk_without_inodes(doctor, healthy):
-    with mounted(LOG_FOLDER, "-o", "size=16m,nr_inodes=8,mode=0750"):
+    with mounted(LOG_DIRECTORY, "-o", "size=16m,nr_inodes=8,mode=0750"):
         assert re.search("only [0-9]+ more files fit", only(doctor(), "space")["text"])
 
 
 def test_a_disk_that_is_mounted_read_only(doctor, healthy):
-    with mounted(LOG_FOLDER, "-o", "ro,mode=0750"):
+    with mounted(LOG_DIRECTORY, "-o", "ro,mode=0750"):
         assert "mounted read-only" in only(doctor(), "space")["text"]
 
 
@@ -117,15 +117,15 @@ def test_something_else_in_the_place_of_a_log(doctor, healthy, path):
 
 def test_a_link_that_leads_nowhere(doctor, healthy):
     LOG.unlink()
-    LOG.symlink_to("/no/such/folder/log")
+    LOG.symlink_to("/no/such/directory/log")
     assert only(doctor(), "file")["text"] == f"{LOG} is a link that leads nowhere"
 
 
 def test_a_log_that_may_not_be_written(command, healthy):
-    LOG_FOLDER.chmod(0o755)
+    LOG_DIRECTORY.chmod(0o755)
     words = [*AS_NOBODY, *command("twlogctl", "doctor")]
     result = subprocess.run(words, capture_output=True, text=True, timeout=HANG, check=False)
-    if f"{LOG_FOLDER} lets other users open the logs" not in result.stdout:
+    if f"{LOG_DIRECTORY} lets other users open the logs" not in result.stdout:
         pytest.skip("there is no other user here, or the tool is out of that user's reach")
     assert result.returncode == 1
     assert f"{LOG} cannot be written: Permission denied; root:root, mode 0644" in result.stdout
@@ -295,7 +295,7 @@ def test_broken_settings_are_told_with_their_position(doctor, healthy):
     assert finding["text"].startswith(f"{SETTINGS}:1:25: ")
 
 
-def test_a_folder_in_the_place_of_the_settings(doctor, healthy):
+def test_a_directory_in_the_place_of_the_settings(doctor, healthy):
     SETTINGS.unlink()
     SETTINGS.mkdir()
     finding = only(doctor(), "settings")

@@ -10,7 +10,7 @@ import subprocess
 import pytest
 
 import shared_record
-from conftest import HANG, LOG_FOLDER, SETTINGS_FOLDER
+from conftest import HANG, LOG_DIRECTORY, SETTINGS_DIRECTORY
 from doctor_fixtures import (
     HAVE_LIBRARY,
     LOG,
@@ -25,6 +25,8 @@ from doctor_fixtures import (
     other_process,
     rotation,
 )
+
+pytestmark = pytest.mark.native
 
 NOBODY = 65534
 
@@ -54,7 +56,7 @@ def new_record(uid=0, mode=0o660):
     """A record that another user made."""
     subprocess.run(["ipcrm", "-M", hex(shared_record.KEY)], check=False, capture_output=True)
     words = ["setpriv", f"--reuid={uid}", f"--regid={uid}", "--clear-groups"] if uid else []
-    # The module is handed over, because other users may not read the tests' folder.
+    # The module is handed over, because other users may not read the tests' directory.
     text = pathlib.Path(shared_record.__file__).read_text()
     code = f"{text}\nmake(mode={mode})"
     made = subprocess.run([*words, "/usr/bin/python3", "-c", code], check=False)
@@ -156,34 +158,34 @@ def test_a_daemon_that_may_not_attach_is_not_to_be_started_again(
 
 
 @pytest.mark.parametrize("mode", [0o777, 0o1777, 0o755, 0o751, 0o757])
-def test_a_folder_open_to_other_users_is_wrong_and_the_fix_closes_it(doctor, healthy, mode):
-    LOG_FOLDER.chmod(mode)
+def test_a_directory_open_to_other_users_is_wrong_and_the_fix_closes_it(doctor, healthy, mode):
+    LOG_DIRECTORY.chmod(mode)
     finding = only(doctor(), "folder")
     assert f"mode {mode:04o}" in finding["text"]
     subprocess.run(finding["fix"], shell=True, check=True)
     assert doctor() == {}
-    assert LOG_FOLDER.stat().st_mode & 0o007 == 0
+    assert LOG_DIRECTORY.stat().st_mode & 0o007 == 0
 
 
-def test_a_folder_of_another_user_is_wrong_and_the_fix_takes_it_back(doctor, healthy):
-    os.chown(LOG_FOLDER, NOBODY, NOBODY)
+def test_a_directory_of_another_user_is_wrong_and_the_fix_takes_it_back(doctor, healthy):
+    os.chown(LOG_DIRECTORY, NOBODY, NOBODY)
     finding = only(doctor(), "folder")
     assert "nobody can put a link or another file in the place of each file" in finding["text"]
     subprocess.run(finding["fix"], shell=True, check=True)
     assert doctor() == {}
 
 
-def test_a_folder_that_a_group_may_write_is_worth_a_note(run, healthy):
-    os.chown(LOG_FOLDER, 0, NOBODY)
-    LOG_FOLDER.chmod(0o2770)
+def test_a_directory_that_a_group_may_write_is_worth_a_note(run, healthy):
+    os.chown(LOG_DIRECTORY, 0, NOBODY)
+    LOG_DIRECTORY.chmod(0o2770)
     result = run("twlogctl", "doctor")
     assert result.returncode == 0
     assert "note   folder    /var/log/tarnwick, root:nogroup, mode 2770: each user" in result.stdout
 
 
-def test_the_log_of_a_user_of_the_folders_group_is_right(doctor, healthy):
-    os.chown(LOG_FOLDER, 0, NOBODY)
-    LOG_FOLDER.chmod(0o2770)
+def test_the_log_of_a_user_of_the_directories_group_is_right(doctor, healthy):
+    os.chown(LOG_DIRECTORY, 0, NOBODY)
+    LOG_DIRECTORY.chmod(0o2770)
     os.chown(LOG, NOBODY, NOBODY)
     assert doctor() == {}
 
@@ -250,21 +252,21 @@ def test_settings_of_another_user(doctor, healthy):
     assert doctor() == {}
 
 
-def test_a_settings_folder_that_anybody_may_write(doctor, healthy):
-    SETTINGS_FOLDER.chmod(0o777)
+def test_a_settings_directory_that_anybody_may_write(doctor, healthy):
+    SETTINGS_DIRECTORY.chmod(0o777)
     finding = only(doctor(), "settings")
-    assert f"{SETTINGS_FOLDER}: anybody can put a link" in finding["text"]
+    assert f"{SETTINGS_DIRECTORY}: anybody can put a link" in finding["text"]
     subprocess.run(finding["fix"], shell=True, check=True)
     assert doctor() == {}
 
 
-def test_the_folder_may_be_a_link_of_roots(doctor, healthy, tmp_path):
-    with mounted(LOG_FOLDER.parent, "-o", "mode=0755"):
+def test_the_directory_may_be_a_link_of_roots(doctor, healthy, tmp_path):
+    with mounted(LOG_DIRECTORY.parent, "-o", "mode=0755"):
         tmp_path.chmod(0o750)
-        LOG_FOLDER.symlink_to(tmp_path)
+        LOG_DIRECTORY.symlink_to(tmp_path)
         assert doctor() == {}
-        os.chown(LOG_FOLDER, NOBODY, NOBODY, follow_symlinks=False)
-        assert f"{LOG_FOLDER} is a link that leads to " in only(doctor(), "folder")["text"]
+        os.chown(LOG_DIRECTORY, NOBODY, NOBODY, follow_symlinks=False)
+        assert f"{LOG_DIRECTORY} is a link that leads to " in only(doctor(), "folder")["text"]
 
 
 # The record

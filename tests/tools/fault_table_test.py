@@ -1,6 +1,6 @@
 #!/usr/bin/python3
-"""twhttp against each profile, style of login and fault of twcamsim: what it says names the true
-cause. Run as a program, it prints the table with what twhttp said, in Markdown:
+"""twhttp against each profile, style of authentication and fault of twcamsim: what it says names the
+true cause. Run as a program, it prints the table with what twhttp said, in Markdown:
 
     scripts/sandbox python3 tests/tools/fault_table_test.py
 """
@@ -11,6 +11,8 @@ import subprocess
 import sys
 
 import pytest
+
+pytestmark = pytest.mark.native
 
 LOGIN = "operator:gate-7@"
 TRUSTED = pathlib.Path("/etc/ssl/certs/ca-certificates.crt")
@@ -29,7 +31,7 @@ UNKNOWN = ("soap", "--direct", "--timeout", "1", "-d", "<a/>")
 XML = ("xml-get", "--timeout", "1")
 PUT = ("xml-put", "-d", "<preset/>")
 
-# Where each profile's answers are.
+# Where each profile's resources are.
 PATHS = {"json": "info.json", "store": "presets/7", "soap": "ptz", "upload": "clip"}
 
 # (profile with its options, the words of twhttp, the class, a phrase of standard error)
@@ -60,7 +62,7 @@ LOGINS = [
     ("digest-opaque", "done", ""),
     ("digest-algorithm", "done", ""),
     ("digest-algorithm-quoted", "done", ""),
-    ("digest-md5-sess", "login-refused", "MD5-sess, which the library answers as plain MD5"),
+    ("digest-md5-sess", "login-refused", "MD5-sess, which the library computes as plain MD5"),
     ("digest-odd-order", "done", ""),
     ("digest-unquoted", "done", ""),
     ("digest-stale", "login-refused", "calls the nonce stale"),
@@ -114,14 +116,14 @@ FAULTS = [
     ("slow", "cgi", GET, "done", ""),
     ("stall-after-request", "cgi", GET, "read-timeout", "0 bytes came, then nothing"),
     ("length-too-long", "cgi", GET, "cut-body", "49 bytes were announced and 39 came"),
-    ("length-too-short", "cgi", GET, "done", "5 bytes came behind the announced end"),
-    ("length-too-short", "cgi", CURL, "done", "5 bytes came behind the announced end"),
+    ("length-too-short", "cgi", GET, "done", "5 bytes came after the announced end"),
+    ("length-too-short", "cgi", CURL, "done", "5 bytes came after the announced end"),
     ("length-missing", "cgi", GET, "done", ""),
     ("length-missing", "soap", SOAP, "no-length", "Content-Length"),
     ("length-double", "cgi", GET, "cut-body", "more than one Content-Length"),
     ("length-negative", "cgi", GET, "done", "Content-Length: -1 is no length"),
     ("length-negative", "cgi", CURL, "malformed-head", "Invalid Content-Length"),
-    ("length-zero", "cgi", GET, "done", "39 bytes came behind the announced end"),
+    ("length-zero", "cgi", GET, "done", "39 bytes came after the announced end"),
     ("length-huge", "cgi", GET, "cut-body", "were announced and 39 came"),
     ("length-text", "cgi", GET, "done", "is no length"),
     ("length-empty", "cgi", GET, "done", "an empty Content-Length line"),
@@ -131,7 +133,7 @@ FAULTS = [
     ("chunk-negative", "cgi", GET, "cut-body", "in place of a chunk's size"),
     ("chunk-too-long", "cgi", GET, "cut-body", "of a chunk did not come"),
     ("chunk-upper-case", "cgi", GET, "done", ""),
-    ("chunk-no-line-end", "cgi", GET, "cut-body", "of the line end behind it"),
+    ("chunk-no-line-end", "cgi", GET, "cut-body", "of the CRLF after it"),
     ("chunk-no-last", "cgi", GET, "cut-body", "the last chunk did not come"),
     ("chunk-extension", "cgi", GET, "done", ""),
     ("chunk-trailer", "cgi", GET, "done", ""),
@@ -145,7 +147,7 @@ FAULTS = [
     ("no-code", "cgi", GET, "malformed-head", "no status of three digits"),
     ("no-reason", "cgi", GET, "done", ""),
     ("long-status", "cgi", GET, "malformed-head", "the library cuts a line at 2,047 bytes"),
-    ("informational", "cgi", GET, "malformed-head", "an interim reply"),
+    ("informational", "cgi", GET, "malformed-head", "an interim response"),
     ("informational", "cgi", CURL, "done", ""),
     ("bare-lf", "cgi", GET, "done", "end in a bare line feed"),
     ("cr-only", "cgi", GET, "malformed-head", "the peer closed in the middle of the head"),
@@ -175,17 +177,17 @@ FAULTS = [
     ("other-scheme", "cgi-digest", GET, "login-wanted", "the peer offers Bearer"),
     ("other-qop", "cgi-digest", GET, "done", ""),
     ("other-algorithm", "cgi-digest", GET, "login-refused", "1. the peer asks for SHA-256"),
-    ("forbidden", "cgi-digest", GET, "status", "the login is good and may not do that"),
+    ("forbidden", "cgi-digest", GET, "status", "the credentials are good and may not do that"),
     ("xml-bomb", "store", XML, "xml", "1. the document's entities multiply"),
     ("xml-deep", "store", XML, "xml", "1. the document is nested more deeply"),
     ("xml-broken", "store", XML, "xml", "tag mismatch"),
-    ("html-page", "json", JSON, "json", "1. the peer answered with a page for people"),
+    ("html-page", "json", JSON, "json", "1. the peer responded with a page for people"),
     ("json-bomb", "json", JSON, "json", "1. it is nested more deeply than is allowed"),
     ("json-broken", "json", JSON, "json", "Line 1"),
     ("success-false", "json", JSON, "not-success", '"success" is false'),
     ("success-missing", "json", JSON, "not-success", 'the member "success" is missing'),
     ("success-text", "json", JSON, "not-success", '"success" is "yes"'),
-    ("json-array", "json", JSON, "not-success", "the reply is no object"),
+    ("json-array", "json", JSON, "not-success", "the response is no object"),
     ("wrong-charset", "json", JSON, "done", ""),
     ("empty-body", "json", JSON, "empty-body", "has no body"),
     ("zero-bytes", "json", JSON, "done", ""),
@@ -193,7 +195,7 @@ FAULTS = [
     ("wrong-type", "json", JSON, "done", ""),
     ("false-gzip", "json", JSON, "done", "Content-Encoding: gzip: the library decodes none"),
     ("big-body", "cgi", GET, "done", ""),
-    ("extra-bytes", "json", JSON, "done", "bytes came behind the announced end"),
+    ("extra-bytes", "json", JSON, "done", "bytes came after the announced end"),
 ]
 
 
@@ -271,7 +273,7 @@ def test_the_explanation_names_the_cause(run, camera, codes, number):
     assert phrase in result.stderr
 
 
-def test_each_fault_and_each_login_of_the_camera_has_its_row(run):
+def test_each_fault_and_each_style_of_authentication_has_its_row(run):
     for option, rows in (("faults", FAULTS), ("logins", LOGINS)):
         listed = run("twcamsim", f"--list-{option}", "--json").stdout.splitlines()
         names = {json.loads(line)["name"] for line in listed} - {"none"}
@@ -293,10 +295,10 @@ def print_table():
     from conftest import ROOT, plain_environment
     import os
 
-    folder = pathlib.Path(os.environ.get("TARNWICK_TOOLS_DIR", ROOT / "build/debug/tools"))
+    directory = pathlib.Path(os.environ.get("TARNWICK_TOOLS_DIR", ROOT / "build/debug/tools"))
 
     def command(tool, *words):
-        return [str(folder / tool / tool), *map(str, words)]
+        return [str(directory / tool / tool), *map(str, words)]
 
     each = Camera(command)
     trust(each.authority)

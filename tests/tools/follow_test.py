@@ -13,7 +13,7 @@ import time
 
 import pytest
 
-from conftest import HANG, LOG_FOLDER, plain_environment, wait_until
+from conftest import HANG, LOG_DIRECTORY, plain_environment, wait_until
 from log_help import LOG, Output, line, processor_seconds, run_plain, without_privileges
 
 WRITERS = 4
@@ -104,7 +104,7 @@ def wait_for_file(output):
 
 
 def rename(output, number):
-    LOG.rename(LOG_FOLDER / f"tarnwick.log.{number}")
+    LOG.rename(LOG_DIRECTORY / f"tarnwick.log.{number}")
 
 
 def remove(output, number):
@@ -173,7 +173,7 @@ def test_lines_reach_the_old_file_after_its_removal(follow):
 def test_a_file_that_comes_back_under_its_name_is_read_on(follow):
     append(line("first") + line("second"))
     output = follow("-n", "10")
-    aside = LOG_FOLDER / "aside"
+    aside = LOG_DIRECTORY / "aside"
     LOG.rename(aside)
     append(line("another file"))
     output.wait_for("another file")
@@ -187,7 +187,7 @@ def test_an_incomplete_line_waits_for_its_end(follow):
     output = follow("-n", "1")
     whole = line("in two parts")
     append(whole[:30])
-    append_later = LOG_FOLDER / "twnotification.log"
+    append_later = LOG_DIRECTORY / "twnotification.log"
     append(line("x"), append_later)  # events of other files are no reason to show it
     time.sleep(0.5)
     assert len(output.lines) == 1
@@ -206,16 +206,16 @@ def test_a_log_that_is_missing_is_waited_for(start):
     output.end()
 
 
-def test_a_folder_that_is_removed_and_made_again_is_followed(start, tmp_path):
-    folder = tmp_path / "logs"
-    folder.mkdir()
-    log = folder / "copy.log"
+def test_a_directory_that_is_removed_and_made_again_is_followed(start, tmp_path):
+    directory = tmp_path / "logs"
+    directory.mkdir()
+    log = directory / "copy.log"
     append(line("old"), log)
     output = Output(start("twlogctl", "follow", "--file", log))
     output.wait_for("old")
     log.unlink()
-    folder.rmdir()
-    folder.mkdir()
+    directory.rmdir()
+    directory.mkdir()
     append(line("new"), log)
     output.wait_for("new")
     output.end()
@@ -271,7 +271,7 @@ def test_messages_are_chosen_as_show_chooses_them(follow):
 
 
 def test_the_notification_log_can_be_followed(follow, run):
-    path = LOG_FOLDER / "twnotification.log"
+    path = LOG_DIRECTORY / "twnotification.log"
     output = follow("--notification", log=path)
     assert run("twlogctl", "write", "--notification", "rang").returncode == 0
     output.wait_for("rang")
@@ -343,7 +343,7 @@ def test_a_log_without_permission_is_named(command):
     assert result.stderr == f"twlogctl: {LOG}: Permission denied\n"
 
 
-def test_a_folder_is_no_log(run, tmp_path):
+def test_a_directory_is_no_log(run, tmp_path):
     result = run("twlogctl", "follow", "--file", tmp_path)
     assert (result.returncode, result.stderr) == (1, f"twlogctl: {tmp_path}: Is a directory\n")
 

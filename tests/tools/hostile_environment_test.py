@@ -7,6 +7,8 @@ import pytest
 
 from log_help import LOG, line
 
+pytestmark = pytest.mark.native
+
 ODD = ["", "x" * 5000, "../../../../etc/passwd", "/dev/zero", "\x1b[2J", "%s%n", "-1", "xterm\n"]
 NAMES = ["TERM", "TERMINFO", "TERMINFO_DIRS", "TERMCAP", "LANG", "LC_ALL", "LC_CTYPE", "HOME", "TZ"]
 NAMES += ["COLUMNS", "LINES", "TMPDIR", "NO_COLOR", "LOCPATH", "NCURSES_NO_UTF8_ACS", "ESCDELAY"]
@@ -31,7 +33,7 @@ def test_no_value_of_a_variable_ends_a_tool_by_a_signal(run, name):
         assert done.returncode == 0, (value, done.stderr)
 
 
-def test_a_folder_for_temporary_files_that_is_missing_is_named(run):
+def test_a_directory_for_temporary_files_that_is_missing_is_named(run):
     done = run("twcamsim", "-e", "json,tls", "--for", "1ms", env={"TMPDIR": "/no/such"})
     assert (done.returncode, done.stdout) == (1, "")
     assert "TMPDIR" in done.stderr
@@ -40,14 +42,14 @@ def test_a_folder_for_temporary_files_that_is_missing_is_named(run):
 
 @pytest.fixture
 def owned(tmp_path):
-    """A folder of terminal descriptions that another user wrote."""
-    folder = tmp_path / ".terminfo"
-    folder.mkdir()
+    """A directory of terminal descriptions that another user wrote."""
+    directory = tmp_path / ".terminfo"
+    directory.mkdir()
     source = tmp_path / "owned.ti"
     source.write_text(OWNED)
-    subprocess.run(["tic", "-x", "-o", folder, source], check=True, capture_output=True)
+    subprocess.run(["tic", "-x", "-o", directory, source], check=True, capture_output=True)
     tmp_path.chmod(0o755)
-    return folder
+    return directory
 
 
 @pytest.mark.parametrize("name", ["TERMINFO", "TERMINFO_DIRS", "HOME"])

@@ -9,10 +9,12 @@ import threading
 import pytest
 
 import shared_record
-from conftest import HANG, LOG_FOLDER, SETTINGS_FOLDER
+from conftest import HANG, LOG_DIRECTORY, SETTINGS_DIRECTORY
 from doctor_fixtures import LOG, NOTIFICATIONS, SETTINGS, doctor, healthy, mounted, rotation
 from log_help import line
 from planted import KINDS, MIB, NO_FILES, Planted, plant
+
+pytestmark = pytest.mark.native
 
 # A guard against a hang, so that a test that finds one ends soon.
 SOON = 30
@@ -20,7 +22,7 @@ SOON = 30
 # No tool needs as much, a sanitizer's memory included; a file of 1 GiB in memory is more.
 MOST_KIB = 800 * 1024
 
-NEW_SETTINGS = SETTINGS_FOLDER / "settings.conf.tarnwick-new"
+NEW_SETTINGS = SETTINGS_DIRECTORY / "settings.conf.tarnwick-new"
 
 
 @pytest.fixture
@@ -157,15 +159,15 @@ def test_a_directory_of_the_new_settings_name_is_told(soon, record, plant):
     assert NEW_SETTINGS.is_dir()
 
 
-# The folders
+# The directories
 
 
-FOLDER_KINDS = sorted(set(NO_FILES) - {"directory"}) + ["three MiB"]
+DIRECTORY_KINDS = sorted(set(NO_FILES) - {"directory"}) + ["three MiB"]
 
 
-@pytest.mark.parametrize("kind", FOLDER_KINDS)
-def test_a_log_folder_that_is_none_is_told(soon, record, kind):
-    with mounted(LOG_FOLDER.parent, "-o", "mode=0755"), Planted(kind, LOG_FOLDER) as planted:
+@pytest.mark.parametrize("kind", DIRECTORY_KINDS)
+def test_a_log_directory_that_is_none_is_told(soon, record, kind):
+    with mounted(LOG_DIRECTORY.parent, "-o", "mode=0755"), Planted(kind, LOG_DIRECTORY) as planted:
         assert soon("show")[0] == 1
         assert soon("write", "text")[0] == 1
         code, output, _ = soon("doctor")
@@ -173,10 +175,10 @@ def test_a_log_folder_that_is_none_is_told(soon, record, kind):
         assert planted.untouched()
 
 
-@pytest.mark.parametrize("kind", FOLDER_KINDS)
-def test_a_settings_folder_that_is_none_is_told(soon, record, kind):
-    above = SETTINGS_FOLDER.parent
-    with mounted(above, "-o", "mode=0755"), Planted(kind, SETTINGS_FOLDER) as planted:
+@pytest.mark.parametrize("kind", DIRECTORY_KINDS)
+def test_a_settings_directory_that_is_none_is_told(soon, record, kind):
+    above = SETTINGS_DIRECTORY.parent
+    with mounted(above, "-o", "mode=0755"), Planted(kind, SETTINGS_DIRECTORY) as planted:
         assert soon("load")[0] == 1
         assert soon("save")[0] == 1
         assert soon("doctor")[0] == 1

@@ -6,7 +6,9 @@ import pytest
 
 from planted import KINDS, NO_FILES, plant
 from twhttp_fixtures import peer
-from twhttp_server import reply
+from twhttp_server import response
+
+pytestmark = pytest.mark.native
 
 SOON = 30
 
@@ -28,27 +30,27 @@ RECORDED = ("001.request", "001.response", "exchanges.jsonl")
 @pytest.mark.parametrize("kind", sorted(set(KINDS) - {"directory"}))
 @pytest.mark.parametrize("name", RECORDED)
 def test_a_recording_takes_the_place_of_what_was_planted(soon, peer, plant, tmp_path, name, kind):
-    folder = tmp_path / "a"
-    folder.mkdir()
-    planted = plant(kind, folder / name)
-    assert soon("twhttp", "get", "--record", folder, peer(reply(b"x")).url()).returncode == 0
-    assert (folder / name).is_file() and not (folder / name).is_symlink()
-    assert (folder / name).stat().st_size < 4096
+    directory = tmp_path / "a"
+    directory.mkdir()
+    planted = plant(kind, directory / name)
+    assert soon("twhttp", "get", "--record", directory, peer(response(b"x")).url()).returncode == 0
+    assert (directory / name).is_file() and not (directory / name).is_symlink()
+    assert (directory / name).stat().st_size < 4096
     assert planted.untouched()
 
 
 @pytest.mark.parametrize("name", RECORDED)
 def test_a_directory_of_a_recordings_name_is_told(soon, peer, plant, tmp_path, name):
     plant("directory", tmp_path / name)
-    done = soon("twhttp", "get", "--record", tmp_path, peer(reply(b"x")).url())
+    done = soon("twhttp", "get", "--record", tmp_path, peer(response(b"x")).url())
     assert done.returncode == 3
     assert f"twhttp: {tmp_path}/{name}: File exists\n" in done.stderr
 
 
 @pytest.mark.parametrize("kind", sorted(set(KINDS) - {"directory"}))
-def test_a_folder_for_recordings_that_is_none_is_told(soon, peer, plant, tmp_path, kind):
+def test_a_directory_for_recordings_that_is_none_is_told(soon, peer, plant, tmp_path, kind):
     planted = plant(kind, tmp_path / "a")
-    done = soon("twhttp", "get", "--record", tmp_path / "a", peer(reply(b"x")).url())
+    done = soon("twhttp", "get", "--record", tmp_path / "a", peer(response(b"x")).url())
     told = "it is a link" if "link" in kind and kind != "hard link" else "Not a directory"
     assert done.returncode == 3
     assert f"twhttp: {tmp_path}/a: {told}\n" in done.stderr
@@ -56,7 +58,7 @@ def test_a_folder_for_recordings_that_is_none_is_told(soon, peer, plant, tmp_pat
 
 
 @pytest.mark.parametrize("kind", sorted(set(NO_FILES) - {"directory"}) + ["three MiB"])
-def test_a_folder_that_is_none_is_not_played_back(soon, plant, tmp_path, kind):
+def test_a_directory_that_is_none_is_not_played_back(soon, plant, tmp_path, kind):
     plant(kind, tmp_path / "a")
     done = soon("twcamsim", "--for", "10ms", "--replay", tmp_path / "a")
     assert (done.returncode, done.stdout) == (2, "")
@@ -75,11 +77,11 @@ def camera_words(option, path):
 LINKS = ["dangling link", "link in a circle", "link of another user", "link to a device"]
 
 
-@pytest.mark.parametrize("folder", [None, SHARED_MEMORY])
+@pytest.mark.parametrize("directory", [None, SHARED_MEMORY])
 @pytest.mark.parametrize("option", ["--journal", "--access", "posted"])
 @pytest.mark.parametrize("kind", LINKS)
-def test_a_link_is_not_written_through(soon, plant, tmp_path, option, kind, folder):
-    path = (folder or tmp_path) / "written"
+def test_a_link_is_not_written_through(soon, plant, tmp_path, option, kind, directory):
+    path = (directory or tmp_path) / "written"
     try:
         planted = plant(kind, path)
         done = soon(*camera_words(option, path))
@@ -92,7 +94,7 @@ def test_a_link_is_not_written_through(soon, plant, tmp_path, option, kind, fold
 
 
 @pytest.mark.parametrize("option", ["--journal", "--access", "posted"])
-def test_no_link_is_reached_around_a_folder_of_the_system(soon, plant, tmp_path, option):
+def test_no_link_is_reached_around_a_directory_of_the_system(soon, plant, tmp_path, option):
     tmp_path.chmod(0o1777)
     planted = plant("link of another user", tmp_path / "written")
     done = soon(*camera_words(option, f"/dev/..{tmp_path}/written"))
@@ -126,7 +128,7 @@ def test_the_authoritys_certificate_is_not_written_through_a_link(soon, plant, t
 @pytest.mark.parametrize("words", [["form", "-f"], ["upload", "-f"], ["get", "--password-file"]])
 def test_a_file_that_cannot_be_read_is_told(soon, peer, plant, tmp_path, words, kind):
     plant(kind, tmp_path / "read")
-    server = peer(reply(b"x"))
+    server = peer(response(b"x"))
     done = soon("twhttp", *words, tmp_path / "read", server.url(login="user"))
     assert done.returncode in (2, 3)
     assert f"{tmp_path}/read" in done.stderr

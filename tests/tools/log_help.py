@@ -8,9 +8,9 @@ import time
 import pexpect
 import pyte
 
-from conftest import HANG, LOG_FOLDER, plain_environment, wait_until
+from conftest import HANG, LOG_DIRECTORY, plain_environment, wait_until
 
-LOG = LOG_FOLDER / "tarnwick.log"
+LOG = LOG_DIRECTORY / "tarnwick.log"
 
 
 def line(text, stamp="Mar  5 14:03:09", pid="812", tags="[camera][warn]"):
@@ -61,7 +61,7 @@ class Screen:
             pass
 
     def wait_for(self, condition):
-        """Waits for a text, or until a function of the rows gives something true."""
+        """Waits for a text, or until a function of the rows returns something true."""
         if isinstance(condition, str):
             wanted = condition
             condition = lambda rows: any(wanted in row for row in rows)

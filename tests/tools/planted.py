@@ -36,9 +36,9 @@ def _device(minor):
 def _socket(path, target):
     listener = socket.socket(socket.AF_UNIX)
     # The length of a socket's path is limited.
-    with_folder = os.open(pathlib.Path(path).parent, os.O_PATH | os.O_CLOEXEC)
-    listener.bind(f"/proc/self/fd/{with_folder}/{pathlib.Path(path).name}")
-    os.close(with_folder)
+    with_directory = os.open(pathlib.Path(path).parent, os.O_PATH | os.O_CLOEXEC)
+    listener.bind(f"/proc/self/fd/{with_directory}/{pathlib.Path(path).name}")
+    os.close(with_directory)
     return listener
 
 
@@ -67,7 +67,7 @@ KINDS = {
     "link to a device": lambda path, target: path.symlink_to("/dev/zero"),
     "directory": lambda path, target: path.mkdir(),
     "socket": _socket,
-    "dangling link": lambda path, target: path.symlink_to("/no/such/folder/file"),
+    "dangling link": lambda path, target: path.symlink_to("/no/such/directory/file"),
     "link in a circle": lambda path, target: path.symlink_to(path.name),
     "link of another user": _link_of_another,
     "hard link": lambda path, target: os.link(target, path),

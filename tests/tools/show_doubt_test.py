@@ -44,7 +44,7 @@ def test_a_stamp_after_the_last_change_of_the_file_is_doubtful_and_not_the_next_
     assert doubtful(run) == told
 
 
-def test_only_the_first_line_behind_a_clock_that_was_set_back_is_doubtful(run):
+def test_only_the_first_line_after_a_clock_that_was_set_back_is_doubtful(run):
     LOG.write_text(stamped(60, "a") + stamped(9 * HOUR, "b") + stamped(9 * HOUR, "c"))
     assert doubtful(run) == ["b"]
 

@@ -7,7 +7,7 @@ import time
 
 import pytest
 
-from conftest import HANG, LOG_FOLDER, plain_environment
+from conftest import HANG, LOG_DIRECTORY, plain_environment
 from log_help import LOG, line, run_plain, without_privileges
 
 
@@ -201,7 +201,7 @@ def test_a_leap_day_is_of_the_last_leap_year(run):
 
 def test_the_notification_log_is_a_log_of_its_own(run):
     LOG.write_text(line("main"))
-    (LOG_FOLDER / "twnotification.log").write_text(line("notification"))
+    (LOG_DIRECTORY / "twnotification.log").write_text(line("notification"))
     assert shown(run, "--notification") == line("notification")
 
 
@@ -249,7 +249,7 @@ def test_a_missing_log_is_named(run):
     assert result.stderr == f"twlogctl: {LOG}: No such file or directory\n"
 
 
-def test_a_folder_is_no_log(run, tmp_path):
+def test_a_directory_is_no_log(run, tmp_path):
     result = run("twlogctl", "show", "--file", tmp_path)
     assert (result.returncode, result.stderr) == (1, f"twlogctl: {tmp_path}: Is a directory\n")
 
@@ -306,7 +306,7 @@ def test_a_reader_that_goes_ends_it_as_the_signal_does(command):
     assert child.wait(timeout=HANG) == -13
 
 
-def test_a_full_disk_behind_standard_output_is_told(command):
+def test_a_full_disk_at_standard_output_is_reported(command):
     LOG.write_text(line("x"))
     with open("/dev/full", "w", encoding="ascii") as full:
         words = command("twlogctl", "show")

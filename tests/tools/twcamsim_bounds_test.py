@@ -9,7 +9,7 @@ import socket
 import pytest
 
 from conftest import HANG, wait_until
-from twcamsim_life_test import write_recording
+from twcamsim_journal_test import write_recording
 from twcamsim_support import GET, camera, read_all, status_of
 
 MIB = 1 << 20
@@ -61,11 +61,11 @@ def test_the_journal_of_one_connection_is_bounded_and_counts_the_rest(camera):
     with running.connect() as client:
         for _ in range(80):
             client.sendall(request)
-            answer = b""
-            while b"\r\n\r\n" not in answer:
-                answer += client.recv(1 << 20)
-            length = int(answer.lower().split(b"content-length: ")[1].split(b"\r\n")[0])
-            body = answer.partition(b"\r\n\r\n")[2]
+            response = b""
+            while b"\r\n\r\n" not in response:
+                response += client.recv(1 << 20)
+            length = int(response.lower().split(b"content-length: ")[1].split(b"\r\n")[0])
+            body = response.partition(b"\r\n\r\n")[2]
             while len(body) < length:
                 body += client.recv(1 << 20)
     entry = running.journal()[0]
@@ -162,13 +162,13 @@ def test_a_journal_may_be_a_descriptor_of_the_shell(run):
 
 @pytest.fixture
 def recording(tmp_path):
-    folder = tmp_path / "recording"
-    write_recording(folder, ([(0, b"HTTP/1.0 200 OK\r\n\r\n"), (1, b"one")], "close"))
-    return folder
+    directory = tmp_path / "recording"
+    write_recording(directory, ([(0, b"HTTP/1.0 200 OK\r\n\r\n"), (1, b"one")], "close"))
+    return directory
 
 
-def refused(run, folder):
-    done = run("twcamsim", "--for", "10ms", "--replay", folder)
+def refused(run, directory):
+    done = run("twcamsim", "--for", "10ms", "--replay", directory)
     assert (done.returncode, done.stdout) == (2, ""), done.stderr
     assert done.stderr.count("\n") == 1
     return done.stderr
@@ -201,7 +201,7 @@ def test_a_file_without_end_is_refused(run, recording):
         ({"pieces": [{"bytes": 22, "delay_ms": 2**63 - 1}]}, "a delay is not between none and a day"),
         ({"pieces": [{"bytes": 22, "delay_ms": -1}]}, "a delay is not between none and a day"),
         ({"end_delay_ms": 2**62}, '"end_delay_ms" is not between none and a day'),
-        ({"response": "001.response\0"}, "is no name of a file in the folder"),
+        ({"response": "001.response\0"}, "is no name of a file in the directory"),
         ({"number": 1e300}, "exchanges.jsonl:1: "),
         ({"pieces": [7]}, "exchanges.jsonl:1: "),
         ({"end": "\x1b[2J"}, "none of the known ends"),

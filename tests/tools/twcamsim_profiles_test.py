@@ -1,4 +1,4 @@
-"""What each profile of the simulated camera answers to clients that behave."""
+"""What each profile of the simulated camera responds to clients that behave."""
 
 import http.client
 import json
@@ -14,6 +14,8 @@ import pytest
 from conftest import HANG
 from twcamsim_support import GET, body_of, camera, headers_of, read_all, reset, status_of
 
+pytestmark = pytest.mark.native
+
 # What an upload's client announces: 2 to the power 37.
 ENDLESS = 137438953472
 BOUNDARY = "-----------QUENMULTIPART_BOUNDARY-----------"
@@ -23,8 +25,8 @@ def call(running, method, path, body=None, headers=None, name=None):
     client = http.client.HTTPConnection("127.0.0.1", running.port(name), timeout=HANG)
     try:
         client.request(method, path, body, headers or {})
-        answer = client.getresponse()
-        return answer.status, answer.headers, answer.read()
+        response = client.getresponse()
+        return response.status, response.headers, response.read()
     finally:
         client.close()
 
@@ -89,9 +91,9 @@ def test_the_soap_device_answers_an_operation(camera):
     ],
 )
 def test_the_soap_device_sends_a_fault_with_500(camera, body, reason):
-    status, _, answer = call(camera("-e", "soap"), "POST", "/ptz", body)
+    status, _, response = call(camera("-e", "soap"), "POST", "/ptz", body)
     assert status == 500
-    nodes = ElementTree.fromstring(answer).iter()
+    nodes = ElementTree.fromstring(response).iter()
     texts = [node.text for node in nodes if node.tag.endswith("Text")]
     assert texts == [reason]
 
@@ -208,7 +210,7 @@ def test_an_upload_of_announced_128_gib_is_counted_up_to_its_closing_boundary(ca
         client.sendall(body[-7:])
         seen = read_all(client, HANG)
     count, end = body_of(seen.bytes).split()
-    # The line end behind the boundary may come too late to be counted.
+    # The CRLF after the boundary may come too late to be counted.
     assert int(count) in (len(body), len(body) - 2) and end == b"closed"
     assert running.journal()[0]["requests"][0]["sloppy"] == "blank in front of a colon"
 
@@ -222,7 +224,7 @@ def test_an_upload_ends_where_its_client_closes_its_direction(camera):
     assert (status_of(seen.bytes), body_of(seen.bytes)) == (200, b"1000 cut\n")
 
 
-def test_an_upload_can_be_answered_behind_a_number_of_bytes(camera):
+def test_an_upload_can_be_responded_to_after_a_number_of_bytes(camera):
     running = camera("-e", "upload,after=1000")
     seen = running.ask(upload_head() + b"x" * 1000)
     assert body_of(seen.bytes) == b"1000 full\n"
@@ -233,11 +235,11 @@ def test_an_upload_with_an_honest_length_ends_there(camera):
     assert body_of(seen.bytes) == b"5 full\n"
 
 
-@pytest.mark.parametrize("folder", ["", "/basic", "/digest"])
-def test_the_site_asks_for_the_login_of_its_folders(camera, folder):
+@pytest.mark.parametrize("directory", ["", "/basic", "/digest"])
+def test_the_site_asks_for_the_credentials_of_its_directories(camera, directory):
     running = camera("-e", "site")
-    url = running.url(f"{folder}/info.json")
-    if folder:
+    url = running.url(f"{directory}/info.json")
+    if directory:
         with pytest.raises(urllib.error.HTTPError) as refused:
             urllib.request.urlopen(url, timeout=HANG)
         assert refused.value.code == 401
@@ -247,8 +249,8 @@ def test_the_site_asks_for_the_login_of_its_folders(camera, folder):
         urllib.request.HTTPBasicAuthHandler(passwords),
         urllib.request.HTTPDigestAuthHandler(passwords),
     )
-    answer = opener.open(url, timeout=HANG).read()
-    assert answer == b'{"camera":"north gate","success":true}\n'
+    response = opener.open(url, timeout=HANG).read()
+    assert response == b'{"camera":"north gate","success":true}\n'
 
 
 def test_the_site_tells_what_came_in_each_form(camera):
@@ -256,8 +258,8 @@ def test_the_site_tells_what_came_in_each_form(camera):
     assert b"body pan=3\n" in call(running, "POST", "/text.cgi", "pan=3")[2]
     assert json.loads(call(running, "POST", "/", "pan=3")[2])["body"] == "pan=3"
     document = "<?xml version='1.0'?>\n<preset/>\n"
-    reply = call(running, "PUT", "/xml.cgi", document)[2]
-    assert ElementTree.fromstring(reply).find("preset") is not None
+    response = call(running, "PUT", "/xml.cgi", document)[2]
+    assert ElementTree.fromstring(response).find("preset") is not None
     assert call(running, "GET", "/xml.cgi?fault")[0] == 500
     assert call(running, "GET", "/nothing.json")[0] == 404
 
@@ -296,7 +298,7 @@ def test_a_close_with_a_semicolon_closes_and_is_noted(camera, name):
     seen = running.ask(request)
     assert (status_of(seen.bytes), seen.end) == (200, "close")
     sloppy = running.journal()[0]["requests"][0]["sloppy"]
-    assert sloppy == "semicolon behind Connection's value"
+    assert sloppy == "semicolon after Connection's value"
 
 
 def test_a_head_request_gets_no_body(camera):

@@ -47,7 +47,7 @@ class Camera:
 
     def ask(self, request=GET, name=None, silence=HANG, least=0):
         """Sends the request and reads to the connection's end, or until nothing comes for
-        `silence` seconds behind the first `least` bytes."""
+        `silence` seconds after the first `least` bytes."""
         with self.connect(name) as client:
             try:
                 client.sendall(request)
@@ -127,7 +127,7 @@ def camera(start, tmp_path):
         nonlocal count
         count += 1
         journal = tmp_path / f"journal-{count}"
-        # The fixture kills it, so its folder must be in one that goes away.
+        # The fixture kills it, so its directory must be in one that goes away.
         place = {"TMPDIR": str(tmp_path)}
         return Camera(start("twcamsim", "--journal", journal, *args, env=place), journal)
 
@@ -192,7 +192,7 @@ def challenge_words(challenge):
     return words
 
 
-# What a Digest answer is made of; a test replaces what it wants wrong.
+# What Digest credentials are made of; a test replaces what it wants wrong.
 USUAL = {
     "user": "operator",
     "password": "gate-7",
@@ -217,7 +217,7 @@ def digest_response(words, parts, qop):
 
 
 def digest_line(words, qop="auth", **changes):
-    """The Authorization line that answers a challenge."""
+    """The Authorization line for a challenge."""
     parts = {**USUAL, **changes}
     response = parts.get("response") or digest_response(words, parts, qop)
     line = (
@@ -236,3 +236,19 @@ def digest_line(words, qop="auth", **changes):
 def request_with(line, target="/info.cgi", method="GET", body=""):
     length = f"Content-Length: {len(body)}\r\n" if body else ""
     return f"{method} {target} HTTP/1.0\r\n{line}\r\n{length}\r\n{body}".encode()
+
+
+# How long a client waits before it takes a silence for one, after all that must come.
+SILENCE = 1.0
+HEAD = b"HTTP/1.1 200 OK\r\n"
+
+
+def ask(camera, *faults, endpoint="json", silence=HANG, request=GET):
+    """What a client sees of a camera with these faults."""
+    words = [word for fault in faults for word in ("-f", fault)]
+    return camera("-e", endpoint, *words).ask(request, silence=silence)
+
+
+def usual(camera):
+    """The same without a fault."""
+    return camera("-e", "json").ask().bytes

@@ -1,4 +1,4 @@
-"""The simulated camera behind TLS, with a good certificate and with all that can be wrong there."""
+"""The simulated camera over TLS, with a good certificate and with all that can be wrong there."""
 
 import socket
 import ssl
@@ -7,6 +7,8 @@ import pytest
 
 from conftest import HANG
 from twcamsim_support import body_of, camera, read_all, status_of
+
+pytestmark = pytest.mark.native
 
 TLS = "json,tls"
 

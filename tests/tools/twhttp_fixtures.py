@@ -7,11 +7,11 @@ from twhttp_server import Peer, make_identity
 
 @pytest.fixture
 def peer():
-    """peer(answers...): a server that ends with the test."""
+    """peer(scripts...): a server that ends with the test."""
     peers = []
 
-    def start(*answers, tls=None):
-        peers.append(Peer(*answers, tls=tls))
+    def start(*scripts, tls=None):
+        peers.append(Peer(*scripts, tls=tls))
         return peers[-1]
 
     yield start

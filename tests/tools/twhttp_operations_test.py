@@ -11,7 +11,7 @@ import pytest
 
 from conftest import HANG
 from twhttp_fixtures import identity, peer  # noqa: F401 (fixtures)
-from twhttp_server import Answer, challenge, reply
+from twhttp_server import Script, challenge, response
 
 LOGIN = "operator:gate-7"
 DIGEST = 'Digest realm="camera", nonce="5f3d9c"'
@@ -19,7 +19,7 @@ DOCUMENT = "<preset><pan>3</pan></preset>"
 JSON = b'{"name":"gate","success":true}'
 XML = b"<presets/>"
 
-# (words, the body of the reply, what is printed of it)
+# (words, the body of the response, what is printed of it)
 OPERATIONS = {
     "get": (["get"], b"state", "state"),
     "get-1.1": (["get", "--http", "1.1", "--cookie", "session=42"], b"state", "state"),
@@ -47,7 +47,7 @@ OPERATIONS = {
 
 
 def url_of(server, words):
-    """A target with a login where the operation sends one, and what is to be encoded."""
+    """A target with credentials where the operation sends them, and what is to be encoded."""
     login = "" if words[0] in ("json-get", "json-post") else LOGIN
     return server.url("set.cgi?name=north/gate&x=1", login)
 
@@ -55,7 +55,7 @@ def url_of(server, words):
 @pytest.mark.parametrize("name", OPERATIONS)
 def test_the_body_is_shown_and_nothing_else(run, peer, name):
     words, body, shown = OPERATIONS[name]
-    server = peer(reply(body))
+    server = peer(response(body))
     result = run("twhttp", *words, url_of(server, words))
     assert (result.returncode, result.stdout, result.stderr) == (0, shown, "")
     assert len(server.requests) == 1
@@ -64,7 +64,7 @@ def test_the_body_is_shown_and_nothing_else(run, peer, name):
 @pytest.mark.parametrize("name", OPERATIONS)
 def test_offline_shows_the_bytes_that_a_server_receives(run, command, peer, name):
     words, body, _ = OPERATIONS[name]
-    server = peer(reply(body))
+    server = peer(response(body))
     target = url_of(server, words)
     run("twhttp", *words, target)
     offline = subprocess.run(
@@ -78,7 +78,7 @@ def test_offline_shows_the_bytes_that_a_server_receives(run, command, peer, name
 
 
 def test_offline_shows_what_is_sent_inside_tls(run, peer, identity):
-    server = peer(reply(b"{}"), tls=identity[0])
+    server = peer(response(b"{}"), tls=identity[0])
     for words in (["get", "--http", "1.1"], ["curl-get", "--insecure"]):
         run("twhttp", *words, server.url("a"))
         assert run("twhttp", *words, "--offline", server.url("a")).stdout == (
@@ -100,15 +100,15 @@ def test_offline_looks_nothing_up_and_connects_to_nobody(run):
     assert "Host: no-such-camera.invalid:81\n" in result.stdout
 
 
-def test_a_login_is_sent_as_the_challenge_asks(run, peer):
-    server = peer(Answer(challenge(DIGEST)), Answer(reply(b"in")))
+def test_credentials_are_sent_as_the_challenge_asks(run, peer):
+    server = peer(Script(challenge(DIGEST)), Script(response(b"in")))
     result = run("twhttp", "get", server.url("info.cgi", LOGIN))
     assert result.stdout == "in"
     assert b'response="d2cef6de08ea63ea3eba0cc5a834f4ef"' in server.requests[1]
 
 
-def test_a_password_file_and_encoded_logins_are_read(run, peer, tmp_path):
-    server = peer(reply(b"in"))
+def test_a_password_file_and_encoded_credentials_are_read(run, peer, tmp_path):
+    server = peer(response(b"in"))
     (tmp_path / "password").write_text("gate-7\nsecond line\n")
     run("twhttp", "curl-get", "--password-file", tmp_path / "password", server.url("", "operator"))
     run("twhttp", "curl-get", server.url("", "operat%6Fr:gate%2D7"))
@@ -119,7 +119,7 @@ def test_a_password_file_and_encoded_logins_are_read(run, peer, tmp_path):
 
 
 def test_bodies_come_from_files_and_from_standard_input(run, peer, tmp_path):
-    server = peer(reply(b"x"))
+    server = peer(response(b"x"))
     (tmp_path / "body").write_text("pan=3")
     run("twhttp", "form", "-f", tmp_path / "body", server.url())
     run("twhttp", "form", "-f", "-", server.url(), input="pan=3")
@@ -127,7 +127,7 @@ def test_bodies_come_from_files_and_from_standard_input(run, peer, tmp_path):
 
 
 def test_an_upload_streams_its_file(run, peer, tmp_path):
-    server = peer(reply(b"taken"))
+    server = peer(response(b"taken"))
     content = bytes(range(256)) * 4000
     (tmp_path / "clip").write_bytes(content)
     assert run("twhttp", "upload", "-f", tmp_path / "clip", server.url()).stdout == "taken"
@@ -135,7 +135,7 @@ def test_an_upload_streams_its_file(run, peer, tmp_path):
 
 
 def test_the_response_file_gets_head_and_body(run, peer, tmp_path):
-    server = peer(reply(b"state", headers=["X-Model: TW-1"]))
+    server = peer(response(b"state", headers=["X-Model: TW-1"]))
     result = run("twhttp", "curl-get", "--response-file", tmp_path / "file", server.url())
     assert (result.returncode, result.stdout) == (0, "")
     expected = b"X-Model: TW-1\r\nContent-Length: 5\r\n\r\nstate"
@@ -143,20 +143,20 @@ def test_the_response_file_gets_head_and_body(run, peer, tmp_path):
 
 
 def test_a_source_address_is_used(run, peer):
-    server = peer(reply(b"x"))
+    server = peer(response(b"x"))
     assert run("twhttp", "get", "--source", "127.0.0.9", server.url()).returncode == 0
     with_other = run("twhttp", "get", "-v", "--source", "192.0.2.9", server.url())
     assert "Failed to bind src ip, ignore it." in with_other.stderr
 
 
 def test_an_endless_body_stops_where_it_is_told_to(run, peer):
-    server = peer(Answer(b"HTTP/1.0 200 OK\r\n\r\n" + b"x" * 100000, end="hold"))
+    server = peer(Script(b"HTTP/1.0 200 OK\r\n\r\n" + b"x" * 100000, end="hold"))
     result = run("twhttp", "get", "--max-body", 50000, server.url())
     assert (result.returncode, len(result.stdout)) == (0, 50000)
 
 
 def test_an_endless_body_is_shown_while_it_comes(start, peer):
-    server = peer(Answer(b"HTTP/1.0 200 OK\r\n\r\n" + b"x" * 8192, end="hold"))
+    server = peer(Script(b"HTTP/1.0 200 OK\r\n\r\n" + b"x" * 8192, end="hold"))
     child = start("twhttp", "get", "--timeout", 60, server.url())
     assert child.stdout.read(8192) == "x" * 8192
     child.terminate()
@@ -189,7 +189,7 @@ def test_the_curl_command_sends_the_same_request(run, peer, name):
     if not shutil.which("curl"):
         pytest.skip("curl is missing (package curl): the printed commands were not run")
     words, body, _ = OPERATIONS[name]
-    server = peer(reply(body))
+    server = peer(response(body))
     target = url_of(server, words)
     run("twhttp", *words, target)
     printed = run("twhttp", *words, "--as-curl", "--show-secrets", target)
@@ -203,7 +203,7 @@ def test_the_other_curl_commands_are_taken_by_a_server(run, peer, name):
     if not shutil.which("curl"):
         pytest.skip("curl is missing (package curl): the printed commands were not run")
     words, _, _ = OPERATIONS[name]
-    server = peer(reply(b"x"))
+    server = peer(response(b"x"))
     target = url_of(server, words)
     printed = run("twhttp", *words, "--as-curl", "--show-secrets", target)
     subprocess.run(shlex.split(printed.stdout), capture_output=True, timeout=HANG, check=True)
@@ -219,7 +219,7 @@ def test_the_curl_command_hides_the_password(run):
 
 
 def test_a_recording_is_played_back(run, start, peer, tmp_path):
-    server = peer(Answer(challenge(DIGEST)), Answer(reply(b"in" * 50000)))
+    server = peer(Script(challenge(DIGEST)), Script(response(b"in" * 50000)))
     live = run("twhttp", "get", "--record", tmp_path / "a", server.url("info.cgi", LOGIN))
     names = sorted(path.name for path in (tmp_path / "a").iterdir())
     assert names == ["001.request", "001.response", "002.request", "002.response"] + [
@@ -236,7 +236,7 @@ def test_a_recording_is_played_back(run, start, peer, tmp_path):
 
 
 def test_a_recording_of_a_failure_fails_again(run, start, peer, tmp_path):
-    server = peer(Answer(reply(b"x" * 100)[:60], end="reset"))
+    server = peer(Script(response(b"x" * 100)[:60], end="reset"))
     assert run("twhttp", "get", "--record", tmp_path / "a", server.url()).returncode == 14
     camera = start("twcamsim", "--replay", tmp_path / "a")
     endpoint = json.loads(camera.stdout.readline())["endpoints"][0]
@@ -246,7 +246,7 @@ def test_a_recording_of_a_failure_fails_again(run, start, peer, tmp_path):
 @pytest.mark.parametrize(
     "old, new, phrase",
     [
-        ('"001.response"', '"../../etc/passwd"', "is no name of a file in the folder"),
+        ('"001.response"', '"../../etc/passwd"', "is no name of a file in the directory"),
         ('"001.response"', '"009.response"', "009.response: No such file or directory"),
         ('"end":"close"', '"end":"somehow"', "none of the known ends"),
         ('"bytes":', '"bytes":1', "the pieces are not as long as the response"),
@@ -256,7 +256,7 @@ def test_a_recording_of_a_failure_fails_again(run, start, peer, tmp_path):
     ],
 )
 def test_a_recording_that_was_tampered_with_is_refused(run, peer, tmp_path, old, new, phrase):
-    server = peer(reply(b"state"))
+    server = peer(response(b"state"))
     run("twhttp", "get", "--record", tmp_path, server.url())
     index = tmp_path / "exchanges.jsonl"
     text = index.read_text()

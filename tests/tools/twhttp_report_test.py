@@ -7,9 +7,11 @@ import time
 
 import pytest
 
-from conftest import HANG, LOG_FOLDER
+from conftest import HANG, LOG_DIRECTORY
 from twhttp_fixtures import identity, peer  # noqa: F401 (fixtures)
-from twhttp_server import Answer, challenge, closed_port, reply
+from twhttp_server import Script, challenge, closed_port, response
+
+pytestmark = pytest.mark.native
 
 LOGIN = "operator:gate-7"
 DIGEST = 'Digest realm="camera", nonce="5f3d9c", qop="auth", opaque="q1"'
@@ -17,7 +19,7 @@ COLOUR = "\x1b["
 
 
 def logged_in(peer, asked=DIGEST):
-    return peer(challenge(asked), reply(b"in", headers=["Set-Cookie: id=9; path=/"]))
+    return peer(challenge(asked), response(b"in", headers=["Set-Cookie: id=9; path=/"]))
 
 
 def test_verbose_numbers_the_exchanges_and_shows_both_heads(run, peer):
@@ -29,7 +31,7 @@ def test_verbose_numbers_the_exchanges_and_shows_both_heads(run, peer):
     assert "== library log\n" in text
 
 
-def test_verbose_shows_the_challenge_as_a_table_and_why_the_login_is_what_it_is(run, peer):
+def test_verbose_shows_the_challenge_as_a_table_and_why_the_credentials_are_what_they_are(run, peer):
     text = run("twhttp", "get", "-v", logged_in(peer).url("", LOGIN)).stderr
     for row in ("realm +camera", "nonce +5f3d9c", "qop +auth", "opaque +q1"):
         assert re.search(rf"^    {row}$", text, re.M)
@@ -62,7 +64,7 @@ def test_verbose_shows_the_challenge_as_a_table_and_why_the_login_is_what_it_is(
 )
 def test_each_line_that_is_sent_has_the_rule_that_made_it(run, peer, words):
     login = "" if words[0].startswith("json") else LOGIN
-    text = run("twhttp", words[0], "-v", *words[1:], peer(reply(b"<a/>")).url("a", login)).stderr
+    text = run("twhttp", words[0], "-v", *words[1:], peer(response(b"<a/>")).url("a", login)).stderr
     sent = [line for line in text.splitlines() if line.startswith("> ")]
     assert len(sent) > 1
     for line in sent:
@@ -70,7 +72,7 @@ def test_each_line_that_is_sent_has_the_rule_that_made_it(run, peer, words):
 
 
 def test_verbose_shows_who_answered_over_tls(run, peer, identity):
-    server = peer(reply(b"x"), tls=identity[0])
+    server = peer(response(b"x"), tls=identity[0])
     by_socket = run("twhttp", "get", "-v", server.url()).stderr
     assert re.search(r"^  connection 1 to 127\.0\.0\.1:\d+, TLSv1\.3, TLS_\w+$", by_socket, re.M)
     assert re.search(r"^  certificate subject .*127\.0\.0\.1.* verify here$", by_socket, re.M)
@@ -82,12 +84,12 @@ def test_verbose_shows_who_answered_over_tls(run, peer, identity):
 def test_secrets_are_masked_everywhere_unless_they_are_asked_for(run, peer):
     words = ["get", "--basic-first", "--cookie", "id=7", "-v"]
     for more in ([], ["--json"]):
-        server = peer(reply(b"in", headers=["Set-Cookie: id=9; path=/"]))
+        server = peer(response(b"in", headers=["Set-Cookie: id=9; path=/"]))
         text = run("twhttp", *words, *more, server.url("", LOGIN)).stderr
         for secret in ("gate-7", "b3BlcmF0b3I6Z2F0ZS03", "id=7", "id=9"):
             assert secret not in text
         assert "***" in text
-    server = peer(reply(b"in", headers=["Set-Cookie: id=9; path=/"]))
+    server = peer(response(b"in", headers=["Set-Cookie: id=9; path=/"]))
     text = run("twhttp", *words, "--show-secrets", server.url("", LOGIN)).stderr
     for secret in ("b3BlcmF0b3I6Z2F0ZS03", "id=7", "id=9"):
         assert secret in text
@@ -95,12 +97,12 @@ def test_secrets_are_masked_everywhere_unless_they_are_asked_for(run, peer):
 
 def test_the_log_of_the_daemons_gets_none_of_it(run, peer):
     run("twhttp", "get", f"http://127.0.0.1:{closed_port()}/")
-    run("twhttp", "json-get", peer(reply(b"<html>")).url())
-    assert not list(LOG_FOLDER.iterdir())
+    run("twhttp", "json-get", peer(response(b"<html>")).url())
+    assert not list(LOG_DIRECTORY.iterdir())
 
 
 def test_control_bytes_of_a_peer_are_escaped(run, peer):
-    server = peer(reply(b"", "404 \x1b[31mred\x07", ["X-Odd: \x1b]0;title"]))
+    server = peer(response(b"", "404 \x1b[31mred\x07", ["X-Odd: \x1b]0;title"]))
     text = run("twhttp", "get", "-v", server.url()).stderr
     assert "\x1b" not in text and "\x07" not in text
     assert "\\x1B[31mred" in text or "\\x1b[31mred" in text
@@ -113,7 +115,7 @@ def timing_rows(text):
 
 
 def test_timings_show_each_phase_beside_its_limit(run, peer, identity):
-    server = peer(reply(b"state"), tls=identity[0])
+    server = peer(response(b"state"), tls=identity[0])
     url = server.url().replace("127.0.0.1", "localhost")
     text = run("twhttp", "get", "--timings", "--timeout", 3, url).stderr
     rows = timing_rows(text)
@@ -125,7 +127,7 @@ def test_timings_show_each_phase_beside_its_limit(run, peer, identity):
 
 
 def test_timings_of_libcurl_are_under_one_limit(run, peer):
-    text = run("twhttp", "curl-get", "--timings", "--timeout", 3, peer(reply(b"x")).url()).stderr
+    text = run("twhttp", "curl-get", "--timings", "--timeout", 3, peer(response(b"x")).url()).stderr
     rows = timing_rows(text)
     assert rows["total"].endswith("3 s")
     assert rows["first byte"].endswith("the total's")
@@ -151,7 +153,7 @@ def test_json_is_one_object_with_the_whole_story(run, peer):
 
 
 def test_repeat_counts_latencies_and_failures_by_class(run, peer):
-    server = peer(reply(b"x"), reply(b"", "404 No"), b"", reply(b"x"))
+    server = peer(response(b"x"), response(b"", "404 No"), b"", response(b"x"))
     result = run("twhttp", "get", "--repeat", 4, "--interval", "1ms", server.url())
     assert result.stdout.startswith("4 requests, 2 good, 2 failed\n")
     assert re.search(r"^latency: least [\d.]+ ms, median ", result.stdout, re.M)
@@ -162,12 +164,12 @@ def test_repeat_counts_latencies_and_failures_by_class(run, peer):
 
 def test_repeat_in_json_is_a_line_a_request(run, peer):
     words = ["get", "--repeat", 3, "--interval", "0", "--json"]
-    result = run("twhttp", *words, peer(reply(b"x")).url())
+    result = run("twhttp", *words, peer(response(b"x")).url())
     assert [json.loads(line)["class"] for line in result.stdout.splitlines()] == ["done"] * 3
 
 
 def test_control_c_ends_repeating_with_what_was_counted(start, peer):
-    server = peer(reply(b"x"))
+    server = peer(response(b"x"))
     child = start("twhttp", "get", "--repeat", 1000, "--interval", "1h", server.url())
     assert server.arrived.wait(HANG)
     child.send_signal(signal.SIGINT)
@@ -199,8 +201,8 @@ def slow_body(seconds, size):
 
 
 def test_a_transfer_that_lasts_shows_its_progress_on_a_terminal(spawn, peer):
-    head = reply(b"x" * 400000)[:-400000]
-    server = peer(Answer(head, *[slow_body(0.5, 100000)] * 4))
+    head = response(b"x" * 400000)[:-400000]
+    server = peer(Script(head, *[slow_body(0.5, 100000)] * 4))
     child = spawn("twhttp", "curl-get", server.url(), dimensions=(24, 100))
     child.expect(r"\[#+\.+\] +\d+ % [\d.]+ KiB, [\d.]+ KiB/s, [\d.]+ m?s left")
     child.read()
@@ -209,11 +211,11 @@ def test_a_transfer_that_lasts_shows_its_progress_on_a_terminal(spawn, peer):
 
 
 def test_the_progress_goes_away_at_the_end_and_keeps_out_of_pipes(run, peer, spawn):
-    head = reply(b"x" * 400)[:-400]
+    head = response(b"x" * 400)[:-400]
     pieces = [slow_body(0.7, 100)] * 4
-    piped = run("twhttp", "get", peer(Answer(head, *pieces)).url())
+    piped = run("twhttp", "get", peer(Script(head, *pieces)).url())
     assert (piped.stdout, piped.stderr) == ("x" * 400, "")
-    child = spawn("twhttp", "curl-get", peer(Answer(head, *pieces)).url(), dimensions=(24, 60))
+    child = spawn("twhttp", "curl-get", peer(Script(head, *pieces)).url(), dimensions=(24, 60))
     text = child.read()
     assert " % " in text
     assert "x" * 400 in text.replace("\r\n", "").split("\x1b[K")[-1]

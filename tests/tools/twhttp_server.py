@@ -1,4 +1,4 @@
-"""Scripted servers for the tests of twhttp: each connection gets the next answer of a list."""
+"""Scripted servers for the tests of twhttp: each connection plays the next script of a list."""
 
 import socket
 import ssl
@@ -10,10 +10,10 @@ HANG = 120
 LONGEST_BODY = 1 << 26
 
 
-class Answer:
-    """What one connection is answered: pieces of bytes, and how it ends: "close", "reset" or "hold"
-    (it stays open and silent until the client goes). `read` False answers before the request is
-    read, `until` when these bytes have come; `times` requests are answered over one connection."""
+class Script:
+    """What one connection is sent: pieces of bytes, and how it ends: "close", "reset" or "hold"
+    (it stays open and silent until the client goes). `read` False sends before the request is
+    read, `until` when these bytes have come; `times` requests are served over one connection."""
 
     def __init__(self, *pieces, end="close", read=True, until=None, times=1):
         self.pieces = pieces
@@ -23,14 +23,14 @@ class Answer:
         self.times = times
 
 
-def reply(body=b"", status="200 OK", headers=()):
-    """A reply with its length."""
+def response(body=b"", status="200 OK", headers=()):
+    """A response with its length."""
     lines = [f"HTTP/1.1 {status}", *headers, f"Content-Length: {len(body)}", "", ""]
     return "\r\n".join(lines).encode() + body
 
 
 def challenge(text, status="401 Unauthorized"):
-    return reply(b"no", status, [f"WWW-Authenticate: {text}", "Connection: close"])
+    return response(b"no", status, [f"WWW-Authenticate: {text}", "Connection: close"])
 
 
 def announced_length(head):
@@ -43,10 +43,10 @@ def announced_length(head):
 
 class Peer:
     """Listens on 127.0.0.1 until it is closed; `requests` holds what came, a request an entry. An
-    Answer repeats for the connections behind the last one."""
+    Script repeats for the connections after the last one."""
 
-    def __init__(self, *answers, tls=None):
-        self.answers = [a if isinstance(a, Answer) else Answer(a) for a in answers]
+    def __init__(self, *scripts, tls=None):
+        self.scripts = [a if isinstance(a, Script) else Script(a) for a in scripts]
         self.tls = tls
         self.requests = []
         self.connections = 0
@@ -69,23 +69,23 @@ class Peer:
             except OSError:
                 return
             connection.settimeout(HANG)
-            answer = self.answers[min(self.connections, len(self.answers) - 1)]
+            script = self.scripts[min(self.connections, len(self.scripts) - 1)]
             self.connections += 1
             try:
-                self.serve(connection, answer)
+                self.serve(connection, script)
             except (OSError, ssl.SSLError):
                 connection.close()
 
-    def serve(self, connection, answer):
+    def serve(self, connection, script):
         if self.tls:
             connection = self.tls.wrap_socket(connection, server_side=True)
         self.open.append(connection)
-        for _ in range(answer.times):
-            if answer.read and not self.read_request(connection, answer.until):
+        for _ in range(script.times):
+            if script.read and not self.read_request(connection, script.until):
                 break
-            for piece in answer.pieces:
+            for piece in script.pieces:
                 connection.sendall(piece() if callable(piece) else piece)
-        self.end(connection, answer.end)
+        self.end(connection, script.end)
 
     def read_request(self, connection, until):
         data = b""
@@ -131,9 +131,9 @@ class Peer:
         assert not self.thread.is_alive()
 
 
-def make_identity(folder, name="127.0.0.1", days=1):
+def make_identity(directory, name="127.0.0.1", days=1):
     """A key and a certificate of its own making; a TLS context that shows it."""
-    key, certificate = folder / "key.pem", folder / "certificate.pem"
+    key, certificate = directory / "key.pem", directory / "certificate.pem"
     subject = ["-subj", f"/CN={name}", "-addext", f"subjectAltName=IP:{name}"]
     subprocess.run(
         ["openssl", "req", "-x509", "-nodes"]

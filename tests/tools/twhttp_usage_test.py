@@ -5,7 +5,9 @@ import re
 import pytest
 
 from twhttp_fixtures import peer  # noqa: F401 (fixture)
-from twhttp_server import reply
+from twhttp_server import response
+
+pytestmark = pytest.mark.native
 
 URL = "http://camera.invalid/"
 
@@ -82,7 +84,7 @@ def test_an_option_that_the_operation_has_no_use_for_is_refused(run, words):
 
 
 def test_a_document_that_is_no_xml_is_not_sent(run, peer):
-    server = peer(reply(b"x"))
+    server = peer(response(b"x"))
     result = run("twhttp", "xml-post", "-d", "<preset>", server.url())
     assert (result.returncode, server.connections) == (3, 0)
     assert "no well-formed XML" in result.stderr
@@ -105,8 +107,7 @@ def test_each_option_has_its_sentence(run, operation):
         assert re.search(r"[A-Z][a-z].*[.)]$", entry), entry
 
 
-@pytest.mark.parametrize("shell", ["bash", "zsh", "fish"])
-def test_completion_knows_the_operations(run, shell):
-    script = run("twhttp", "--completion", shell)
-    assert script.returncode == 0
-    assert "soap-auth" in script.stdout and "give-up" in script.stdout
+def test_completion_knows_the_operations_and_their_options(run):
+    assert run("twhttp", "__complete", "soap-a").stdout.startswith("soap-auth\t")
+    assert run("twhttp", "__complete", "get", "--give").stdout.startswith("--give-up\t")
+    assert run("twhttp", "__complete", "get", "--http", "1.").stdout == "1.0\n1.1\n"

@@ -84,13 +84,13 @@ TEST(CreateThread, AnyDetachedFlagButZeroDetaches) {
 TEST(CreateThread, UsesTheStackSize) {
   Report report;
   pthread_t thread;
-  constexpr unsigned kStack = 20 << 20;  // beyond what an earlier thread may have left behind
+  constexpr unsigned kStack = 20 << 20;  // beyond what an earlier thread may have left
   ASSERT_EQ(CreateThread(FillReport, &report, kStack, 0, &thread), 1);
   pthread_join(thread, nullptr);
   EXPECT_GE(report.stack_size, kStack);
 }
 
-TEST(CreateThread, StackSizeZeroGivesTheSystemsDefault) {
+TEST(CreateThread, StackSizeZeroReturnsTheSystemsDefault) {
   pthread_attr_t attr;
   pthread_attr_init(&attr);
   size_t expected = 0;

@@ -58,7 +58,7 @@ TEST_F(Pacing, ALateCallDoesNotSleepAndStartsAPeriodNow) {
   EXPECT_THAT(Sleeps(), ElementsAre(9000));
 }
 
-TEST_F(Pacing, AClockThatWasSetBackCountsAsLate) {
+TEST_F(Pacing, AClockThatWasSetBackIsTakenForLate) {
   DelayTimer timer(10000);
   Pass(-5000000);
   EXPECT_EQ(timer.Delay(), 0);
@@ -122,7 +122,7 @@ TEST_F(Pacing, ANewPeriodKeepsTheStartOfTheCurrentOne) {
   EXPECT_THAT(Sleeps(), ElementsAre(16000));
 }
 
-TEST_F(Pacing, AMarkAtSecondZeroCountsAsNotStarted) {
+TEST_F(Pacing, AMarkAtSecondZeroIsTakenForNotStarted) {
   now_ = 999999;
   DelayTimer timer(10000);
   Pass(5000001);
@@ -150,7 +150,7 @@ TEST_F(Pacing, TheEndOf32BitSecondsDoesNotDisturbThePace) {
   EXPECT_THAT(Sleeps(), ElementsAre(800000, 999000));
 }
 
-TEST(DelayTimer, GivesWhatTheSleepGives) {
+TEST(DelayTimer, ReturnsWhatTheSleepReturns) {
   Faults faults;
   faults.FailNth(Call::kUsleep, 1, EINTR);
   DelayTimer timer(1000000);
@@ -159,7 +159,7 @@ TEST(DelayTimer, GivesWhatTheSleepGives) {
   EXPECT_EQ(errno, EINTR);
 }
 
-TEST(DelayTimer, GivesWhatTheYieldGives) {
+TEST(DelayTimer, ReturnsWhatTheYieldReturns) {
   Faults faults;
   faults.FailNth(Call::kSchedYield, 1, ENOSYS);
   DelayTimer timer(0);

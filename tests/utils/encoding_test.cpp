@@ -62,7 +62,7 @@ TEST(UrlEncode, TheKeepSetOfTheHttpClientLeavesAQueryReadable) {
   EXPECT_EQ(UrlEncode("cgi/x.cgi?a=1&b=%2&c=\"", "/?=&"), "cgi/x.cgi?a=1&b=%252&c=%22");
 }
 
-TEST(UrlEncode, AnEmptyTextIsEmpty) {
+TEST(UrlEncode, AnEmptyStringIsEmpty) {
   EXPECT_EQ(UrlEncode("", "/"), "");
 }
 
@@ -73,7 +73,7 @@ std::string Base64(const std::string& text) {
   return result;
 }
 
-TEST(Base64Encode, AnEmptyTextGivesAnAllocatedEmptyText) {
+TEST(Base64Encode, AnEmptyStringReturnsAnAllocatedEmptyString) {
   char* encoded = Base64Encode("");
   ASSERT_NE(encoded, nullptr);
   EXPECT_STREQ(encoded, "");
@@ -92,7 +92,7 @@ TEST(Base64Encode, ATextOfMoreThan768MebibytesIsEncodedToItsEnd) {
   free(encoded);
 }
 
-TEST(Base64Encode, GivesTheStandardsExamples) {
+TEST(Base64Encode, ReturnsTheStandardsExamples) {
   EXPECT_EQ(Base64("f"), "Zg==");
   EXPECT_EQ(Base64("fo"), "Zm8=");
   EXPECT_EQ(Base64("foo"), "Zm9v");
@@ -121,11 +121,11 @@ TEST(Base64Encode, AgreesWithOpensslForEveryByteAndLength) {
   }
 }
 
-TEST(Base64Encode, ALongTextHasNoLineEnds) {
+TEST(Base64Encode, ALongTextHasNoLineFeeds) {
   EXPECT_EQ(Base64(std::string(3000, '\xff')), std::string(4000, '/'));
 }
 
-TEST(Base64Encode, WithoutMemoryOrTextGivesNull) {
+TEST(Base64Encode, WithoutMemoryOrTextReturnsNull) {
   EXPECT_EQ(ForEachFailingCall(Call::kMalloc,
                                [](Faults& faults) {
                                  char* encoded = Base64Encode("text");
@@ -148,7 +148,7 @@ TEST(Md5ToHex, PrintsTheDigestOfTheStandardsExample) {
   EXPECT_EQ(Md5ToHex(digest), "900150983cd24fb0d6963f7d28e17f72");
 }
 
-TEST(Md5ToHex, NoDigestGivesAnEmptyText) {
+TEST(Md5ToHex, NoDigestReturnsAnEmptyString) {
   EXPECT_EQ(Md5ToHex(nullptr), "");
 }
 

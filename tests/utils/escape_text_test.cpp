@@ -63,7 +63,7 @@ TEST(EscapeText, ACutCharacterDoesNotTakeWhatFollows) {
   EXPECT_EQ(EscapeText("\xC3\n"), "\\xC3\\x0A");
 }
 
-TEST(EscapeText, NoTwoTextsGiveTheSame) {
+TEST(EscapeText, NoTwoStringsBecomeTheSame) {
   std::set<std::string> escaped;
   const std::string pieces[] = {"\n", "\\", "\\n", "x", "0A", "\\x0A", "\\\\", "\xC2"};
   std::set<std::string> texts;

@@ -65,7 +65,7 @@ std::string RandomText(std::mt19937* random, size_t size) {
   return text;
 }
 
-TEST(FastText, IsWhatThePlainWayGives) {
+TEST(FastText, IsWhatThePlainWayReturns) {
   std::mt19937 random(1);
   for (size_t round = 0; round < 2000; ++round) {
     const std::string text = RandomText(&random, round % 100);

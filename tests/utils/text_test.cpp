@@ -21,7 +21,7 @@ TEST(TrimString, TakesTheSetsCharactersFromBothEndsOnly) {
   EXPECT_EQ(TrimString("a", " "), "a");
 }
 
-TEST(TrimString, AnEmptyTextOrSetGivesTheText) {
+TEST(TrimString, AnEmptyStringOrSetReturnsTheText) {
   EXPECT_EQ(TrimString("", " "), "");
   EXPECT_EQ(TrimString(" a ", ""), " a ");
   EXPECT_EQ(TrimString("", nullptr), "");
@@ -31,7 +31,7 @@ TEST(TrimString, AZeroByteInTheTextIsACharacter) {
   EXPECT_EQ(TrimString(std::string(" \0 ", 3), " "), std::string("\0", 1));
 }
 
-// The buffer is larger than the size that is passed, so that a write behind it would show.
+// The buffer is larger than the size that is passed, so that a write after it would show.
 class StrNCopyBuffer : public ::testing::Test {
  protected:
   StrNCopyBuffer() { memset(buf_, '#', sizeof(buf_)); }

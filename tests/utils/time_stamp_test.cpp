@@ -23,7 +23,7 @@ TEST(FormatUtcTimeStamp, TheLastMomentOf32BitSecondsIsRight) {
 }
 
 // The calendar is the system's: where its seconds have 32 bits, they start again in 1901.
-TEST(FormatUtcTimeStamp, BehindItTheSystemsSecondsCount) {
+TEST(FormatUtcTimeStamp, AfterItTheSystemsSecondsAreTaken) {
   EXPECT_EQ(FormatUtcTimeStamp(kEnd), Either("20380119T031408.000Z", "19011213T204552.000Z"));
   EXPECT_EQ(FormatUtcTimeStamp(4102444800 * kSecond),
             Either("21000101T000000.000Z", "19631125T173144.000Z"));

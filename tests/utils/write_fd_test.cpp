@@ -63,7 +63,7 @@ std::string ErrorMessage(int fd, int error) {
   return "Write fd[" + std::to_string(fd) + "] error[" + std::to_string(error) + "]\n";
 }
 
-TEST(WriteFd, ALengthOfZeroOrLessGivesZeroWithoutAWrite) {
+TEST(WriteFd, ALengthOfZeroOrLessReturnsZeroWithoutAWrite) {
   Faults faults;
   for (const int length : {0, -1, INT_MIN}) EXPECT_EQ(WriteFd(1, "x", length), 0);
   EXPECT_EQ(WriteFd(-1, nullptr, 0), 0);
@@ -160,7 +160,7 @@ TEST(WriteFd, AnInterruptedWriteIsPacedAndTriedAgain) {
   EXPECT_EQ(faults.Count(Call::kUsleep) + faults.Count(Call::kSchedYield), 2);
 }
 
-TEST(WriteFd, AnErrorAfterSomeBytesGivesTheirCount) {
+TEST(WriteFd, AnErrorAfterSomeBytesReturnsTheirCount) {
   const LogCapture log;
   const Pipe pipe;
   Faults faults;

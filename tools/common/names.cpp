@@ -3,7 +3,7 @@
 #include <algorithm>
 #include <charconv>
 
-#include "tools/common/words.h"
+#include "tools/common/text.h"
 
 namespace {
 

@@ -6,7 +6,7 @@
 
 #include "tarnwick/version.h"
 #include "tools/common/terminal.h"
-#include "tools/common/words.h"
+#include "tools/common/text.h"
 
 namespace {
 
@@ -26,11 +26,8 @@ std::string UnknownCommand(const CLI::App& app, int argc, char** argv) {
   }
   if (names.empty() || argc < 2 || argv[1][0] == '-' || !app.get_subcommands().empty()) return "";
   std::string text = "unknown sub-command \"" + std::string(argv[1]) + "\"";
-  std::string nearest;
-  for (const std::string& name : NearestNames(argv[1], names)) {
-    nearest += (nearest.empty() ? "" : ", ") + name;
-  }
-  return nearest.empty() ? text : text + " (did you mean " + nearest + "?)";
+  const std::string hint = DidYouMean(argv[1], names);
+  return hint.empty() ? text : text + " (" + hint + ")";
 }
 
 }  // namespace
@@ -43,7 +40,12 @@ void AddVersionFlag(CLI::App* app) {
                         "print the version");
 }
 
-std::optional<int> ParseArguments(CLI::App* app, int argc, char** argv) try {
+std::optional<int> ParseArguments(CLI::App* app, const CompletionWords& words, int argc,
+                                  char** argv) try {
+  if (argc > 1 && std::string(argv[1]) == "__complete") {
+    fputs(CompletionCandidates(*app, words, {argv + 2, argv + argc}).c_str(), stdout);
+    return 0;
+  }
   app->parse(argc, argv);
   return std::nullopt;
 } catch (const CLI::RuntimeError& error) {

@@ -21,8 +21,8 @@ std::string WithoutSlashes(std::string path) {
   return path;
 }
 
-bool IsBelow(const std::string& path, const char* folder) {
-  return path.compare(0, std::strlen(folder), folder) == 0;
+bool IsBelow(const std::string& path, const char* directory) {
+  return path.compare(0, std::strlen(directory), directory) == 0;
 }
 
 // Below /dev and /proc, in a directory into which no other user can put a link: /dev/shm and
@@ -34,6 +34,8 @@ bool IsSystemFile(const std::string& path) {
   const bool own = state.st_uid == 0 || state.st_uid == geteuid();
   return own && (state.st_mode & (S_IWGRP | S_IWOTH)) == 0;
 }
+
+}  // namespace
 
 bool ReadAll(int fd, size_t most, std::string* bytes) {
   char piece[65536];
@@ -49,8 +51,6 @@ bool ReadAll(int fd, size_t most, std::string* bytes) {
   }
 }
 
-}  // namespace
-
 bool WriteAll(const tarnwick::UniqueFd& fd, const std::string& bytes) {
   for (size_t done = 0; done < bytes.size();) {
     const ssize_t count = write(fd.Get(), bytes.data() + done, bytes.size() - done);
@@ -61,32 +61,32 @@ bool WriteAll(const tarnwick::UniqueFd& fd, const std::string& bytes) {
   return true;
 }
 
-tarnwick::UniqueFd OpenPrivateFolder(const std::string& path, std::string* error) {
-  const std::string folder = WithoutSlashes(path);
+tarnwick::UniqueFd OpenPrivateDirectory(const std::string& path, std::string* error) {
+  const std::string directory = WithoutSlashes(path);
   std::error_code ignored;  // mkdir tells what is wrong
-  const auto above = std::filesystem::path(folder).parent_path();
+  const auto above = std::filesystem::path(directory).parent_path();
   if (!above.empty()) std::filesystem::create_directories(above, ignored);
-  if (mkdir(folder.c_str(), 0700) != 0 && errno != EEXIST) {
-    return Refuse(folder, std::strerror(errno), error);
+  if (mkdir(directory.c_str(), 0700) != 0 && errno != EEXIST) {
+    return Refuse(directory, std::strerror(errno), error);
   }
-  tarnwick::UniqueFd fd(open(folder.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
+  tarnwick::UniqueFd fd(open(directory.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
   if (!fd.Valid()) {
     struct stat state = {};
     const int reason = errno;
-    const bool link = lstat(folder.c_str(), &state) == 0 && S_ISLNK(state.st_mode);
-    return Refuse(folder, link ? "it is a link" : std::strerror(reason), error);
+    const bool link = lstat(directory.c_str(), &state) == 0 && S_ISLNK(state.st_mode);
+    return Refuse(directory, link ? "it is a link" : std::strerror(reason), error);
   }
   struct stat state = {};
-  if (fstat(fd.Get(), &state) != 0) return Refuse(folder, std::strerror(errno), error);
-  if (state.st_uid != geteuid()) return Refuse(folder, "it belongs to another user", error);
+  if (fstat(fd.Get(), &state) != 0) return Refuse(directory, std::strerror(errno), error);
+  if (state.st_uid != geteuid()) return Refuse(directory, "it belongs to another user", error);
   return fd;
 }
 
-bool WritePrivateFile(const tarnwick::UniqueFd& folder, const std::string& name,
+bool WritePrivateFile(const tarnwick::UniqueFd& directory, const std::string& name,
                       const std::string& bytes, std::string* error) {
-  unlinkat(folder.Get(), name.c_str(), 0);  // where it cannot, the next call tells
+  unlinkat(directory.Get(), name.c_str(), 0);  // where it cannot, the next call tells
   const int flags = O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC;
-  const tarnwick::UniqueFd fd(openat(folder.Get(), name.c_str(), flags, 0600));
+  const tarnwick::UniqueFd fd(openat(directory.Get(), name.c_str(), flags, 0600));
   if (fd.Valid() && WriteAll(fd, bytes)) return true;
   *error = name + ": " + std::strerror(errno);
   return false;
@@ -120,10 +120,10 @@ tarnwick::UniqueFd OpenRegularFile(const char* path) {
   return tarnwick::UniqueFd(-1);
 }
 
-bool ReadRegularFile(const tarnwick::UniqueFd& folder, const std::string& name, size_t most,
+bool ReadRegularFile(const tarnwick::UniqueFd& directory, const std::string& name, size_t most,
                      std::string* bytes, std::string* error) {
   const int flags = O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC;
-  const tarnwick::UniqueFd fd(openat(folder.Get(), name.c_str(), flags));
+  const tarnwick::UniqueFd fd(openat(directory.Get(), name.c_str(), flags));
   struct stat state = {};
   if (!fd.Valid() || fstat(fd.Get(), &state) != 0) {
     *error = name + ": " + (errno == ELOOP ? "it is a link" : std::strerror(errno));

@@ -13,10 +13,10 @@
 
 // The directory at `path`, made with mode 0700 when it is missing, the ones above it with the usual
 // mode. One of another user is refused.
-tarnwick::UniqueFd OpenPrivateFolder(const std::string& path, std::string* error);
+tarnwick::UniqueFd OpenPrivateDirectory(const std::string& path, std::string* error);
 
 // Writes the file `name` of the directory with mode 0600, in the place of whatever has the name.
-bool WritePrivateFile(const tarnwick::UniqueFd& folder, const std::string& name,
+bool WritePrivateFile(const tarnwick::UniqueFd& directory, const std::string& name,
                       const std::string& bytes, std::string* error);
 
 // Results: false with errno.
@@ -32,8 +32,12 @@ tarnwick::UniqueFd OpenOwnFile(const std::string& path, int flags, mode_t mode, 
 // Results: not Valid() with errno: EISDIR for a directory, EINVAL for a FIFO or a device.
 tarnwick::UniqueFd OpenRegularFile(const char* path);
 
+// Appends what is left of the file to `bytes`. Results: false with errno, EFBIG when that gets
+// longer than `most`.
+bool ReadAll(int fd, size_t most, std::string* bytes);
+
 // Reads the regular file `name` of the directory, of `most` bytes at most.
-bool ReadRegularFile(const tarnwick::UniqueFd& folder, const std::string& name, size_t most,
+bool ReadRegularFile(const tarnwick::UniqueFd& directory, const std::string& name, size_t most,
                      std::string* bytes, std::string* error);
 
 #endif  // TARNWICK_TOOLS_COMMON_PRIVATE_FILE_H_

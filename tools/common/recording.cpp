@@ -42,12 +42,12 @@ Json::Value IndexLine(const RecordedExchange& exchange) {
   Json::Value& pieces = line["pieces"] = Json::Value(Json::arrayValue);
   for (const RecordedPiece& piece : exchange.pieces) {
     Json::Value entry(Json::objectValue);
-    entry["delay_ms"] = static_cast<Json::Int64>(piece.delayMs);
+    entry["delay_ms"] = static_cast<Json::Int64>(piece.delay_ms);
     entry["bytes"] = static_cast<Json::UInt64>(piece.bytes);
     pieces.append(entry);
   }
   line["end"] = exchange.end;
-  line["end_delay_ms"] = static_cast<Json::Int64>(exchange.endDelayMs);
+  line["end_delay_ms"] = static_cast<Json::Int64>(exchange.end_delay_ms);
   return line;
 }
 
@@ -59,28 +59,28 @@ bool IsKnownEnd(const std::string& end) {
 }
 
 // The bytes of the file that the member names. A recording may come from a stranger.
-bool ReadNamed(const tarnwick::UniqueFd& folder, const Json::Value& line, const char* member,
+bool ReadNamed(const tarnwick::UniqueFd& directory, const Json::Value& line, const char* member,
                std::string* bytes, std::string* error) {
   const std::string name = line.get(member, "").asString();
   if (name.empty() || name.find('/') != std::string::npos || name == ".." ||
       name.find('\0') != std::string::npos) {
-    *error = std::string("\"") + member + "\" is no name of a file in the folder";
+    *error = std::string("\"") + member + "\" is no name of a file in the directory";
     return false;
   }
-  return ReadRegularFile(folder, name, kMostBytes, bytes, error);
+  return ReadRegularFile(directory, name, kMostBytes, bytes, error);
 }
 
-bool IsDelay(int64_t delayMs) {
-  return delayMs >= 0 && delayMs <= kLongestDelay;
+bool IsDelay(int64_t delay_ms) {
+  return delay_ms >= 0 && delay_ms <= kLongestDelay;
 }
 
 bool ReadPieces(const Json::Value& line, RecordedExchange* exchange, std::string* error) {
   size_t left = exchange->response.size();
   for (const Json::Value& entry : line["pieces"]) {
     RecordedPiece piece;
-    piece.delayMs = entry.get("delay_ms", 0).asInt64();
+    piece.delay_ms = entry.get("delay_ms", 0).asInt64();
     const uint64_t bytes = entry.get("bytes", 0).asUInt64();
-    if (!IsDelay(piece.delayMs)) {
+    if (!IsDelay(piece.delay_ms)) {
       *error = "a delay is not between none and a day";
       return false;
     }
@@ -94,7 +94,7 @@ bool ReadPieces(const Json::Value& line, RecordedExchange* exchange, std::string
   return false;
 }
 
-bool ReadExchange(const tarnwick::UniqueFd& folder, const Json::Value& line,
+bool ReadExchange(const tarnwick::UniqueFd& directory, const Json::Value& line,
                   RecordedExchange* exchange, std::string* error) {
   exchange->number = line.get("number", 0).asInt();
   exchange->connection = line.get("connection", exchange->number).asInt();
@@ -104,21 +104,21 @@ bool ReadExchange(const tarnwick::UniqueFd& folder, const Json::Value& line,
   exchange->method = line.get("method", "").asString();
   exchange->target = line.get("target", "").asString();
   exchange->end = line.get("end", "close").asString();
-  exchange->endDelayMs = line.get("end_delay_ms", 0).asInt64();
+  exchange->end_delay_ms = line.get("end_delay_ms", 0).asInt64();
   if (!IsKnownEnd(exchange->end)) {
     *error = "\"end\" is none of the known ends";
     return false;
   }
-  if (!IsDelay(exchange->endDelayMs)) {
+  if (!IsDelay(exchange->end_delay_ms)) {
     *error = "\"end_delay_ms\" is not between none and a day";
     return false;
   }
-  return ReadNamed(folder, line, "request", &exchange->request, error) &&
-         ReadNamed(folder, line, "response", &exchange->response, error) &&
+  return ReadNamed(directory, line, "request", &exchange->request, error) &&
+         ReadNamed(directory, line, "response", &exchange->response, error) &&
          ReadPieces(line, exchange, error);
 }
 
-bool ParseLine(const tarnwick::UniqueFd& folder, const std::string& text,
+bool ParseLine(const tarnwick::UniqueFd& directory, const std::string& text,
                RecordedExchange* exchange, std::string* error) {
   const std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
   Json::Value line;
@@ -127,14 +127,14 @@ bool ParseLine(const tarnwick::UniqueFd& folder, const std::string& text,
     *error = "no object with an array \"pieces\"";
     return false;
   }
-  return ReadExchange(folder, line, exchange, error);
+  return ReadExchange(directory, line, exchange, error);
 }
 
 }  // namespace
 
-bool WriteRecording(const std::string& folder, const std::vector<RecordedExchange>& exchanges,
+bool WriteRecording(const std::string& directory, const std::vector<RecordedExchange>& exchanges,
                     std::string* error) {
-  const tarnwick::UniqueFd opened = OpenPrivateFolder(folder, error);
+  const tarnwick::UniqueFd opened = OpenPrivateDirectory(directory, error);
   if (!opened.Valid()) return false;
   std::string index;
   bool written = true;
@@ -146,20 +146,20 @@ bool WriteRecording(const std::string& folder, const std::vector<RecordedExchang
     index += CompactJson(IndexLine(exchange)) + "\n";
   }
   if (written && WritePrivateFile(opened, kIndex, index, error)) return true;
-  *error = folder + "/" + *error;
+  *error = directory + "/" + *error;
   return false;
 }
 
-bool ReadRecording(const std::string& folder, std::vector<RecordedExchange>* exchanges,
+bool ReadRecording(const std::string& directory, std::vector<RecordedExchange>* exchanges,
                    std::string* error) {
-  const tarnwick::UniqueFd opened(open(folder.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+  const tarnwick::UniqueFd opened(open(directory.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
   if (!opened.Valid()) {
-    *error = folder + "/" + kIndex + ": " + std::strerror(errno);
+    *error = directory + "/" + kIndex + ": " + std::strerror(errno);
     return false;
   }
   std::string text;
   if (!ReadRegularFile(opened, kIndex, kMostBytes, &text, error)) {
-    *error = folder + "/" + *error;
+    *error = directory + "/" + *error;
     return false;
   }
   std::istringstream index(text);

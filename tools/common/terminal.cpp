@@ -114,13 +114,13 @@ bool IsTerminal(int fd) {
 }
 
 bool MayColour(int fd) {
-  const char* const noColour = std::getenv("NO_COLOR");
-  if (noColour != nullptr && *noColour != '\0') return false;
+  const char* const no_colour = std::getenv("NO_COLOR");
+  if (no_colour != nullptr && *no_colour != '\0') return false;
   const char* const type = std::getenv("TERM");
   return type != nullptr && *type != '\0' && std::strcmp(type, "dumb") != 0 && IsTerminal(fd);
 }
 
-std::string Paint(Colour colour, std::string_view text, bool enabled) {
+std::string InColour(Colour colour, std::string_view text, bool enabled) {
   if (!enabled || colour == Colour::kNone) return std::string(text);
   std::string result(CodeOf(colour));
   result.append(text);

@@ -15,9 +15,9 @@ bool IsTerminal(int fd);
 bool MayColour(int fd);
 
 // `text` in that colour, or as it is when `enabled` is false.
-std::string Paint(Colour colour, std::string_view text, bool enabled);
+std::string InColour(Colour colour, std::string_view text, bool enabled);
 
-// Columns of the terminal behind `fd`; 80 when it is none or does not tell.
+// Columns of the terminal `fd`; 80 when it is none or does not know.
 int TerminalWidth(int fd);
 
 enum class Backslash { kDoubled, kKept };

@@ -4,9 +4,9 @@
 #include <algorithm>
 #include <set>
 
-#include "tools/common/amounts.h"
 #include "tools/common/completion.h"
 #include "tools/common/parser.h"
+#include "tools/common/units.h"
 
 namespace {
 
@@ -54,15 +54,16 @@ void AddServing(CLI::App* app, Arguments* arguments) {
 }
 
 void AddFiles(CLI::App* app, Arguments* arguments) {
-  app->add_option("--dir", arguments->dir,
-                  "Write the authority's certificate, ca.pem, into this folder and leave it there; "
-                  "otherwise into one that goes away at the end.")
+  app->add_option(
+         "--dir", arguments->dir,
+         "Write the authority's certificate, ca.pem, into this directory and leave it there; "
+         "otherwise into one that goes away at the end.")
       ->type_name("DIR");
   app->add_option("--journal", arguments->journal,
                   "Append a JSON line for each connection to this file; - is standard output.")
       ->type_name("FILE");
   app->add_option("--access", arguments->access,
-                  "Append a line \"METHOD PATH STATUS\" for each answer to this file.")
+                  "Append a line \"METHOD PATH STATUS\" for each response to this file.")
       ->type_name("FILE");
 }
 
@@ -70,15 +71,16 @@ void AddLimits(CLI::App* app, Arguments* arguments) {
   AddSpan(app, "--idle", &arguments->idle,
           "Close a connection on which nothing comes for so long; 60s when it is not given.");
   AddSpan(app, "--hold", &arguments->hold,
-          "End a stall for good behind that span; 1h when it is not given.");
+          "End a stall for good after that span; 1h when it is not given.");
   AddSpan(app, "--for", &arguments->run_for,
-          "End by itself behind that span; otherwise at SIGTERM or SIGINT.");
+          "End by itself after that span; otherwise at SIGTERM or SIGINT.");
 }
 
 void AddLists(CLI::App* app, Arguments* arguments) {
   app->add_flag("--list-faults", arguments->list_faults, "List the faults and end.");
   app->add_flag("--list-profiles", arguments->list_profiles, "List the profiles and end.");
-  app->add_flag("--list-logins", arguments->list_logins, "List the styles of login and end.");
+  app->add_flag("--list-logins", arguments->list_logins,
+                "List the styles of authentication and end.");
   app->add_flag("--json", arguments->json, "Make the lists JSON, one object a line.");
 }
 
@@ -135,15 +137,15 @@ std::optional<int> ParseArguments(int argc, char** argv, Arguments* arguments) {
   AddFiles(&app, arguments);
   AddLimits(&app, arguments);
   AddLists(&app, arguments);
-  AddCompletion(&app, Words());
-  return ParseArguments(&app, argc, argv);
+  AddCompletion(&app);
+  return ParseArguments(&app, Words(), argc, argv);
 }
 
 bool MakeEndpoints(const Arguments& arguments, std::vector<std::unique_ptr<Endpoint>>* endpoints,
                    std::string* error) {
   std::vector<std::string> texts = arguments.endpoints;
   if (!arguments.replay.empty()) texts.push_back("replay,dir=" + arguments.replay);
-  for (const std::string& text : texts.empty() ? StandardEndpoints() : texts) {
+  for (const std::string& text : texts.empty() ? DefaultEndpoints() : texts) {
     std::unique_ptr<Endpoint> endpoint = ParseEndpoint(text, error);
     if (!endpoint || !AddGlobalFaults(arguments, endpoint.get(), error)) return false;
     if (endpoint->host.empty()) endpoint->host = arguments.listen;

@@ -13,9 +13,9 @@ enum class Opening { kServe, kClose, kReset, kNeverRead };
 enum class TlsOpening {
   kHandshake,
   kStall,    // accepts TCP and says nothing
-  kGarbage,  // answers with bytes that are no TLS
+  kGarbage,  // responds with bytes that are no TLS
   kPlain,    // serves HTTP without TLS
-  kClose,    // closes behind the client's first message
+  kClose,    // closes after the client's first message
   kReset,
   kAlert,  // refuses with a fatal alert
   kCut,    // closes in the middle of its own part of the handshake
@@ -37,11 +37,11 @@ struct Behaviour {
   bool close_notice = true;
 
   AfterRequest after_request = AfterRequest::kAnswer;
-  int64_t request_limit = -1;  // closes behind that many bytes of the request
+  int64_t request_limit = -1;  // closes after that many bytes of the request
   size_t read_piece = 0;       // reads so many bytes each read_interval; 0: as fast as they come
   std::chrono::milliseconds read_interval{0};
 
-  int64_t output_limit = -1;  // ends the connection behind that many bytes of output
+  int64_t output_limit = -1;  // ends the connection after that many bytes of output
   bool reset_at_limit = false;
   size_t write_piece = 0;  // sends so many bytes each write_interval; 0: all at once
   std::chrono::milliseconds write_interval{0};

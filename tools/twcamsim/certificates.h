@@ -1,4 +1,5 @@
-// A certificate authority of the simulator's own, and the certificates that it gives its endpoints.
+// A certificate authority of the simulator's own, and the certificates that it issues for its
+// endpoints.
 #ifndef TARNWICK_TOOLS_TWCAMSIM_CERTIFICATES_H_
 #define TARNWICK_TOOLS_TWCAMSIM_CERTIFICATES_H_
 

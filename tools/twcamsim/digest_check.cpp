@@ -15,7 +15,7 @@ void SkipBlanks(const std::string& text, size_t* at) {
   if (*at == std::string::npos) *at = text.size();
 }
 
-// Reads the value at `*at` and leaves `*at` behind it.
+// Reads the value at `*at` and leaves `*at` after it.
 bool ReadWord(const std::string& text, size_t* at, DigestWord* word) {
   if (*at < text.size() && text[*at] == '"') {
     const size_t end = text.find('"', *at + 1);
@@ -29,11 +29,6 @@ bool ReadWord(const std::string& text, size_t* at, DigestWord* word) {
   word->value.erase(word->value.find_last_not_of(kBlanks) + 1);
   *at = end;
   return true;
-}
-
-std::string LowerCase(std::string text) {
-  for (char& letter : text) letter = static_cast<char>(std::tolower(letter));
-  return text;
 }
 
 std::string Ha2(const DigestInput& input) {

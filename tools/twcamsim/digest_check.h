@@ -1,11 +1,11 @@
-// The arithmetic of Digest logins (RFC 2617).
+// The arithmetic of Digest authentication (RFC 2617).
 #ifndef TARNWICK_TOOLS_TWCAMSIM_DIGEST_CHECK_H_
 #define TARNWICK_TOOLS_TWCAMSIM_DIGEST_CHECK_H_
 
 #include <map>
 #include <string>
 
-#include "tools/twcamsim/login.h"
+#include "tools/twcamsim/authenticator.h"
 
 // A parameter of an Authorization line.
 struct DigestWord {
@@ -15,7 +15,7 @@ struct DigestWord {
 
 using DigestWords = std::map<std::string, DigestWord>;  // names in lower case
 
-// Takes the text behind "Digest " apart.
+// Takes the text after "Digest " apart.
 // Results: false when a quote is not closed or a parameter has no "=".
 bool ParseDigestWords(const std::string& text, DigestWords* words);
 
@@ -33,7 +33,7 @@ struct DigestInput {
   std::string nonce;
   std::string count;
   std::string cnonce;
-  std::string qop;  // "", "auth" or "auth-int"; anything else counts as ""
+  std::string qop;  // "", "auth" or "auth-int"; anything else is taken for ""
   bool session = false;
 };
 

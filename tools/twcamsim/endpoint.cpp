@@ -4,7 +4,7 @@
 
 #include <algorithm>
 
-#include "tools/common/words.h"
+#include "tools/common/text.h"
 
 namespace {
 
@@ -28,8 +28,8 @@ bool HasOption(const std::vector<ProfileOption>& table, const std::string& name)
 }
 
 std::string Suggest(const std::string& name, const std::vector<std::string>& names) {
-  const std::vector<std::string> nearest = NearestNames(name, names);
-  return nearest.empty() ? "" : fmt::format("; did you mean {}?", fmt::join(nearest, ", "));
+  const std::string hint = DidYouMean(name, names);
+  return hint.empty() ? "" : "; " + hint;
 }
 
 std::string UnknownProfile(const std::string& name) {
@@ -52,12 +52,12 @@ bool SetPort(const std::string& text, Endpoint* endpoint, std::string* error) {
   return true;
 }
 
-bool SetLogin(const std::string& text, Endpoint* endpoint, std::string* error) {
-  endpoint->login_style = text;
-  if (FindLoginStyle(text)) return true;
+bool SetAuthentication(const std::string& text, Endpoint* endpoint, std::string* error) {
+  endpoint->authentication_style = text;
+  if (FindAuthenticationStyle(text)) return true;
   std::vector<std::string> names;
-  for (const LoginStyle& style : LoginStyles()) names.push_back(style.name);
-  *error = fmt::format("there is no login \"{}\"{}", text, Suggest(text, names));
+  for (const AuthenticationStyle& style : AuthenticationStyles()) names.push_back(style.name);
+  *error = fmt::format("there is no style of authentication \"{}\"{}", text, Suggest(text, names));
   return false;
 }
 
@@ -72,7 +72,7 @@ bool AddFault(const std::string& text, Endpoint* endpoint, std::string* error) {
 bool SetCommon(const Option& option, Endpoint* endpoint, std::string* error) {
   const auto& [name, value] = option;
   if (name == "port") return SetPort(value, endpoint, error);
-  if (name == "login") return SetLogin(value, endpoint, error);
+  if (name == "login") return SetAuthentication(value, endpoint, error);
   if (name == "fault") return AddFault(value, endpoint, error);
   if (name == "tls" && !value.empty()) {
     *error = "tls takes no value";
@@ -123,7 +123,7 @@ std::unique_ptr<Endpoint> ParseEndpoint(const std::string& text, std::string* er
     return nullptr;
   }
   auto endpoint = std::make_unique<Endpoint>(type, AccountOf(options));
-  endpoint->login_style = type->login;
+  endpoint->authentication_style = type->authentication;
   if (!ApplyOptions(options, endpoint.get(), error)) {
     *error = "endpoint " + text + ": " + *error;
     return nullptr;
@@ -135,20 +135,20 @@ std::unique_ptr<Endpoint> ParseEndpoint(const std::string& text, std::string* er
 
 const std::vector<ProfileOption>& CommonOptions() {
   static const std::vector<ProfileOption> kOptions = {
-      {"port", "NUMBER", "the port; 0, the standard: any free one"},
+      {"port", "NUMBER", "the port; 0, the default: any free one"},
       {"host", "ADDRESS", "the address to listen at instead of --listen's"},
       {"tls", "", "with TLS"},
       {"name", "TEXT", "the name in the list of ports and in the journal"},
-      {"login", "STYLE", "the login that is asked for (--list-logins)"},
-      {"user", "TEXT", "the user that may log in; the standard is operator"},
-      {"password", "TEXT", "the password; the standard is gate-7"},
-      {"realm", "TEXT", "the realm; the standard is camera"},
+      {"login", "STYLE", "the authentication that is asked for (--list-logins)"},
+      {"user", "TEXT", "the user that may log in; the default is operator"},
+      {"password", "TEXT", "the password; the default is gate-7"},
+      {"realm", "TEXT", "the realm; the default is camera"},
       {"fault", "NAME[:ARG[:ARG]]", "a fault of this endpoint alone; may come several times"},
   };
   return kOptions;
 }
 
-const std::vector<std::string>& StandardEndpoints() {
+const std::vector<std::string>& DefaultEndpoints() {
   static const std::vector<std::string> kEndpoints = {
       "json",  "json,tls", "cgi",       "cgi-basic", "cgi-digest", "soap",
       "store", "snapshot", "multipart", "upload",    "site",       "site,tls",

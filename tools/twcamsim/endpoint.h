@@ -1,4 +1,4 @@
-// An endpoint: an address, what answers there and what is wrong with it.
+// An endpoint: an address, what responds there and what is wrong with it.
 #ifndef TARNWICK_TOOLS_TWCAMSIM_ENDPOINT_H_
 #define TARNWICK_TOOLS_TWCAMSIM_ENDPOINT_H_
 
@@ -8,13 +8,13 @@
 #include <string>
 #include <vector>
 
+#include "tools/twcamsim/authenticator.h"
 #include "tools/twcamsim/faults.h"
-#include "tools/twcamsim/login.h"
 #include "tools/twcamsim/profile.h"
 
 struct Endpoint {
   Endpoint(const ProfileType* profile_type, Account account)
-      : type(profile_type), login(std::move(account)) {}
+      : type(profile_type), authenticator(std::move(account)) {}
 
   const ProfileType* type;
   std::string name;
@@ -22,8 +22,8 @@ struct Endpoint {
   std::string host;
   uint16_t port = 0;  // 0 until it listens, unless one was asked for
   bool tls = false;
-  std::string login_style;
-  Login login;
+  std::string authentication_style;
+  Authenticator authenticator;
   std::unique_ptr<Profile> profile;
   std::vector<Fault> faults;
   std::atomic<int> connections{0};
@@ -37,6 +37,6 @@ std::unique_ptr<Endpoint> ParseEndpoint(const std::string& text, std::string* er
 const std::vector<ProfileOption>& CommonOptions();
 
 // What is started when no endpoint is asked for.
-const std::vector<std::string>& StandardEndpoints();
+const std::vector<std::string>& DefaultEndpoints();
 
 #endif  // TARNWICK_TOOLS_TWCAMSIM_ENDPOINT_H_

@@ -4,7 +4,7 @@
 
 #include <charconv>
 
-#include "tools/common/words.h"
+#include "tools/common/text.h"
 
 namespace {
 
@@ -28,10 +28,9 @@ const FaultType* FindFault(const std::string& name) {
 std::string UnknownFault(const std::string& name) {
   std::vector<std::string> names;
   for (const FaultType& type : FaultTypes()) names.emplace_back(type.name);
-  const std::vector<std::string> nearest = NearestNames(name, names);
+  const std::string hint = DidYouMean(name, names);
   const std::string text = fmt::format("there is no fault \"{}\"", name);
-  if (nearest.empty()) return text + "; --list-faults shows them";
-  return fmt::format("{}; did you mean {}?", text, fmt::join(nearest, ", "));
+  return text + "; " + (hint.empty() ? "--list-faults shows them" : hint);
 }
 
 bool ParseArgument(const ArgumentRule& rule, const std::string& text, FaultArgument* argument) {
@@ -59,11 +58,11 @@ bool ParseArguments(const FaultType& type, const std::vector<std::string>& texts
   }
   for (size_t i = 0; i < type.rules.size(); ++i) {
     const ArgumentRule& rule = type.rules[i];
-    if (i >= texts.size() && !rule.standard) {
+    if (i >= texts.size() && !rule.default_value) {
       *error = fmt::format("fault {} needs {}", type.name, rule.name);
       return false;
     }
-    const std::string text = i < texts.size() ? texts[i] : rule.standard;
+    const std::string text = i < texts.size() ? texts[i] : rule.default_value;
     FaultArgument argument;
     if (!ParseArgument(rule, text, &argument)) {
       *error = WrongArgument(type, rule, text);
@@ -80,7 +79,7 @@ const std::vector<FaultType>& FaultTypes() {
   static const std::vector<FaultType> kTypes = [] {
     std::vector<FaultType> types;
     for (const auto part : {ConnectionFaults, TlsFaults, TimingFaults, LengthFaults, ChunkFaults,
-                            HeadFaults, LoginFaults, BodyFaults}) {
+                            HeadFaults, AuthenticationFaults, BodyFaults}) {
       for (FaultType& type : part()) types.push_back(std::move(type));
     }
     return types;
@@ -91,7 +90,7 @@ const std::vector<FaultType>& FaultTypes() {
 std::string ArgumentsText(const FaultType& type) {
   std::string text, closing;
   for (const ArgumentRule& rule : type.rules) {
-    if (rule.standard) {
+    if (rule.default_value) {
       text += "[";
       closing += "]";
     }

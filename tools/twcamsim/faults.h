@@ -6,16 +6,16 @@
 #include <string>
 #include <vector>
 
+#include "tools/twcamsim/authenticator.h"
 #include "tools/twcamsim/behaviour.h"
-#include "tools/twcamsim/login.h"
 #include "tools/twcamsim/random.h"
 #include "tools/twcamsim/request.h"
 #include "tools/twcamsim/response.h"
 
 // One argument of a fault.
 struct ArgumentRule {
-  const char* name;                // "BYTES", "MS": the unit
-  const char* standard = nullptr;  // what it is when it is left out; nullptr: it must be given
+  const char* name;                     // "BYTES", "MS": the unit
+  const char* default_value = nullptr;  // what it is when it is left out; nullptr: it is required
   int64_t least = 0;
   int64_t most = 0;  // least == most: a text
 };
@@ -38,11 +38,11 @@ struct FaultContext {
 // Where a fault takes hold; a fault has one hook or several.
 struct FaultHooks {
   void (*behaviour)(Behaviour*, const FaultContext&) = nullptr;
-  void (*login)(LoginStyle*, const FaultContext&) = nullptr;
-  // The answer itself; challenges are left alone.
+  void (*authentication)(AuthenticationStyle*, const FaultContext&) = nullptr;
+  // The response itself; challenges are left alone.
   void (*response)(Response*, const FaultContext&) = nullptr;
-  // Every answer on its way, challenges as well.
-  void (*wire)(Wire*, const FaultContext&) = nullptr;
+  // Every response on its way, challenges as well.
+  void (*steps)(Steps*, const FaultContext&) = nullptr;
 };
 
 struct FaultType {
@@ -67,7 +67,7 @@ const std::vector<FaultType>& FaultTypes();
 std::string ArgumentsText(const FaultType& type);
 
 // A fault from "NAME", "NAME=ARG" or "NAME=ARG,ARG"; `separator` stands between the arguments, and
-// `assign` behind the name.
+// `assign` after the name.
 // Results: false with a sentence in `error`, which names the nearest faults for an unknown one.
 bool ParseFault(const std::string& text, char assign, char separator, Fault* fault,
                 std::string* error);
@@ -79,7 +79,7 @@ std::vector<FaultType> TimingFaults();
 std::vector<FaultType> LengthFaults();
 std::vector<FaultType> ChunkFaults();
 std::vector<FaultType> HeadFaults();
-std::vector<FaultType> LoginFaults();
+std::vector<FaultType> AuthenticationFaults();
 std::vector<FaultType> BodyFaults();
 
 #endif  // TARNWICK_TOOLS_TWCAMSIM_FAULTS_H_

@@ -1,4 +1,4 @@
-// The journal: a JSON object a line for each connection, and a short line for each answer.
+// The journal: a JSON object a line for each connection, and a short line for each response.
 #ifndef TARNWICK_TOOLS_TWCAMSIM_JOURNAL_H_
 #define TARNWICK_TOOLS_TWCAMSIM_JOURNAL_H_
 
@@ -16,8 +16,8 @@ class Journal {
   Journal(const Journal&) = delete;
   Journal& operator=(const Journal&) = delete;
 
-  // Appends to the file, which is made for the caller alone: it holds logins. A link and the file
-  // of another user are refused. "-" is standard output, and an empty name nothing at all.
+  // Appends to the file, which is made for the caller alone: it holds credentials. A link and the
+  // file of another user are refused. "-" is standard output, and an empty name nothing at all.
   // Results: false with the reason in `error`.
   bool Open(const std::string& path, std::string* error);
 

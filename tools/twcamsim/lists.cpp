@@ -27,7 +27,7 @@ Json::Value FaultRecord(const FaultType& type) {
   value["arguments"] = ArgumentsText(type);
   value["standards"] = Json::Value(Json::arrayValue);
   for (const ArgumentRule& rule : type.rules) {
-    value["standards"].append(rule.standard ? Json::Value(rule.standard) : Json::Value());
+    value["standards"].append(rule.default_value ? Json::Value(rule.default_value) : Json::Value());
   }
   return value;
 }
@@ -67,7 +67,7 @@ bool ListProfiles(bool json) {
   std::string text;
   for (const ProfileType& type : ProfileTypes()) {
     Json::Value value = Named(type.name, type.meaning);
-    value["login"] = type.login;
+    value["login"] = type.authentication;
     value["options"] = OptionRecords(type.options);
     if (json && !PrintJsonLine(value)) return false;
     text += fmt::format("{:<12}  {}\n", type.name, type.meaning);
@@ -80,7 +80,7 @@ bool ListProfiles(bool json) {
 
 bool ListLogins(bool json) {
   std::string text;
-  for (const LoginStyle& style : LoginStyles()) {
+  for (const AuthenticationStyle& style : AuthenticationStyles()) {
     if (json && !PrintJsonLine(Named(style.name.c_str(), style.meaning.c_str()))) return false;
     text += fmt::format("{:<28}  {}\n", style.name, style.meaning);
   }

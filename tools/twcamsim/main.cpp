@@ -26,17 +26,17 @@ int Complain(int status, const std::string& text) {
   return status;
 }
 
-// The folder for the authority's certificate: one that stays, or one that goes away with this
+// The directory for the authority's certificate: one that stays, or one that goes away with this
 // object.
-class Folder {
+class Directory {
  public:
-  Folder() = default;
-  ~Folder() {
+  Directory() = default;
+  ~Directory() {
     std::error_code ignored;
     if (temporary_) std::filesystem::remove_all(path_, ignored);
   }
-  Folder(const Folder&) = delete;
-  Folder& operator=(const Folder&) = delete;
+  Directory(const Directory&) = delete;
+  Directory& operator=(const Directory&) = delete;
 
   bool Make(const std::string& wish, std::string* error) {
     path_ = wish;
@@ -73,12 +73,12 @@ std::set<std::string> TlsHosts(const std::vector<std::unique_ptr<Endpoint>>& end
   return hosts;
 }
 
-bool PrepareWorld(const Arguments& arguments, World* world, std::string* error) {
-  world->seed = arguments.seed ? *arguments.seed : std::random_device()();
-  world->idle = arguments.idle;
-  world->hold = arguments.hold;
-  return world->journal.Open(arguments.journal, error) &&
-         world->access.Open(arguments.access, error);
+bool PrepareSharedState(const Arguments& arguments, SharedState* shared, std::string* error) {
+  shared->seed = arguments.seed ? *arguments.seed : std::random_device()();
+  shared->idle = arguments.idle;
+  shared->hold = arguments.hold;
+  return shared->journal.Open(arguments.journal, error) &&
+         shared->access.Open(arguments.access, error);
 }
 
 // A simulated camera takes what it gets, from whoever reaches it, and its passwords stand in its
@@ -93,23 +93,23 @@ void WarnOfNetwork(const std::vector<std::unique_ptr<Endpoint>>& endpoints) {
 }
 
 int Serve(const Arguments& arguments, std::vector<std::unique_ptr<Endpoint>> endpoints) {
-  World world;
-  Folder folder;
+  SharedState shared;
+  Directory directory;
   std::string error;
-  if (!PrepareWorld(arguments, &world, &error)) return Complain(kFailed, error);
+  if (!PrepareSharedState(arguments, &shared, &error)) return Complain(kFailed, error);
   Json::Value report(Json::objectValue);
-  report["seed"] = static_cast<Json::UInt64>(world.seed);
+  report["seed"] = static_cast<Json::UInt64>(shared.seed);
   report["pid"] = getpid();
   const std::set<std::string> hosts = TlsHosts(endpoints);
   WarnOfNetwork(endpoints);
   if (!hosts.empty()) {
-    if (!folder.Make(arguments.dir, &error) || !world.certificates.Make(hosts, &error) ||
-        !world.certificates.WriteAuthority(folder.Path() + "/ca.pem", &error)) {
+    if (!directory.Make(arguments.dir, &error) || !shared.certificates.Make(hosts, &error) ||
+        !shared.certificates.WriteAuthority(directory.Path() + "/ca.pem", &error)) {
       return Complain(kFailed, error);
     }
-    report["ca"] = folder.Path() + "/ca.pem";
+    report["ca"] = directory.Path() + "/ca.pem";
   }
-  Server server(&world, std::move(endpoints));
+  Server server(&shared, std::move(endpoints));
   if (!server.Listen(&error)) return Complain(kFailed, error);
   report["endpoints"] = server.Describe();
   if (!PrintJsonLine(report)) return Complain(kFailed, "standard output is gone");

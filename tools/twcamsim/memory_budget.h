@@ -14,10 +14,10 @@ class MemoryBudget {
   // Results: false when so many are not left; none are taken then.
   bool Take(size_t bytes) {
     if (used_.fetch_add(bytes) + bytes <= kBytes) return true;
-    Give(bytes);
+    Release(bytes);
     return false;
   }
-  void Give(size_t bytes) { used_.fetch_sub(bytes); }
+  void Release(size_t bytes) { used_.fetch_sub(bytes); }
 
  private:
   std::atomic<size_t> used_{0};

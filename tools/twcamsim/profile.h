@@ -1,4 +1,4 @@
-// What an endpoint answers.
+// What an endpoint responds with.
 #ifndef TARNWICK_TOOLS_TWCAMSIM_PROFILE_H_
 #define TARNWICK_TOOLS_TWCAMSIM_PROFILE_H_
 
@@ -18,10 +18,10 @@ using ProfileOptions = std::map<std::string, std::string>;
 // Takes the next bytes of a request's body; false when the peer's direction has ended.
 using BodySource = std::function<bool(std::string* bytes)>;
 
-// One request that has passed the login.
+// One request that has passed the authentication.
 struct Exchange {
   const Request& request;
-  const std::string& user;  // who logged in; empty without a login
+  const std::string& user;  // whose credentials came; empty without any
   Random* random;
   BodySource* source;  // of a request that TakesStream; else nullptr
 };
@@ -31,13 +31,13 @@ class Profile {
  public:
   virtual ~Profile() = default;
 
-  virtual Response Answer(const Exchange& exchange) = 0;
+  virtual Response Respond(const Exchange& exchange) = 0;
 
-  // True when the body of `request` goes to Answer piece by piece. The connection closes behind the
-  // answer.
+  // True when the body of `request` goes to Respond piece by piece. The connection closes after the
+  // response.
   virtual bool TakesStream(const Request& request) const;
 
-  // The name of the login style for that request; empty: the endpoint's.
+  // The name of the authentication style for that request; empty: the endpoint's.
   virtual std::string LoginFor(const Request& request) const;
 
   // True when an endpoint of this profile speaks TLS without being asked to.
@@ -55,7 +55,7 @@ struct ProfileOption {
 
 struct ProfileType {
   const char* name;
-  const char* login;  // the style when the endpoint has no option "login"
+  const char* authentication;  // the style when the endpoint has no option "login"
   const char* meaning;
   std::vector<ProfileOption> options;
   // Results: nullptr with a sentence in `error` when an option's value is wrong.
@@ -68,7 +68,7 @@ const std::vector<ProfileType>& ProfileTypes();
 // nullptr when there is none of that name.
 const ProfileType* FindProfile(const std::string& name);
 
-// The number in `options`, `standard` when it is not there.
+// The number in `options`, the default when it is not there.
 // Results: false with a sentence in `error` when it is no number from `least` to `most`.
 bool NumberOption(const ProfileOptions& options, const char* name, int64_t least, int64_t most,
                   int64_t* value, std::string* error);

@@ -1,16 +1,10 @@
 #include "tools/twcamsim/request.h"
 
-#include <strings.h>
-
 #include <charconv>
-
-bool SameName(std::string_view left, std::string_view right) {
-  return left.size() == right.size() && strncasecmp(left.data(), right.data(), left.size()) == 0;
-}
 
 std::string Request::Get(std::string_view name) const {
   for (const Header& header : headers) {
-    if (SameName(header.name, name)) return header.value;
+    if (EqualsIgnoringCase(header.name, name)) return header.value;
   }
   return "";
 }
@@ -22,9 +16,9 @@ int64_t Request::Length() const {
   return error == std::errc() && end == text.data() + text.size() ? length : -1;
 }
 
-// A client in the field ends its "close" with a semicolon, so the beginning counts.
+// The library's form POST writes "close;" (docs/wire.md), so only the beginning is compared.
 bool Request::KeepsAlive() const {
   const std::string wish = Get("Connection");
-  if (SameName(wish.substr(0, 5), "close")) return false;
-  return version >= 11 || SameName(wish, "keep-alive");
+  if (EqualsIgnoringCase(wish.substr(0, 5), "close")) return false;
+  return version >= 11 || EqualsIgnoringCase(wish, "keep-alive");
 }

@@ -7,6 +7,8 @@
 #include <string_view>
 #include <vector>
 
+#include "tools/common/text.h"
+
 struct Header {
   std::string name;
   std::string value;
@@ -16,14 +18,14 @@ struct Request {
   std::string method;
   std::string target;  // as on the request line
   std::string path;    // the target up to the "?"
-  std::string query;   // and behind it
+  std::string query;   // and after it
   int version = 11;    // 10: HTTP/1.0
   std::vector<Header> headers;
   std::string head;  // the bytes up to the blank line
   std::string body;
 
   // What a strict server would refuse in the head; empty when nothing.
-  std::string sloppy;
+  std::string deviation;
 
   // The value of the first header of that name, in any case; empty when there is none.
   std::string Get(std::string_view name) const;
@@ -33,8 +35,5 @@ struct Request {
 
   bool KeepsAlive() const;
 };
-
-// True when the texts differ in nothing but the case of ASCII letters.
-bool SameName(std::string_view left, std::string_view right);
 
 #endif  // TARNWICK_TOOLS_TWCAMSIM_REQUEST_H_

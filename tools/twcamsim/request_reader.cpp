@@ -15,15 +15,16 @@ namespace {
 constexpr size_t kMostHead = 1 << 20;
 constexpr int64_t kMostBody = 64 << 20;
 
-// A client of TLS waits for its answer, so that its blank line would never come.
+// A client of TLS waits for its response, so that its blank line would never come.
 bool MayBecomeHead(const std::string& bytes, std::string* complaint) {
   if (bytes.size() > kMostHead) *complaint = "the head is longer than 1 MiB";
   if (!bytes.empty() && bytes[0] == '\x16') *complaint = "the client speaks TLS, not HTTP";
   return complaint->empty();
 }
 
-// Clients in the field put a blank in front of a colon, which the parser refuses. Takes it out of
-// the header lines and tells whether there was one. One pass: a head has up to 1 MiB of lines.
+// The library's upload writes a blank before a colon (docs/wire.md), which the parser refuses.
+// Takes it out of the header lines and returns whether there was one. One pass: a head has up to 1
+// MiB of lines.
 bool RemoveBlanksBeforeColons(std::string* head) {
   std::string cleaned;
   cleaned.reserve(head->size());
@@ -53,18 +54,19 @@ bool RemoveSemicolonOfConnection(std::string* head) {
     const size_t end = head->find("\r\n", line + 2);
     if (end == std::string::npos) break;
     const std::string_view text = std::string_view(*head).substr(line + 2, end - line - 2);
-    if (!SameName(text.substr(0, kName.size()), kName) || text.back() != ';') continue;
+    if (!EqualsIgnoringCase(text.substr(0, kName.size()), kName) || text.back() != ';') continue;
     head->erase(end - 1, 1);
     return true;
   }
   return false;
 }
 
-// Makes a head one that the parser takes; tells in `sloppy` what it was.
-void Tolerate(std::string* head, std::string* sloppy) {
-  if (RemoveBlanksBeforeColons(head)) *sloppy = "blank in front of a colon";
+// Makes a head one that the parser takes; tells in `deviation` what it was.
+void Tolerate(std::string* head, std::string* deviation) {
+  if (RemoveBlanksBeforeColons(head)) *deviation = "blank in front of a colon";
   if (RemoveSemicolonOfConnection(head)) {
-    *sloppy += std::string(sloppy->empty() ? "" : ", ") + "semicolon behind Connection's value";
+    *deviation +=
+        std::string(deviation->empty() ? "" : ", ") + "semicolon after Connection's value";
   }
 }
 
@@ -86,12 +88,12 @@ struct RequestReader::Parser {
   http::request_parser<http::string_body> parser;
 };
 
-RequestReader::RequestReader(Link* link, const Behaviour& behaviour, Milliseconds limit,
+RequestReader::RequestReader(Connection* connection, const Behaviour& behaviour, Milliseconds limit,
                              MemoryBudget* budget)
-    : link_(link), behaviour_(behaviour), limit_(limit), budget_(budget) {}
+    : connection_(connection), behaviour_(behaviour), limit_(limit), budget_(budget) {}
 
 RequestReader::~RequestReader() {
-  budget_->Give(held_);
+  budget_->Release(held_);
 }
 
 // The size of the head, its blank line included; npos when that has not come. What was searched is
@@ -105,14 +107,14 @@ size_t RequestReader::HeadSize() {
 
 void RequestReader::Release() {
   parser_.reset();
-  budget_->Give(held_ - pending_.size());
+  budget_->Release(held_ - pending_.size());
   held_ = pending_.size();
 }
 
 Io RequestReader::ReadMore() {
   size_t most = 65536;
   if (behaviour_.read_piece > 0) {
-    result_ = link_->Pause(behaviour_.read_interval);
+    result_ = connection_->Pause(behaviour_.read_interval);
     if (result_ != Io::kDone) return result_;
     most = std::min(most, behaviour_.read_piece);
   }
@@ -122,7 +124,7 @@ Io RequestReader::ReadMore() {
     most = static_cast<size_t>(std::min(static_cast<int64_t>(most), left));
   }
   const size_t before = pending_.size();
-  result_ = link_->Read(&pending_, most, limit_);
+  result_ = connection_->Read(&pending_, most, limit_);
   const size_t got = pending_.size() - before;
   taken_ += static_cast<int64_t>(got);
   full_ = !budget_->Take(got);
@@ -143,7 +145,7 @@ Reading RequestReader::ReadHead(Request* request) {
       request->head = pending_;
       return Reading::kLimit;
     }
-    if (!MayBecomeHead(pending_, &request->sloppy)) return Reading::kBad;
+    if (!MayBecomeHead(pending_, &request->deviation)) return Reading::kBad;
     if (ReadMore() != Io::kDone) {
       request->head = pending_;
       if (full_) return Reading::kFull;
@@ -157,13 +159,13 @@ Reading RequestReader::ReadHead(Request* request) {
 
 Reading RequestReader::Parse(Request* request) {
   std::string head = request->head;
-  Tolerate(&head, &request->sloppy);
+  Tolerate(&head, &request->deviation);
   parser_ = std::make_unique<Parser>();
   beast::error_code code;
   auto& parser = parser_->parser;
   parser.put(boost::asio::buffer(head), code);
   if (code && code != http::error::need_more) {
-    request->sloppy = code.message();
+    request->deviation = code.message();
     return Reading::kBad;
   }
   request->method = Text(parser.get().method_string());
@@ -182,7 +184,7 @@ Reading RequestReader::ReadBody(Request* request) {
   auto& parser = parser_->parser;
   while (!parser.is_done()) {
     if (request->Length() > kMostBody || parser_->BodySize() > kMostBody) {
-      request->sloppy = "the body is longer than 64 MiB";
+      request->deviation = "the body is longer than 64 MiB";
       return Reading::kBad;
     }
     if (pending_.empty()) {
@@ -196,7 +198,7 @@ Reading RequestReader::ReadBody(Request* request) {
     if (code == http::error::need_more) {
       if (ReadMore() != Io::kDone) break;
     } else if (code) {
-      request->sloppy = code.message();
+      request->deviation = code.message();
       return Reading::kBad;
     }
   }

@@ -7,7 +7,7 @@
 #include <string>
 
 #include "tools/twcamsim/behaviour.h"
-#include "tools/twcamsim/link.h"
+#include "tools/twcamsim/connection.h"
 #include "tools/twcamsim/memory_budget.h"
 #include "tools/twcamsim/request.h"
 
@@ -15,7 +15,7 @@ enum class Reading {
   kDone,
   kNothing,  // the peer ended the connection between two requests
   kBroken,   // it did so inside of one, or the connection failed; Result tells
-  kBad,      // what came is no HTTP; the request's `sloppy` tells
+  kBad,      // what came is no HTTP; the request's `deviation` tells
   kFull,     // all connections together hold as much as they may
   kLimit,    // the behaviour's limit is reached
 };
@@ -25,7 +25,8 @@ class RequestReader {
  public:
   using Milliseconds = std::chrono::milliseconds;
 
-  RequestReader(Link* link, const Behaviour& behaviour, Milliseconds limit, MemoryBudget* budget);
+  RequestReader(Connection* connection, const Behaviour& behaviour, Milliseconds limit,
+                MemoryBudget* budget);
   ~RequestReader();
 
   // Reads up to the blank line. What the request before held is given back to the budget.
@@ -34,7 +35,7 @@ class RequestReader {
   // Reads the body that the head announces, chunks decoded.
   Reading ReadBody(Request* request);
 
-  // Hands out what comes behind the head, as it comes, without regard to the announced length.
+  // Hands out what comes after the head, as it comes, without regard to the announced length.
   Io ReadStream(std::string* bytes);
 
   // How the last read of the connection went.
@@ -48,7 +49,7 @@ class RequestReader {
   size_t HeadSize();
   Reading Parse(Request* request);
 
-  Link* link_;
+  Connection* connection_;
   const Behaviour& behaviour_;
   const Milliseconds limit_;
   Io result_ = Io::kDone;

@@ -40,41 +40,42 @@ bool HasBody(const Response& response, const Request& request) {
          response.status != 304;
 }
 
-void Add(Wire* wire, Part part, std::string bytes) {
-  wire->push_back({Action::kSend, part, std::move(bytes), {}});
+void Add(Steps* steps, Part part, std::string bytes) {
+  steps->push_back({Action::kSend, part, std::move(bytes), {}});
 }
 
-void AddHeader(Wire* wire, const std::string& name, const std::string& value) {
-  Add(wire, Part::kHeader, name + ": " + value + "\r\n");
+void AddHeader(Steps* steps, const std::string& name, const std::string& value) {
+  Add(steps, Part::kHeader, name + ": " + value + "\r\n");
 }
 
-void AddHead(const Response& response, const Request& request, Wire* wire) {
+void AddHead(const Response& response, const Request& request, Steps* steps) {
   const std::string reason =
       response.reason.empty() ? UsualReason(response.status) : response.reason;
-  Add(wire, Part::kStatusLine, fmt::format("HTTP/1.1 {} {}\r\n", response.status, reason));
-  for (const Header& header : response.headers) AddHeader(wire, header.name, header.value);
+  Add(steps, Part::kStatusLine, fmt::format("HTTP/1.1 {} {}\r\n", response.status, reason));
+  for (const Header& header : response.headers) AddHeader(steps, header.name, header.value);
   if (response.chunked) {
-    AddHeader(wire, "Transfer-Encoding", "chunked");
+    AddHeader(steps, "Transfer-Encoding", "chunked");
   } else if (!response.more && HasBody(response, request)) {
-    AddHeader(wire, "Content-Length", std::to_string(response.body.size()));
+    AddHeader(steps, "Content-Length", std::to_string(response.body.size()));
   }
-  AddHeader(wire, "Connection", response.close ? "close" : "keep-alive");
-  Add(wire, Part::kBlank, "\r\n");
+  AddHeader(steps, "Connection", response.close ? "close" : "keep-alive");
+  Add(steps, Part::kBlank, "\r\n");
 }
 
-void AddChunks(const Response& response, Wire* wire) {
+void AddChunks(const Response& response, Steps* steps) {
   for (size_t at = 0; at < response.body.size(); at += response.chunk_size) {
     const std::string piece = response.body.substr(at, response.chunk_size);
-    Add(wire, Part::kChunkSize, fmt::format("{:x}\r\n", piece.size()));
-    Add(wire, Part::kBody, piece);
-    Add(wire, Part::kChunkEnd, "\r\n");
+    Add(steps, Part::kChunkSize, fmt::format("{:x}\r\n", piece.size()));
+    Add(steps, Part::kBody, piece);
+    Add(steps, Part::kChunkEnd, "\r\n");
   }
-  Add(wire, Part::kLastChunk, "0\r\n\r\n");
+  Add(steps, Part::kLastChunk, "0\r\n\r\n");
 }
 
-auto FindHeader(Wire* wire, std::string_view name) {
-  return std::find_if(wire->begin(), wire->end(), [name](const WireStep& step) {
-    return step.part == Part::kHeader && SameName(step.bytes.substr(0, name.size()), name);
+auto FindHeader(Steps* steps, std::string_view name) {
+  return std::find_if(steps->begin(), steps->end(), [name](const Step& step) {
+    return step.part == Part::kHeader &&
+           EqualsIgnoringCase(step.bytes.substr(0, name.size()), name);
   });
 }
 
@@ -82,7 +83,7 @@ auto FindHeader(Wire* wire, std::string_view name) {
 
 void Response::Set(std::string_view name, const std::string& value) {
   for (Header& header : headers) {
-    if (SameName(header.name, name)) {
+    if (EqualsIgnoringCase(header.name, name)) {
       header.value = value;
       return;
     }
@@ -92,7 +93,7 @@ void Response::Set(std::string_view name, const std::string& value) {
 
 std::string Response::Get(std::string_view name) const {
   for (const Header& header : headers) {
-    if (SameName(header.name, name)) return header.value;
+    if (EqualsIgnoringCase(header.name, name)) return header.value;
   }
   return "";
 }
@@ -105,43 +106,43 @@ Response MakeResponse(int status, const std::string& type, const std::string& bo
   return response;
 }
 
-Wire RenderResponse(const Response& response, const Request& request) {
+Steps RenderResponse(const Response& response, const Request& request) {
   if (response.raw) return response.steps;
-  Wire wire;
-  AddHead(response, request, &wire);
-  if (response.more || !HasBody(response, request)) return wire;
+  Steps steps;
+  AddHead(response, request, &steps);
+  if (response.more || !HasBody(response, request)) return steps;
   if (response.chunked) {
-    AddChunks(response, &wire);
+    AddChunks(response, &steps);
   } else {
-    Add(&wire, Part::kBody, response.body);
+    Add(&steps, Part::kBody, response.body);
   }
-  return wire;
+  return steps;
 }
 
-std::string WireBytes(const Wire& wire) {
+std::string BytesOf(const Steps& steps) {
   std::string bytes;
-  for (const WireStep& step : wire) bytes += step.bytes;
+  for (const Step& step : steps) bytes += step.bytes;
   return bytes;
 }
 
-void SetWireHeader(Wire* wire, std::string_view name, const std::string& value) {
+void SetHeader(Steps* steps, std::string_view name, const std::string& value) {
   const std::string line = std::string(name) + ": " + value + "\r\n";
-  const auto found = FindHeader(wire, name);
-  if (found != wire->end()) {
+  const auto found = FindHeader(steps, name);
+  if (found != steps->end()) {
     found->bytes = line;
     return;
   }
-  const auto blank = static_cast<Wire::difference_type>(FindPart(*wire, Part::kBlank));
-  wire->insert(wire->begin() + blank, {Action::kSend, Part::kHeader, line, {}});
+  const auto blank = static_cast<Steps::difference_type>(FindPart(*steps, Part::kBlank));
+  steps->insert(steps->begin() + blank, {Action::kSend, Part::kHeader, line, {}});
 }
 
-void RemoveWireHeader(Wire* wire, std::string_view name) {
-  const auto found = FindHeader(wire, name);
-  if (found != wire->end()) wire->erase(found);
+void RemoveHeader(Steps* steps, std::string_view name) {
+  const auto found = FindHeader(steps, name);
+  if (found != steps->end()) steps->erase(found);
 }
 
-size_t FindPart(const Wire& wire, Part part) {
+size_t FindPart(const Steps& steps, Part part) {
   size_t at = 0;
-  while (at < wire.size() && wire[at].part != part) ++at;
+  while (at < steps.size() && steps[at].part != part) ++at;
   return at;
 }

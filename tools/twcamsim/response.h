@@ -1,4 +1,4 @@
-// An answer, first as what it says and then as the steps that put it on the wire.
+// A response, first as what it says and then as the steps that put it on the wire.
 #ifndef TARNWICK_TOOLS_TWCAMSIM_RESPONSE_H_
 #define TARNWICK_TOOLS_TWCAMSIM_RESPONSE_H_
 
@@ -11,7 +11,7 @@
 #include "tools/twcamsim/request.h"
 
 enum class Part {
-  kEarlier,
+  kInterim,
   kWait,  // no bytes
   kStatusLine,
   kHeader,
@@ -30,14 +30,14 @@ enum class Action {
   kReset,
 };
 
-struct WireStep {
+struct Step {
   Action action = Action::kSend;
   Part part = Part::kBody;
   std::string bytes;
   std::chrono::milliseconds pause{0};
 };
 
-using Wire = std::vector<WireStep>;
+using Steps = std::vector<Step>;
 
 struct Response {
   int status = 200;
@@ -48,34 +48,34 @@ struct Response {
   size_t chunk_size = 4096;
   bool close = false;
 
-  // An endless body: gives the next piece, false behind the last. The body is then not used.
+  // An endless body: makes the next piece; false after the last. The body is then not used.
   std::function<bool(std::string* piece)> more;
   std::chrono::milliseconds interval{0};
 
   // Bytes to send as they are, instead of all of the above.
   bool raw = false;
-  Wire steps;
+  Steps steps;
 
   void Set(std::string_view name, const std::string& value);
   std::string Get(std::string_view name) const;
 };
 
-// An answer with a body of that type.
+// A response with a body of that type.
 Response MakeResponse(int status, const std::string& type, const std::string& body);
 
 // The steps of `response` for `request`: one for the status line, one for each header, one for the
 // blank line, and the body whole or by chunks. Without a body for HEAD and for 1xx, 204 and 304.
-Wire RenderResponse(const Response& response, const Request& request);
+Steps RenderResponse(const Response& response, const Request& request);
 
 // All bytes of the steps that send.
-std::string WireBytes(const Wire& wire);
+std::string BytesOf(const Steps& steps);
 
 // Replaces the header of that name, or adds it in front of the blank line.
-void SetWireHeader(Wire* wire, std::string_view name, const std::string& value);
+void SetHeader(Steps* steps, std::string_view name, const std::string& value);
 
-void RemoveWireHeader(Wire* wire, std::string_view name);
+void RemoveHeader(Steps* steps, std::string_view name);
 
-// The index of the first step of `part`; wire.size() when there is none.
-size_t FindPart(const Wire& wire, Part part);
+// The index of the first step of `part`; steps.size() when there is none.
+size_t FindPart(const Steps& steps, Part part);
 
 #endif  // TARNWICK_TOOLS_TWCAMSIM_RESPONSE_H_

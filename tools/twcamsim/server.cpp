@@ -54,7 +54,7 @@ struct Server::Impl {
   void Reap();
   void EndAll();
 
-  World* world = nullptr;
+  SharedState* shared = nullptr;
   std::vector<std::unique_ptr<Endpoint>> endpoints;
   asio::io_context io{1};
   // From here on, so that a signal that comes between the list of ports and Run is not lost.
@@ -63,9 +63,9 @@ struct Server::Impl {
   std::list<Served> served;
 };
 
-Server::Server(World* world, std::vector<std::unique_ptr<Endpoint>> endpoints)
+Server::Server(SharedState* shared, std::vector<std::unique_ptr<Endpoint>> endpoints)
     : impl_(std::make_unique<Impl>()) {
-  impl_->world = world;
+  impl_->shared = shared;
   impl_->endpoints = std::move(endpoints);
 }
 
@@ -95,7 +95,7 @@ bool Server::Impl::Open(Listener* listener, std::string* error) {
 
 // A bound port that does not listen refuses, and nobody else gets it.
 bool Server::Impl::OpenQueue(Listener* listener, error_code* code) {
-  Random unused(world->seed, 0, 0);
+  Random unused(shared->seed, 0, 0);
   switch (BehaviourOf(listener->endpoint->faults, &unused).listening) {
     case Listening::kRefuse:
       break;
@@ -120,7 +120,7 @@ void Server::Impl::FillQueue(Listener* listener) {
     listener->fillers.emplace_back(io, tcp::v4());
     tcp::socket& filler = listener->fillers.back();
     filler.native_non_blocking(true, code);
-    // Its result says "in progress". The object's own connect waits for the answer, whatever the
+    // Fails with EINPROGRESS. tcp::socket::connect would wait for the handshake, whatever the
     // socket's mode is.
     (void)::connect(filler.native_handle(), own.data(), static_cast<socklen_t>(own.size()));
   }
@@ -157,7 +157,7 @@ void Server::Impl::Begin(Endpoint* endpoint, tcp::socket socket) {
   if (code) return;
   Served& one = served.emplace_back();
   try {
-    one.session = std::make_unique<Session>(world, endpoint, fd, number);
+    one.session = std::make_unique<Session>(shared, endpoint, fd, number);
     one.thread = std::thread([this, session = one.session.get()] {
       session->Run();
       asio::post(io, [this] { Reap(); });
@@ -197,10 +197,10 @@ Json::Value Server::Describe() const {
     entry["port"] = endpoint->port;
     entry["tls"] = endpoint->tls;
     entry["url"] = Url(*endpoint);
-    entry["login"] = endpoint->login_style;
-    entry["user"] = endpoint->login.GetAccount().user;
-    entry["password"] = endpoint->login.GetAccount().password;
-    entry["realm"] = endpoint->login.GetAccount().realm;
+    entry["login"] = endpoint->authentication_style;
+    entry["user"] = endpoint->authenticator.GetAccount().user;
+    entry["password"] = endpoint->authenticator.GetAccount().password;
+    entry["realm"] = endpoint->authenticator.GetAccount().realm;
     entry["faults"] = Json::Value(Json::arrayValue);
     for (const Fault& fault : endpoint->faults) entry["faults"].append(fault.text);
     list.append(entry);

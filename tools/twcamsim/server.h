@@ -15,7 +15,7 @@
 // Threads: one.
 class Server {
  public:
-  Server(World* world, std::vector<std::unique_ptr<Endpoint>> endpoints);
+  Server(SharedState* shared, std::vector<std::unique_ptr<Endpoint>> endpoints);
   ~Server();
   Server(const Server&) = delete;
   Server& operator=(const Server&) = delete;
@@ -24,7 +24,7 @@ class Server {
   // Results: false with the reason in `error`.
   bool Listen(std::string* error);
 
-  // Each endpoint with its address and its login.
+  // Each endpoint with its address and its account.
   Json::Value Describe() const;
 
   // Serves until SIGTERM or SIGINT comes, or until `limit` has passed when it is not zero. All

@@ -22,20 +22,20 @@ const char* EndName(Io result) {
   }
 }
 
-Json::Value LoginRecord(const Verdict& verdict) {
-  Json::Value login(Json::objectValue);
-  login["passed"] = verdict.passed;
-  login["scheme"] = verdict.scheme;
-  if (!verdict.user.empty()) login["user"] = verdict.user;
-  if (verdict.passed) return login;
-  login["field"] = verdict.field;
-  login["text"] = verdict.text;
-  return login;
+Json::Value AuthenticationRecord(const Verdict& verdict) {
+  Json::Value record(Json::objectValue);
+  record["passed"] = verdict.passed;
+  record["scheme"] = verdict.scheme;
+  if (!verdict.user.empty()) record["user"] = verdict.user;
+  if (verdict.passed) return record;
+  record["field"] = verdict.field;
+  record["text"] = verdict.text;
+  return record;
 }
 
-// The code of an answer as it went out, which a fault may have made anything.
-std::string StatusOf(const Wire& wire) {
-  const std::string bytes = WireBytes(wire).substr(0, 64);
+// The code of a response as it went out, which a fault may have made anything.
+std::string StatusOf(const Steps& steps) {
+  const std::string bytes = BytesOf(steps).substr(0, 64);
   const size_t blank = bytes.find(' ');
   if (blank == std::string::npos) return "";
   return bytes.substr(blank + 1, bytes.find_first_of(" \r\n", blank + 1) - blank - 1);
@@ -52,19 +52,19 @@ Behaviour BehaviourOf(const std::vector<Fault>& faults, Random* random) {
   return behaviour;
 }
 
-Session::Session(World* world, Endpoint* endpoint, int fd, int number)
-    : world_(world),
+Session::Session(SharedState* shared, Endpoint* endpoint, int fd, int number)
+    : shared_(shared),
       endpoint_(endpoint),
-      link_(fd),
-      random_(world->seed, static_cast<uint64_t>(endpoint->index), static_cast<uint64_t>(number)),
+      connection_(fd),
+      random_(shared->seed, static_cast<uint64_t>(endpoint->index), static_cast<uint64_t>(number)),
       behaviour_(BehaviourOf(endpoint->faults, &random_)),
-      reader_(&link_, behaviour_, world->idle, &world->budget),
+      reader_(&connection_, behaviour_, shared->idle, &shared->budget),
       start_(std::chrono::steady_clock::now()),
       record_(Json::objectValue) {
   record_["time"] = TimeText();
   record_["endpoint"] = endpoint->name;
   record_["connection"] = number;
-  record_["peer"] = link_.Peer();
+  record_["peer"] = connection_.Peer();
   record_["requests"] = Json::Value(Json::arrayValue);
   for (const Fault& fault : endpoint->faults) {
     if (fault.type->hooks.behaviour && (endpoint->tls || !fault.type->needs_tls)) NoteFault(fault);
@@ -79,7 +79,7 @@ void Session::Run() {
     }
   } catch (const std::exception& exception) {  // no memory for what a fault or a client asks for
     record_["error"] = exception.what();
-    link_.Reset();
+    connection_.Reset();
     End("error");
   }
   WriteRecord();
@@ -89,16 +89,16 @@ void Session::Run() {
 bool Session::ServeOne() {
   Request request;
   if (!TakeRequest(&request)) return false;
-  const LoginStyle style = StyleFor(request);
-  const Verdict verdict = endpoint_->login.Check(style, request);
+  const AuthenticationStyle style = StyleFor(request);
+  const Verdict verdict = endpoint_->authenticator.Check(style, request);
   NoteRequest(request, verdict);
-  if (!BeforeAnswer()) return false;
-  Response response = MakeAnswer(request, style, verdict);
+  if (!BeforeResponse()) return false;
+  Response response = MakeResponseTo(request, style, verdict);
   const bool streams = endpoint_->profile->TakesStream(request);
   if (!request.KeepsAlive() || streams || response.more) response.close = true;
-  const Wire wire = Render(response, request);
-  NoteAnswer(request, wire);
-  if (!Play(wire) || (response.more && !PlayMore(response))) return false;
+  const Steps steps = Render(response, request);
+  NoteResponse(request, steps);
+  if (!Play(steps) || (response.more && !PlayMore(response))) return false;
   return response.close && !response.raw ? CloseNow() : true;
 }
 
@@ -109,28 +109,28 @@ bool Session::End(const char* how) {
 
 bool Session::End(Io result) {
   End(EndName(result));
-  link_.Close(behaviour_.close_notice);
+  connection_.Close(behaviour_.close_notice);
   return false;
 }
 
 bool Session::CloseNow() {
-  link_.Close(behaviour_.close_notice);
+  connection_.Close(behaviour_.close_notice);
   return End("closed");
 }
 
 bool Session::ResetNow() {
-  link_.Reset();
+  connection_.Reset();
   return End("reset");
 }
 
-bool Session::Hold() {
-  return End(link_.HoldUntilPeerLeaves(world_->hold));
+bool Session::StallUntilPeerLeaves() {
+  return End(connection_.WaitUntilPeerLeaves(shared_->hold));
 }
 
 // A client that keeps its connection may send requests for days, and the record is written at the
 // end.
 void Session::NoteRequest(const Request& request, const Verdict& verdict) {
-  if (!world_->journal.IsOpen()) return;
+  if (!shared_->journal.IsOpen()) return;
   if (noted_ > kMostNoted) {
     ++unnoted_;
     return;
@@ -141,32 +141,32 @@ void Session::NoteRequest(const Request& request, const Verdict& verdict) {
   entry["head"] = Excerpt(request.head);
   entry["body"] = Excerpt(request.body);
   entry["body_bytes"] = static_cast<Json::UInt64>(request.body.size());
-  if (!request.sloppy.empty()) entry["sloppy"] = request.sloppy;
-  if (!verdict.scheme.empty()) entry["login"] = LoginRecord(verdict);
+  if (!request.deviation.empty()) entry["sloppy"] = request.deviation;
+  if (!verdict.scheme.empty()) entry["login"] = AuthenticationRecord(verdict);
   record_["requests"].append(entry);
   constexpr size_t kOverhead = 1024;
   noted_ += kOverhead + entry["head"].asString().size() + entry["body"].asString().size();
 }
 
-void Session::NoteAnswer(const Request& request, const Wire& wire) {
-  const std::string status = StatusOf(wire);
+void Session::NoteResponse(const Request& request, const Steps& steps) {
+  const std::string status = StatusOf(steps);
   Json::Value& requests = record_["requests"];
   if (!requests.empty() && unnoted_ == 0) requests[requests.size() - 1]["status"] = status;
   const auto word = [](const std::string& text) { return text.empty() ? "-" : text; };
-  world_->access.Write(word(request.method) + " " + word(request.path) + " " + word(status));
+  shared_->access.Write(word(request.method) + " " + word(request.path) + " " + word(status));
 }
 
 void Session::WriteRecord() {
-  record_["tls"] = link_.TlsVersion();
+  record_["tls"] = connection_.TlsVersion();
   Json::Value& faults = record_["faults"] = Json::Value(Json::arrayValue);
   for (const std::string& fault : faults_) faults.append(fault);
   if (unnoted_ > 0) record_["more_requests"] = static_cast<Json::UInt64>(unnoted_);
-  record_["bytes_in"] = static_cast<Json::UInt64>(link_.BytesIn());
-  record_["bytes_out"] = static_cast<Json::UInt64>(link_.BytesOut());
+  record_["bytes_in"] = static_cast<Json::UInt64>(connection_.BytesIn());
+  record_["bytes_out"] = static_cast<Json::UInt64>(connection_.BytesOut());
   const auto span = std::chrono::steady_clock::now() - start_;
   record_["duration_ms"] =
       static_cast<Json::Int64>(std::chrono::duration_cast<std::chrono::milliseconds>(span).count());
   record_["end"] = end_;
-  if (!link_.ErrorText().empty()) record_["error"] = link_.ErrorText();
-  world_->journal.Write(CompactJson(record_));
+  if (!connection_.ErrorText().empty()) record_["error"] = connection_.ErrorText();
+  shared_->journal.Write(CompactJson(record_));
 }

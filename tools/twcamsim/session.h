@@ -11,14 +11,14 @@
 
 #include "tools/twcamsim/behaviour.h"
 #include "tools/twcamsim/certificates.h"
+#include "tools/twcamsim/connection.h"
 #include "tools/twcamsim/endpoint.h"
 #include "tools/twcamsim/journal.h"
-#include "tools/twcamsim/link.h"
 #include "tools/twcamsim/random.h"
 #include "tools/twcamsim/request_reader.h"
 
 // What all connections share.
-struct World {
+struct SharedState {
   uint64_t seed = 0;
   std::chrono::milliseconds idle{0};  // a connection without a byte for that long is closed
   std::chrono::milliseconds hold{0};  // a stall for good lasts that long at most
@@ -35,10 +35,10 @@ Behaviour BehaviourOf(const std::vector<Fault>& faults, Random* random);
 class Session {
  public:
   // Owns `fd`. `number` counts the endpoint's connections from 1.
-  Session(World* world, Endpoint* endpoint, int fd, int number);
+  Session(SharedState* shared, Endpoint* endpoint, int fd, int number);
 
   void Run();
-  void Stop() { link_.Stop(); }
+  void Stop() { connection_.Stop(); }
   bool IsFinished() const { return finished_; }
 
  private:
@@ -48,20 +48,21 @@ class Session {
   bool Shake();
   void OpenWithBytes(const std::string& bytes, bool reset);
 
-  // One request and its answer; false when the connection is over.
+  // One request and its response; false when the connection is over.
   bool ServeOne();
   bool TakeRequest(Request* request);
   bool Refuse(const Request& request, int status, const std::string& text);
-  bool BeforeAnswer();
-  Response MakeAnswer(const Request& request, const LoginStyle& style, const Verdict& verdict);
-  Response Refuse(const LoginStyle& style, const Verdict& verdict);
+  bool BeforeResponse();
+  Response MakeResponseTo(const Request& request, const AuthenticationStyle& style,
+                          const Verdict& verdict);
+  Response Refuse(const AuthenticationStyle& style, const Verdict& verdict);
   Response Ask(const Request& request, const Verdict& verdict);
-  LoginStyle StyleFor(const Request& request);
-  Wire Render(const Response& response, const Request& request);
+  AuthenticationStyle StyleFor(const Request& request);
+  Steps Render(const Response& response, const Request& request);
 
   // The way out.
-  bool Play(const Wire& wire);
-  bool PlayStep(const WireStep& step);
+  bool Play(const Steps& steps);
+  bool PlayStep(const Step& step);
   bool PlayMore(const Response& response);
   bool Send(const std::string& bytes);
   bool SendPaced(const std::string& bytes);
@@ -71,17 +72,17 @@ class Session {
   bool End(Io result);
   bool CloseNow();
   bool ResetNow();
-  bool Hold();
+  bool StallUntilPeerLeaves();
 
   // The journal.
   void NoteRequest(const Request& request, const Verdict& verdict);
-  void NoteAnswer(const Request& request, const Wire& wire);
+  void NoteResponse(const Request& request, const Steps& steps);
   void NoteFault(const Fault& fault) { faults_.insert(fault.text); }
   void WriteRecord();
 
-  World* world_;
+  SharedState* shared_;
   Endpoint* endpoint_;
-  Link link_;
+  Connection connection_;
   Random random_;
   Behaviour behaviour_;
   RequestReader reader_;
@@ -92,7 +93,7 @@ class Session {
   std::string end_;
   std::set<std::string> faults_;
   size_t noted_ = 0;    // bytes of requests in the record
-  size_t unnoted_ = 0;  // requests behind those
+  size_t unnoted_ = 0;  // requests after those
   Json::Value record_;
 };
 

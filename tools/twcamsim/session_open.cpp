@@ -3,7 +3,7 @@
 
 namespace {
 
-// No TLS record begins like this, and no HTTP answer either.
+// No TLS record begins like this, and no HTTP response either.
 constexpr char kGarbage[] = "\x7f\x03 not a record of TLS \x02\x01\r\n\r\n";
 
 // The record and message heads of a ServerHello of 118 bytes, and the first of these.
@@ -22,7 +22,7 @@ std::string Alert(int number) {
 
 bool Session::Open() {
   if (behaviour_.accept_delay.count() > 0) {
-    const Io result = link_.Pause(behaviour_.accept_delay);
+    const Io result = connection_.Pause(behaviour_.accept_delay);
     if (result != Io::kDone) return End(result);
   }
   switch (behaviour_.opening) {
@@ -33,7 +33,7 @@ bool Session::Open() {
     case Opening::kReset:
       return ResetNow();
     case Opening::kNeverRead:
-      return End(link_.HoldUnread(world_->hold));
+      return End(connection_.WaitUnread(shared_->hold));
   }
   return false;
 }
@@ -45,7 +45,7 @@ bool Session::OpenTls() {
     case TlsOpening::kPlain:
       return true;
     case TlsOpening::kStall:
-      return Hold();
+      return StallUntilPeerLeaves();
     case TlsOpening::kGarbage:
       OpenWithBytes(std::string(kGarbage, sizeof(kGarbage) - 1), false);
       return false;
@@ -66,23 +66,23 @@ bool Session::OpenTls() {
 }
 
 bool Session::Shake() {
-  SSL_CTX* context = world_->certificates.Context(behaviour_.certificate, behaviour_.old_tls);
-  const Io result = link_.Handshake(context, world_->idle);
+  SSL_CTX* context = shared_->certificates.Context(behaviour_.certificate, behaviour_.old_tls);
+  const Io result = connection_.Handshake(context, shared_->idle);
   if (result == Io::kDone) return true;
   End(result == Io::kError ? "tls-failed" : "tls-broken");
-  link_.Close(false);
+  connection_.Close(false);
   return false;
 }
 
-// Answers the client's first message with bytes that are no handshake, and ends.
+// Responds to the client's first message with bytes that are no handshake, and ends.
 void Session::OpenWithBytes(const std::string& bytes, bool reset) {
   std::string hello;
-  const Io result = link_.ReadRaw(&hello, 65536, world_->idle);
+  const Io result = connection_.ReadRaw(&hello, 65536, shared_->idle);
   if (result != Io::kDone) {
     End(result);
     return;
   }
-  if (!bytes.empty()) link_.WriteRaw(bytes, world_->idle);
+  if (!bytes.empty()) connection_.WriteRaw(bytes, shared_->idle);
   if (reset) {
     ResetNow();
   } else {

@@ -1,12 +1,12 @@
-// The answer's way out.
+// The response's way out.
 #include <algorithm>
 
 #include "tools/twcamsim/session.h"
 
 // What is to be sent together goes out by one write.
-bool Session::Play(const Wire& wire) {
+bool Session::Play(const Steps& steps) {
   std::string bytes;
-  for (const WireStep& step : wire) {
+  for (const Step& step : steps) {
     if (step.action == Action::kSend) {
       bytes += step.bytes;
       continue;
@@ -17,16 +17,16 @@ bool Session::Play(const Wire& wire) {
   return Send(bytes);
 }
 
-bool Session::PlayStep(const WireStep& step) {
+bool Session::PlayStep(const Step& step) {
   switch (step.action) {
     case Action::kSend:
       return Send(step.bytes);
     case Action::kPause: {
-      const Io result = link_.Pause(step.pause);
+      const Io result = connection_.Pause(step.pause);
       return result == Io::kDone || End(result);
     }
     case Action::kStall:
-      return Hold();
+      return StallUntilPeerLeaves();
     case Action::kClose:
       return CloseNow();
     case Action::kReset:
@@ -38,7 +38,7 @@ bool Session::PlayStep(const WireStep& step) {
 bool Session::PlayMore(const Response& response) {
   for (std::string piece; response.more(&piece); piece.clear()) {
     if (!Send(piece)) return false;
-    const Io result = link_.Pause(response.interval);
+    const Io result = connection_.Pause(response.interval);
     if (result != Io::kDone) return End(result);
   }
   return true;
@@ -58,10 +58,10 @@ bool Session::SendPaced(const std::string& bytes) {
   const size_t piece = behaviour_.write_piece > 0 ? behaviour_.write_piece : bytes.size();
   for (size_t at = 0; at < bytes.size(); at += piece) {
     if (at > 0) {
-      const Io paused = link_.Pause(behaviour_.write_interval);
+      const Io paused = connection_.Pause(behaviour_.write_interval);
       if (paused != Io::kDone) return End(paused);
     }
-    const Io result = link_.Write(std::string_view(bytes).substr(at, piece), world_->idle);
+    const Io result = connection_.Write(std::string_view(bytes).substr(at, piece), shared_->idle);
     if (result != Io::kDone) return End(result);
   }
   return true;

@@ -9,7 +9,7 @@
 
 struct UploadCount {
   uint64_t bytes = 0;
-  std::string end;  // "closed" behind the closing boundary, "full" behind `most` bytes or the
+  std::string end;  // "closed" after the closing boundary, "full" after `most` bytes or the
                     // announced length, "cut" where the peer's direction ended before
 };
 

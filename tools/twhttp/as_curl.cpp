@@ -22,13 +22,13 @@ class CurlCommand {
   }
   void Header(const std::string& line) { Add({"--header", line}); }
 
-  void Login(const char* scheme) {
+  void Credentials(const char* scheme) {
     const Target& target = options_.target;
     const std::string password = options_.show_secrets ? target.password : "***";
     Add({scheme, "--user", target.user + ":" + (target.password.empty() ? "" : password)});
   }
-  void LoginIfGiven(const char* scheme) {
-    if (options_.target.has_login) Login(scheme);
+  void CredentialsIfGiven(const char* scheme) {
+    if (options_.target.has_credentials) Credentials(scheme);
   }
   void Cookie() {
     if (options_.cookie.empty()) return;
@@ -71,7 +71,7 @@ void CurlCommand::ByCurl() {
   Header("Content-Type: application/x-www-form-urlencoded; charset=utf-8");
   Header("Connection: close");
   Cookie();
-  Login("--basic");
+  Credentials("--basic");
   if (!options_.verify_peer) Add({"--insecure"});
   TotalTimeout();
   if (!options_.response_file.empty()) {
@@ -93,9 +93,9 @@ std::string Get(const Options& options) {
   command.SocketHeaders(http11);
   command.Cookie();
   if (one_call || options.basic_first) {
-    command.Login("--basic");
+    command.Credentials("--basic");
   } else {
-    command.LoginIfGiven("--anyauth");
+    command.CredentialsIfGiven("--anyauth");
   }
   command.Socket();
   return command.Finish(options.encode_query
@@ -123,7 +123,7 @@ std::string Soap(const Options& options) {
   command.Header("User-Agent:");
   command.SocketHeaders(true);
   command.Header("Content-Type: application/soap+xml; charset=utf-8");
-  if (options.operation->id == OperationId::kSoapAuth) command.LoginIfGiven("--anyauth");
+  if (options.operation->id == OperationId::kSoapAuth) command.CredentialsIfGiven("--anyauth");
   command.Body("--data-binary");
   command.Socket();
   return command.Finish(options.target.path);
@@ -155,7 +155,7 @@ std::string CurlForm(const Options& options) {
     command.Add({options.version == HTTP_VERSION_1_0 ? "--http1.0" : "--http1.1"});
   }
   command.Header("User-Agent:");
-  command.LoginIfGiven("--anyauth");
+  command.CredentialsIfGiven("--anyauth");
   command.Add({"--data-binary", path.substr(std::min(separator + 1, path.size()))});
   return command.Finish(path.substr(0, separator));
 }
@@ -164,11 +164,11 @@ std::string Xml(const Options& options) {
   CurlCommand command(options);
   const OperationId id = options.operation->id;
   command.Header("User-Agent:");
-  command.LoginIfGiven(id == OperationId::kXmlGet ? "--anyauth" : "--basic");
+  command.CredentialsIfGiven(id == OperationId::kXmlGet ? "--anyauth" : "--basic");
   if (id == OperationId::kXmlGet) command.TotalTimeout();
   if (id == OperationId::kXmlDelete) command.Add({"--request", "DELETE"});
   if (id == OperationId::kXmlPut) command.Add({"--request", "PUT"});
-  if (options.operation->Does(kBody)) {
+  if (options.operation->Uses(kBody)) {
     command.Header("Content-Type: application/xml; charset=UTF-8");
     command.Body("--data-binary");
   }

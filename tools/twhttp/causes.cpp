@@ -2,22 +2,8 @@
 #include "tools/twhttp/causes.h"
 
 #include <algorithm>
-#include <cctype>
 
-std::string Lower(std::string text) {
-  for (char& c : text) c = static_cast<char>(std::tolower(static_cast<unsigned char>(c)));
-  return text;
-}
-
-bool Has(const std::string& text, const char* word) {
-  return text.find(word) != std::string::npos;
-}
-
-const Exchange& LastOf(const Evidence& evidence) {
-  static const Exchange none = {};
-  const Exchange* const last = evidence.trace.LastExchange();
-  return last != nullptr ? *last : none;
-}
+#include "tools/common/text.h"
 
 namespace {
 
@@ -25,21 +11,22 @@ using Id = FailureClass;
 
 std::string SystemWords(const Evidence& evidence) {
   const Connection* const connection = evidence.trace.LastConnection();
-  if (evidence.trace.curl.used) return Lower(evidence.trace.curl.text);
-  return connection != nullptr ? Lower(connection->handshake.text) : "";
+  if (evidence.trace.curl.used) return LowerCase(evidence.trace.curl.text);
+  return connection != nullptr ? LowerCase(connection->handshake.text) : "";
 }
 
 Causes OfStatus(const Evidence& evidence) {
-  const ReplyMessage& reply = LastOf(evidence).reply;
-  const int status = reply.Status();
-  const std::string place = reply.Value("Location");
+  const ResponseMessage& response = LastOf(evidence).response;
+  const int status = response.Status();
+  const std::string place = response.Value("Location");
   if (status >= 300 && status <= 399) {
     return {place.empty() ? "the peer redirects, and does not say where to"
                           : "the peer redirects to " + place + ", and the library follows nowhere"};
   }
-  const bool old = Has(LastOf(evidence).sent.substr(0, 4096), " HTTP/1.0\r\n");
+  const bool old = Contains(LastOf(evidence).sent.substr(0, 4096), " HTTP/1.0\r\n");
   if (status == 400 && old) return {"the peer wants HTTP/1.1 with a Host line: --http 1.1"};
-  if (status == 403) return {"the login is good and may not do that, or the address is blocked"};
+  if (status == 403)
+    return {"the credentials are good and may not do that, or the address is blocked"};
   if (status == 404) return {"the path does not exist there"};
   if (status == 405) return {"the peer does not take the method there"};
   if (status == 414) return {"the path is too long for the peer"};
@@ -50,22 +37,24 @@ Causes OfStatus(const Evidence& evidence) {
 
 Causes OfTls(const Evidence& evidence) {
   const std::string words = SystemWords(evidence);
-  if (evidence.stop == Stop::kGaveUp || Has(words, "timed out") || Has(words, "timeout")) {
+  if (evidence.stop == Stop::kGaveUp || Contains(words, "timed out") ||
+      Contains(words, "timeout")) {
     return {"the peer took the connection and says nothing in the handshake",
             "the port speaks plain HTTP and waits for the end of a request: try http://"};
   }
-  if (Has(words, "wrong version number") || Has(words, "packet length too long")) {
-    return {"what answers speaks no TLS: plain HTTP (try http://) or another protocol"};
+  if (Contains(words, "wrong version number") || Contains(words, "packet length too long")) {
+    return {"what responds speaks no TLS: plain HTTP (try http://) or another protocol"};
   }
-  if (Has(words, "unsupported protocol") || Has(words, "protocol version") ||
-      Has(words, "sigalg")) {
+  if (Contains(words, "unsupported protocol") || Contains(words, "protocol version") ||
+      Contains(words, "sigalg")) {
     return {"the peer speaks only versions of TLS that are switched off here"};
   }
-  if (Has(words, "dh key too small") || Has(words, "ee key too small")) {
+  if (Contains(words, "dh key too small") || Contains(words, "ee key too small")) {
     return {"the peer's keys are shorter than is allowed here"};
   }
-  if (Has(words, "handshake failure")) return {"the two sides share no cipher"};
-  if (Has(words, "reset") || Has(words, "eof") || Has(words, "syscall") || Has(words, "closed")) {
+  if (Contains(words, "handshake failure")) return {"the two sides share no cipher"};
+  if (Contains(words, "reset") || Contains(words, "eof") || Contains(words, "syscall") ||
+      Contains(words, "closed")) {
     return {"the peer closed the connection in the handshake"};
   }
   return {};
@@ -73,16 +62,17 @@ Causes OfTls(const Evidence& evidence) {
 
 Causes OfCertificate(const Evidence& evidence) {
   const std::string words = SystemWords(evidence);
-  if (Has(words, "expired")) return {"the certificate has expired, or the clock here is wrong"};
-  if (Has(words, "not yet valid"))
+  if (Contains(words, "expired"))
+    return {"the certificate has expired, or the clock here is wrong"};
+  if (Contains(words, "not yet valid"))
     return {"the certificate is not valid yet, or the clock is wrong"};
-  if (Has(words, "self-signed") || Has(words, "self signed")) {
+  if (Contains(words, "self-signed") || Contains(words, "self signed")) {
     return {"the certificate, or one above it, is of the peer's own making"};
   }
-  if (Has(words, "unable to get local issuer")) {
+  if (Contains(words, "unable to get local issuer")) {
     return {"who issued the certificate is not known to this machine"};
   }
-  if (Has(words, "does not match") || Has(words, "no alternative certificate")) {
+  if (Contains(words, "does not match") || Contains(words, "no alternative certificate")) {
     return {"the certificate is made out to another name than " + evidence.options.target.host};
   }
   return {};
@@ -99,14 +89,14 @@ Causes OfNoReply(const Evidence& evidence) {
 Causes OfHead(const Evidence& evidence) {
   const Exchange& last = LastOf(evidence);
   Causes causes;
-  const std::string head = last.reply.Head().substr(0, 16);
+  const std::string head = last.response.Head().substr(0, 16);
   if (!evidence.options.target.https && head.size() > 1 && head[0] == '\x15' && head[1] == '\x03') {
     causes.push_back("the port speaks TLS: try https://");
   }
   const CurlFigures& curl = evidence.trace.curl;
   if (curl.used && curl.code != 0) {
     causes.push_back("libcurl says: " + curl.text);
-  } else if (!last.reply.HeadComplete() && last.end == End::kClosed) {
+  } else if (!last.response.HeadComplete() && last.end == End::kClosed) {
     causes.push_back("the peer closed in the middle of the head");
   }
   for (const HeadFinding& finding : FindingsOf(evidence.trace, last)) {
@@ -117,7 +107,7 @@ Causes OfHead(const Evidence& evidence) {
 
 Causes OfCutBody(const Evidence& evidence) {
   const Exchange& last = LastOf(evidence);
-  if (last.reply.BodyFraming() == Framing::kChunked) {
+  if (last.response.BodyFraming() == Framing::kChunked) {
     return {"the peer closed before the last chunk, or does not keep to the form of chunks"};
   }
   return {"the peer closed early, or announced more than it has"};
@@ -133,24 +123,24 @@ Causes OfKeptOpen(const Evidence& evidence) {
 Causes OfGaveUp(const Evidence& evidence) {
   const Exchange& last = LastOf(evidence);
   if (last.send_begin >= 0 && last.received_bytes == 0) {
-    return {"the request was taken, and no answer came"};
+    return {"the request was taken, and no response came"};
   }
   return {};
 }
 
 Causes OfXml(const Evidence& evidence) {
-  const std::string words = Lower(evidence.outcome.content_error);
-  if (Has(words, "entity")) return {"the document's entities multiply without end"};
-  if (Has(words, "depth")) return {"the document is nested more deeply than is allowed"};
-  if (evidence.outcome.content == Content::kNoXml) return {"the reply has no body"};
+  const std::string words = LowerCase(evidence.outcome.content_error);
+  if (Contains(words, "entity")) return {"the document's entities multiply without end"};
+  if (Contains(words, "depth")) return {"the document is nested more deeply than is allowed"};
+  if (evidence.outcome.content == Content::kNoXml) return {"the response has no body"};
   return {};
 }
 
 Causes OfJson(const Evidence& evidence) {
   const Exchange& last = LastOf(evidence);
-  const uint64_t head = std::min<uint64_t>(last.reply.HeadBytes(), last.received.size());
+  const uint64_t head = std::min<uint64_t>(last.response.HeadBytes(), last.received.size());
   const std::string start = last.received.substr(static_cast<size_t>(head), 3);
-  if (Has(evidence.outcome.content_error, "too deeply")) {
+  if (Contains(evidence.outcome.content_error, "too deeply")) {
     return {"it is nested more deeply than is allowed"};
   }
   if (start == "\xEF\xBB\xBF") return {"the body begins with a byte order mark"};
@@ -158,9 +148,9 @@ Causes OfJson(const Evidence& evidence) {
 }
 
 Causes OfNoLength(const Evidence& evidence) {
-  const ReplyMessage& reply = LastOf(evidence).reply;
-  if (reply.BodyFraming() == Framing::kChunked) return {"the service answers in chunks"};
-  if (reply.BodyFraming() == Framing::kLength) return {"the body is empty"};
+  const ResponseMessage& response = LastOf(evidence).response;
+  if (response.BodyFraming() == Framing::kChunked) return {"the service responds in chunks"};
+  if (response.BodyFraming() == Framing::kLength) return {"the body is empty"};
   return {"the service tells the end of the body by closing"};
 }
 
@@ -208,11 +198,11 @@ const char* NextCommand(const Evidence& evidence, FailureClass id) {
   if (id == Id::kKeptOpen && evidence.options.version == HTTP_VERSION_1_1) {
     return "twhttp {operation} --http 1.0 {url}";
   }
-  if (id == Id::kLoginRefused && Has(LastOf(evidence).sent, "Authorization: Basic") &&
-      Has(Lower(LastOf(evidence).reply.Value("WWW-Authenticate")), "digest")) {
-    return "twhttp get -v {url}";  // which answers as it is asked
+  if (id == Id::kLoginRefused && Contains(LastOf(evidence).sent, "Authorization: Basic") &&
+      Contains(LowerCase(LastOf(evidence).response.Value("WWW-Authenticate")), "digest")) {
+    return "twhttp get -v {url}";  // which sends the credentials that are asked for
   }
-  if (id == Id::kCertificate && evidence.options.operation->Does(kVerify)) {
+  if (id == Id::kCertificate && evidence.options.operation->Uses(kVerify)) {
     return "twhttp {operation} -v --insecure {url}";
   }
   return FactsOf(id).next;

@@ -1,4 +1,4 @@
-// The finders of causes, and what they share.
+// What a failure's evidence points at.
 #ifndef TARNWICK_TOOLS_TWHTTP_CAUSES_H_
 #define TARNWICK_TOOLS_TWHTTP_CAUSES_H_
 
@@ -9,16 +9,17 @@
 
 using Causes = std::vector<std::string>;
 
-std::string Lower(std::string text);
-bool Has(const std::string& text, const char* word);
+// What this failure's own evidence points at, before the usual causes of its class; and the command
+// that looks further.
+Causes SpecialCauses(const Evidence& evidence, FailureClass id);
+Causes FurtherCauses(const Evidence& evidence, FailureClass id);  // after them
+const char* NextCommand(const Evidence& evidence, FailureClass id);
 
-// The last exchange, or an empty one.
-const Exchange& LastOf(const Evidence& evidence);
-
+// Of causes_credentials.cpp.
 Causes OfLoginRefused(const Evidence& evidence);
 Causes OfLoginWanted(const Evidence& evidence);
 
-// Behind the usual causes: peers that renew their nonces with each refusal are nothing unusual.
+// After the usual causes, because many peers send a new nonce with each refusal.
 Causes AfterLoginRefused(const Evidence& evidence);
 
 #endif  // TARNWICK_TOOLS_TWHTTP_CAUSES_H_

@@ -56,7 +56,7 @@ bool CurlTimedOut(const Evidence& evidence) {
 }
 
 bool HeadMissing(const Exchange& exchange) {
-  return !exchange.reply.HeadComplete();
+  return !exchange.response.HeadComplete();
 }
 
 // The last wait for the peer passed without a byte, and it did not close either.
@@ -99,8 +99,9 @@ bool WasReset(const Evidence& evidence) {
   const bool in_curl = CurlCode(evidence, {CURLE_RECV_ERROR, CURLE_SEND_ERROR}) &&
                        evidence.trace.curl.os_error == ECONNRESET;
   const bool says_so = evidence.trace.curl.text.find("reset by peer") != std::string::npos;
-  const bool in_reply = last != nullptr && last->end == End::kReset && !last->reply.BodyComplete();
-  return in_curl || says_so || ConnectError(evidence, {ECONNRESET}) || in_reply ||
+  const bool in_response =
+      last != nullptr && last->end == End::kReset && !last->response.BodyComplete();
+  return in_curl || says_so || ConnectError(evidence, {ECONNRESET}) || in_response ||
          (last != nullptr && last->send.failed && last->send.error == ECONNRESET);
 }
 
@@ -119,14 +120,15 @@ bool NoReply(const Evidence& evidence) {
 
 bool KeptOpen(const Evidence& evidence) {
   const Exchange* const last = Last(evidence);
-  return last != nullptr && Silent(*last) && last->reply.BodyComplete() && !evidence.outcome.good;
+  return last != nullptr && Silent(*last) && last->response.BodyComplete() &&
+         !evidence.outcome.good;
 }
 
 bool ReadTimedOut(const Evidence& evidence) {
   const Exchange* const last = Last(evidence);
   if (CurlTimedOut(evidence)) return true;
-  if (last == nullptr || !Silent(*last) || last->reply.BodyComplete()) return false;
-  return HeadMissing(*last) || !evidence.outcome.good || !last->reply.Missing().empty();
+  if (last == nullptr || !Silent(*last) || last->response.BodyComplete()) return false;
+  return HeadMissing(*last) || !evidence.outcome.good || !last->response.Missing().empty();
 }
 
 // What the library makes no head of, or another one than the peer meant.
@@ -140,7 +142,7 @@ bool HeadMalformed(const Evidence& evidence) {
     if (finding.breaks) return true;
   }
   const bool refused = evidence.outcome.last == HTTP_RET_NOT_READY;
-  return (refused && !evidence.outcome.good) || last->reply.Status() < 100;
+  return (refused && !evidence.outcome.good) || last->response.Status() < 100;
 }
 
 bool BodyCut(const Evidence& evidence) {
@@ -148,35 +150,35 @@ bool BodyCut(const Evidence& evidence) {
   if (CurlCode(evidence, {CURLE_PARTIAL_FILE, CURLE_BAD_CONTENT_ENCODING})) return true;
   if (CurlCode(evidence, {CURLE_RECV_ERROR}) && last != nullptr) return !HeadMissing(*last);
   if (last == nullptr) return false;
-  if (last->reply.BadChunk()) return true;
+  if (last->response.BadChunk()) return true;
   if (last->end == End::kKept) return false;
-  return !last->reply.Missing().empty();
+  return !last->response.Missing().empty();
 }
 
-// libcurl goes on answering as long as the peer calls the nonce stale, until it runs out of time or
-// has read too much.
+// libcurl goes on sending credentials as long as the peer calls the nonce stale, until it runs out
+// of time or has read too much.
 bool LoginRefusedForEver(const Evidence& evidence) {
   constexpr size_t kMany = 5;
   const std::vector<Exchange>& exchanges = evidence.trace.Exchanges();
   if (CurlCode(evidence, {CURLE_OK}) || exchanges.size() < kMany) return false;
   const Exchange& before = exchanges[exchanges.size() - 2];
-  return before.reply.Status() == 401 && SentLogin(before);
+  return before.response.Status() == 401 && SentCredentials(before);
 }
 
 bool LoginRefused(const Evidence& evidence) {
   const Exchange* const last = Last(evidence);
-  return last != nullptr && last->reply.Status() == 401 && SentLogin(*last);
+  return last != nullptr && last->response.Status() == 401 && SentCredentials(*last);
 }
 
 bool LoginWanted(const Evidence& evidence) {
   const Exchange* const last = Last(evidence);
-  return last != nullptr && last->reply.Status() == 401;
+  return last != nullptr && last->response.Status() == 401;
 }
 
 bool StatusIsNoSuccess(const Evidence& evidence) {
   const Exchange* const last = Last(evidence);
   if (last == nullptr || HeadMissing(*last)) return false;
-  return last->reply.Status() < 200 || last->reply.Status() > 299;
+  return last->response.Status() < 200 || last->response.Status() > 299;
 }
 
 bool NoLength(const Evidence& evidence) {
@@ -186,13 +188,13 @@ bool NoLength(const Evidence& evidence) {
                                               static_cast<int>(OperationId::kSoapAuth)});
   const Exchange* const last = Last(evidence);
   if (!soap || last == nullptr || evidence.outcome.result != HTTP_RET_IO_ERROR) return false;
-  return last->reply.BodyFraming() != Framing::kLength || last->reply.Announced() == 0;
+  return last->response.BodyFraming() != Framing::kLength || last->response.Announced() == 0;
 }
 
 bool EmptyBody(const Evidence& evidence) {
   const Exchange* const last = Last(evidence);
   return evidence.options.operation->id == OperationId::kJsonGet && !evidence.outcome.good &&
-         last != nullptr && last->reply.HeadComplete() && last->reply.BodyBytes() == 0;
+         last != nullptr && last->response.HeadComplete() && last->response.BodyBytes() == 0;
 }
 
 template <Content content>
@@ -241,18 +243,6 @@ constexpr Rule kRules[] = {
 };
 
 }  // namespace
-
-std::vector<HeadFinding> FindingsOf(const Trace& trace, const Exchange& exchange) {
-  return trace.curl.used ? std::vector<HeadFinding>() : InspectHead(exchange.reply);
-}
-
-bool SentLogin(const Exchange& exchange) {
-  const size_t end = exchange.sent.find("\r\n\r\n");
-  for (const auto& header : SplitHeaderLines(exchange.sent.substr(0, end))) {
-    if (EqualsIgnoringCase(header.first, "Authorization")) return true;
-  }
-  return false;
-}
 
 FailureClass Classify(const Evidence& evidence) {
   for (const Rule& rule : kRules) {

@@ -24,7 +24,7 @@ class ToolClient : public TWHttpClient {
     return m_pRespBuf != nullptr ? std::string(m_pRespBuf, m_respLen) : std::string();
   }
 
-  // Connects and sends `request` as it is; GetResp reads the reply.
+  // Connects and sends `request` as it is; GetResp reads the response.
   int SendAsItIs(const std::string& request) {
     if (m_pSocket->Connect() != 0) return HTTP_RET_IO_ERROR;
     const int size = static_cast<int>(request.size());

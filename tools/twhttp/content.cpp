@@ -33,7 +33,7 @@ bool IsXml(const std::string& text) {
   return document != nullptr;
 }
 
-// What the parser told the log about a reply that is no JSON; an empty text for one that is.
+// What the parser told the log about a response that is no JSON; an empty text for one that is.
 std::string JsonError() {
   constexpr char kFailed[] = "JsonParse(): Failed to parse json: ";
   constexpr char kWith[] = "] with error [";
@@ -49,8 +49,8 @@ std::string JsonError() {
   return "";
 }
 
-std::string SuccessError(const Json::Value& reply) {
-  if (!reply.isObject()) return "the reply is no object";
-  if (!reply.isMember("success")) return "the member \"success\" is missing";
-  return "\"success\" is " + CompactJson(reply["success"]);
+std::string SuccessError(const Json::Value& response) {
+  if (!response.isObject()) return "the response is no object";
+  if (!response.isMember("success")) return "the member \"success\" is missing";
+  return "\"success\" is " + CompactJson(response["success"]);
 }

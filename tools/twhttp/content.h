@@ -1,4 +1,4 @@
-// What the parsers of replies say beside their results.
+// What the parsers of responses say beside their results.
 #ifndef TARNWICK_TOOLS_TWHTTP_CONTENT_H_
 #define TARNWICK_TOOLS_TWHTTP_CONTENT_H_
 
@@ -19,11 +19,11 @@ void ListenToXml();
 // The first finding since, which explains the others.
 std::string FirstXmlError();
 
-// What the parser told the library's log about a reply that is no JSON; an empty text for one that
-// is. REQUIRES: within Observe.
+// What the parser told the library's log about a response that is no JSON; an empty text for one
+// that is. REQUIRES: within Observe.
 std::string JsonError();
 
-// Why a reply in JSON is no success.
-std::string SuccessError(const Json::Value& reply);
+// Why a response in JSON is no success.
+std::string SuccessError(const Json::Value& response);
 
 #endif  // TARNWICK_TOOLS_TWHTTP_CONTENT_H_

@@ -3,16 +3,15 @@
 #include <cstdio>
 
 #include "tools/common/shell.h"
-#include "tools/twhttp/failure.h"
+#include "tools/common/units.h"
+#include "tools/twhttp/causes.h"
 
 namespace {
 
 using Id = FailureClass;
 
 std::string Seconds(double seconds) {
-  char text[32];
-  snprintf(text, sizeof(text), seconds < 10 ? "%.2f s" : "%.1f s", seconds);
-  return text;
+  return FormatSeconds(seconds, seconds < 10 ? 2 : 1);
 }
 
 std::string Count(uint64_t count, const char* what) {
@@ -55,14 +54,14 @@ std::string PhaseOf(const Evidence& evidence, Id id) {
   if (last == nullptr || last->connection != connection->number || last->send.failed) {
     return "request";
   }
-  return last->reply.HeadComplete() ? "body" : "head";
+  return last->response.HeadComplete() ? "body" : "head";
 }
 
 std::string LimitOf(const Evidence& evidence, const std::string& phase) {
   if (phase == "content" || phase == "status") return "";
   const Options& options = evidence.options;
   if (options.operation->by_curl) {
-    if (!options.operation->Does(kTimeout)) return "none";
+    if (!options.operation->Uses(kTimeout)) return "none";
     return options.timeout > 0 ? Seconds(options.timeout) + " for the whole transfer" : "none";
   }
   if (phase == "look-up" || phase == "TLS" || phase == "request") return "none in the library";
@@ -102,7 +101,7 @@ std::string Silence(const Exchange& exchange) {
 }
 
 std::string StatusLine(const Exchange& exchange) {
-  const std::string& head = exchange.reply.Head();
+  const std::string& head = exchange.response.Head();
   return head.substr(0, head.find_first_of("\r\n"));
 }
 
@@ -111,7 +110,7 @@ std::string HeadDetail(const Trace& trace, const Exchange& exchange) {
   for (const HeadFinding& finding : found) {
     if (finding.breaks) return finding.text;
   }
-  if (!exchange.reply.HeadComplete()) {
+  if (!exchange.response.HeadComplete()) {
     return "the head ended after " + Count(exchange.received_bytes, "byte") +
            ", before its empty line";
   }
@@ -129,7 +128,7 @@ std::string ExchangeDetail(const Trace& trace, const Exchange& last, Id id) {
     case Id::kMalformedHead:
       return HeadDetail(trace, last);
     case Id::kCutBody:
-      return last.reply.Missing();
+      return last.response.Missing();
     case Id::kReset:
     case Id::kNoReply:
     case Id::kWriteFailed:
@@ -166,7 +165,7 @@ std::string WaitLimit(const Options& options) {
   if (options.timeout < 0) return "none";
   // What TWSocket does with a small buffered read that gets nothing.
   return Seconds(options.timeout) + " a wait" +
-         (options.buffered || !options.operation->Does(kBuffered) ? ", 7 waits at most" : "");
+         (options.buffered || !options.operation->Uses(kBuffered) ? ", 7 waits at most" : "");
 }
 
 Failure Explain(const Evidence& evidence) {

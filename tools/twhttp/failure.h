@@ -5,10 +5,7 @@
 #include <string>
 #include <vector>
 
-#include "tools/twhttp/interrupt.h"
-#include "tools/twhttp/options.h"
-#include "tools/twhttp/run.h"
-#include "tools/twhttp/trace.h"
+#include "tools/twhttp/evidence.h"
 
 enum class FailureClass {
   kNone,
@@ -66,31 +63,11 @@ struct Failure {
   std::string next;
 };
 
-// Everything that a verdict is made of.
-struct Evidence {
-  const Options& options;
-  const Outcome& outcome;
-  const Trace& trace;
-  Stop stop;
-};
-
 // The class alone, decided by the first rule that fits.
 FailureClass Classify(const Evidence& evidence);
 
 // The whole explanation. `id` is kNone when all went well.
 Failure Explain(const Evidence& evidence);
-
-// What this failure's own evidence points at, before the usual causes of its class; and the command
-// that looks further.
-std::vector<std::string> SpecialCauses(const Evidence& evidence, FailureClass id);
-std::vector<std::string> FurtherCauses(const Evidence& evidence, FailureClass id);  // behind them
-const char* NextCommand(const Evidence& evidence, FailureClass id);
-
-// What the library trips over in the head of `exchange`; nothing when libcurl read it.
-std::vector<HeadFinding> FindingsOf(const Trace& trace, const Exchange& exchange);
-
-// True when the request carried an Authorization line.
-bool SentLogin(const Exchange& exchange);
 
 // The tool's own limit for one wait, in seconds; 0 for none.
 double GiveUpLimit(const Options& options);

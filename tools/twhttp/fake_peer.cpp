@@ -8,6 +8,7 @@
 #include <cstdlib>
 #include <system_error>
 
+#include "tools/common/text.h"
 #include "tools/twhttp/message.h"
 
 namespace {
@@ -75,7 +76,7 @@ std::vector<std::string> FakePeer::Finish() {
   return requests_;
 }
 
-std::string FakePeer::NextReply() {
+std::string FakePeer::NextResponse() {
   constexpr char kEmpty[] = "Content-Length: 0\r\nConnection: close\r\n\r\n";
   const std::lock_guard<std::mutex> lock(mutex_);
   if (challenge_.empty() || requests_.size() != 1)
@@ -86,17 +87,17 @@ std::string FakePeer::NextReply() {
 void FakePeer::Serve(int fd) {
   std::string bytes;
   bool endless = false;
-  bool answered = false;
+  bool responded = false;
   char piece[65536];
   for (ssize_t count; (count = recv(fd, piece, sizeof(piece), 0)) > 0;) {
     bytes.append(piece, static_cast<size_t>(count));
     const size_t length = endless ? bytes.size() : RequestLength(bytes, &endless);
     if (length == 0) continue;
-    Take(bytes.substr(0, length), endless && answered);
+    Take(bytes.substr(0, length), endless && responded);
     bytes.erase(0, length);
-    if (!answered) SendAll(fd, NextReply());
-    shutdown(fd, SHUT_WR);  // the library reads a reply to the close
-    answered = true;
+    if (!responded) SendAll(fd, NextResponse());
+    shutdown(fd, SHUT_WR);  // the library reads a response to the close
+    responded = true;
   }
   if (!bytes.empty()) Take(bytes, false);
   close(fd);

@@ -1,6 +1,6 @@
 // A peer inside the process, for showing what an operation would send: it takes requests over the
-// loopback interface and answers each with an empty success, the first with a challenge when there
-// is one.
+// loopback interface and responds to each with an empty success, the first with a challenge when
+// there is one.
 #ifndef TARNWICK_TOOLS_TWHTTP_FAKE_PEER_H_
 #define TARNWICK_TOOLS_TWHTTP_FAKE_PEER_H_
 
@@ -28,7 +28,7 @@ class FakePeer {
   void Accept();
   void Serve(int fd);
   void Take(const std::string& bytes, bool continued);
-  std::string NextReply();
+  std::string NextResponse();
 
   const std::string challenge_;
   std::mutex mutex_;

@@ -1,7 +1,8 @@
-// What is odd about a reply's head, and what the library makes of it.
+// What is odd about a response's head, and what the library makes of it.
 #include <algorithm>
 
 #include "tarnwick/http/kept_fields.h"
+#include "tools/common/text.h"
 #include "tools/twhttp/message.h"
 
 namespace {
@@ -11,21 +12,21 @@ constexpr size_t kLibraryLines = 30;
 
 struct LineFacts {
   size_t longest = 0;
-  int bareLineFeeds = 0;
-  bool nullBytes = false;
-  std::string withoutColon;  // the first such line
-  bool withoutName = false;
-  bool onlyDelimiters = false;
+  int bare_line_feeds = 0;
+  bool null_bytes = false;
+  std::string without_colon;  // the first such line
+  bool without_name = false;
+  bool only_delimiters = false;
 };
 
-// `line` is one behind the status line, without its end.
+// `line` is one after the status line, without its end.
 void MeasureHeader(const std::string& line, LineFacts* facts) {
   if (line.empty()) return;
   const size_t colon = line.find(':');
-  if (colon == std::string::npos && facts->withoutColon.empty()) facts->withoutColon = line;
-  if (colon == 0) facts->withoutName = true;
+  if (colon == std::string::npos && facts->without_colon.empty()) facts->without_colon = line;
+  if (colon == 0) facts->without_name = true;
   // What the library takes for ends of a name.
-  if (line.find_first_not_of(" :;=") == std::string::npos) facts->onlyDelimiters = true;
+  if (line.find_first_not_of(" :;=") == std::string::npos) facts->only_delimiters = true;
 }
 
 LineFacts Measure(const std::string& head) {
@@ -35,10 +36,10 @@ LineFacts Measure(const std::string& head) {
     facts.longest = std::max(facts.longest, end - begin);
     const size_t text = end > begin && head[end - 1] == '\r' ? end - 1 : end;
     if (begin > 0) MeasureHeader(head.substr(begin, text - begin), &facts);
-    if (end < head.size() && (end == begin || head[end - 1] != '\r')) ++facts.bareLineFeeds;
+    if (end < head.size() && (end == begin || head[end - 1] != '\r')) ++facts.bare_line_feeds;
     begin = end + 1;
   }
-  facts.nullBytes = head.find('\0') != std::string::npos;
+  facts.null_bytes = head.find('\0') != std::string::npos;
   return facts;
 }
 
@@ -53,40 +54,40 @@ size_t CountOf(const HeaderLines& headers, const std::string& name) {
   }));
 }
 
-void InspectLines(const ReplyMessage& reply, std::vector<HeadFinding>* found) {
-  const LineFacts facts = Measure(reply.Head());
+void InspectLines(const ResponseMessage& response, std::vector<HeadFinding>* found) {
+  const LineFacts facts = Measure(response.Head());
   if (facts.longest > kLibraryLine) {
     found->push_back({"a head line of " + std::to_string(facts.longest) + " bytes",
                       "the library cuts a line at 2,047 bytes and takes the rest for another line",
                       true});
   }
-  if (reply.Headers().size() > kLibraryLines) {
-    found->push_back({std::to_string(reply.Headers().size()) + " header lines",
+  if (response.Headers().size() > kLibraryLines) {
+    found->push_back({std::to_string(response.Headers().size()) + " header lines",
                       "the library reads 30; the others are taken for the beginning of the body",
                       true});
   }
-  if (facts.bareLineFeeds > 0) {
-    found->push_back({std::to_string(facts.bareLineFeeds) + " head lines end in a bare line feed",
+  if (facts.bare_line_feeds > 0) {
+    found->push_back({std::to_string(facts.bare_line_feeds) + " head lines end in a bare line feed",
                       "the library takes either line end"});
   }
-  if (facts.nullBytes) {
+  if (facts.null_bytes) {
     found->push_back({"zero bytes in the head", "the library's line ends at the first of them"});
   }
-  if (!facts.withoutColon.empty()) {
-    found->push_back({"a header line without a colon: " + facts.withoutColon.substr(0, 60),
+  if (!facts.without_colon.empty()) {
+    found->push_back({"a header line without a colon: " + facts.without_colon.substr(0, 60),
                       "the library takes its first word for the name"});
   }
-  if (facts.onlyDelimiters) {
+  if (facts.only_delimiters) {
     found->push_back({"a header line without a name and without a value",
                       "the library takes the whole head for malformed", true});
-  } else if (facts.withoutName) {
+  } else if (facts.without_name) {
     found->push_back({"a header line that begins with its colon",
                       "the library takes the next word for the name"});
   }
   for (const tarnwick::KeptField& field : tarnwick::kKeptFields) {
     const std::string name(field.name);
-    if (CountOf(reply.Headers(), name) == 0 || !reply.Value(name).empty()) continue;
-    const bool breaks = reply.Head().find(name + ":\r\n") != std::string::npos;
+    if (CountOf(response.Headers(), name) == 0 || !response.Value(name).empty()) continue;
+    const bool breaks = response.Head().find(name + ":\r\n") != std::string::npos;
     found->push_back({"an empty " + name + " line",
                       breaks ? "the library takes the whole head for malformed"
                              : "the blank in it keeps the library from refusing the head",
@@ -94,21 +95,21 @@ void InspectLines(const ReplyMessage& reply, std::vector<HeadFinding>* found) {
   }
 }
 
-void InspectFraming(const ReplyMessage& reply, std::vector<HeadFinding>* found) {
-  const std::string coding = reply.Value("Transfer-Encoding");
-  const std::string length = reply.Value("Content-Length");
+void InspectFraming(const ResponseMessage& response, std::vector<HeadFinding>* found) {
+  const std::string coding = response.Value("Transfer-Encoding");
+  const std::string length = response.Value("Content-Length");
   if (!length.empty() && length.find_first_not_of("0123456789") != std::string::npos) {
     found->push_back({"Content-Length: " + length + " is no length",
-                      "only a SOAP reply needs one; libcurl refuses the head"});
+                      "only a SOAP response needs one; libcurl refuses the head"});
   }
-  if (CountOf(reply.Headers(), "Content-Length") > 1) {
+  if (CountOf(response.Headers(), "Content-Length") > 1) {
     found->push_back({"more than one Content-Length", "the library keeps the first of them"});
   }
-  if (!coding.empty() && !reply.Value("Content-Length").empty()) {
+  if (!coding.empty() && !response.Value("Content-Length").empty()) {
     found->push_back({"a Content-Length beside a Transfer-Encoding", "the chunks count"});
   }
-  if (!reply.Value("Content-Encoding").empty()) {
-    found->push_back({"Content-Encoding: " + reply.Value("Content-Encoding"),
+  if (!response.Value("Content-Encoding").empty()) {
+    found->push_back({"Content-Encoding: " + response.Value("Content-Encoding"),
                       "the library decodes none, and hands the body on as it is"});
   }
   if (!coding.empty() && coding != "chunked") {
@@ -121,25 +122,25 @@ void InspectFraming(const ReplyMessage& reply, std::vector<HeadFinding>* found) 
 
 }  // namespace
 
-std::vector<HeadFinding> InspectHead(const ReplyMessage& reply) {
+std::vector<HeadFinding> InspectHead(const ResponseMessage& response) {
   std::vector<HeadFinding> found;
-  const std::string& head = reply.Head();
+  const std::string& head = response.Head();
   const std::string start = head.substr(0, 8);
   const bool known = start == "HTTP/1.0" || start == "HTTP/1.1";
   const bool complete = head.find('\n') != std::string::npos;
-  if (known && complete && reply.Interims() == 0 && reply.Status() < 100) {
+  if (known && complete && response.Interims() == 0 && response.Status() < 100) {
     found.push_back({"the status line has no status of three digits: " + FirstLine(head),
                      "the library takes it for no success", true});
   }
   if (!head.empty() && !known) {
-    found.push_back({"the reply begins with \"" + FirstLine(head) + "\"",
-                     "the library reads replies of HTTP/1.0 and HTTP/1.1", true});
+    found.push_back({"the response begins with \"" + FirstLine(head) + "\"",
+                     "the library reads responses of HTTP/1.0 and HTTP/1.1", true});
   }
-  if (reply.Interims() > 0) {
-    found.push_back({"an interim reply of status 100 to 199 came first",
-                     "the library takes it for the reply", true});
+  if (response.Interims() > 0) {
+    found.push_back({"an interim response of status 100 to 199 came first",
+                     "the library takes it for the response", true});
   }
-  InspectLines(reply, &found);
-  if (reply.HeadComplete()) InspectFraming(reply, &found);
+  InspectLines(response, &found);
+  if (response.HeadComplete()) InspectFraming(response, &found);
   return found;
 }

@@ -14,11 +14,11 @@ class TWDbgLogCfg;
 
 struct Hooks {
   Trace* trace = nullptr;
-  // With a peer, nothing leaves the process: it answers every connection.
+  // With a peer, nothing leaves the process: it responds on every connection.
   FakePeer* peer = nullptr;
   int port = 0;  // the target's
   // Called after bytes went or came.
-  std::function<void()> moved;
+  std::function<void()> on_transfer;
 
   double Now() const;  // seconds since Observe
   void Moved() const;

@@ -8,7 +8,7 @@
 
 #include "tools/twhttp/fake_peer.h"
 #include "tools/twhttp/hooks.h"
-#include "tools/twhttp/interrupt.h"
+#include "tools/twhttp/watchdog.h"
 
 namespace {
 
@@ -59,11 +59,11 @@ void NoteText(Transfer* transfer, std::string_view text) {
   }
 }
 
-// libcurl does not tell of the empty line behind an interim reply.
+// libcurl does not report the empty line after an interim response.
 void EndInterim(Hooks* hooks, int connection) {
   const Exchange* const last = hooks->trace->LastExchange();
-  if (last == nullptr || last->connection != connection || last->reply.HeadComplete()) return;
-  const std::string& head = last->reply.Head();
+  if (last == nullptr || last->connection != connection || last->response.HeadComplete()) return;
+  const std::string& head = last->response.Head();
   const bool ended = head.size() < 4 || head.compare(head.size() - 4, 4, "\r\n\r\n") == 0;
   if (!ended) hooks->trace->Received(connection, hooks->Now(), "\r\n");
 }
@@ -170,9 +170,9 @@ extern "C" CURLcode __wrap_curl_easy_perform(CURL* curl) {
   SetObservers(curl, &transfer);
   if (hooks->peer != nullptr) GoOffline(curl, &transfer, names);
   hooks->trace->curl.used = true;
-  RestartGiveUp();
+  RestartWatchdog();
   const CURLcode code = __real_curl_easy_perform(curl);
-  EndGiveUp();
+  StopWatchdog();
   NoteFigures(curl, code, transfer);
   NoteSteps(transfer);
   // What the cleanup still says comes too late for the buffers here.

@@ -15,7 +15,7 @@
 #include "tarnwick/platform/unique.h"
 #include "tools/twhttp/fake_peer.h"
 #include "tools/twhttp/hooks.h"
-#include "tools/twhttp/interrupt.h"
+#include "tools/twhttp/watchdog.h"
 
 namespace {
 
@@ -83,8 +83,8 @@ double Hooks::Now() const {
 }
 
 void Hooks::Moved() const {
-  if (trace->curl.used) RestartGiveUp();
-  if (moved) moved();
+  if (trace->curl.used) RestartWatchdog();
+  if (on_transfer) on_transfer();
 }
 
 Hooks* CurrentHooks() {
@@ -151,7 +151,7 @@ extern "C" int __wrap_connect(int fd, const sockaddr* address, socklen_t length)
   if (connection == nullptr) return __real_connect(fd, address, length);
   connection->address = AddressText(address);
   connection->connect.begin = g_hooks->Now();
-  const GiveUpWait wait;
+  const WatchedWait wait;
   if (g_hooks->peer != nullptr) {
     address = reinterpret_cast<const sockaddr*>(&g_hooks->peer->Address());
   }
@@ -182,7 +182,7 @@ extern "C" int __wrap_select(int count, fd_set* readable, fd_set* writable, fd_s
   if (connection == nullptr) return __real_select(count, readable, writable, exceptional, left);
   const double begin = g_hooks->Now();
   // A wait for writing is part of the write, which may need many of them.
-  std::optional<GiveUpWait> wait;
+  std::optional<WatchedWait> wait;
   if (readable != nullptr) wait.emplace();
   int result = -1;
   errno = EINTR;
@@ -204,7 +204,7 @@ extern "C" int __wrap_select(int count, fd_set* readable, fd_set* writable, fd_s
 extern "C" ssize_t __real_read(int fd, void* buf, size_t length);
 extern "C" ssize_t __wrap_read(int fd, void* buf, size_t length) {
   if (Watched(fd) == nullptr) return __real_read(fd, buf, length);
-  const GiveUpWait wait;
+  const WatchedWait wait;
   const ssize_t count = __real_read(fd, buf, length);
   if (count < 0) TurnIntoCancelled();
   NoteRead(fd, buf, count);
@@ -215,13 +215,13 @@ extern "C" ssize_t __real_write(int fd, const void* buf, size_t length);
 extern "C" ssize_t __wrap_write(int fd, const void* buf, size_t length) {
   if (Watched(fd) == nullptr) return __real_write(fd, buf, length);
   const double begin = g_hooks->Now();
-  BeginGiveUp();
+  StartWatchdog();
   const ssize_t count = __real_write(fd, buf, length);
   if (count < 0) TurnIntoCancelled();
   const tarnwick::ErrnoSaver keeper;
   const int number = ConnectionOf(fd);
   if (count > 0) {
-    EndGiveUp();
+    StopWatchdog();
     g_hooks->trace->Sent(number, begin, g_hooks->Now(),
                          {static_cast<const char*>(buf), static_cast<size_t>(count)});
     g_hooks->Moved();

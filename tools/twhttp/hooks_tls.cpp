@@ -9,7 +9,7 @@
 
 #include "tarnwick/platform/unique.h"
 #include "tools/twhttp/hooks.h"
-#include "tools/twhttp/interrupt.h"
+#include "tools/twhttp/watchdog.h"
 
 namespace {
 
@@ -117,7 +117,7 @@ extern "C" int __wrap_SSL_connect(SSL* ssl) {
   if (IsOffline()) return 1;
   connection->handshake.begin = CurrentHooks()->Now();
   SSL_set_info_callback(ssl, OnInfo);
-  const GiveUpWait wait;
+  const WatchedWait wait;
   const int result = __real_SSL_connect(ssl);
   NoteHandshake(ssl, connection, result);
   return result;
@@ -129,7 +129,7 @@ extern "C" int __wrap_SSL_read(SSL* ssl, void* buf, int length) {
   if (IsOffline()) {
     return static_cast<int>(read(SSL_get_fd(ssl), buf, static_cast<size_t>(length)));
   }
-  const GiveUpWait wait;
+  const WatchedWait wait;
   const int count = __real_SSL_read(ssl, buf, length);
   NoteRead(ssl, buf, count);
   return count;
@@ -143,14 +143,14 @@ extern "C" int __wrap_SSL_write(SSL* ssl, const void* buf, int length) {
     return static_cast<int>(write(SSL_get_fd(ssl), buf, static_cast<size_t>(length)));
   }
   const double begin = CurrentHooks()->Now();
-  BeginGiveUp();
+  StartWatchdog();
   const int count = __real_SSL_write(ssl, buf, length);
   const tarnwick::ErrnoSaver keeper;
   const int error = SSL_get_error(ssl, count);
   const bool waits = error == SSL_ERROR_WANT_READ || error == SSL_ERROR_WANT_WRITE;
   Trace* const trace = CurrentHooks()->trace;
   if (count > 0) {
-    EndGiveUp();
+    StopWatchdog();
     trace->Sent(connection->number, begin, CurrentHooks()->Now(),
                 {static_cast<const char*>(buf), static_cast<size_t>(count)});
     CurrentHooks()->Moved();

@@ -66,7 +66,7 @@ uint64_t UploadSize(const Options& options, const std::string& body) {
 
 // Where the body goes to the same terminal, the line would tear it.
 bool MayShowProgress(const Options& options) {
-  const bool mixed = options.operation->Does(kStream) && IsTerminal(STDOUT_FILENO);
+  const bool mixed = options.operation->Uses(kStream) && IsTerminal(STDOUT_FILENO);
   return IsTerminal(STDERR_FILENO) && !mixed && !options.json;
 }
 
@@ -106,10 +106,10 @@ int RunOnce(const Options& options, const std::string& body) {
     if (progress && IsTerminal(STDOUT_FILENO)) progress->Finish();
     return written = WriteOut(piece);
   };
-  const auto moved = [&] {
+  const auto on_transfer = [&] {
     if (progress) progress->Update();
   };
-  RunSession(&session, body, write, moved, nullptr);
+  RunSession(&session, body, write, on_transfer, nullptr);
   if (progress) progress->Finish();
   if (!written) session.failure.id = FailureClass::kLocalFile;
   Report(session);

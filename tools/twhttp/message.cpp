@@ -6,6 +6,8 @@
 #include <cctype>
 #include <cstdlib>
 
+#include "tools/common/text.h"
+
 namespace {
 
 constexpr size_t kMaxHead = size_t{256} * 1024;
@@ -36,10 +38,6 @@ bool IsHex(char c) {
 
 }  // namespace
 
-bool EqualsIgnoringCase(std::string_view a, std::string_view b) {
-  return a.size() == b.size() && strncasecmp(a.data(), b.data(), a.size()) == 0;
-}
-
 HeaderLines SplitHeaderLines(std::string_view head) {
   HeaderLines lines;
   for (bool first = true; !head.empty(); first = false) {
@@ -51,7 +49,7 @@ HeaderLines SplitHeaderLines(std::string_view head) {
   return lines;
 }
 
-void ReplyMessage::Feed(std::string_view bytes) {
+void ResponseMessage::Feed(std::string_view bytes) {
   while (!bytes.empty()) {
     size_t used = bytes.size();
     if (state_ == State::kHead) {
@@ -65,7 +63,7 @@ void ReplyMessage::Feed(std::string_view bytes) {
   }
 }
 
-size_t ReplyMessage::FeedHead(std::string_view bytes) {
+size_t ResponseMessage::FeedHead(std::string_view bytes) {
   const size_t end = bytes.find('\n');
   const size_t used = end == std::string_view::npos ? bytes.size() : end + 1;
   const std::string_view part = bytes.substr(0, used);
@@ -76,7 +74,7 @@ size_t ReplyMessage::FeedHead(std::string_view bytes) {
   return used;
 }
 
-void ReplyMessage::EndLine() {
+void ResponseMessage::EndLine() {
   const std::string_view line = Trimmed(line_);
   if (line.empty() && !first_line_) {
     EndHead();
@@ -92,8 +90,8 @@ void ReplyMessage::EndLine() {
   line_.clear();
 }
 
-void ReplyMessage::EndHead() {
-  if (status_ >= 100 && status_ <= 199) {  // an interim reply; the real one follows
+void ResponseMessage::EndHead() {
+  if (status_ >= 100 && status_ <= 199) {  // an interim response; the real one follows
     headers_.clear();
     first_line_ = true;
     ++interims_;
@@ -115,7 +113,7 @@ void ReplyMessage::EndHead() {
   if (framing_ == Framing::kNone || empty) state_ = State::kDone;
 }
 
-size_t ReplyMessage::FeedBody(std::string_view bytes) {
+size_t ResponseMessage::FeedBody(std::string_view bytes) {
   size_t used = bytes.size();
   if (framing_ == Framing::kChunked) {
     used = FeedChunked(bytes);
@@ -127,7 +125,7 @@ size_t ReplyMessage::FeedBody(std::string_view bytes) {
   return used;
 }
 
-size_t ReplyMessage::FeedChunked(std::string_view bytes) {
+size_t ResponseMessage::FeedChunked(std::string_view bytes) {
   if (chunk_state_ == ChunkState::kData) {
     const size_t used = static_cast<size_t>(std::min<uint64_t>(bytes.size(), chunk_left_));
     chunk_left_ -= used;
@@ -141,7 +139,7 @@ size_t ReplyMessage::FeedChunked(std::string_view bytes) {
   return used;
 }
 
-void ReplyMessage::EndChunkLine() {
+void ResponseMessage::EndChunkLine() {
   const std::string line(Trimmed(line_));
   line_.clear();
   if (chunk_state_ == ChunkState::kDataEnd) {
@@ -156,7 +154,7 @@ void ReplyMessage::EndChunkLine() {
   }
 }
 
-std::string ReplyMessage::Value(std::string_view name) const {
+std::string ResponseMessage::Value(std::string_view name) const {
   std::string value;
   for (const auto& header : headers_) {
     if (EqualsIgnoringCase(header.first, name)) value = header.second;
@@ -164,16 +162,15 @@ std::string ReplyMessage::Value(std::string_view name) const {
   return value;
 }
 
-std::string ReplyMessage::Missing() const {
-  if (bad_chunk_)
-    return "what stands in place of a chunk's size, or of the line end behind it, is none";
+std::string ResponseMessage::Missing() const {
+  if (bad_chunk_) return "what stands in place of a chunk's size, or of the CRLF after it, is none";
   if (state_ != State::kBody) return "";
   if (framing_ == Framing::kLength) {
     return std::to_string(announced_) + " bytes were announced and " + std::to_string(body_bytes_) +
            " came";
   }
   if (framing_ != Framing::kChunked) return "";
-  // Behind the last chunk only the empty line is missing, and the body is whole.
+  // After the last chunk only the empty line is missing, and the body is whole.
   if (chunk_state_ == ChunkState::kTrailer) return "";
   if (chunk_state_ == ChunkState::kData) {
     return std::to_string(chunk_left_) + " bytes of a chunk did not come";

@@ -1,4 +1,4 @@
-// A reply's head and framing, followed byte by byte as it arrives.
+// A response's head and framing, followed byte by byte as it arrives.
 //
 // It stands beside the library's own reading, which believes devices in much: what was announced
 // and what came are compared here.
@@ -14,12 +14,12 @@
 
 using HeaderLines = std::vector<std::pair<std::string, std::string>>;
 
-// How the end of a reply's body is told.
+// How the end of a response's body is told.
 enum class Framing { kUnknown, kNone, kLength, kChunked, kUntilClose };
 
-class ReplyMessage {
+class ResponseMessage {
  public:
-  // The next bytes that came. Any split gives the same result.
+  // The next bytes that came. Any split has the same result.
   void Feed(std::string_view bytes);
 
   bool HeadComplete() const { return state_ != State::kHead; }
@@ -28,7 +28,7 @@ class ReplyMessage {
   bool BodyComplete() const { return state_ == State::kDone; }
 
   int Status() const { return status_; }
-  int Interims() const { return interims_; }  // replies of 100 to 199 in front of it
+  int Interims() const { return interims_; }  // responses of 100 to 199 in front of it
   Framing BodyFraming() const { return framing_; }
 
   // The head as it came, of at most 256 KiB, with its line ends.
@@ -43,7 +43,7 @@ class ReplyMessage {
   uint64_t HeadBytes() const { return head_bytes_; }
   uint64_t BodyBytes() const { return body_bytes_; }  // chunk lines included
   uint64_t Announced() const { return announced_; }   // of kLength
-  uint64_t Surplus() const { return surplus_; }       // bytes behind the end of the body
+  uint64_t Surplus() const { return surplus_; }       // bytes after the end of the body
 
   // A chunk is not what it should be; the library then takes the body for ended.
   bool BadChunk() const { return bad_chunk_; }
@@ -79,18 +79,16 @@ class ReplyMessage {
   bool bad_chunk_ = false;
 };
 
-// One thing about a reply's head that the library, or a strict client, trips over.
+// One thing about a response's head that the library, or a strict client, trips over.
 struct HeadFinding {
   std::string text;     // what was seen
   std::string rule;     // what the library makes of it
   bool breaks = false;  // the library then reads another head or body than was meant
 };
 
-std::vector<HeadFinding> InspectHead(const ReplyMessage& reply);
+std::vector<HeadFinding> InspectHead(const ResponseMessage& response);
 
-// The header lines of a request's or reply's head, without its first line.
+// The header lines of a request's or response's head, without its first line.
 HeaderLines SplitHeaderLines(std::string_view head);
-
-bool EqualsIgnoringCase(std::string_view a, std::string_view b);
 
 #endif  // TARNWICK_TOOLS_TWHTTP_MESSAGE_H_

@@ -4,9 +4,9 @@
 
 #include <array>
 
-// What an operation takes.
-enum Takes : unsigned {
-  kLogin = 1,
+// What an operation of the library offers or needs.
+enum Feature : unsigned {
+  kCredentials = 1,
   kVersion = 2,
   kCookie = 4,
   kBasicFirst = 8,
@@ -51,9 +51,9 @@ struct Operation {
   const char* method;
   Scheme scheme;
   bool by_curl;
-  unsigned takes;
+  unsigned features;
 
-  bool Does(unsigned what) const { return (takes & what) != 0; }
+  bool Uses(unsigned feature) const { return (features & feature) != 0; }
 };
 
 using OperationTable = std::array<Operation, 17>;

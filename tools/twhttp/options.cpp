@@ -8,10 +8,10 @@
 #include <iostream>
 #include <map>
 
-#include "tools/common/amounts.h"
 #include "tools/common/completion.h"
 #include "tools/common/parser.h"
 #include "tools/common/terminal.h"
+#include "tools/common/units.h"
 #include "tools/twhttp/failure.h"
 
 namespace {
@@ -26,7 +26,7 @@ constexpr char kFooter[] =
     "The body goes to standard output, everything else to standard error.\n"
     "\"twhttp codes\" lists the exit codes; \"twhttp COMMAND --help\" tells what a command takes.";
 
-// Refuses with the reason that `parse` gives; an empty one is consent.
+// Refuses with the reason that `parse` returns; an empty one accepts.
 template <typename Parse>
 CLI::Option* AddParsed(CLI::App* app, const char* name, Parse parse, const char* help,
                        const char* type) {
@@ -91,7 +91,7 @@ void AddBody(CLI::App* app, Options* options) {
 }
 
 void AddConnection(CLI::App* app, const Operation& operation, Options* options) {
-  if (operation.Does(kTimeout)) {
+  if (operation.Uses(kTimeout)) {
     app->add_option("-t,--timeout", options->timeout,
                     operation.by_curl
                         ? "End the whole transfer after so many seconds; 0 for no limit."
@@ -99,13 +99,13 @@ void AddConnection(CLI::App* app, const Operation& operation, Options* options) 
         ->type_name("SECONDS")
         ->capture_default_str();
   }
-  if (operation.Does(kBuffered)) {
+  if (operation.Uses(kBuffered)) {
     app->add_flag_callback(
         "--direct", [options] { options->buffered = false; },
         "Read byte by byte instead of reading ahead.");
   }
-  if (operation.Does(kSource)) AddSource(app, options);
-  if (operation.Does(kVerify)) {
+  if (operation.Uses(kSource)) AddSource(app, options);
+  if (operation.Uses(kVerify)) {
     app->add_flag_callback(
         "--insecure", [options] { options->verify_peer = false; },
         "Accept any certificate and host name.");
@@ -113,20 +113,20 @@ void AddConnection(CLI::App* app, const Operation& operation, Options* options) 
 }
 
 void AddRequest(CLI::App* app, const Operation& operation, Options* options, Raw* raw) {
-  if (operation.Does(kVersion)) AddVersion(app, options);
-  if (operation.Does(kCookie)) {
+  if (operation.Uses(kVersion)) AddVersion(app, options);
+  if (operation.Uses(kCookie)) {
     app->add_option("--cookie", options->cookie, "Send this Cookie line.")->type_name("TEXT");
   }
-  if (operation.Does(kLogin)) {
+  if (operation.Uses(kCredentials)) {
     app->add_option("--password-file", raw->password_file,
                     "Read the password from the first line of this file; - reads standard input.")
         ->type_name("FILE");
   }
-  if (operation.Does(kBasicFirst)) {
+  if (operation.Uses(kBasicFirst)) {
     app->add_flag("--basic-first", options->basic_first,
-                  "Send the login by Basic at once instead of waiting to be asked.");
+                  "Send the credentials by Basic at once instead of waiting to be asked.");
   }
-  if (operation.Does(kEncoding)) {
+  if (operation.Uses(kEncoding)) {
     app->add_flag("--encode-query", options->encode_query,
                   "Percent-encode the values of the query.");
   }
@@ -134,42 +134,42 @@ void AddRequest(CLI::App* app, const Operation& operation, Options* options, Raw
     app->add_option("--keep", options->encode_keep, "Characters that --encode-query leaves alone.")
         ->type_name("CHARACTERS");
   }
-  if (operation.Does(kSeparators)) {
+  if (operation.Uses(kSeparators)) {
     app->add_option("--separators", options->separators,
                     "Characters that separate the path from the body.")
         ->type_name("CHARACTERS")
         ->capture_default_str();
   }
-  if (operation.Does(kBody)) AddBody(app, options);
+  if (operation.Uses(kBody)) AddBody(app, options);
 }
 
 void AddOutput(CLI::App* app, const Operation& operation, Options* options) {
-  if (operation.Does(kResponseFile)) {
+  if (operation.Uses(kResponseFile)) {
     app->add_option("--response-file", options->response_file,
                     "Let the library write head and body to this file.")
         ->type_name("FILE");
   }
-  if (operation.Does(kStream)) {
+  if (operation.Uses(kStream)) {
     app->add_option("--max-body", options->max_body, "Stop after so many bytes of the body.")
         ->type_name("BYTES")
         ->check(CLI::NonNegativeNumber);
   }
   app->add_flag("-v,--verbose", options->verbose,
-                "Show each exchange, the challenge, the login chosen and the library's log.");
+                "Show each exchange, the challenge, the credentials chosen and the library's log.");
   app->add_flag("--timings", options->timings, "Show where the time went, beside its limits.");
   app->add_flag("--json", options->json, "Report as one JSON object a line, on standard error.");
   app->add_flag("--show-secrets", options->show_secrets,
-                "Show passwords, logins and cookies instead of ***.");
+                "Show passwords, credentials and cookies instead of ***.");
   app->add_option("--record", options->record,
-                  "Save the exchanges in this folder, for the simulated camera to play back.")
-      ->type_name("FOLDER");
+                  "Save the exchanges in this directory, for the simulated camera to play back.")
+      ->type_name("DIRECTORY");
 }
 
 void AddModes(CLI::App* app, Options* options) {
   CLI::Option* const offline = app->add_flag(
       "--offline", options->offline, "Print the exact bytes that would be sent; send nothing.");
   app->add_option("--challenge", options->challenge,
-                  "With --offline: what the peer asks for in a first 401, to see the answer.")
+                  "With --offline: what the peer asks for in a first 401, to see the credentials.")
       ->type_name("TEXT")
       ->needs(offline);
   app->add_flag("--as-curl", options->as_curl, "Print the nearest curl command; send nothing.")
@@ -219,12 +219,12 @@ std::string FinishOptions(const CLI::App& command, const Raw& raw, Options* opti
   wrong = CheckTarget(*options->operation, options->target);
   if (!wrong.empty()) return wrong;
   if (!raw.password_file.empty()) {
-    options->target.has_login = true;
+    options->target.has_credentials = true;
     if (!ReadFirstLine(raw.password_file, &options->target.password)) {
       return raw.password_file + ": no password in it";
     }
   }
-  if (options->operation->Does(kBody)) {
+  if (options->operation->Uses(kBody)) {
     options->has_body = command.count("--data") + command.count("--data-file") > 0;
     const bool optional = options->operation->id == OperationId::kRawResp;
     if (!options->has_body && !optional) return "--data or --data-file is needed";
@@ -240,14 +240,15 @@ bool ReadOptions(int argc, char** argv, Options* options, int* exit_code) {
   app.require_subcommand(1);
   app.footer(kFooter);
   AddVersionFlag(&app);
-  AddCompletion(&app, {{"--http", {"default", "1.0", "1.1"}},
-                       {"--data-file", {kCompleteFiles}},
-                       {"--password-file", {kCompleteFiles}},
-                       {"--response-file", {kCompleteFiles}},
-                       {"--record", {kCompleteFiles}}});
+  AddCompletion(&app);
   for (const Operation& operation : Operations()) AddOperation(&app, operation, options, &raw);
   app.add_subcommand("codes", "list the exit codes");
-  if (const auto code = ParseArguments(&app, argc, argv)) {
+  const CompletionWords words = {{"--http", {"default", "1.0", "1.1"}},
+                                 {"--data-file", {kCompleteFiles}},
+                                 {"--password-file", {kCompleteFiles}},
+                                 {"--response-file", {kCompleteFiles}},
+                                 {"--record", {kCompleteFiles}}};
+  if (const auto code = ParseArguments(&app, words, argc, argv)) {
     *exit_code = *code;
     return false;
   }

@@ -5,8 +5,8 @@
 #include <algorithm>
 #include <cstdio>
 
-#include "tools/common/amounts.h"
 #include "tools/common/terminal.h"
+#include "tools/common/units.h"
 
 namespace {
 
@@ -51,8 +51,8 @@ void Progress::Update() {
   }
   drawn_ = Clock::now();
   const bool receiving = last->received_bytes > 0;
-  const uint64_t done = receiving ? last->reply.BodyBytes() : last->sent_bytes;
-  const uint64_t total = receiving ? last->reply.Announced() : upload_size_;
+  const uint64_t done = receiving ? last->response.BodyBytes() : last->sent_bytes;
+  const uint64_t total = receiving ? last->response.Announced() : upload_size_;
   const int width = TerminalWidth(STDERR_FILENO);
   const std::string line = ProgressLine(done, total, SecondsSince(start_), width);
   fprintf(stderr, "\r\x1b[K%s", line.substr(0, static_cast<size_t>(width - 1)).c_str());

@@ -19,7 +19,7 @@ class Progress {
 
   void Update();
 
-  // Takes the line away.
+  // Feature the line away.
   void Finish();
 
  private:

@@ -53,7 +53,7 @@ RecordedExchange RecordOf(const Session& session, const Exchange& exchange, int 
     before = piece.at;
   }
   record.end = EndOf(exchange);
-  record.endDelayMs = Milliseconds(before, exchange.ended);
+  record.end_delay_ms = Milliseconds(before, exchange.ended);
   return record;
 }
 
@@ -62,7 +62,7 @@ RecordedExchange FailedRecord(const Session& session, const Connection& connecti
   RecordedExchange record = BeginRecord(session, &connection, number);
   const bool refused = session.failure.id == FailureClass::kRefused;
   record.end = connection.connect.Done() ? "tls" : refused ? "refused" : "unreachable";
-  record.endDelayMs = Milliseconds(connection.connect.begin, connection.connect.end);
+  record.end_delay_ms = Milliseconds(connection.connect.begin, connection.connect.end);
   return record;
 }
 

@@ -4,7 +4,7 @@
 #include <iterator>
 #include <string_view>
 
-#include "tools/common/words.h"
+#include "tools/common/text.h"
 #include "tools/twhttp/message.h"
 #include "tools/twhttp/secrets.h"
 
@@ -26,7 +26,7 @@ bool IsSecretName(std::string_view name) {
                      [&](std::string_view part) { return lower.find(part) != std::string::npos; });
 }
 
-// The parameters in `text` that begin behind a question mark or an ampersand, or with `text` itself
+// The parameters in `text` that begin after a question mark or an ampersand, or with `text` itself
 // when it is a form's.
 std::string MaskParameters(const std::string& text, bool form, Length length) {
   constexpr char kEnds[] = "&#\"'<> \t\r\n";
@@ -81,8 +81,8 @@ std::string MaskRest(std::string line, size_t begin) {
   return line;
 }
 
-// A line of a response's head. Of a cookie its name stays, and of a login its scheme. A line that
-// begins with a blank belongs to the one before; `secret` tells of that one.
+// A line of a response's head. Of a cookie its name stays, and of credentials their scheme. A line
+// that begins with a blank belongs to the one before; `secret` tells of that one.
 std::string MaskResponseLine(const std::string& line, bool* secret) {
   const bool folded = !line.empty() && (line[0] == ' ' || line[0] == '\t');
   const size_t colon = line.find(':');

@@ -6,7 +6,7 @@
 
 #include "tools/twhttp/options.h"
 
-// A whole request: logins, cookies, the login of a URL and the values of secret parameters (those
+// A whole request: credentials, cookies, those in a URL and the values of secret parameters (those
 // of the query, and of a body of form fields) become ***, unless secrets are to be shown.
 std::string MaskRequest(const Options& options, const std::string& request);
 

@@ -89,7 +89,7 @@ std::string CountsText(Counts counts, bool colour) {
     char line[64];
     snprintf(line, sizeof(line), "%6d ", count);
     text +=
-        line + Paint(Colour::kRed, FactsOf(id).name, colour) + ": " + FactsOf(id).meaning + "\n";
+        line + InColour(Colour::kRed, FactsOf(id).name, colour) + ": " + FactsOf(id).meaning + "\n";
   }
   return text;
 }

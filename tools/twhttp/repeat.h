@@ -13,7 +13,7 @@ struct Counts {
   std::map<FailureClass, int> failures;
 };
 
-// The counts as a table: how many, quantiles, a histogram of the latencies, failures by class.
+// The counts in a table: how many, quantiles, a histogram of the latencies, failures by class.
 std::string CountsText(Counts counts, bool colour);
 
 // Makes the requests one after another. Results: the exit code: 0 when all were good, else that of

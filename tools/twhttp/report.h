@@ -11,10 +11,10 @@
 // The failure's explanation, in lines.
 std::string FailureText(const Session& session, bool colour);
 
-// The exchanges with their heads, rules, challenge and login; and the log.
+// The exchanges with their heads, rules, challenge and credentials; and the log.
 std::string ExchangesText(const Session& session, bool colour);
 
-// What was odd about the last reply, though it need not have failed for it.
+// What was odd about the last response, though it need not have failed for it.
 std::string NotesText(const Session& session);
 
 std::string TimingsText(const Session& session, bool colour);

@@ -24,10 +24,10 @@ Json::Value ExchangeJson(const Session& session, const Exchange& exchange) {
   value["request_line"] = head.substr(0, head.find("\r\n"));
   value["request_headers"] = HeadersJson(options, SplitHeaderLines(head));
   value["bytes_sent"] = static_cast<Json::UInt64>(exchange.sent_bytes);
-  value["status"] = exchange.reply.Status();
-  value["response_headers"] = HeadersJson(options, exchange.reply.Headers());
-  value["head_bytes"] = static_cast<Json::UInt64>(exchange.reply.HeadBytes());
-  value["body_bytes"] = static_cast<Json::UInt64>(exchange.reply.BodyBytes());
+  value["status"] = exchange.response.Status();
+  value["response_headers"] = HeadersJson(options, exchange.response.Headers());
+  value["head_bytes"] = static_cast<Json::UInt64>(exchange.response.HeadBytes());
+  value["body_bytes"] = static_cast<Json::UInt64>(exchange.response.BodyBytes());
   Json::Value& notes = value["notes"] = Json::Value(Json::arrayValue);
   for (const HeadFinding& finding : FindingsOf(session.trace, exchange)) {
     notes.append(finding.text + ": " + finding.rule);
@@ -77,7 +77,7 @@ Json::Value ReportJson(const Session& session) {
   report["class"] = FactsOf(session.failure.id).name;
   report["exit"] = FactsOf(session.failure.id).exit_code;
   report["result"] = session.outcome.result;
-  report["status"] = last != nullptr ? last->reply.Status() : 0;
+  report["status"] = last != nullptr ? last->response.Status() : 0;
   report["elapsed"] = session.trace.finished;
   report["body_bytes"] = static_cast<Json::UInt64>(session.outcome.body_bytes);
   Json::Value& exchanges = report["exchanges"] = Json::Value(Json::arrayValue);

@@ -3,6 +3,7 @@
 
 #include "tarnwick/http/digest.h"
 #include "tools/common/terminal.h"
+#include "tools/common/units.h"
 #include "tools/twhttp/report.h"
 #include "tools/twhttp/rules.h"
 #include "tools/twhttp/secrets.h"
@@ -14,12 +15,6 @@ std::string Field(const char* name, const std::string& value) {
   char label[24];
   snprintf(label, sizeof(label), "  %-9s", name);
   return value.empty() ? "" : label + value + "\n";
-}
-
-std::string Seconds(double seconds) {
-  char text[32];
-  snprintf(text, sizeof(text), "%.3f s", seconds);
-  return text;
 }
 
 std::string CausesText(const std::vector<std::string>& causes) {
@@ -42,7 +37,7 @@ std::string LineText(const char* mark, const std::string& line, const std::strin
   std::string text = mark + shown;
   if (rule.empty()) return text + "\n";
   text.append(text.size() < kRuleColumn ? kRuleColumn - text.size() : 1, ' ');
-  return text + Paint(Colour::kGrey, "| " + rule, colour) + "\n";
+  return text + InColour(Colour::kGrey, "| " + rule, colour) + "\n";
 }
 
 std::string HeadOf(const std::string& message) {
@@ -68,7 +63,7 @@ std::string HeadText(const char* mark, const std::string& head, const Operation*
 }
 
 std::string ChallengeText(const Exchange& exchange) {
-  const std::string challenge = exchange.reply.Value("WWW-Authenticate");
+  const std::string challenge = exchange.response.Value("WWW-Authenticate");
   if (challenge.empty()) return "";
   std::string text =
       "  challenge " + EscapeControls(challenge.substr(0, challenge.find(' '))) + "\n";
@@ -81,13 +76,14 @@ std::string ChallengeText(const Exchange& exchange) {
 }
 
 // The scheme that followed a challenge, and why it was that.
-std::string LoginText(const Exchange& asked, const Exchange* next, const Operation& operation) {
-  if (asked.reply.Status() != 401) return "";
-  if (next == nullptr || !SentLogin(*next)) {
-    if (SentLogin(asked)) return "  login     refused, and not tried again\n";
+std::string CredentialsText(const Exchange& asked, const Exchange* next,
+                            const Operation& operation) {
+  if (asked.response.Status() != 401) return "";
+  if (next == nullptr || !SentCredentials(*next)) {
+    if (SentCredentials(asked)) return "  login     refused, and not tried again\n";
     return std::string("  login     none: ") +
-           (operation.Does(kLogin) ? "the challenge names neither Digest nor Basic\n"
-                                   : "the operation sends no login\n");
+           (operation.Uses(kCredentials) ? "the challenge names neither Digest nor Basic\n"
+                                         : "the operation sends no credentials\n");
   }
   const bool digest = next->sent.find("Authorization: Digest") != std::string::npos;
   return digest ? "  login     Digest, because the challenge names it, and it goes before Basic\n"
@@ -111,9 +107,9 @@ std::vector<std::string> NotesOf(const Session& session, const Exchange& exchang
   for (const HeadFinding& finding : FindingsOf(session.trace, exchange)) {
     notes.push_back(EscapeControls(finding.text) + ": " + finding.rule);
   }
-  if (exchange.reply.Surplus() > 0) {
-    notes.push_back(std::to_string(exchange.reply.Surplus()) +
-                    " bytes came behind the announced end of the body");
+  if (exchange.response.Surplus() > 0) {
+    notes.push_back(std::to_string(exchange.response.Surplus()) +
+                    " bytes came after the announced end of the body");
   }
   const Connection* const connection = session.trace.Find(exchange.connection);
   const bool closed = exchange.end == End::kClosed && !session.trace.curl.used;
@@ -127,18 +123,18 @@ std::string ExchangeText(const Session& session, const Exchange& exchange, const
                          bool colour) {
   const Options& options = session.options;
   std::string text =
-      Paint(Colour::kBold, "== exchange " + std::to_string(exchange.number), colour) + "\n";
+      InColour(Colour::kBold, "== exchange " + std::to_string(exchange.number), colour) + "\n";
   if (const Connection* const connection = session.trace.Find(exchange.connection)) {
     text += ConnectionText(*connection, session.trace.curl.used);
   }
   const std::string sent = HeadOf(exchange.sent);
   text += HeadText("> ", MaskHead(options, sent), options.operation, colour);
   text += "  " + std::to_string(exchange.sent_bytes) + " bytes sent\n";
-  text += HeadText("< ", MaskHead(options, HeadOf(exchange.reply.Head())), nullptr, colour);
-  text += "  " + std::to_string(exchange.reply.HeadBytes()) + " bytes of head and " +
-          std::to_string(exchange.reply.BodyBytes()) + " of body came\n";
+  text += HeadText("< ", MaskHead(options, HeadOf(exchange.response.Head())), nullptr, colour);
+  text += "  " + std::to_string(exchange.response.HeadBytes()) + " bytes of head and " +
+          std::to_string(exchange.response.BodyBytes()) + " of body came\n";
   for (const std::string& note : NotesOf(session, exchange)) text += "  note      " + note + "\n";
-  return text + ChallengeText(exchange) + LoginText(exchange, next, *options.operation);
+  return text + ChallengeText(exchange) + CredentialsText(exchange, next, *options.operation);
 }
 
 }  // namespace
@@ -155,14 +151,14 @@ std::string FailureText(const Session& session, bool colour) {
   const Failure& failure = session.failure;
   const ClassFacts& facts = FactsOf(failure.id);
   std::string text =
-      "twhttp: " + Paint(Colour::kRed, facts.name, colour) + ": " + facts.meaning + "\n";
+      "twhttp: " + InColour(Colour::kRed, facts.name, colour) + ": " + facts.meaning + "\n";
   if (failure.id == FailureClass::kInterrupted) return text;
   text += Field("phase", failure.phase);
   text += Field("peer", EscapeControls(failure.peer));
   text += Field("seen", EscapeControls(failure.detail));
   text += Field("system", EscapeControls(MaskText(session.options, failure.system)));
   const std::string limit = failure.limit.empty() ? "" : " (limit: " + failure.limit + ")";
-  text += Field("elapsed", Seconds(failure.elapsed) + limit);
+  text += Field("elapsed", FormatSeconds(failure.elapsed, 3) + limit);
   text += CausesText(failure.causes);
   return text + Field("next", EscapeControls(failure.next, Backslash::kKept));
 }
@@ -174,7 +170,7 @@ std::string ExchangesText(const Session& session, bool colour) {
     const Exchange* const next = i + 1 < exchanges.size() ? &exchanges[i + 1] : nullptr;
     text += ExchangeText(session, exchanges[i], next, colour);
   }
-  if (!session.trace.log.empty()) text += Paint(Colour::kBold, "== library log", colour) + "\n";
+  if (!session.trace.log.empty()) text += InColour(Colour::kBold, "== library log", colour) + "\n";
   for (const std::string& line : session.trace.log) {
     text += "  " + EscapeControls(MaskText(session.options, line)) + "\n";
   }
@@ -185,11 +181,11 @@ std::string TimingsText(const Session& session, bool colour) {
   char line[160];
   snprintf(line, sizeof(line), "%-9s%-11s %11s %11s   %s", "exchange", "phase", "took", "done at",
            "limit");
-  std::string text = Paint(Colour::kBold, line, colour) + "\n";
+  std::string text = InColour(Colour::kBold, line, colour) + "\n";
   for (const Timing& timing : TimingsOf(session.trace, session.options)) {
     const std::string exchange = timing.exchange > 0 ? std::to_string(timing.exchange) : "";
     snprintf(line, sizeof(line), "%-9s%-11s %11s %11s   ", exchange.c_str(), timing.phase.c_str(),
-             Seconds(timing.took).c_str(), Seconds(timing.at).c_str());
+             FormatSeconds(timing.took, 3).c_str(), FormatSeconds(timing.at, 3).c_str());
     text += line + timing.limit + "\n";
   }
   return text;

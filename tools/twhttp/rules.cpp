@@ -1,5 +1,6 @@
 #include "tools/twhttp/rules.h"
 
+#include "tools/common/text.h"
 #include "tools/twhttp/message.h"
 
 namespace {
@@ -50,7 +51,7 @@ constexpr struct {
   const char* header;  // "" for the request line
   const char* rule;
 } kRules[] = {
-    {kGetFamily, "", "HTTP/1.0 unless --http 1.1; cut behind 2,047 bytes"},
+    {kGetFamily, "", "HTTP/1.0 unless --http 1.1; cut after 2,047 bytes"},
     {kFormFamily, "", "HTTP/1.1 unless --http 1.0"},
     {kSoapFamily, "", "always HTTP/1.1"},
     {kUploadFamily, "", "always HTTP/1.1"},
@@ -64,9 +65,9 @@ constexpr struct {
     {kGetFamily | kCurlFamily, "User-Agent", "always this name"},
     {kGetFamily | kFormFamily | kUploadFamily | kCurlFamily, "Cookie",
      "--cookie, or the last Set-Cookie up to its semicolon"},
-    {kGetFamily, "Authorization", "behind a 401, or at once with --basic-first"},
-    {kSoapFamily, "Authorization", "behind a 401, by soap-auth alone"},
-    {kCurlFamily, "Authorization", "the login at once, by Basic, empty or not"},
+    {kGetFamily, "Authorization", "after a 401, or at once with --basic-first"},
+    {kSoapFamily, "Authorization", "after a 401, by soap-auth alone"},
+    {kCurlFamily, "Authorization", "the credentials at once, by Basic, empty or not"},
     {kCurlFormFamily, "Authorization", "libcurl's, Basic or Digest as a 401 asks"},
     {kXmlFamily, "Authorization", "Basic at once; xml-get Basic or Digest as a 401 asks"},
     {kFormFamily, "Content-Type", "a form in UTF-8"},

@@ -6,7 +6,7 @@
 
 #include "tools/twhttp/operations.h"
 
-// The rule behind the request line, for `name` empty, or behind the header of that name; empty for
+// The rule for the request line, for `name` empty, or for the header of that name; empty for
 // a line that this operation never writes.
 std::string RuleOf(const Operation& operation, const std::string& name);
 

@@ -46,7 +46,7 @@ class Runner {
   void JsonGet();
   void JsonGets();
   void JsonPost();
-  void JudgeJson(const Json::Value& reply, int failed);
+  void JudgeJson(const Json::Value& response, int failed);
 
   const Options& options_;
   const std::string& body_;
@@ -68,7 +68,7 @@ void Runner::Finish() {
       outcome_.result == HTTP_RET_OK && outcome_.last == HTTP_RET_OK && !outcome_.read_failed;
 }
 
-// An endless reply is written while it comes. Chunks only ReadBody decodes.
+// An endless response is written while it comes. Chunks only ReadBody decodes.
 void Runner::ReadBody() {
   int status = 0;
   const int last = client_.CheckResponse(status);
@@ -110,11 +110,11 @@ void Runner::Form() {
 }
 
 void Runner::Soap() {
-  std::string reply;
+  std::string response;
   outcome_.result = options_.operation->id == OperationId::kSoap
-                        ? client_.SendReqBySocketPost(body_, reply)
-                        : client_.SendAuthReqBySocketPost(body_, reply);
-  Write(reply);
+                        ? client_.SendReqBySocketPost(body_, response)
+                        : client_.SendAuthReqBySocketPost(body_, response);
+  Write(response);
   Finish();
 }
 
@@ -144,11 +144,11 @@ void Runner::Upload() {
   ReadWhole();
 }
 
-// The whole reply comes as one text, and so does its failure.
+// The whole response comes as one text, and so does its failure.
 void Runner::ReadWhole() {
-  const std::string reply = client_.GetResp();
-  const bool failed = reply == "{\"error\":true}";
-  if (!failed) Write(reply);
+  const std::string response = client_.GetResp();
+  const bool failed = response == "{\"error\":true}";
+  if (!failed) Write(response);
   Finish();
   const bool success = outcome_.status >= 200 && outcome_.status <= 299;
   outcome_.last = success ? HTTP_RET_OK : HTTP_RET_BAD_RESPONSE;
@@ -195,7 +195,7 @@ int Runner::SendXml() {
   }
 }
 
-// The answer of a change may be empty, that of a GET may not.
+// The response to a change may be empty, that to a GET may not.
 void Runner::Xml() {
   outcome_.result = SendXml();
   Finish();
@@ -211,34 +211,34 @@ void Runner::Xml() {
   xmlFreeDoc(parsed);
 }
 
-// The library gives one result for what is no JSON and for what is no success.
-void Runner::JudgeJson(const Json::Value& reply, int failed) {
+// The library returns one result for what is no JSON and for what is no success.
+void Runner::JudgeJson(const Json::Value& response, int failed) {
   outcome_.good = outcome_.result == 0;
   if (outcome_.result == failed) {
     outcome_.content_error = JsonError();
     outcome_.content = outcome_.content_error.empty() ? Content::kNotSuccess : Content::kNotJson;
-    if (outcome_.content_error.empty()) outcome_.content_error = SuccessError(reply);
+    if (outcome_.content_error.empty()) outcome_.content_error = SuccessError(response);
   }
-  const bool shown = outcome_.content != Content::kNotJson && !reply.isNull();
-  if (shown) Write(CompactJson(reply) + "\n");
+  const bool shown = outcome_.content != Content::kNotJson && !response.isNull();
+  if (shown) Write(CompactJson(response) + "\n");
 }
 
 void Runner::JsonGet() {
   constexpr int kFailed = -2;
-  Json::Value reply;
+  Json::Value response;
   const Target& target = options_.target;
-  outcome_.result = SendHttpGet(target.host, target.port, target.path, reply, options_.timeout,
+  outcome_.result = SendHttpGet(target.host, target.port, target.path, response, options_.timeout,
                                 options_.encode_query);
-  JudgeJson(reply, kFailed);
+  JudgeJson(response, kFailed);
 }
 
 void Runner::JsonGets() {
   constexpr int kFailed = -3;
   if (options_.offline) return ByCurl(HTTP_METHOD_GET);  // the same request, without the TLS
-  Json::Value reply;
+  Json::Value response;
   const Target& target = options_.target;
-  outcome_.result = SendHttpsGet(target.host, target.port, target.path, reply, options_.timeout);
-  JudgeJson(reply, kFailed);
+  outcome_.result = SendHttpsGet(target.host, target.port, target.path, response, options_.timeout);
+  JudgeJson(response, kFailed);
 }
 
 void Runner::JsonPost() {

@@ -16,7 +16,7 @@ struct Outcome {
   int last = 0;              // of the last response, as CheckResponse tells it
   bool good = false;         // the call and the status say success
   int status = 0;            // as the client tells it
-  bool read_failed = false;  // the body's reading failed behind a good head
+  bool read_failed = false;  // the body's reading failed after a good head
   Content content = Content::kFine;
   std::string content_error;  // the parser's words
   uint64_t body_bytes = 0;    // handed to the writer
@@ -26,7 +26,7 @@ struct Outcome {
 // True when `text` is a well-formed document, which the XML requests have to be given.
 bool IsXml(const std::string& text);
 
-// Takes the body piece by piece. Results: false when no more is wanted or possible.
+// Feature the body piece by piece. Results: false when no more is wanted or possible.
 using BodyWriter = std::function<bool(const std::string& piece)>;
 
 // Runs `options.operation`. `body` is what to send; an upload reads its file itself.

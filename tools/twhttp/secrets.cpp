@@ -5,6 +5,7 @@
 
 #include "tarnwick/platform/unique.h"
 #include "tarnwick/utils/utils.h"
+#include "tools/common/text.h"
 #include "tools/twhttp/message.h"
 
 namespace {
@@ -39,9 +40,9 @@ std::string MaskLine(const Options& options, const std::string& line) {
 std::string MaskValue(const Options& options, const std::string& name, const std::string& value) {
   if (options.show_secrets) return value;
   if (EqualsIgnoringCase(name, "Cookie") || EqualsIgnoringCase(name, "Set-Cookie")) return kMask;
-  const bool login =
+  const bool credentials =
       EqualsIgnoringCase(name, "Authorization") || EqualsIgnoringCase(name, "Proxy-Authorization");
-  if (!login) return value;
+  if (!credentials) return value;
   const size_t blank = value.find(' ');
   return (blank == std::string::npos ? "" : value.substr(0, blank + 1)) + kMask;
 }

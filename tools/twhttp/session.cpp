@@ -57,13 +57,13 @@ bool LoadBody(const Options& options, std::string* body) {
 }
 
 void RunSession(Session* session, const std::string& body, const BodyWriter& write,
-                const std::function<void()>& moved, FakePeer* peer) {
+                const std::function<void()>& on_transfer, FakePeer* peer) {
   Hooks hooks;
   hooks.trace = &session->trace;
   hooks.peer = peer;
   hooks.port = session->options.target.port;
-  hooks.moved = moved;
-  SetGiveUp(GiveUpLimit(session->options));
+  hooks.on_transfer = on_transfer;
+  SetWatchdog(GiveUpLimit(session->options));
   Observe(&hooks, [&] { session->outcome = RunOperation(session->options, body, write); });
   session->failure = Explain({session->options, session->outcome, session->trace, StopReason()});
 }

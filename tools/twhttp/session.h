@@ -21,9 +21,10 @@ struct Session {
   Failure failure;
 };
 
-// Runs the operation of `session`; `moved` is called after bytes went or came, `peer` may be null.
+// Runs the operation of `session`. `on_transfer` is called after bytes went or came; `peer` may be
+// null.
 void RunSession(Session* session, const std::string& body, const BodyWriter& write,
-                const std::function<void()>& moved, FakePeer* peer);
+                const std::function<void()>& on_transfer, FakePeer* peer);
 
 // The body to send, from the options. Results: false when its file cannot be read, which is told.
 bool LoadBody(const Options& options, std::string* body);

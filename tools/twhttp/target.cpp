@@ -42,7 +42,7 @@ std::string PercentEncoded(const std::string& text) {
 
 void TakeLogin(const std::string& text, Target* target) {
   const size_t colon = std::min(text.find(':'), text.size());
-  target->has_login = true;
+  target->has_credentials = true;
   target->user = PercentDecoded(text.substr(0, colon));
   target->password = PercentDecoded(text.substr(std::min(colon + 1, text.size())));
 }
@@ -108,7 +108,7 @@ std::string Target::HostAndPort() const {
 
 std::string Target::Url(bool with_password) const {
   std::string url = https ? "https://" : "http://";
-  if (has_login) {
+  if (has_credentials) {
     url += PercentEncoded(user) + ":" + (with_password ? PercentEncoded(password) : "***") + "@";
   }
   url += host;

@@ -11,7 +11,7 @@ struct Target {
   std::string path;  // with its query, without the leading "/"
   std::string user;
   std::string password;
-  bool has_login = false;
+  bool has_credentials = false;
 
   std::string HostAndPort() const;
 

@@ -15,7 +15,7 @@ struct Limits {
 Limits LimitsOf(const Options& options) {
   const std::string seconds = std::to_string(options.timeout) + " s";
   if (options.operation->by_curl) {
-    const bool limited = options.operation->Does(kTimeout) && options.timeout > 0;
+    const bool limited = options.operation->Uses(kTimeout) && options.timeout > 0;
     return {limited ? "the total's" : kNone, limited ? "the total's" : kNone,
             limited ? seconds : kNone};
   }

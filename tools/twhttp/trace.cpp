@@ -33,10 +33,10 @@ Exchange* Trace::Current(int connection) {
   return found ? &exchanges_.back() : nullptr;
 }
 
-// What is sent behind a reply's first byte begins the next exchange; an interim reply is none.
+// What is sent after a response's first byte begins the next exchange; an interim response is none.
 void Trace::Sent(int connection, double begin, double end, std::string_view bytes) {
   Exchange* exchange = Current(connection);
-  if (exchange == nullptr || exchange->reply.HeadComplete()) {
+  if (exchange == nullptr || exchange->response.HeadComplete()) {
     exchanges_.emplace_back();
     exchange = &exchanges_.back();
     exchange->number = static_cast<int>(exchanges_.size());
@@ -60,10 +60,10 @@ void Trace::SendFailed(int connection, double at, int error, const std::string& 
 void Trace::Received(int connection, double at, std::string_view bytes) {
   if (Current(connection) == nullptr) Sent(connection, at, at, "");
   Exchange* const exchange = Current(connection);
-  const bool had_head = exchange->reply.HeadComplete();
+  const bool had_head = exchange->response.HeadComplete();
   if (exchange->first_byte < 0) exchange->first_byte = at;
-  exchange->reply.Feed(bytes);
-  if (!had_head && exchange->reply.HeadComplete()) exchange->head_end = at;
+  exchange->response.Feed(bytes);
+  if (!had_head && exchange->response.HeadComplete()) exchange->head_end = at;
   exchange->last_byte = at;
   exchange->received_bytes += bytes.size();
   exchange->empty_waits = 0;
@@ -81,7 +81,7 @@ void Trace::Waited(int connection, double begin, double end, bool ready) {
   exchange->waited += end - begin;
 }
 
-// The first end counts: what is read behind it is an echo.
+// Only the first end is kept: what is read after it repeats it.
 void Trace::Ended(int connection, double at, End end, int error, const std::string& text) {
   Exchange* const exchange = Current(connection);
   if (exchange == nullptr || exchange->ended >= 0) return;

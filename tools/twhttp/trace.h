@@ -52,7 +52,7 @@ struct Exchange {
   double send_begin = -1;
   double send_end = -1;
   Step send;  // its failure
-  ReplyMessage reply;
+  ResponseMessage response;
   std::string received;  // as `sent`
   std::vector<Piece> pieces;
   uint64_t received_bytes = 0;
@@ -83,7 +83,7 @@ class Trace {
  public:
   static constexpr size_t kKeptBytes = 1 << 20;
 
-  // Everything is kept for a recording; else the bytes of an endless reply are only counted.
+  // Everything is kept for a recording; else the bytes of an endless response are only counted.
   explicit Trace(bool keep_all = false) : keep_all_(keep_all) {}
 
   Connection& Open(bool tls);

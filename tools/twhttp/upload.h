@@ -1,4 +1,4 @@
-// The body of a streaming upload: one part, and the boundary behind it.
+// The body of a streaming upload: one part, and the boundary after it.
 #ifndef TARNWICK_TOOLS_TWHTTP_UPLOAD_H_
 #define TARNWICK_TOOLS_TWHTTP_UPLOAD_H_
 

@@ -30,7 +30,7 @@ Colour ColourOf(Verdict verdict) {
 void PrintText(const Finding& finding, bool colour) {
   std::string word = WordOf(finding.verdict);
   word.resize(5, ' ');
-  printf("%s  %-9s %s\n", Paint(ColourOf(finding.verdict), word, colour).c_str(),
+  printf("%s  %-9s %s\n", InColour(ColourOf(finding.verdict), word, colour).c_str(),
          finding.check.c_str(), EscapeControls(finding.text, Backslash::kKept).c_str());
   if (!finding.fix.empty())
     printf("       fix:      %s\n", EscapeControls(finding.fix, Backslash::kKept).c_str());
@@ -49,7 +49,7 @@ void PrintJson(const Finding& finding) {
 
 int RunDoctor(bool json) {
   Findings findings;
-  for (const auto check : {CheckFolder, CheckSpace, CheckFiles, CheckLocks, CheckFileSizeLimits,
+  for (const auto check : {CheckDirectory, CheckSpace, CheckFiles, CheckLocks, CheckFileSizeLimits,
                            CheckRecord, CheckLevels, CheckDaemons, CheckSettings, CheckRotation}) {
     check(&findings);
   }

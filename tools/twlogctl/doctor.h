@@ -17,7 +17,7 @@ struct Finding {
 };
 using Findings = std::vector<Finding>;
 
-void CheckFolder(Findings* findings);
+void CheckDirectory(Findings* findings);
 void CheckSpace(Findings* findings);
 void CheckFiles(Findings* findings);
 void CheckLocks(Findings* findings);

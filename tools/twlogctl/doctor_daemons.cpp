@@ -26,12 +26,12 @@ Credentials CredentialsOf(pid_t pid) {
   for (std::string line; std::getline(status, line);) {
     std::istringstream fields(line);
     std::string name;
-    unsigned long realNumber = 0;
+    unsigned long real_number = 0;
     unsigned long number = 0;
     fields >> name;
-    if (name == "Uid:" && fields >> realNumber >> number)
+    if (name == "Uid:" && fields >> real_number >> number)
       credentials.user = static_cast<uid_t>(number);
-    if (name == "Gid:" && fields >> realNumber >> number) {
+    if (name == "Gid:" && fields >> real_number >> number) {
       credentials.groups.push_back(static_cast<gid_t>(number));
     }
     while (name == "Groups:" && fields >> number) {
@@ -53,11 +53,11 @@ bool MayDo(const Credentials& credentials, const struct stat& state, mode_t bits
 }
 
 bool MayWrite(const Credentials& credentials, const char* path) {
-  struct stat folder = {};
+  struct stat directory = {};
   struct stat file = {};
-  if (stat(kLogFolder, &folder) != 0) return true;  // another finding tells of that
+  if (stat(kLogDirectory, &directory) != 0) return true;  // another finding tells of that
   const bool exists = stat(path, &file) == 0;
-  if (!MayDo(credentials, folder, exists ? S_IXOTH : S_IWOTH | S_IXOTH)) return false;
+  if (!MayDo(credentials, directory, exists ? S_IXOTH : S_IWOTH | S_IXOTH)) return false;
   return !exists || MayDo(credentials, file, S_IWOTH);
 }
 
@@ -82,7 +82,7 @@ bool MayAttach(const Credentials& credentials, const RecordSegment& segment) {
 
 void CheckAttached(const LibraryUser& user, const Credentials& credentials,
                    const std::optional<RecordSegment>& segment, Findings* findings) {
-  if (!segment || user.hasRecord) return;
+  if (!segment || user.has_record) return;
   if (!MayAttach(credentials, *segment)) {
     findings->push_back(OtherUsersProcess(
         user, credentials.user,
@@ -106,7 +106,7 @@ void CheckDaemon(const LibraryUser& user, const std::optional<RecordSegment>& se
   findings->push_back(OtherUsersProcess(
       user, credentials.user,
       std::string("write ") + kMainLogPath +
-          "; when it is a daemon of this machine, the folder needs a group for its user"));
+          "; when it is a daemon of this machine, the directory needs a group for its user"));
 }
 
 }  // namespace

@@ -1,4 +1,4 @@
-// The doctor's look at the log folder and the files in it.
+// The doctor's look at the log directory and the files in it.
 #include <fcntl.h>
 #include <grp.h>
 #include <pwd.h>
@@ -12,8 +12,8 @@
 #include <vector>
 
 #include "tarnwick/platform/unique.h"
-#include "tools/common/amounts.h"
 #include "tools/common/shell.h"
+#include "tools/common/units.h"
 #include "tools/twlogctl/doctor.h"
 #include "tools/twlogctl/doctor_paths.h"
 #include "tools/twlogctl/log_paths.h"
@@ -32,18 +32,18 @@ int TryToOpen(const char* path) {
   return fd.Valid() ? 0 : errno;
 }
 
-// The users that may make files in the log's folder are those of its group, when that may write it:
-// daemons that do not run as root are set up like this, and make logs of their own.
+// The users that may make files in the log's directory are those of its group, when that may write
+// it: daemons that do not run as root are set up like this, and make logs of their own.
 bool MayMakeLogs(uid_t user) {
-  const auto folder = StateAt(kLogFolder);
-  if (!folder || (folder->st_mode & S_IWGRP) == 0) return false;
+  const auto directory = StateAt(kLogDirectory);
+  if (!directory || (directory->st_mode & S_IWGRP) == 0) return false;
   const struct passwd* const entry = getpwuid(user);
   if (entry == nullptr) return false;
   std::vector<gid_t> groups(64);
   auto count = static_cast<int>(groups.size());
   if (getgrouplist(entry->pw_name, entry->pw_gid, groups.data(), &count) < 0) return false;
   groups.resize(static_cast<size_t>(count));
-  return std::find(groups.begin(), groups.end(), folder->st_gid) != groups.end();
+  return std::find(groups.begin(), groups.end(), directory->st_gid) != groups.end();
 }
 
 // Results: nothing when only those may change it who may change all logs.
@@ -85,67 +85,68 @@ void CheckFile(const char* path, Findings* findings) {
 }
 
 // Who may open a log, even for reading, can hold its lock, and every daemon then waits.
-Finding LookAtFolder(const std::string& folder, const struct stat& state) {
+Finding LookAtDirectory(const std::string& directory, const struct stat& state) {
   if ((state.st_mode & S_IRWXU) != S_IRWXU) {
     return {"folder", Verdict::kWrong,
-            folder + " keeps its owner from making files: " + DescribeState(state),
-            "chmod u+rwx " + folder};
+            directory + " keeps its owner from making files: " + DescribeState(state),
+            "chmod u+rwx " + directory};
   }
-  if (const auto open = OpenDirectory("folder", folder, state)) return *open;
+  if (const auto open = OpenDirectory("folder", directory, state)) return *open;
   if ((state.st_mode & S_IRWXO) != 0) {
-    return {
-        "folder", Verdict::kWrong,
-        folder + " lets other users open the logs, and hold their locks: " + DescribeState(state),
-        "chmod o= " + folder};
+    return {"folder", Verdict::kWrong,
+            directory +
+                " lets other users open the logs, and hold their locks: " + DescribeState(state),
+            "chmod o= " + directory};
   }
   const bool shared = (state.st_mode & S_IWGRP) != 0 && state.st_gid != 0;
   return {
       "folder", shared ? Verdict::kNote : Verdict::kRight,
-      folder + ", " + DescribeState(state) +
+      directory + ", " + DescribeState(state) +
           (shared ? ": each user of the group can put other files in the place of the logs" : ""),
       ""};
 }
 
 }  // namespace
 
-// Root may lead the folder elsewhere by a link: nobody else can change that one.
-void CheckFolder(Findings* findings) {
-  const std::string folder = kLogFolder;
-  const auto link = StateAt(folder);
+// Root may lead the directory elsewhere by a link: nobody else can change that one.
+void CheckDirectory(Findings* findings) {
+  const std::string directory = kLogDirectory;
+  const auto link = StateAt(directory);
   struct stat state = {};
-  const int error = stat(kLogFolder, &state) == 0 ? 0 : errno;
-  const std::string make = "install -d -m 0750 " + folder;
+  const int error = stat(kLogDirectory, &state) == 0 ? 0 : errno;
+  const std::string make = "install -d -m 0750 " + directory;
   if (link && S_ISLNK(link->st_mode) && (error != 0 || !IsRootOrCaller(link->st_uid))) {
-    const auto odd = OddFile("folder", folder, *link);
+    const auto odd = OddFile("folder", directory, *link);
     findings->push_back({"folder", Verdict::kWrong, odd->text, odd->fix + " && " + make});
   } else if (error != 0) {
-    findings->push_back({"folder", Verdict::kWrong, folder + ": " + strerror(error), make});
+    findings->push_back({"folder", Verdict::kWrong, directory + ": " + strerror(error), make});
   } else if (!S_ISDIR(state.st_mode)) {
-    findings->push_back(
-        {"folder", Verdict::kWrong, folder + " is no folder", "rm " + folder + " && " + make});
+    findings->push_back({"folder", Verdict::kWrong, directory + " is no directory",
+                         "rm " + directory + " && " + make});
   } else {
-    findings->push_back(LookAtFolder(folder, state));
+    findings->push_back(LookAtDirectory(directory, state));
   }
 }
 
 void CheckSpace(Findings* findings) {
-  const std::string folder = kLogFolder;
+  const std::string directory = kLogDirectory;
   struct statvfs system = {};
-  if (statvfs(kLogFolder, &system) != 0) return;  // the folder's check has told
+  if (statvfs(kLogDirectory, &system) != 0) return;  // the directory's check has told
   const double bytes = static_cast<double>(system.f_bavail) * static_cast<double>(system.f_frsize);
-  const std::string left = FormatBytes(bytes) + " left for " + folder;
+  const std::string left = FormatBytes(bytes) + " left for " + directory;
   if ((system.f_flag & ST_RDONLY) != 0) {
-    findings->push_back({"space", Verdict::kWrong, folder + " is mounted read-only",
-                         "mount -o remount,rw $(findmnt -no TARGET -T " + folder + ")"});
+    findings->push_back({"space", Verdict::kWrong, directory + " is mounted read-only",
+                         "mount -o remount,rw $(findmnt -no TARGET -T " + directory + ")"});
   } else if (bytes < kFewBytes) {
     findings->push_back({"space", Verdict::kWrong, "only " + left,
-                         "remove files: du -xh $(findmnt -no TARGET -T " + folder +
-                             ") | sort -h | tail shows the large folders"});
+                         "remove files: du -xh $(findmnt -no TARGET -T " + directory +
+                             ") | sort -h | tail shows the large directories"});
   } else if (system.f_files > 0 && system.f_favail < kFewFiles) {
-    findings->push_back({"space", Verdict::kWrong,
-                         "only " + std::to_string(system.f_favail) + " more files fit in " + folder,
-                         "remove files: du -x --inodes $(findmnt -no TARGET -T " + folder +
-                             ") | sort -n | tail shows the folders with many"});
+    findings->push_back(
+        {"space", Verdict::kWrong,
+         "only " + std::to_string(system.f_favail) + " more files fit in " + directory,
+         "remove files: du -x --inodes $(findmnt -no TARGET -T " + directory +
+             ") | sort -n | tail shows the directories with many"});
   } else {
     findings->push_back({"space", Verdict::kRight, left, ""});
   }

@@ -12,8 +12,8 @@
 #include <thread>
 
 #include "tarnwick/platform/unique.h"
-#include "tools/common/amounts.h"
 #include "tools/common/shell.h"
+#include "tools/common/units.h"
 #include "tools/twlogctl/doctor.h"
 #include "tools/twlogctl/file_locks.h"
 #include "tools/twlogctl/log_paths.h"
@@ -61,7 +61,7 @@ std::string Describe(pid_t pid, const std::optional<ProcessInfo>& process) {
   if (pid < 1) return "a process of another PID namespace";
   if (!process) return "process " + std::to_string(pid) + ", which has ended";
   return QuoteForShell(process->name) + " (" + std::to_string(pid) + ", started " +
-         SpanText(process->ageSeconds) + " ago" + (IsStopped(*process) ? ", stopped" : "") + ")";
+         SpanText(process->age_seconds) + " ago" + (IsStopped(*process) ? ", stopped" : "") + ")";
 }
 
 std::string FixFor(pid_t pid, const std::optional<ProcessInfo>& process, const std::string& path) {

@@ -19,13 +19,6 @@ std::string Describe(const RecordSegment& segment) {
          GroupName(segment.group) + ", mode " + ModeText(segment.mode);
 }
 
-// The record without complaints. Results: null with errno.
-AttachedRecord Attach(const RecordSegment& segment) {
-  void* const address = shmat(segment.id, nullptr, SHM_RDONLY);
-  if (reinterpret_cast<intptr_t>(address) == -1) return nullptr;
-  return AttachedRecord(static_cast<TWDbgLogCfg*>(address));
-}
-
 // Nobody may attach it read-write, as the library does, when its mode does not let anybody write.
 bool OwnerMayWrite(const RecordSegment& segment) {
   return (segment.mode & 0600) == 0600;
@@ -89,7 +82,7 @@ void CheckRecord(Findings* findings) {
     findings->push_back(
         {"record", Verdict::kWrong,
          "its mode keeps processes from attaching the record: " + Describe(*segment), kReplace});
-  } else if (!Attach(*segment)) {
+  } else if (!Attach(*segment, SHM_RDONLY)) {
     const std::string reason = strerror(errno);
     findings->push_back(
         {"record", Verdict::kWrong,
@@ -103,14 +96,15 @@ void CheckRecord(Findings* findings) {
 
 void CheckLevels(Findings* findings) {
   const auto segment = FindRecord();
-  const AttachedRecord record = segment && segment->HasRightSize() ? Attach(*segment) : nullptr;
+  const AttachedRecord record =
+      segment && segment->HasRightSize() ? Attach(*segment, SHM_RDONLY) : nullptr;
   if (!record) return;
-  std::map<int, std::vector<std::string>> byLevel;
+  std::map<int, std::vector<std::string>> by_level;
   for (int value = 0; value < LOG_CATEG_COUNT; ++value) {
     const auto categ = static_cast<LOG_CATEG>(value);
-    byLevel[record->Level(categ)].emplace_back(Enum2String(categ));
+    by_level[record->Level(categ)].emplace_back(Enum2String(categ));
   }
-  for (const auto& [level, names] : byLevel) {
+  for (const auto& [level, names] : by_level) {
     if (level < LOG_LEVEL_NOTICE || level > LOG_LEVEL_DEBUG3) TellLevel(level, names, findings);
   }
 }

@@ -8,16 +8,16 @@
 #include "tools/twlogctl/doctor.h"
 #include "tools/twlogctl/doctor_paths.h"
 #include "tools/twlogctl/log_paths.h"
-#include "tools/twlogctl/owned_folder.h"
+#include "tools/twlogctl/owned_directory.h"
 #include "tools/twlogctl/processes.h"
 #include "tools/twlogctl/report.h"
 #include "tools/twlogctl/settings_file.h"
 
 namespace {
 
-constexpr char kRotationFolder[] = "/etc/logrotate.d";
+constexpr char kRotationDirectory[] = "/etc/logrotate.d";
 
-// Those that logrotate leaves out are what editors and package managers leave behind.
+// Those that logrotate leaves out are what editors and package managers leave.
 bool IsLeftOver(const std::string& name) {
   for (const std::string ending : {"~", ".bak", ".dpkg-old", ".dpkg-new", ".dpkg-dist", ".disabled",
                                    ".rpmsave", ".rpmorig", ".rpmnew", ".swp"}) {
@@ -31,11 +31,11 @@ bool IsLeftOver(const std::string& name) {
 
 std::vector<std::string> RotationFiles() {
   std::vector<std::string> files = {"/etc/logrotate.conf"};
-  const OwnedFolder folder(opendir(kRotationFolder));
-  if (!folder) return files;
-  while (const struct dirent* const entry = readdir(folder.get())) {
+  const OwnedDirectory directory(opendir(kRotationDirectory));
+  if (!directory) return files;
+  while (const struct dirent* const entry = readdir(directory.get())) {
     const std::string name = entry->d_name;
-    if (!IsLeftOver(name)) files.push_back(std::string(kRotationFolder) + "/" + name);
+    if (!IsLeftOver(name)) files.push_back(std::string(kRotationDirectory) + "/" + name);
   }
   std::sort(files.begin() + 1, files.end());
   return files;
@@ -67,10 +67,10 @@ std::string RotatedBy(const char* path) {
 
 // Results: nothing when the file is there, or none, and nobody else chooses what it says.
 std::optional<Finding> ForeignSettings(const std::string& path) {
-  const std::string folder = path.substr(0, path.rfind('/'));
-  const auto above = StateAt(folder);
+  const std::string directory = path.substr(0, path.rfind('/'));
+  const auto above = StateAt(directory);
   if (above && S_ISDIR(above->st_mode)) {
-    if (auto open = OpenDirectory("settings", folder, *above)) return open;
+    if (auto open = OpenDirectory("settings", directory, *above)) return open;
   }
   const auto state = StateAt(path);
   if (!state) return std::nullopt;
@@ -128,11 +128,11 @@ void CheckRotation(Findings* findings) {
     }
   }
   if (missing.empty()) return;
-  const std::string folder = kLogFolder;
+  const std::string directory = kLogDirectory;
   findings->push_back({"rotation", Verdict::kWrong,
                        "nothing rotates " + missing + ", which grows until the disk is full",
-                       "printf '" + folder +
+                       "printf '" + directory +
                            "/*.log {\\n  size 10M\\n  rotate 5\\n  missingok\\n  nocreate\\n  "
                            "compress\\n  delaycompress\\n}\\n' >" +
-                           kRotationFolder + "/tarnwick"});
+                           kRotationDirectory + "/tarnwick"});
 }

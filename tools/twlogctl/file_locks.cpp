@@ -7,7 +7,7 @@
 #include <sstream>
 #include <string>
 
-#include "tools/twlogctl/owned_folder.h"
+#include "tools/twlogctl/owned_directory.h"
 #include "tools/twlogctl/processes.h"
 
 namespace {
@@ -30,9 +30,9 @@ std::string MountDevice(int fd) {
 }
 
 // A file as /proc/locks writes it: "08:01:131", the device in hexadecimal.
-std::string LockName(unsigned majorNumber, unsigned minorNumber, ino_t inode) {
+std::string LockName(unsigned major_number, unsigned minor_number, ino_t inode) {
   char text[64];
-  snprintf(text, sizeof(text), "%02x:%02x:%llu", majorNumber, minorNumber,
+  snprintf(text, sizeof(text), "%02x:%02x:%llu", major_number, minor_number,
            static_cast<unsigned long long>(inode));
   return text;
 }
@@ -43,10 +43,10 @@ std::vector<std::string> LockNames(int fd) {
   std::vector<std::string> names = {
       LockName(major(state.st_dev), minor(state.st_dev), state.st_ino)};
   std::istringstream device(MountDevice(fd));
-  unsigned majorNumber = 0, minorNumber = 0;
+  unsigned major_number = 0, minor_number = 0;
   char colon = 0;
-  if (device >> majorNumber >> colon >> minorNumber) {
-    names.push_back(LockName(majorNumber, minorNumber, state.st_ino));
+  if (device >> major_number >> colon >> minor_number) {
+    names.push_back(LockName(major_number, minor_number, state.st_ino));
   }
   return names;
 }
@@ -80,10 +80,10 @@ std::vector<pid_t> HoldersByDescriptor(int fd) {
   if (fstat(fd, &file) != 0) return holders;
   for (const pid_t pid : AllProcesses()) {
     const std::string process = "/proc/" + std::to_string(pid);
-    const OwnedFolder folder(opendir((process + "/fd").c_str()));
-    if (!folder) continue;
+    const OwnedDirectory directory(opendir((process + "/fd").c_str()));
+    if (!directory) continue;
     bool holds = false;
-    while (const struct dirent* const entry = readdir(folder.get())) {
+    while (const struct dirent* const entry = readdir(directory.get())) {
       if (entry->d_name[0] != '.') holds |= IsLockedDescriptor(process, entry->d_name, file);
     }
     if (holds) holders.push_back(pid);

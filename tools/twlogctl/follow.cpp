@@ -25,44 +25,44 @@ struct FollowOptions : LogOptions {
 
 // Says on standard error that the log is away and that it is back. A rotation leaves it away for a
 // moment, which is not worth a word.
-class Absence {
+class MissingLogNotice {
  public:
-  explicit Absence(std::string path) : m_path(std::move(path)) {}
+  explicit MissingLogNotice(std::string path) : path_(std::move(path)) {}
 
   void Look(int error) {
-    if (error == 0 && m_told != 0) Tell("it is there");
-    if (error == 0) m_seen = m_told = 0;
-    if (error == 0 || error == m_told) return;
-    if (error == m_seen && LogTail::Clock::now() - m_since >= std::chrono::seconds(2)) {
+    if (error == 0 && told_ != 0) Tell("it is there");
+    if (error == 0) seen_ = told_ = 0;
+    if (error == 0 || error == told_) return;
+    if (error == seen_ && LogTail::Clock::now() - since_ >= std::chrono::seconds(2)) {
       TellAway(error);
-    } else if (error != m_seen) {
-      m_seen = error;
-      m_since = LogTail::Clock::now();
+    } else if (error != seen_) {
+      seen_ = error;
+      since_ = LogTail::Clock::now();
     }
   }
 
   void TellAway(int error) {
-    m_seen = m_told = error;
+    seen_ = told_ = error;
     Tell(std::string(std::strerror(error)) + "; waiting for it");
   }
 
  private:
-  void Tell(const std::string& text) const { Complain(m_path + ": " + text); }
+  void Tell(const std::string& text) const { Complain(path_ + ": " + text); }
 
-  std::string m_path;
-  int m_seen = 0;
-  int m_told = 0;
-  LogTail::Clock::time_point m_since;
+  std::string path_;
+  int seen_ = 0;
+  int told_ = 0;
+  LogTail::Clock::time_point since_;
 };
 
 class Follower {
  public:
   explicit Follower(const FollowOptions& options)
-      : m_printer(options.json, options.mark),
-        m_path(FollowedPath(options)),
-        m_selector(MakeFilter(options, Now(), Direction::kAhead), Now(), IsOwnLog(m_path)),
-        m_tail(m_path),
-        m_absence(m_path) {}
+      : printer_(options.json, options.mark),
+        path_(FollowedPath(options)),
+        selector_(MakeFilter(options, Now(), Direction::kAhead), Now(), IsOwnLog(path_)),
+        tail_(path_),
+        missing_(path_) {}
 
   int Run(std::optional<size_t> count);
 
@@ -74,65 +74,65 @@ class Follower {
   int Finish();
   void Wait();
 
-  LogPrinter m_printer;
-  std::string m_path;
-  LogSelector m_selector;
-  LogTail m_tail;
-  Absence m_absence;
+  LogPrinter printer_;
+  std::string path_;
+  LogSelector selector_;
+  LogTail tail_;
+  MissingLogNotice missing_;
 };
 
 // What stands in the log already: all of it that is wanted when a time was given, else the last
 // messages. Results: false when the log may not be read.
 bool Follower::ShowExisting(std::optional<size_t> count) {
-  const bool all = m_selector.Filter().since && !count;
+  const bool all = selector_.Filter().since && !count;
   LogWindow window(count.value_or(kDefaultCount));
-  const auto print = [this](const LogMessage& message) { m_printer.Print(message); };
+  const auto print = [this](const LogMessage& message) { printer_.Print(message); };
   const auto keep = [&](const LogMessage& message) {
-    all ? m_printer.Print(message) : window.Add(message);
+    all ? printer_.Print(message) : window.Add(message);
   };
   const auto take = [&](std::string_view text, bool continues) {
-    m_selector.Take(text, continues, keep);
+    selector_.Take(text, continues, keep);
   };
-  m_tail.Poll(take);
-  m_tail.Flush(take);
+  tail_.Poll(take);
+  tail_.Flush(take);
   window.Drain(print);
-  const int error = m_tail.Error();
-  if (error == ENOENT) m_absence.TellAway(error);
+  const int error = tail_.Error();
+  if (error == ENOENT) missing_.TellAway(error);
   if (error == 0 || error == ENOENT) return true;
-  Complain(m_path + ": " + std::strerror(error));
+  Complain(path_ + ": " + std::strerror(error));
   return false;
 }
 
 void Follower::Take(std::string_view text, bool continues) {
-  m_selector.Take(text, continues, [this](const LogMessage& message) { m_printer.Print(message); });
+  selector_.Take(text, continues, [this](const LogMessage& message) { printer_.Print(message); });
 }
 
 void Follower::Poll() {
-  m_selector.Advance(Now());
-  m_tail.Poll([this](std::string_view text, bool continues) { Take(text, continues); });
-  m_absence.Look(m_tail.Error());
+  selector_.Advance(Now());
+  tail_.Poll([this](std::string_view text, bool continues) { Take(text, continues); });
+  missing_.Look(tail_.Error());
 }
 
 bool Follower::Ended() {
-  const std::optional<Moment> until = m_selector.Filter().until;
+  const std::optional<Moment> until = selector_.Filter().until;
   return until && Now() >= *until;
 }
 
 void Follower::Wait() {
-  auto patience = m_tail.Patience();
-  if (const auto until = m_selector.Filter().until) patience = std::min(patience, *until - Now());
-  WaitForLog(m_tail.Descriptor(), patience);
+  auto patience = tail_.Patience();
+  if (const auto until = selector_.Filter().until) patience = std::min(patience, *until - Now());
+  WaitForLog(tail_.Descriptor(), patience);
 }
 
 // The last message need not wait for further lines any more.
 int Follower::Finish() {
-  m_tail.Flush([this](std::string_view text, bool continues) { Take(text, continues); });
-  return m_printer.Flush() ? kExitDone : kExitWrong;
+  tail_.Flush([this](std::string_view text, bool continues) { Take(text, continues); });
+  return printer_.Flush() ? kExitDone : kExitWrong;
 }
 
 int Follower::Run(std::optional<size_t> count) {
   if (!ShowExisting(count)) return kExitWrong;
-  while (m_printer.Flush()) {
+  while (printer_.Flush()) {
     if (Ended()) return Finish();
     Wait();
     Poll();
@@ -142,7 +142,7 @@ int Follower::Run(std::optional<size_t> count) {
 
 }  // namespace
 
-void AddFollow(CLI::App* app, int* exitCode) {
+void AddFollow(CLI::App* app, int* exit_code) {
   auto options = std::make_shared<FollowOptions>();
   CLI::App* follow = app->add_subcommand("follow", "Show the messages of a log as they come.");
   AddSourceOptions(follow, options.get());
@@ -155,5 +155,5 @@ void AddFollow(CLI::App* app, int* exitCode) {
                    "Show so many of the messages that are there already (10, or all of --since).")
       ->check(IsWholeNumber)
       ->type_name("COUNT");
-  follow->callback([=] { *exitCode = Follower(*options).Run(options->count); });
+  follow->callback([=] { *exit_code = Follower(*options).Run(options->count); });
 }

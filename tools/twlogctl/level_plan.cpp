@@ -11,18 +11,18 @@ namespace {
 
 class PlanReader {
  public:
-  explicit PlanReader(std::vector<std::string>* errors) : m_errors(errors) {}
+  explicit PlanReader(std::vector<std::string>* errors) : errors_(errors) {}
 
   void Read(const std::string& assignment) {
     const size_t equals = assignment.find('=');
     if (equals == std::string::npos || equals == 0) {
-      m_errors->push_back("\"" + assignment + "\" is not of the form CATEGORY=LEVEL");
+      errors_->push_back("\"" + assignment + "\" is not of the form CATEGORY=LEVEL");
       return;
     }
-    const std::string levelText = assignment.substr(equals + 1);
-    const std::optional<LOG_LEVEL> level = ParseLevel(levelText);
+    const std::string level_text = assignment.substr(equals + 1);
+    const std::optional<LOG_LEVEL> level = ParseLevel(level_text);
     if (!level) {
-      m_errors->push_back("unknown level \"" + levelText + "\"" + DidYouMeanLevel(levelText));
+      errors_->push_back("unknown level \"" + level_text + "\"" + DidYouMeanLevel(level_text));
     }
     // The categories are read all the same: all mistakes are told at once.
     std::istringstream names(assignment.substr(0, equals) + ",");
@@ -32,32 +32,32 @@ class PlanReader {
   }
 
   std::optional<int> LevelOf(LOG_CATEG categ) const {
-    const auto named = m_named.find(categ);
-    return named != m_named.end() ? named->second : m_all;
+    const auto named = named_.find(categ);
+    return named != named_.end() ? named->second : all_;
   }
-  bool Names(LOG_CATEG categ) const { return m_named.count(categ) > 0; }
+  bool Names(LOG_CATEG categ) const { return named_.count(categ) > 0; }
 
  private:
   void ReadCategory(const std::string& name, int level) {
     if (name == "all") {
-      if (m_all && *m_all != level) m_errors->push_back("\"all\" is given two levels");
-      m_all = level;
+      if (all_ && *all_ != level) errors_->push_back("\"all\" is given two levels");
+      all_ = level;
       return;
     }
     const std::optional<LOG_CATEG> categ = ParseCategory(name);
     if (!categ) {
-      m_errors->push_back("unknown category \"" + name + "\"" + DidYouMeanCategory(name));
+      errors_->push_back("unknown category \"" + name + "\"" + DidYouMeanCategory(name));
       return;
     }
-    const auto [entry, isNew] = m_named.emplace(*categ, level);
-    if (!isNew && entry->second != level) {
-      m_errors->push_back("category \"" + name + "\" is given two levels");
+    const auto [entry, is_new] = named_.emplace(*categ, level);
+    if (!is_new && entry->second != level) {
+      errors_->push_back("category \"" + name + "\" is given two levels");
     }
   }
 
-  std::vector<std::string>* m_errors;
-  std::map<LOG_CATEG, int> m_named;
-  std::optional<int> m_all;
+  std::vector<std::string>* errors_;
+  std::map<LOG_CATEG, int> named_;
+  std::optional<int> all_;
 };
 
 }  // namespace

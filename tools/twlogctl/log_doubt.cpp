@@ -12,7 +12,7 @@ namespace {
 // is rare, and a line may wait long for the lock after its time was taken.
 constexpr std::chrono::hours kMargin(2);
 
-// The number behind a word at the beginning of a line of /proc/stat.
+// The number after a word at the beginning of a line of /proc/stat.
 std::optional<long long> SystemFigure(const std::string& name) {
   std::istringstream lines(ReadWholeFile("/proc/stat"));
   for (std::string line; std::getline(lines, line);) {
@@ -41,23 +41,23 @@ std::optional<Moment> UniqueSince(int largest) {
 }  // namespace
 
 ProcessNumbers::ProcessNumbers()
-    : m_largest(LargestNumber()), m_uniqueSince(UniqueSince(m_largest)) {}
+    : largest_(LargestNumber()), unique_since_(UniqueSince(largest_)) {}
 
 // Results: nothing for a process that does not run.
 std::optional<Moment> ProcessNumbers::StartOf(int pid) {
-  const auto known = m_starts.find(pid);
-  if (known != m_starts.end()) return known->second;
+  const auto known = starts_.find(pid);
+  if (known != starts_.end()) return known->second;
   std::optional<Moment> start;
   if (const auto process = ReadProcess(pid)) {
-    start = Now() - std::chrono::milliseconds(static_cast<int64_t>(process->ageSeconds * 1000));
+    start = Now() - std::chrono::milliseconds(static_cast<int64_t>(process->age_seconds * 1000));
   }
-  m_starts[pid] = start;
+  starts_[pid] = start;
   return start;
 }
 
 bool ProcessNumbers::CannotHaveWritten(int pid, std::optional<Moment> moment) {
-  if (pid <= 0 || pid > m_largest) return true;
-  if (!m_uniqueSince || !moment || *moment < *m_uniqueSince + kMargin) return false;
+  if (pid <= 0 || pid > largest_) return true;
+  if (!unique_since_ || !moment || *moment < *unique_since_ + kMargin) return false;
   const auto start = StartOf(pid);
   return start && *start > *moment + kMargin;
 }
@@ -67,12 +67,12 @@ bool ProcessNumbers::CannotHaveWritten(int pid, std::optional<Moment> moment) {
 bool LineDoubts::RunsBack(std::optional<Moment> moment, Moment newest) {
   if (!moment) return false;
   if (*moment > newest + kMargin) return true;
-  const bool back = m_before && *moment + kMargin < *m_before;
-  m_before = moment;
+  const bool back = before_ && *moment + kMargin < *before_;
+  before_ = moment;
   return back;
 }
 
 bool LineDoubts::Doubts(int pid, std::optional<Moment> moment, Moment newest) {
   const bool back = RunsBack(moment, newest);
-  return back || (m_numbers && m_numbers->CannotHaveWritten(pid, moment));
+  return back || (numbers_ && numbers_->CannotHaveWritten(pid, moment));
 }

@@ -7,9 +7,9 @@
 
 #include "tools/twlogctl/log_time.h"
 
-// Whether a process can have written a line, as far as /proc knows: not one with a number that this
-// system does not give; and not one that runs and was started after the line. The latter is certain
-// only while no number was given twice since the start of the system.
+// Whether a process can have written a line, as far as /proc knows: not one with a number above
+// this system's largest; and not one that runs and was started after the line. The latter is
+// certain only while no number was given twice since the start of the system.
 class ProcessNumbers {
  public:
   ProcessNumbers();
@@ -19,17 +19,17 @@ class ProcessNumbers {
  private:
   std::optional<Moment> StartOf(int pid);
 
-  int m_largest;
-  std::optional<Moment> m_uniqueSince;
-  std::map<int, std::optional<Moment>> m_starts;
+  int largest_;
+  std::optional<Moment> unique_since_;
+  std::map<int, std::optional<Moment>> starts_;
 };
 
 // Judges the first lines of a log's messages one after another.
 class LineDoubts {
  public:
-  // With `ownLog` the log's writers are processes of this machine, which /proc knows.
-  explicit LineDoubts(bool ownLog) {
-    if (ownLog) m_numbers.emplace();
+  // With `own_log` the log's writers are processes of this machine, which /proc knows.
+  explicit LineDoubts(bool own_log) {
+    if (own_log) numbers_.emplace();
   }
 
   // `newest` is no earlier than the log's last line.
@@ -38,8 +38,8 @@ class LineDoubts {
  private:
   bool RunsBack(std::optional<Moment> moment, Moment newest);
 
-  std::optional<ProcessNumbers> m_numbers;
-  std::optional<Moment> m_before;
+  std::optional<ProcessNumbers> numbers_;
+  std::optional<Moment> before_;
 };
 
 #endif  // TARNWICK_TOOLS_TWLOGCTL_LOG_DOUBT_H_

@@ -21,56 +21,56 @@ std::string ReadAt(int fd, off_t offset, size_t size) {
 }  // namespace
 
 bool LogFile::Stands(const Mark& mark) const {
-  return mark.bytes.empty() || ReadAt(m_fd.Get(), mark.offset, mark.bytes.size()) == mark.bytes;
+  return mark.bytes.empty() || ReadAt(fd_.Get(), mark.offset, mark.bytes.size()) == mark.bytes;
 }
 
 bool LogFile::Truncated() const {
   struct stat status = {};
-  if (fstat(m_fd.Get(), &status) == 0 && status.st_size < m_offset) return true;
-  return !Stands(m_tail) || !Stands(m_head);
+  if (fstat(fd_.Get(), &status) == 0 && status.st_size < offset_) return true;
+  return !Stands(tail_) || !Stands(head_);
 }
 
 LogFile::Result LogFile::Restart() {
-  m_offset = 0;
-  m_head = Mark();
-  m_tail = Mark();
+  offset_ = 0;
+  head_ = Mark();
+  tail_ = Mark();
   return Result::kRestarted;
 }
 
 void LogFile::Remember(const std::string& data) {
-  if (m_head.bytes.size() < kMarkSize) {
+  if (head_.bytes.size() < kMarkSize) {
     // It grows with the first reads only, which are those of its place.
-    m_head.bytes.append(data, 0, kMarkSize - m_head.bytes.size());
+    head_.bytes.append(data, 0, kMarkSize - head_.bytes.size());
   }
-  m_tail.bytes.append(data, data.size() - std::min(data.size(), kMarkSize), kMarkSize);
-  m_tail.bytes.erase(0, m_tail.bytes.size() - std::min(m_tail.bytes.size(), kMarkSize));
-  m_offset += static_cast<off_t>(data.size());
-  m_tail.offset = m_offset - static_cast<off_t>(m_tail.bytes.size());
+  tail_.bytes.append(data, data.size() - std::min(data.size(), kMarkSize), kMarkSize);
+  tail_.bytes.erase(0, tail_.bytes.size() - std::min(tail_.bytes.size(), kMarkSize));
+  offset_ += static_cast<off_t>(data.size());
+  tail_.offset = offset_ - static_cast<off_t>(tail_.bytes.size());
 }
 
 LogFile::Result LogFile::Read(std::string* data) {
   if (Truncated()) return Restart();
-  *data = ReadAt(m_fd.Get(), m_offset, kPiece);
+  *data = ReadAt(fd_.Get(), offset_, kPiece);
   if (data->empty()) return Result::kNothing;
   // Truncated meanwhile: what was read may be of the old contents, and is then to be had nowhere
   // else, or of the new, and will be read again from their beginning.
-  if (Truncated() && ReadAt(m_fd.Get(), m_offset, data->size()) == *data) return Restart();
+  if (Truncated() && ReadAt(fd_.Get(), offset_, data->size()) == *data) return Restart();
   Remember(*data);
   return Result::kData;
 }
 
 off_t LogFile::Unread() const {
   struct stat status = {};
-  if (fstat(m_fd.Get(), &status) != 0) return 0;
-  return std::max<off_t>(status.st_size - m_offset, 0);
+  if (fstat(fd_.Get(), &status) != 0) return 0;
+  return std::max<off_t>(status.st_size - offset_, 0);
 }
 
 bool LogFile::Removed() const {
   struct stat status = {};
-  return fstat(m_fd.Get(), &status) == 0 && status.st_nlink == 0;
+  return fstat(fd_.Get(), &status) == 0 && status.st_nlink == 0;
 }
 
 bool LogFile::Is(const struct stat& status) const {
   struct stat own = {};
-  return fstat(m_fd.Get(), &own) == 0 && own.st_dev == status.st_dev && own.st_ino == status.st_ino;
+  return fstat(fd_.Get(), &own) == 0 && own.st_dev == status.st_dev && own.st_ino == status.st_ino;
 }

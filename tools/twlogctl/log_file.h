@@ -21,7 +21,7 @@ class LogFile {
   };
 
   // REQUIRES: a regular file's descriptor, open for reading.
-  explicit LogFile(tarnwick::UniqueFd fd) : m_fd(std::move(fd)) {}
+  explicit LogFile(tarnwick::UniqueFd fd) : fd_(std::move(fd)) {}
 
   // Puts the next bytes, 64 KiB at most, into `data`.
   Result Read(std::string* data);
@@ -35,7 +35,7 @@ class LogFile {
   // True when `status` is that of this file.
   bool Is(const struct stat& status) const;
 
-  int Descriptor() const { return m_fd.Get(); }
+  int Descriptor() const { return fd_.Get(); }
 
  private:
   // Bytes that were read, to be found again at their place.
@@ -49,10 +49,10 @@ class LogFile {
   void Remember(const std::string& data);
   Result Restart();
 
-  tarnwick::UniqueFd m_fd;
-  off_t m_offset = 0;
-  Mark m_head;  // the first bytes of the file
-  Mark m_tail;  // the last ones in front of m_offset
+  tarnwick::UniqueFd fd_;
+  off_t offset_ = 0;
+  Mark head_;  // the first bytes of the file
+  Mark tail_;  // the last ones in front of offset_
 };
 
 #endif  // TARNWICK_TOOLS_TWLOGCTL_LOG_FILE_H_

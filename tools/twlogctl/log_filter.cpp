@@ -11,10 +11,10 @@ struct TextPattern::Compiled {
   regex_t regex;
 };
 
-TextPattern::TextPattern(std::unique_ptr<Compiled> compiled) : m_compiled(std::move(compiled)) {}
+TextPattern::TextPattern(std::unique_ptr<Compiled> compiled) : compiled_(std::move(compiled)) {}
 
 TextPattern::~TextPattern() {
-  regfree(&m_compiled->regex);
+  regfree(&compiled_->regex);
 }
 
 std::shared_ptr<const TextPattern> TextPattern::Compile(const std::string& text,
@@ -33,7 +33,7 @@ std::shared_ptr<const TextPattern> TextPattern::Compile(const std::string& text,
 bool TextPattern::Finds(std::string_view text) const {
   regmatch_t range = {};
   range.rm_eo = static_cast<regoff_t>(text.size());
-  return regexec(&m_compiled->regex, text.data(), 1, &range, REG_STARTEND) == 0;
+  return regexec(&compiled_->regex, text.data(), 1, &range, REG_STARTEND) == 0;
 }
 
 int LevelNumber(std::string_view name) {

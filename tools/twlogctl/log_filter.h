@@ -25,7 +25,7 @@ class TextPattern {
  private:
   struct Compiled;
   explicit TextPattern(std::unique_ptr<Compiled> compiled);
-  std::unique_ptr<Compiled> m_compiled;
+  std::unique_ptr<Compiled> compiled_;
 };
 
 // A condition that is empty is met by every message, and the others only by messages that have what

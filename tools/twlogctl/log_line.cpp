@@ -15,35 +15,35 @@ constexpr size_t kLongestMonth = 16;
 // What is not read yet of a text.
 class Cursor {
  public:
-  explicit Cursor(std::string_view rest) : m_rest(rest) {}
+  explicit Cursor(std::string_view rest) : rest_(rest) {}
 
-  std::string_view Rest() const { return m_rest; }
+  std::string_view Rest() const { return rest_; }
 
   bool Skip(char expected) {
-    if (m_rest.empty() || m_rest.front() != expected) return false;
-    m_rest.remove_prefix(1);
+    if (rest_.empty() || rest_.front() != expected) return false;
+    rest_.remove_prefix(1);
     return true;
   }
 
   bool Number(int* value) {
-    const char* begin = m_rest.data();
-    const auto result = std::from_chars(begin, begin + m_rest.size(), *value);
+    const char* begin = rest_.data();
+    const auto result = std::from_chars(begin, begin + rest_.size(), *value);
     if (result.ec != std::errc()) return false;
-    m_rest.remove_prefix(static_cast<size_t>(result.ptr - begin));
+    rest_.remove_prefix(static_cast<size_t>(result.ptr - begin));
     return true;
   }
 
   // What stands before `end`, which is skipped as well.
   bool Until(std::string_view end, std::string_view* part) {
-    const size_t found = m_rest.find(end);
+    const size_t found = rest_.find(end);
     if (found == std::string_view::npos) return false;
-    *part = m_rest.substr(0, found);
-    m_rest.remove_prefix(found + end.size());
+    *part = rest_.substr(0, found);
+    rest_.remove_prefix(found + end.size());
     return true;
   }
 
  private:
-  std::string_view m_rest;
+  std::string_view rest_;
 };
 
 int MonthOf(std::string_view name) {
@@ -90,8 +90,8 @@ bool ParseBrackets(Cursor* cursor, LogLine* line) {
   }
   if (count == 0 || !cursor->Skip(' ') || !ToNumber(parts[0], &line->pid)) return false;
   line->tid = line->pid;
-  const bool hasThread = count == 2 || count == 4;
-  if (hasThread && !ToNumber(parts[1], &line->tid)) return false;
+  const bool has_thread = count == 2 || count == 4;
+  if (has_thread && !ToNumber(parts[1], &line->tid)) return false;
   if (count < 3) return true;
   line->category = parts[count - 2];
   line->level = parts[count - 1];

@@ -15,49 +15,49 @@ bool BeginsMessage(std::string_view line) {
 }  // namespace
 
 void MessageSplitter::Feed(std::string_view bytes, const MessageSink& sink) {
-  m_held.append(bytes);
+  held_.append(bytes);
   TakeLines(sink);
-  if (m_held.size() > kLongest) End(sink);
+  if (held_.size() > kLongest) End(sink);
 }
 
 // One pass over the new lines; what was given out is erased once, because each erasure moves the
 // rest.
 void MessageSplitter::TakeLines(const MessageSink& sink) {
-  const std::string_view held(m_held);
+  const std::string_view held(held_);
   size_t begin = 0;
-  size_t lines = m_lines;
+  size_t lines = lines_;
   for (size_t end = held.find('\n', lines); end != std::string_view::npos;
        end = held.find('\n', lines)) {
     const bool begins = BeginsMessage(held.substr(lines, end + 1 - lines));
-    if (begins && lines > begin) sink(held.substr(begin, lines - begin), m_continues);
+    if (begins && lines > begin) sink(held.substr(begin, lines - begin), continues_);
     if (begins) {
       begin = lines;
-      m_continues = false;
+      continues_ = false;
     }
     lines = end + 1;
   }
-  m_held.erase(0, begin);
-  m_lines = lines - begin;
+  held_.erase(0, begin);
+  lines_ = lines - begin;
 }
 
 void MessageSplitter::Flush(const MessageSink& sink) {
-  if (m_lines > 0) GiveOut(m_lines, sink);
+  if (lines_ > 0) GiveOut(lines_, sink);
 }
 
 void MessageSplitter::End(const MessageSink& sink) {
-  if (m_held.empty()) return;
+  if (held_.empty()) return;
   // An incomplete last line may begin a message of its own.
-  if (m_lines > 0 && m_lines < m_held.size() &&
-      BeginsMessage(std::string_view(m_held).substr(m_lines))) {
-    GiveOut(m_lines, sink);
-    m_continues = false;
+  if (lines_ > 0 && lines_ < held_.size() &&
+      BeginsMessage(std::string_view(held_).substr(lines_))) {
+    GiveOut(lines_, sink);
+    continues_ = false;
   }
-  GiveOut(m_held.size(), sink);
+  GiveOut(held_.size(), sink);
 }
 
 void MessageSplitter::GiveOut(size_t size, const MessageSink& sink) {
-  sink(std::string_view(m_held).substr(0, size), m_continues);
-  m_held.erase(0, size);
-  m_lines = 0;
-  m_continues = true;
+  sink(std::string_view(held_).substr(0, size), continues_);
+  held_.erase(0, size);
+  lines_ = 0;
+  continues_ = true;
 }

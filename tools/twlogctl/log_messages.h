@@ -14,25 +14,25 @@ using MessageSink = std::function<void(std::string_view text, bool continues)>;
 // Puts messages together from the bytes of one log, in the pieces in which they come.
 class MessageSplitter {
  public:
-  // Gives out each message whose end is known by the beginning of the next one.
+  // Hands out each message whose end is known by the beginning of the next one.
   void Feed(std::string_view bytes, const MessageSink& sink);
 
-  // Gives out the whole lines: nothing has followed for a while. An incomplete line stays.
+  // Hands out the whole lines: nothing has followed for a while. An incomplete line stays.
   void Flush(const MessageSink& sink);
 
-  // Gives out everything: the file has ended.
+  // Hands out everything: the file has ended.
   void End(const MessageSink& sink);
 
   // True while there is something for Flush.
-  bool Waits() const { return m_lines > 0; }
+  bool Waits() const { return lines_ > 0; }
 
  private:
   void TakeLines(const MessageSink& sink);
   void GiveOut(size_t size, const MessageSink& sink);
 
-  std::string m_held;  // a message, of which the first `m_lines` bytes are whole lines
-  size_t m_lines = 0;
-  bool m_continues = false;  // the held lines belong to a message that has been given out
+  std::string held_;  // a message, of which the first `lines_` bytes are whole lines
+  size_t lines_ = 0;
+  bool continues_ = false;  // the held lines belong to a message that has been given out
 };
 
 #endif  // TARNWICK_TOOLS_TWLOGCTL_LOG_MESSAGES_H_

@@ -4,7 +4,7 @@
 
 #include <string_view>
 
-constexpr char kLogFolder[] = "/var/log/tarnwick";
+constexpr char kLogDirectory[] = "/var/log/tarnwick";
 constexpr char kMainLogPath[] = "/var/log/tarnwick/tarnwick.log";
 constexpr char kNotificationLogPath[] = "/var/log/tarnwick/twnotification.log";
 

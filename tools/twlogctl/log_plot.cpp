@@ -28,16 +28,16 @@ bool MayDrawBlocks() {
   return std::strcmp(nl_langinfo(CODESET), "UTF-8") == 0;
 }
 
-std::vector<double> PlotColumns(const std::map<int64_t, uint64_t>& bySecond, int64_t begin,
+std::vector<double> PlotColumns(const std::map<int64_t, uint64_t>& by_second, int64_t begin,
                                 int64_t end, size_t columns) {
   const auto seconds = static_cast<size_t>(std::max<int64_t>(end - begin, 1));
-  const size_t perColumn = (seconds + columns - 1) / columns;
-  std::vector<double> values((seconds + perColumn - 1) / perColumn);
-  for (auto entry = bySecond.lower_bound(begin); entry != bySecond.end() && entry->first < end;
+  const size_t per_column = (seconds + columns - 1) / columns;
+  std::vector<double> values((seconds + per_column - 1) / per_column);
+  for (auto entry = by_second.lower_bound(begin); entry != by_second.end() && entry->first < end;
        ++entry) {
-    const size_t column = static_cast<size_t>(entry->first - begin) / perColumn;
+    const size_t column = static_cast<size_t>(entry->first - begin) / per_column;
     // The last column may be of fewer seconds.
-    const size_t width = std::min(perColumn, seconds - column * perColumn);
+    const size_t width = std::min(per_column, seconds - column * per_column);
     values[column] += static_cast<double>(entry->second) / static_cast<double>(width);
   }
   return values;

@@ -68,20 +68,20 @@ Json::Value ToJson(const LogMessage& message) {
 }  // namespace
 
 LogPrinter::LogPrinter(bool json, bool mark)
-    : m_json(json),
-      m_terminal(IsTerminal(STDOUT_FILENO)),
-      m_mark(mark || m_terminal),
-      m_colour(MayColour(STDOUT_FILENO)) {}
+    : json_(json),
+      terminal_(IsTerminal(STDOUT_FILENO)),
+      mark_(mark || terminal_),
+      colour_(MayColour(STDOUT_FILENO)) {}
 
 void LogPrinter::PrintText(const LogMessage& message) {
-  if (!m_mark) return Put(message.text);
+  if (!mark_) return Put(message.text);
   const Colour colour = ColourOf(message.line);
   std::string_view rest = message.text;
   const char* mark = message.continues ? "| " : message.doubtful ? "? " : "";
   while (!rest.empty()) {
     const std::string_view line = rest.substr(0, rest.find('\n'));
     Put(mark);
-    m_terminal ? Put(Paint(colour, EscapeControls(line), m_colour)) : Put(line);
+    terminal_ ? Put(InColour(colour, EscapeControls(line), colour_)) : Put(line);
     Put("\n");
     rest.remove_prefix(std::min(rest.size(), line.size() + 1));
     mark = "| ";
@@ -89,7 +89,7 @@ void LogPrinter::PrintText(const LogMessage& message) {
 }
 
 void LogPrinter::Print(const LogMessage& message) {
-  if (!m_json) return PrintText(message);
+  if (!json_) return PrintText(message);
   Put(CompactJson(ToJson(message)));
   Put("\n");
 }

@@ -20,10 +20,10 @@ class LogPrinter {
  private:
   void PrintText(const LogMessage& message);
 
-  bool m_json;
-  bool m_terminal;
-  bool m_mark;
-  bool m_colour;
+  bool json_;
+  bool terminal_;
+  bool mark_;
+  bool colour_;
 };
 
 #endif  // TARNWICK_TOOLS_TWLOGCTL_LOG_PRINTER_H_

@@ -51,31 +51,31 @@ std::vector<std::pair<std::string, LogAmount>> LoudestFirst(const NamedAmounts& 
 
 void LogCounter::Add(const LogMessage& message) {
   const LogAmount amount = AmountOf(message);
-  m_amounts.Add(amount, message.line);
+  amounts_.Add(amount, message.line);
   if (message.moment) {
-    m_first = std::min(m_first.value_or(*message.moment), *message.moment);
-    m_last = std::max(m_last.value_or(*message.moment), *message.moment);
+    first_ = std::min(first_.value_or(*message.moment), *message.moment);
+    last_ = std::max(last_.value_or(*message.moment), *message.moment);
   }
   // What has no time was written after what stands in front of it.
-  if (m_last) m_lines[SecondOf(message.moment.value_or(*m_last))] += amount.lines;
+  if (last_) lines_[SecondOf(message.moment.value_or(*last_))] += amount.lines;
 }
 
 void SlidingCounter::Add(const LogMessage& message, Moment now) {
-  m_seconds[SecondOf(message.moment.value_or(now))].Add(AmountOf(message), message.line);
+  seconds_[SecondOf(message.moment.value_or(now))].Add(AmountOf(message), message.line);
 }
 
 void SlidingCounter::Advance(Moment now) {
-  m_seconds.erase(m_seconds.begin(), m_seconds.upper_bound(SecondOf(now - m_window)));
+  seconds_.erase(seconds_.begin(), seconds_.upper_bound(SecondOf(now - window_)));
 }
 
 LogAmounts SlidingCounter::Amounts() const {
   LogAmounts sum;
-  for (const auto& entry : m_seconds) sum.Add(entry.second);
+  for (const auto& entry : seconds_) sum.Add(entry.second);
   return sum;
 }
 
 std::map<int64_t, uint64_t> SlidingCounter::LinesBySecond() const {
   std::map<int64_t, uint64_t> lines;
-  for (const auto& [second, amounts] : m_seconds) lines[second] = amounts.all.lines;
+  for (const auto& [second, amounts] : seconds_) lines[second] = amounts.all.lines;
   return lines;
 }

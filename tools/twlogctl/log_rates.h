@@ -39,24 +39,24 @@ class LogCounter {
  public:
   void Add(const LogMessage& message);
 
-  const LogAmounts& Amounts() const { return m_amounts; }
-  const std::map<int64_t, uint64_t>& LinesBySecond() const { return m_lines; }
+  const LogAmounts& Amounts() const { return amounts_; }
+  const std::map<int64_t, uint64_t>& LinesBySecond() const { return lines_; }
 
   // Of the messages that have a time.
-  std::optional<Moment> First() const { return m_first; }
-  std::optional<Moment> Last() const { return m_last; }
+  std::optional<Moment> First() const { return first_; }
+  std::optional<Moment> Last() const { return last_; }
 
  private:
-  LogAmounts m_amounts;
-  std::map<int64_t, uint64_t> m_lines;  // by the seconds since 1970
-  std::optional<Moment> m_first;
-  std::optional<Moment> m_last;
+  LogAmounts amounts_;
+  std::map<int64_t, uint64_t> lines_;  // by the seconds since 1970
+  std::optional<Moment> first_;
+  std::optional<Moment> last_;
 };
 
 // Counts the messages of the last seconds.
 class SlidingCounter {
  public:
-  explicit SlidingCounter(std::chrono::seconds window) : m_window(window) {}
+  explicit SlidingCounter(std::chrono::seconds window) : window_(window) {}
 
   // A message without a time is of `now`.
   void Add(const LogMessage& message, Moment now);
@@ -66,11 +66,11 @@ class SlidingCounter {
 
   LogAmounts Amounts() const;
   std::map<int64_t, uint64_t> LinesBySecond() const;
-  std::chrono::seconds Window() const { return m_window; }
+  std::chrono::seconds Window() const { return window_; }
 
  private:
-  std::chrono::seconds m_window;
-  std::map<int64_t, LogAmounts> m_seconds;
+  std::chrono::seconds window_;
+  std::map<int64_t, LogAmounts> seconds_;
 };
 
 // The lines and bytes of a message.

@@ -5,9 +5,9 @@ void LogSelector::Take(std::string_view text, bool continues, const WantedSink& 
   LogMessage message = {text, nullptr, std::nullopt, continues};
   if (!continues && ParseLogLine(text, &line)) {
     message.line = &line;
-    message.moment = m_clock.MomentOf(line.stamp);
-    message.doubtful = m_doubts.Doubts(line.pid, message.moment, m_clock.Newest());
+    message.moment = clock_.MomentOf(line.stamp);
+    message.doubtful = doubts_.Doubts(line.pid, message.moment, clock_.Newest());
   }
-  if (!continues) m_wantedLast = m_filter.Wants(text, message.line, message.moment);
-  if (m_wantedLast) sink(message);
+  if (!continues) wanted_last_ = filter_.Wants(text, message.line, message.moment);
+  if (wanted_last_) sink(message);
 }

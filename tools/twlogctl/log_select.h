@@ -24,22 +24,22 @@ using WantedSink = std::function<void(const LogMessage& message)>;
 
 class LogSelector {
  public:
-  // With `ownLog` the log is one of this machine's processes.
-  LogSelector(LogFilter filter, Moment newest, bool ownLog)
-      : m_filter(std::move(filter)), m_clock(newest), m_doubts(ownLog) {}
+  // With `own_log` the log is one of this machine's processes.
+  LogSelector(LogFilter filter, Moment newest, bool own_log)
+      : filter_(std::move(filter)), clock_(newest), doubts_(own_log) {}
 
   // Takes a message as a MessageSink does and hands it on if it is wanted. Lines that continue a
   // message share its fate.
   void Take(std::string_view text, bool continues, const WantedSink& sink);
 
-  void Advance(Moment newest) { m_clock.Advance(newest); }
-  LogFilter& Filter() { return m_filter; }
+  void Advance(Moment newest) { clock_.Advance(newest); }
+  LogFilter& Filter() { return filter_; }
 
  private:
-  LogFilter m_filter;
-  LogClock m_clock;
-  LineDoubts m_doubts;
-  bool m_wantedLast = false;
+  LogFilter filter_;
+  LogClock clock_;
+  LineDoubts doubts_;
+  bool wanted_last_ = false;
 };
 
 #endif  // TARNWICK_TOOLS_TWLOGCTL_LOG_SELECT_H_

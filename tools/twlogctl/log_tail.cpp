@@ -18,7 +18,7 @@ using std::chrono::seconds;
 // The lines of a message come at once, or nearly so when it is longer than the writer's buffer.
 constexpr milliseconds kMessageEnd(100);
 
-// Looks without an event, for what gives none.
+// Looks without an event, for what has none.
 constexpr seconds kLook(1);
 
 constexpr minutes kQuiet(1);
@@ -26,7 +26,7 @@ constexpr minutes kQuiet(1);
 // Files that are read on. Rotations come hours apart.
 constexpr size_t kMostSources = 16;
 
-std::string FolderOf(const std::string& path) {
+std::string DirectoryOf(const std::string& path) {
   const size_t slash = path.rfind('/');
   if (slash == std::string::npos) return ".";
   return slash == 0 ? "/" : path.substr(0, slash);
@@ -34,44 +34,44 @@ std::string FolderOf(const std::string& path) {
 
 }  // namespace
 
-LogTail::LogTail(std::string path) : m_path(std::move(path)) {
-  WatchFolder();
+LogTail::LogTail(std::string path) : path_(std::move(path)) {
+  WatchDirectory();
 }
 
-void LogTail::WatchFolder() {
-  m_watch.AddFolder(FolderOf(m_path));
-  m_folderWatched = Clock::now();
+void LogTail::WatchDirectory() {
+  watch_.AddDirectory(DirectoryOf(path_));
+  directory_watched_ = Clock::now();
 }
 
 LogTail::SourceIterator LogTail::Known(const struct stat& status) {
-  return std::find_if(m_sources.begin(), m_sources.end(),
+  return std::find_if(sources_.begin(), sources_.end(),
                       [&](const Source& source) { return source.file.Is(status); });
 }
 
 // Makes the file at the path the last source. One that comes back under its old name is read on
 // where it was left. Results: 0 or an errno.
 int LogTail::OpenFile() {
-  tarnwick::UniqueFd fd = OpenRegularFile(m_path.c_str());
+  tarnwick::UniqueFd fd = OpenRegularFile(path_.c_str());
   struct stat status = {};
   if (!fd.Valid() || fstat(fd.Get(), &status) != 0) return errno;
   const SourceIterator known = Known(status);
-  if (known != m_sources.end()) {
-    m_sources.splice(m_sources.end(), m_sources, known);
+  if (known != sources_.end()) {
+    sources_.splice(sources_.end(), sources_, known);
     return 0;
   }
-  const int watch = m_watch.AddFile(fd.Get());
-  m_sources.push_back({LogFile(std::move(fd)), MessageSplitter(), watch, Clock::now()});
+  const int watch = watch_.AddFile(fd.Get());
+  sources_.push_back({LogFile(std::move(fd)), MessageSplitter(), watch, Clock::now()});
   return 0;
 }
 
 void LogTail::FindFile() {
   struct stat status = {};
-  if (stat(m_path.c_str(), &status) != 0) {
-    m_error = errno;
-  } else if (m_sources.empty() || !m_sources.back().file.Is(status)) {
-    m_error = OpenFile();
+  if (stat(path_.c_str(), &status) != 0) {
+    error_ = errno;
+  } else if (sources_.empty() || !sources_.back().file.Is(status)) {
+    error_ = OpenFile();
   } else {
-    m_error = 0;
+    error_ = 0;
   }
 }
 
@@ -97,7 +97,7 @@ bool LogTail::ReadSource(Source* source, const MessageSink& sink) {
 }
 
 void LogTail::ReadAll(const MessageSink& sink) {
-  for (Source& source : m_sources) {
+  for (Source& source : sources_) {
     const Clock::time_point now = Clock::now();
     if (ReadSource(&source, sink)) {
       source.changed = now;
@@ -109,22 +109,22 @@ void LogTail::ReadAll(const MessageSink& sink) {
 
 void LogTail::DropOver(const MessageSink& sink) {
   const Clock::time_point now = Clock::now();
-  for (auto source = m_sources.begin(); source != m_sources.end();) {
-    const bool atPath = m_error == 0 && std::next(source) == m_sources.end();
+  for (auto source = sources_.begin(); source != sources_.end();) {
+    const bool at_path = error_ == 0 && std::next(source) == sources_.end();
     const bool over = source->file.Removed() && now - source->changed >= kQuiet;
-    if (atPath || (!over && m_sources.size() <= kMostSources)) {
+    if (at_path || (!over && sources_.size() <= kMostSources)) {
       ++source;
       continue;
     }
     source->splitter.End(sink);
-    m_watch.Remove(source->watch);
-    source = m_sources.erase(source);
+    watch_.Remove(source->watch);
+    source = sources_.erase(source);
   }
 }
 
 void LogTail::Poll(const MessageSink& sink) {
-  m_watch.Drain();
-  if (Clock::now() - m_folderWatched >= kLook) WatchFolder();
+  watch_.Drain();
+  if (Clock::now() - directory_watched_ >= kLook) WatchDirectory();
   // What was written before the rotation comes before what was written after it.
   ReadAll(sink);
   FindFile();
@@ -133,11 +133,11 @@ void LogTail::Poll(const MessageSink& sink) {
 }
 
 void LogTail::Flush(const MessageSink& sink) {
-  for (Source& source : m_sources) source.splitter.Flush(sink);
+  for (Source& source : sources_) source.splitter.Flush(sink);
 }
 
 milliseconds LogTail::Patience() const {
-  const bool waits = std::any_of(m_sources.begin(), m_sources.end(),
+  const bool waits = std::any_of(sources_.begin(), sources_.end(),
                                  [](const Source& source) { return source.splitter.Waits(); });
   return waits ? kMessageEnd : milliseconds(kLook);
 }

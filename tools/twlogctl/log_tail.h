@@ -19,19 +19,19 @@ class LogTail {
 
   explicit LogTail(std::string path);
 
-  // Gives out the messages that are new, those of older files first. The last message of a file
+  // Hands out the messages that are new, those of older files first. The last message of a file
   // waits a little for further lines, and an incomplete line for its end.
   void Poll(const MessageSink& sink);
 
-  // Gives out what waits for further lines.
+  // Hands out what waits for further lines.
   void Flush(const MessageSink& sink);
 
   // How long to wait at most, unless Descriptor() becomes readable, before the next Poll.
   std::chrono::milliseconds Patience() const;
-  int Descriptor() const { return m_watch.Descriptor(); }
+  int Descriptor() const { return watch_.Descriptor(); }
 
   // 0 while the path leads to a log that can be read, else the errno of opening it.
-  int Error() const { return m_error; }
+  int Error() const { return error_; }
 
  private:
   struct Source {
@@ -45,16 +45,16 @@ class LogTail {
   SourceIterator Known(const struct stat& status);
   void FindFile();
   int OpenFile();
-  void WatchFolder();
+  void WatchDirectory();
   bool ReadSource(Source* source, const MessageSink& sink);
   void ReadAll(const MessageSink& sink);
   void DropOver(const MessageSink& sink);
 
-  std::string m_path;
-  LogWatch m_watch;
-  std::list<Source> m_sources;  // the last one is that at the path, if m_error is 0
-  Clock::time_point m_folderWatched;
-  int m_error = 0;
+  std::string path_;
+  LogWatch watch_;
+  std::list<Source> sources_;  // the last one is that at the path, if error_ is 0
+  Clock::time_point directory_watched_;
+  int error_ = 0;
 };
 
 #endif  // TARNWICK_TOOLS_TWLOGCTL_LOG_TAIL_H_

@@ -2,7 +2,7 @@
 
 #include <cstdio>
 
-#include "tools/common/amounts.h"
+#include "tools/common/units.h"
 
 namespace {
 
@@ -110,13 +110,13 @@ Moment Now() {
 
 std::optional<Moment> LogClock::MomentOf(const LogStamp& stamp) {
   if (stamp.month < 0) return std::nullopt;
-  if (!SameHour(stamp, m_hour)) {
-    const std::optional<time_t> hour = LatestHour(stamp, m_newest);
+  if (!SameHour(stamp, hour_)) {
+    const std::optional<time_t> hour = LatestHour(stamp, newest_);
     if (!hour) return std::nullopt;
-    m_hour = stamp;
-    m_hourStart = *hour;
+    hour_ = stamp;
+    hour_start_ = *hour;
   }
-  return FromTime(m_hourStart) + seconds(stamp.minute * 60 + stamp.second) +
+  return FromTime(hour_start_) + seconds(stamp.minute * 60 + stamp.second) +
          milliseconds(stamp.millisecond < 0 ? 0 : stamp.millisecond);
 }
 
@@ -146,7 +146,7 @@ std::string FormatIso(Moment moment) {
   const struct tm local = Local(moment);
   char date[64];
   char zone[16];
-  const size_t dateLength = strftime(date, sizeof(date), "%Y-%m-%dT%H:%M:%S", &local);
-  const size_t zoneLength = strftime(zone, sizeof(zone), "%z", &local);
-  return std::string(date, dateLength) + Fraction(moment) + std::string(zone, zoneLength);
+  const size_t date_length = strftime(date, sizeof(date), "%Y-%m-%dT%H:%M:%S", &local);
+  const size_t zone_length = strftime(zone, sizeof(zone), "%z", &local);
+  return std::string(date, date_length) + Fraction(moment) + std::string(zone, zone_length);
 }

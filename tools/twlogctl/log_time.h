@@ -22,20 +22,20 @@ class LogClock {
  public:
   // `newest` is no earlier than the log's last line: the present, or the time of the last change of
   // a copied log.
-  explicit LogClock(Moment newest) : m_newest(newest) {}
+  explicit LogClock(Moment newest) : newest_(newest) {}
 
   // A log that grows has newer lines by and by.
-  void Advance(Moment newest) { m_newest = newest; }
-  Moment Newest() const { return m_newest; }
+  void Advance(Moment newest) { newest_ = newest; }
+  Moment Newest() const { return newest_; }
 
   // No value for a line without a time.
   std::optional<Moment> MomentOf(const LogStamp& stamp);
 
  private:
-  Moment m_newest;
+  Moment newest_;
   // The hour of the line before: most lines are of the same one, and mktime is slow.
-  LogStamp m_hour;
-  time_t m_hourStart = 0;
+  LogStamp hour_;
+  time_t hour_start_ = 0;
 };
 
 // Where a time of day without a date lies, and a span: before the present or after it.

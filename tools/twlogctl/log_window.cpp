@@ -9,21 +9,21 @@ constexpr size_t kLongest = 16 << 20;
 }  // namespace
 
 void LogWindow::Add(const LogMessage& message) {
-  if (m_size == 0) return;
-  if (message.continues && !m_kept.empty() && m_kept.back().text.size() < kLongest) {
-    m_kept.back().text += message.text;
+  if (size_ == 0) return;
+  if (message.continues && !kept_.empty() && kept_.back().text.size() < kLongest) {
+    kept_.back().text += message.text;
     return;
   }
-  if (m_kept.size() == m_size) m_kept.pop_front();
-  const bool part = message.continues && !m_kept.empty();
-  m_kept.push_back({std::string(message.text), message.moment, message.doubtful, part});
+  if (kept_.size() == size_) kept_.pop_front();
+  const bool part = message.continues && !kept_.empty();
+  kept_.push_back({std::string(message.text), message.moment, message.doubtful, part});
 }
 
 void LogWindow::Drain(const WantedSink& sink) {
-  for (const Kept& kept : m_kept) {
+  for (const Kept& kept : kept_) {
     LogLine line;
     const bool begins = !kept.continues && ParseLogLine(kept.text, &line);
     sink({kept.text, begins ? &line : nullptr, kept.moment, kept.continues, kept.doubtful});
   }
-  m_kept.clear();
+  kept_.clear();
 }

@@ -11,7 +11,7 @@
 // Keeps the newest messages, and their lines that came later as a part of them.
 class LogWindow {
  public:
-  explicit LogWindow(size_t size) : m_size(size) {}
+  explicit LogWindow(size_t size) : size_(size) {}
 
   void Add(const LogMessage& message);
 
@@ -25,8 +25,8 @@ class LogWindow {
     bool doubtful = false;
     bool continues = false;  // lines of a long message whose beginning came before
   };
-  size_t m_size;
-  std::deque<Kept> m_kept;
+  size_t size_;
+  std::deque<Kept> kept_;
 };
 
 #endif  // TARNWICK_TOOLS_TWLOGCTL_LOG_WINDOW_H_

@@ -29,7 +29,7 @@ LOG_LEVEL LevelOf(const std::string& text) {
 
 }  // namespace
 
-void AddWrite(CLI::App* app, int* exitCode) {
+void AddWrite(CLI::App* app, int* exit_code) {
   auto options = std::make_shared<WriteOptions>();
   CLI::App* const command =
       app->add_subcommand("write", "Write a line into the log, as a daemon does.");
@@ -55,14 +55,14 @@ void AddWrite(CLI::App* app, int* exitCode) {
   command->add_flag("--force", options->force, "Write although the category's level is off.");
   command->add_flag("--json", options->json, "Print one JSON object a line.");
   command->footer("A line whose level is off is not written: exit code 1.");
-  command->callback([=] { *exitCode = WriteText(*options); });
+  command->callback([=] { *exit_code = WriteText(*options); });
 }
 
-void AddDoctor(CLI::App* app, int* exitCode) {
+void AddDoctor(CLI::App* app, int* exit_code) {
   auto json = std::make_shared<bool>(false);
   CLI::App* const command = app->add_subcommand(
       "doctor", "Look for what stops logging, and tell a fix for each finding.");
   command->add_flag("--json", *json, "Print one JSON object a line.");
   command->footer("Exit code 1 when something is wrong. It watches the logs' locks for a second.");
-  command->callback([=] { *exitCode = RunDoctor(*json); });
+  command->callback([=] { *exit_code = RunDoctor(*json); });
 }

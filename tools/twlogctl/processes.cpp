@@ -4,6 +4,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <cerrno>
 #include <cstdio>
 #include <cstdlib>
 #include <ctime>
@@ -13,7 +14,7 @@
 #include "tarnwick/platform/unique.h"
 #include "tools/common/private_file.h"
 #include "tools/common/shell.h"
-#include "tools/twlogctl/owned_folder.h"
+#include "tools/twlogctl/owned_directory.h"
 
 namespace {
 
@@ -53,11 +54,11 @@ std::string IpcNamespace(const std::string& process) {
 
 LibraryUser LookAtMemory(pid_t pid, int segment) {
   LibraryUser user;
-  const std::string segmentName = SegmentName();
+  const std::string segment_name = SegmentName();
   std::istringstream maps(ReadWholeFile("/proc/" + std::to_string(pid) + "/maps"));
   for (std::string line; std::getline(maps, line);) {
-    if (line.find("/libtarnwick.so") != std::string::npos) user.hasLibrary = true;
-    if (IsSegment(line, segmentName, segment)) user.hasRecord = true;
+    if (line.find("/libtarnwick.so") != std::string::npos) user.has_library = true;
+    if (IsSegment(line, segment_name, segment)) user.has_record = true;
   }
   return user;
 }
@@ -67,12 +68,8 @@ LibraryUser LookAtMemory(pid_t pid, int segment) {
 std::string ReadWholeFile(const std::string& path) {
   const tarnwick::UniqueFd file = OpenRegularFile(path.c_str());
   std::string text;
-  char piece[65536];
-  for (ssize_t count; (count = read(file.Get(), piece, sizeof(piece))) > 0;) {
-    text.append(piece, static_cast<size_t>(count));
-    if (text.size() > kLongestFile) return "";
-  }
-  return text;
+  const bool read = ReadAll(file.Get(), kLongestFile, &text);
+  return read || errno != EFBIG ? text : "";
 }
 
 std::string NameAndPid(const ProcessInfo& process) {
@@ -101,18 +98,18 @@ std::optional<ProcessInfo> ReadProcess(pid_t pid) {
   fields >> process.state;
   std::string skipped;
   for (int field = 4; field < 22; ++field) fields >> skipped;
-  double startTicks = 0;  // field 22, since the machine was started
-  fields >> startTicks;
-  process.ageSeconds =
-      std::max(0.0, SecondsSinceBoot() - startTicks / static_cast<double>(sysconf(_SC_CLK_TCK)));
+  double start_ticks = 0;  // field 22, since the machine was started
+  fields >> start_ticks;
+  process.age_seconds =
+      std::max(0.0, SecondsSinceBoot() - start_ticks / static_cast<double>(sysconf(_SC_CLK_TCK)));
   return process;
 }
 
 std::vector<pid_t> AllProcesses() {
   std::vector<pid_t> pids;
-  const OwnedFolder folder(opendir("/proc"));
-  if (!folder) return pids;
-  while (const struct dirent* const entry = readdir(folder.get())) {
+  const OwnedDirectory directory(opendir("/proc"));
+  if (!directory) return pids;
+  while (const struct dirent* const entry = readdir(directory.get())) {
     const long pid = std::strtol(entry->d_name, nullptr, 10);  // 0 for what is no process
     if (pid > 0) pids.push_back(static_cast<pid_t>(pid));
   }
@@ -122,11 +119,11 @@ std::vector<pid_t> AllProcesses() {
 
 std::vector<LibraryUser> LibraryUsers(int segment) {
   std::vector<LibraryUser> users;
-  const std::string ownNamespace = IpcNamespace("self");
+  const std::string own_namespace = IpcNamespace("self");
   for (const pid_t pid : AllProcesses()) {
-    if (pid == getpid() || IpcNamespace(std::to_string(pid)) != ownNamespace) continue;
+    if (pid == getpid() || IpcNamespace(std::to_string(pid)) != own_namespace) continue;
     LibraryUser user = LookAtMemory(pid, segment);
-    if (!user.hasLibrary && !user.hasRecord) continue;
+    if (!user.has_library && !user.has_record) continue;
     const std::optional<ProcessInfo> process = ReadProcess(pid);
     if (!process) continue;
     user.process = *process;

@@ -11,8 +11,8 @@
 struct ProcessInfo {
   pid_t pid = 0;
   std::string name;
-  char state = '?';       // the letter of /proc/PID/stat; T is a stopped process
-  double ageSeconds = 0;  // since it was started
+  char state = '?';        // the letter of /proc/PID/stat; T is a stopped process
+  double age_seconds = 0;  // since it was started
 };
 
 // "camerad (812)". The name is what the process calls itself; one that is not plain is quoted for
@@ -34,8 +34,8 @@ std::vector<pid_t> AllProcesses();
 // How a process stands to the record.
 struct LibraryUser {
   ProcessInfo process;
-  bool hasLibrary = false;  // it has the shared library in its memory
-  bool hasRecord = false;   // it has attached the record with the given segment
+  bool has_library = false;  // it has the shared library in its memory
+  bool has_record = false;   // it has attached the record with the given segment
 };
 
 // The processes but this one that have the shared library or the record in their memory, of

@@ -63,7 +63,7 @@ std::string DescribeAttached(const RecordSegment& segment) {
   const unsigned long count = AttachedOthers(segment);
   std::string names;
   for (const LibraryUser& user : LibraryUsers(segment.id)) {
-    if (!user.hasRecord) continue;
+    if (!user.has_record) continue;
     names += (names.empty() ? ": " : ", ") + NameAndPid(user.process);
   }
   return std::to_string(count) + (count == 1 ? " process" : " processes") + names;
@@ -71,6 +71,12 @@ std::string DescribeAttached(const RecordSegment& segment) {
 
 void RecordDetacher::operator()(const TWDbgLogCfg* record) const {
   if (record != g_pDbgLogCfg) shmdt(record);
+}
+
+AttachedRecord Attach(const RecordSegment& segment, int flags) {
+  void* const address = shmat(segment.id, nullptr, flags);
+  if (reinterpret_cast<intptr_t>(address) == -1) return nullptr;
+  return AttachedRecord(static_cast<TWDbgLogCfg*>(address));
 }
 
 AttachedRecord AttachRecord(Access access) {
@@ -84,16 +90,16 @@ AttachedRecord AttachRecord(Access access) {
              std::to_string(sizeof(TWDbgLogCfg)) + "; \"twlogctl doctor\" tells what to do");
     return nullptr;
   }
-  // The library has it already, unless it may only be read. A second time would count as a process.
+  // The library has it already, unless it may only be read. A second time would show as another
+  // process.
   if (g_pDbgLogCfg != nullptr) return AttachedRecord(g_pDbgLogCfg);
-  void* const address = shmat(segment->id, nullptr, access == Access::kRead ? SHM_RDONLY : 0);
-  if (reinterpret_cast<intptr_t>(address) == -1) {
+  AttachedRecord record = Attach(*segment, access == Access::kRead ? SHM_RDONLY : 0);
+  if (!record) {
     const int error = errno;
     Complain(std::string("the record may not be ") +
              (access == Access::kRead ? "read: " : "changed: ") + strerror(error) +
              "; it belongs to " + UserName(segment->owner) + ":" + GroupName(segment->group) +
              " with mode " + ModeText(segment->mode));
-    return nullptr;
   }
-  return AttachedRecord(static_cast<TWDbgLogCfg*>(address));
+  return record;
 }

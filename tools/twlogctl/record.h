@@ -42,10 +42,13 @@ struct RecordDetacher {
 // Detached at the end of its life, unless it is the library's.
 using AttachedRecord = std::unique_ptr<TWDbgLogCfg, RecordDetacher>;
 
+// Attaches `segment`, with SHM_RDONLY in `flags` to read it. Results: null with errno.
+AttachedRecord Attach(const RecordSegment& segment, int flags);
+
 enum class Access { kRead, kWrite };
 
 // Attaches the record for a sub-command. Without one, with one of another size and without the
-// permission it complains, with what to do about it, and gives null.
+// permission it complains, with what to do about it, and returns null.
 AttachedRecord AttachRecord(Access access);
 
 #endif  // TARNWICK_TOOLS_TWLOGCTL_RECORD_H_

@@ -2,9 +2,9 @@
 #include <CLI/CLI.hpp>
 #include <memory>
 
-#include "tools/common/amounts.h"
+#include "tools/common/units.h"
 #include "tools/twlogctl/commands.h"
-#include "tools/twlogctl/lifetime.h"
+#include "tools/twlogctl/create_remove.h"
 #include "tools/twlogctl/set_levels.h"
 #include "tools/twlogctl/settings_commands.h"
 #include "tools/twlogctl/status.h"
@@ -40,16 +40,16 @@ mode_t ModeOf(const std::string& text) {
 
 }  // namespace
 
-void AddStatus(CLI::App* app, int* exitCode) {
+void AddStatus(CLI::App* app, int* exit_code) {
   auto flags = std::make_shared<Flags>();
   CLI::App* const command = app->add_subcommand(
       "status", "Show the shared record of levels, and the levels that are not notice.");
   command->add_flag("-a,--all", flags->all, "Show the levels of all categories.");
   AddJson(command, &flags->json);
-  command->callback([=] { *exitCode = ShowStatus(flags->all, flags->json); });
+  command->callback([=] { *exit_code = ShowStatus(flags->all, flags->json); });
 }
 
-void AddCreate(CLI::App* app, int* exitCode) {
+void AddCreate(CLI::App* app, int* exit_code) {
   auto options = std::make_shared<CreateOptions>();
   CLI::App* const command = app->add_subcommand(
       "create", "Make the shared record, with the levels of the settings file.");
@@ -67,19 +67,19 @@ void AddCreate(CLI::App* app, int* exitCode) {
   command->footer(
       "A daemon attaches the record when it loads the library, and not later:\n"
       "daemons that run already must be started again.");
-  command->callback([=] { *exitCode = CreateRecord(*options); });
+  command->callback([=] { *exit_code = CreateRecord(*options); });
 }
 
-void AddRemove(CLI::App* app, int* exitCode) {
+void AddRemove(CLI::App* app, int* exit_code) {
   auto flags = std::make_shared<Flags>();
   CLI::App* const command = app->add_subcommand(
       "remove", "Remove the shared record; ask first while processes are attached.");
   command->add_flag("-y,--yes", flags->yes, "Do not ask, and remove it from under its users.");
   AddJson(command, &flags->json);
-  command->callback([=] { *exitCode = RemoveRecord(flags->yes, flags->json); });
+  command->callback([=] { *exit_code = RemoveRecord(flags->yes, flags->json); });
 }
 
-void AddSet(CLI::App* app, int* exitCode) {
+void AddSet(CLI::App* app, int* exit_code) {
   auto options = std::make_shared<SetOptions>();
   CLI::App* const command =
       app->add_subcommand("set", "Change levels, for all running processes at once.");
@@ -99,10 +99,10 @@ void AddSet(CLI::App* app, int* exitCode) {
       "With --for, a second process keeps the old levels. It puts them back when the\n"
       "span is over, and at once when this one is gone, by Ctrl-C or even by SIGKILL.\n"
       "A level that somebody else has changed meanwhile stays as they left it.");
-  command->callback([=] { *exitCode = SetLevels(*options); });
+  command->callback([=] { *exit_code = SetLevels(*options); });
 }
 
-void AddTimeScale(CLI::App* app, int* exitCode) {
+void AddTimeScale(CLI::App* app, int* exit_code) {
   auto flags = std::make_shared<Flags>();
   auto state = std::make_shared<std::string>();
   CLI::App* const command = app->add_subcommand(
@@ -111,29 +111,29 @@ void AddTimeScale(CLI::App* app, int* exitCode) {
       ->required()
       ->check(CLI::IsMember({"on", "off"}));
   AddJson(command, &flags->json);
-  command->callback([=] { *exitCode = SetTimeScale(*state == "on", flags->json); });
+  command->callback([=] { *exit_code = SetTimeScale(*state == "on", flags->json); });
 }
 
-void AddSave(CLI::App* app, int* exitCode) {
+void AddSave(CLI::App* app, int* exit_code) {
   auto flags = std::make_shared<Flags>();
   CLI::App* const command =
       app->add_subcommand("save", "Write the record's levels into the settings file.");
   AddJson(command, &flags->json);
-  command->callback([=] { *exitCode = SaveRecord(flags->json); });
+  command->callback([=] { *exit_code = SaveRecord(flags->json); });
 }
 
-void AddLoad(CLI::App* app, int* exitCode) {
+void AddLoad(CLI::App* app, int* exit_code) {
   auto flags = std::make_shared<Flags>();
   CLI::App* const command = app->add_subcommand(
       "load", "Set the record's levels from the settings file, unless it is broken.");
   AddJson(command, &flags->json);
-  command->callback([=] { *exitCode = LoadRecord(flags->json); });
+  command->callback([=] { *exit_code = LoadRecord(flags->json); });
 }
 
-void AddDiff(CLI::App* app, int* exitCode) {
+void AddDiff(CLI::App* app, int* exit_code) {
   auto flags = std::make_shared<Flags>();
   CLI::App* const command = app->add_subcommand(
       "diff", "Show where the record and the settings file differ; exit with 1 when they do.");
   AddJson(command, &flags->json);
-  command->callback([=] { *exitCode = DiffRecord(flags->json); });
+  command->callback([=] { *exit_code = DiffRecord(flags->json); });
 }

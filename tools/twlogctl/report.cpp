@@ -10,14 +10,13 @@
 #include "tarnwick/log/twdebuglog.h"
 #include "tools/common/names.h"
 #include "tools/common/terminal.h"
-#include "tools/common/words.h"
+#include "tools/common/text.h"
 
 namespace {
 
-std::string DidYouMean(const std::vector<std::string>& nearest) {
-  std::string names;
-  for (const std::string& name : nearest) names += (names.empty() ? "" : ", ") + name;
-  return names.empty() ? "" : " (did you mean " + names + "?)";
+std::string Hint(const std::string& text, const std::vector<std::string>& names) {
+  const std::string hint = DidYouMean(text, names);
+  return hint.empty() ? "" : " (" + hint + ")";
 }
 
 }  // namespace
@@ -57,9 +56,9 @@ std::string ModeText(mode_t mode) {
 }
 
 std::string DidYouMeanCategory(const std::string& text) {
-  return DidYouMean(NearestNames(text, CategoryNames()));
+  return Hint(text, CategoryNames());
 }
 
 std::string DidYouMeanLevel(const std::string& text) {
-  return DidYouMean(NearestNames(text, LevelNames()));
+  return Hint(text, LevelNames());
 }

@@ -8,13 +8,13 @@
 #include <ctime>
 #include <map>
 
-#include "tools/common/amounts.h"
 #include "tools/common/json_output.h"
 #include "tools/common/terminal.h"
+#include "tools/common/units.h"
 #include "tools/twlogctl/commands.h"
-#include "tools/twlogctl/guardian.h"
 #include "tools/twlogctl/record.h"
 #include "tools/twlogctl/report.h"
+#include "tools/twlogctl/temporary_levels.h"
 
 namespace {
 
@@ -29,7 +29,7 @@ void PrintChange(const LevelChange& change, bool json) {
   }
   const bool colour = MayColour(1);
   printf("%s: %s -> %s\n", Enum2String(change.categ), LevelWords(change.before).c_str(),
-         Paint(Colour::kBold, LevelWords(change.after), colour).c_str());
+         InColour(Colour::kBold, LevelWords(change.after), colour).c_str());
 }
 
 // Categories that "all" changes from one level to another. Many have one line, which says as much.
@@ -51,9 +51,9 @@ std::string TimeAfter(std::chrono::milliseconds span) {
   struct tm local = {};
   localtime_r(&now, &today);
   localtime_r(&then, &local);
-  const bool sameDay = today.tm_yday == local.tm_yday && today.tm_year == local.tm_year;
+  const bool same_day = today.tm_yday == local.tm_yday && today.tm_year == local.tm_year;
   char text[64];
-  strftime(text, sizeof(text), sameDay ? "%T" : "%F %T", &local);
+  strftime(text, sizeof(text), same_day ? "%T" : "%F %T", &local);
   return text;
 }
 
@@ -65,21 +65,21 @@ void TellLeft(const std::vector<LevelChange>& left, const TWDbgLogCfg& record) {
   }
 }
 
-int ReportEnd(const GuardResult& result) {
+int ReportEnd(const TemporaryResult& result) {
   switch (result.end) {
-    case GuardEnd::kTimePassed:
+    case TemporaryEnd::kTimePassed:
       Complain("the time is over: the levels are back");
       return kExitDone;
-    case GuardEnd::kInterrupted:
+    case TemporaryEnd::kInterrupted:
       Complain("interrupted: the levels are back");
       // The shell that waits for this program wants to know that it was a signal.
       signal(result.signal, SIG_DFL);
       raise(result.signal);
       return 128 + result.signal;
-    case GuardEnd::kGuardianKilled:
+    case TemporaryEnd::kReverterKilled:
       Complain("the process that counts the time was killed: the levels are back early");
       return kExitWrong;
-    case GuardEnd::kNoGuardian:
+    case TemporaryEnd::kNoReverter:
       Complain("no process can be started that would put the levels back: nothing was changed");
       return kExitWrong;
   }
@@ -96,16 +96,16 @@ bool AssignmentsAreRight(const std::vector<std::string>& assignments) {
   return errors.empty();
 }
 
-int HoldForSpan(TWDbgLogCfg* record, std::vector<LevelChange> changes, const SetOptions& options) {
+int SetForSpan(TWDbgLogCfg* record, std::vector<LevelChange> changes, const SetOptions& options) {
   // What stands at its new level already is not this call's to put back.
-  const auto changesNothing = [](const LevelChange& c) { return c.before == c.after; };
-  changes.erase(std::remove_if(changes.begin(), changes.end(), changesNothing), changes.end());
+  const auto changes_nothing = [](const LevelChange& c) { return c.before == c.after; };
+  changes.erase(std::remove_if(changes.begin(), changes.end(), changes_nothing), changes.end());
   if (changes.empty()) return kExitDone;
-  const GuardResult result = HoldLevels(record, changes, *options.span, [&options] {
+  const TemporaryResult result = SetTemporarily(record, changes, *options.span, [&options] {
     Complain("for " + FormatSpan(*options.span) + ", until " + TimeAfter(*options.span) +
              "; Ctrl-C puts the old levels back at once");
   });
-  if (result.end != GuardEnd::kNoGuardian) TellLeft(result.left, *record);
+  if (result.end != TemporaryEnd::kNoReverter) TellLeft(result.left, *record);
   return ReportEnd(result);
 }
 
@@ -134,7 +134,7 @@ int SetLevels(const SetOptions& options) {
   std::vector<std::string> errors;
   const std::vector<LevelChange> changes = PlanLevels(options.assignments, *record, &errors);
   PrintChanges(changes, options.json);
-  if (options.span) return HoldForSpan(record.get(), changes, options);
+  if (options.span) return SetForSpan(record.get(), changes, options);
   for (const LevelChange& change : changes) record->SetLevel(change.categ, change.after);
   return kExitDone;
 }

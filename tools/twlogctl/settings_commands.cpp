@@ -19,8 +19,8 @@
 
 namespace {
 
-const char* StampText(bool timeScale) {
-  return timeScale ? "milliseconds" : "seconds";
+const char* StampText(bool time_scale) {
+  return time_scale ? "milliseconds" : "seconds";
 }
 
 // One thing in which the record and the file differ.
@@ -38,9 +38,9 @@ std::vector<Difference> Compare(const TWDbgLogCfg& record, const SavedLevels& sa
     differences.push_back(
         {Enum2String(categ), LevelText(record.Level(categ)), LevelText(saved.levels[i])});
   }
-  if (record.TimeScale() != saved.timeScale) {
+  if (record.TimeScale() != saved.time_scale) {
     differences.push_back(
-        {"time stamps", StampText(record.TimeScale()), StampText(saved.timeScale)});
+        {"time stamps", StampText(record.TimeScale()), StampText(saved.time_scale)});
   }
   return differences;
 }
@@ -62,13 +62,13 @@ std::optional<SavedLevels> ReadWholeSettings() {
   return saved;
 }
 
-void PrintDifference(const std::string& name, const char* firstName, const std::string& first,
-                     const char* secondName, const std::string& second) {
+void PrintDifference(const std::string& name, const char* first_name, const std::string& first,
+                     const char* second_name, const std::string& second) {
   Json::Value line;
   line[name == "time stamps" ? "setting" : "category"] =
       name == "time stamps" ? "time_stamps" : name;
-  line[firstName] = first;
-  line[secondName] = second;
+  line[first_name] = first;
+  line[second_name] = second;
   PrintJsonLine(line);
 }
 
@@ -86,13 +86,13 @@ void PrintLoaded(const std::vector<Difference>& changes, bool json) {
 // What the two lines of the file were, so that a save that fails between them can be undone.
 class SavedLines {
  public:
-  SavedLines() : m_levels(Read(kLevelsKey)) {}
+  SavedLines() : levels_(Read(kLevelsKey)) {}
 
   // Results: false when the new levels stay beside the old flag.
   bool PutLevelsBack() const {
-    if (Read(kLevelsKey) == m_levels) return true;
-    return !m_levels.empty() &&
-           QLIBCFileSetKeyValue(kSettingsPath, kLevelsKey, m_levels.c_str(), "%s=\"%s\"\n") == 0;
+    if (Read(kLevelsKey) == levels_) return true;
+    return !levels_.empty() &&
+           QLIBCFileSetKeyValue(kSettingsPath, kLevelsKey, levels_.c_str(), "%s=\"%s\"\n") == 0;
   }
 
  private:
@@ -102,7 +102,7 @@ class SavedLines {
     return value;
   }
 
-  std::string m_levels;
+  std::string levels_;
 };
 
 }  // namespace
@@ -140,7 +140,7 @@ int LoadRecord(bool json) {
   for (size_t i = 0; i < saved->levels.size(); ++i) {
     record->SetLevel(static_cast<LOG_CATEG>(i), saved->levels[i]);
   }
-  record->SetTimeScale(saved->timeScale);
+  record->SetTimeScale(saved->time_scale);
   return kExitDone;
 }
 

@@ -1,4 +1,4 @@
-// The record and the settings file. Each function gives the exit code.
+// The record and the settings file. Each function returns the exit code.
 #ifndef TARNWICK_TOOLS_TWLOGCTL_SETTINGS_COMMANDS_H_
 #define TARNWICK_TOOLS_TWLOGCTL_SETTINGS_COMMANDS_H_
 

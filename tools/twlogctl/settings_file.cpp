@@ -41,7 +41,7 @@ bool Unquote(Value* value, SettingsFault* fault) {
   return true;
 }
 
-// The value behind the "=", when the line is one of `key`.
+// The value after the "=", when the line is one of `key`.
 std::optional<Value> ValueInLine(std::string_view line, std::string_view key) {
   const size_t equals = line.find('=');
   const size_t start = line.find_first_not_of(kBlanks);
@@ -98,27 +98,13 @@ bool ParseLevels(const Value& value, std::vector<int>* levels, SettingsFault* fa
   }
 }
 
-bool ParseTimeScale(const Value& value, bool* timeScale, SettingsFault* fault) {
+bool ParseTimeScale(const Value& value, bool* time_scale, SettingsFault* fault) {
   if (value.text != "yes" && value.text != "no") {
     const std::string found = "\"" + EscapeControls(value.text) + "\"";
     return Fail(value, 0, found + " is neither \"yes\" nor \"no\"", fault);
   }
-  *timeScale = value.text == "yes";
+  *time_scale = value.text == "yes";
   return true;
-}
-
-bool ReadAll(int fd, std::string* text) {
-  char piece[4096];
-  for (;;) {
-    const ssize_t count = read(fd, piece, sizeof(piece));
-    if (count == 0) return true;
-    if (count == -1 && errno == EINTR) continue;
-    if (count == -1) return false;
-    text->append(piece, static_cast<size_t>(count));
-    if (text->size() <= kLongestFile) continue;
-    errno = EFBIG;
-    return false;
-  }
 }
 
 }  // namespace
@@ -131,17 +117,17 @@ std::string SettingsFault::Describe() const {
 
 bool ParseSettings(std::string_view text, SavedLevels* saved, SettingsFault* fault) {
   Value levels;
-  Value timeScale;
+  Value time_scale;
   return FindValue(text, kLevelsKey, &levels, fault) &&
          ParseLevels(levels, &saved->levels, fault) &&
-         FindValue(text, kTimeScaleKey, &timeScale, fault) &&
-         ParseTimeScale(timeScale, &saved->timeScale, fault);
+         FindValue(text, kTimeScaleKey, &time_scale, fault) &&
+         ParseTimeScale(time_scale, &saved->time_scale, fault);
 }
 
 SettingsState ReadSettings(SavedLevels* saved, SettingsFault* fault) {
   const tarnwick::UniqueFd fd = OpenRegularFile(kSettingsPath);
   std::string text;
-  if (!fd.Valid() || !ReadAll(fd.Get(), &text)) {
+  if (!fd.Valid() || !ReadAll(fd.Get(), kLongestFile, &text)) {
     const int error = errno;
     *fault = {0, 0, strerror(error)};
     return error == ENOENT ? SettingsState::kMissing : SettingsState::kUnreadable;

@@ -13,7 +13,7 @@ constexpr char kTimeScaleKey[] = "tw_dbglog_time_scale";
 
 struct SavedLevels {
   std::vector<int> levels;  // of the first categories; all 74 in a file that was saved whole
-  bool timeScale = false;
+  bool time_scale = false;
 };
 
 // What is wrong with a file, with line and column from 1 on; a line of 0 is the file as a whole.

@@ -20,18 +20,18 @@ struct ShowOptions : LogOptions {
 // Counts what was shown, because nothing found is a result of its own.
 class Shower {
  public:
-  explicit Shower(const LogOptions& options) : m_printer(options.json, options.mark) {}
+  explicit Shower(const LogOptions& options) : printer_(options.json, options.mark) {}
 
   void Show(const LogMessage& message) {
-    m_printer.Print(message);
-    m_found = true;
+    printer_.Print(message);
+    found_ = true;
   }
-  bool Found() const { return m_found; }
-  bool Flush() { return m_printer.Flush(); }
+  bool Found() const { return found_; }
+  bool Flush() { return printer_.Flush(); }
 
  private:
-  LogPrinter m_printer;
-  bool m_found = false;
+  LogPrinter printer_;
+  bool found_ = false;
 };
 
 int Show(const ShowOptions& options) {
@@ -55,7 +55,7 @@ int Show(const ShowOptions& options) {
 
 }  // namespace
 
-void AddShow(CLI::App* app, int* exitCode) {
+void AddShow(CLI::App* app, int* exit_code) {
   auto options = std::make_shared<ShowOptions>();
   CLI::App* show = app->add_subcommand("show", "Show the messages of a log.");
   AddSourceOptions(show, options.get());
@@ -66,5 +66,5 @@ void AddShow(CLI::App* app, int* exitCode) {
   show->add_option("-n,--lines", options->count, "Show the last messages only, so many of them.")
       ->check(IsWholeNumber)
       ->type_name("COUNT");
-  show->callback([=] { *exitCode = Show(*options); });
+  show->callback([=] { *exit_code = Show(*options); });
 }

@@ -12,8 +12,8 @@
 #include <memory>
 #include <optional>
 
-#include "tools/common/amounts.h"
 #include "tools/common/terminal.h"
+#include "tools/common/units.h"
 #include "tools/twlogctl/commands.h"
 #include "tools/twlogctl/log_options.h"
 #include "tools/twlogctl/log_plot.h"
@@ -64,9 +64,9 @@ StatsReport ReportOf(const LogCounter& counter, const LogFilter& filter,
   const Moment last = std::chrono::floor<seconds>(counter.Last().value_or(now)) + seconds(1);
   StatsReport report;
   report.source = LogPath(options);
-  report.ownProcesses = options.file.empty();
+  report.own_processes = options.file.empty();
   report.amounts = counter.Amounts();
-  report.linesBySecond = counter.LinesBySecond();
+  report.lines_by_second = counter.LinesBySecond();
   report.begin = filter.since.value_or(first);
   report.end = filter.until.value_or(filter.since && options.file.empty() ? now : last);
   report.end = std::max(report.end, report.begin + seconds(1));
@@ -93,12 +93,12 @@ int CountOnce(const StatsOptions& options) {
 class StatsWatch {
  public:
   StatsWatch(const StatsOptions& options, milliseconds interval)
-      : m_options(options),
-        m_interval(interval),
-        m_selector(MakeFilter(options, Now(), Direction::kAhead), Now(), false),
-        m_tail(FollowedPath(options)),
-        m_counter(WindowOf(m_selector.Filter())) {
-    m_selector.Filter().since = Now() - m_counter.Window();
+      : options_(options),
+        interval_(interval),
+        selector_(MakeFilter(options, Now(), Direction::kAhead), Now(), false),
+        tail_(FollowedPath(options)),
+        counter_(WindowOf(selector_.Filter())) {
+    selector_.Filter().since = Now() - counter_.Window();
   }
 
   int Run();
@@ -110,11 +110,11 @@ class StatsWatch {
   void PrintScreen(const StatsReport& report);
   void TakeUntil(Moment next);
 
-  const StatsOptions& m_options;
-  milliseconds m_interval;
-  LogSelector m_selector;
-  LogTail m_tail;
-  SlidingCounter m_counter;
+  const StatsOptions& options_;
+  milliseconds interval_;
+  LogSelector selector_;
+  LogTail tail_;
+  SlidingCounter counter_;
 };
 
 seconds StatsWatch::WindowOf(const LogFilter& filter) {
@@ -125,14 +125,13 @@ seconds StatsWatch::WindowOf(const LogFilter& filter) {
 // `all` takes the last message too, for which further lines may come.
 void StatsWatch::Take(bool all) {
   const Moment now = Now();
-  m_selector.Advance(now);
+  selector_.Advance(now);
   const auto take = [&](std::string_view text, bool continues) {
-    m_selector.Take(text, continues,
-                    [&](const LogMessage& message) { m_counter.Add(message, now); });
+    selector_.Take(text, continues, [&](const LogMessage& message) { counter_.Add(message, now); });
   };
-  m_tail.Poll(take);
-  if (all) m_tail.Flush(take);
-  m_counter.Advance(now);
+  tail_.Poll(take);
+  if (all) tail_.Flush(take);
+  counter_.Advance(now);
 }
 
 // Each report overwrites the one before; what does not fit would scroll.
@@ -140,7 +139,7 @@ void StatsWatch::PrintScreen(const StatsReport& report) {
   struct winsize size = {};
   const bool known = ioctl(STDOUT_FILENO, TIOCGWINSZ, &size) == 0 && size.ws_row > 0;
   const size_t height = known ? size.ws_row : 24;
-  StatsLayout layout = LayoutFor(m_options);
+  StatsLayout layout = LayoutFor(options_);
   // Twelve lines are not of the three tables.
   layout.most = std::min(layout.most, height > 15 ? (height - 13) / 3 : 1);
   std::vector<std::string> lines = StatsLines(report, layout);
@@ -152,37 +151,37 @@ void StatsWatch::PrintScreen(const StatsReport& report) {
 
 bool StatsWatch::PrintNow() {
   StatsReport report;
-  report.source = LogPath(m_options);
-  report.ownProcesses = m_options.file.empty();
+  report.source = LogPath(options_);
+  report.own_processes = options_.file.empty();
   report.end = Now();
-  report.begin = report.end - m_counter.Window();
-  report.amounts = m_counter.Amounts();
-  report.linesBySecond = m_counter.LinesBySecond();
+  report.begin = report.end - counter_.Window();
+  report.amounts = counter_.Amounts();
+  report.lines_by_second = counter_.LinesBySecond();
   const char* terminal = std::getenv("TERM");
   const bool dumb = terminal == nullptr || std::strcmp(terminal, "dumb") == 0;
-  if (m_options.json || dumb || !IsTerminal(STDOUT_FILENO)) return Print(report, m_options);
+  if (options_.json || dumb || !IsTerminal(STDOUT_FILENO)) return Print(report, options_);
   PrintScreen(report);
   return FlushOutput();
 }
 
 void StatsWatch::TakeUntil(Moment next) {
   for (Moment now = Now(); now < next; now = Now()) {
-    WaitForLog(m_tail.Descriptor(), std::min(m_tail.Patience(), milliseconds(next - now)));
+    WaitForLog(tail_.Descriptor(), std::min(tail_.Patience(), milliseconds(next - now)));
     Take(false);
   }
 }
 
 int StatsWatch::Run() {
   Take(true);
-  if (m_tail.Error() != 0 && m_tail.Error() != ENOENT) {
-    Complain(LogPath(m_options) + ": " + std::strerror(m_tail.Error()));
+  if (tail_.Error() != 0 && tail_.Error() != ENOENT) {
+    Complain(LogPath(options_) + ": " + std::strerror(tail_.Error()));
     return kExitWrong;
   }
-  if (!m_options.json && IsTerminal(STDOUT_FILENO)) fputs("\x1b[2J", stdout);
+  if (!options_.json && IsTerminal(STDOUT_FILENO)) fputs("\x1b[2J", stdout);
   while (PrintNow()) {
-    const std::optional<Moment> until = m_selector.Filter().until;
+    const std::optional<Moment> until = selector_.Filter().until;
     if (until && Now() >= *until) return kExitDone;
-    Moment next = Now() + m_interval;
+    Moment next = Now() + interval_;
     if (until) next = std::min(next, *until);
     TakeUntil(next);
   }
@@ -203,7 +202,7 @@ int Stats(const StatsOptions& options) {
 
 }  // namespace
 
-void AddStats(CLI::App* app, int* exitCode) {
+void AddStats(CLI::App* app, int* exit_code) {
   auto options = std::make_shared<StatsOptions>();
   CLI::App* stats =
       app->add_subcommand("stats", "Count lines and bytes by category, level and process.");
@@ -224,6 +223,6 @@ void AddStats(CLI::App* app, int* exitCode) {
                     ->type_name("SPAN");
   stats->callback([=] {
     options->watch = watch->count() > 0;
-    *exitCode = Stats(*options);
+    *exit_code = Stats(*options);
   });
 }

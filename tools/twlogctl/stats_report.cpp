@@ -6,9 +6,9 @@
 #include <cstdio>
 #include <cstdlib>
 
-#include "tools/common/amounts.h"
 #include "tools/common/json_output.h"
 #include "tools/common/terminal.h"
+#include "tools/common/units.h"
 #include "tools/twlogctl/log_plot.h"
 #include "tools/twlogctl/processes.h"
 
@@ -27,7 +27,7 @@ double Seconds(const StatsReport& report) {
 // The name of a process that still runs: its number may be another one's by now, which the manual
 // page says.
 std::string CommandOf(const StatsReport& report, const std::string& pid) {
-  if (!report.ownProcesses || pid.empty()) return "";
+  if (!report.own_processes || pid.empty()) return "";
   const auto process = ReadProcess(static_cast<pid_t>(std::strtol(pid.c_str(), nullptr, 10)));
   return process ? process->name : "";
 }
@@ -46,7 +46,7 @@ std::string Row(const std::string& name, const LogAmount& amount, double seconds
 // The bars compare the lines of one kind.
 void AddTable(const StatsReport& report, const StatsLayout& layout, const std::string& title,
               const NamedAmounts& amounts, std::vector<std::string>* lines) {
-  lines->push_back(Paint(Colour::kBold, title, layout.colour));
+  lines->push_back(InColour(Colour::kBold, title, layout.colour));
   const auto sorted = LoudestFirst(amounts);
   for (size_t i = 0; i < sorted.size() && i < layout.most; ++i) {
     const auto& [name, amount] = sorted[i];
@@ -57,9 +57,9 @@ void AddTable(const StatsReport& report, const StatsLayout& layout, const std::s
     const double part = static_cast<double>(amount.lines) /
                         static_cast<double>(std::max<uint64_t>(sorted[0].second.lines, 1));
     if (layout.width > kTableWidth + 10) {
-      row +=
-          " " + Paint(Colour::kCyan, PlotBar(part, layout.width - kTableWidth - 3, layout.blocks),
-                      layout.colour);
+      row += " " + InColour(Colour::kCyan,
+                            PlotBar(part, layout.width - kTableWidth - 3, layout.blocks),
+                            layout.colour);
     }
     lines->push_back(row);
   }
@@ -70,13 +70,13 @@ void AddPlot(const StatsReport& report, const StatsLayout& layout,
   const int64_t begin = SecondOf(report.begin);
   const int64_t end = std::max(SecondOf(report.end - std::chrono::milliseconds(1)), begin) + 1;
   const std::vector<double> values =
-      PlotColumns(report.linesBySecond, begin, end, std::max<size_t>(layout.width - 2, 10));
+      PlotColumns(report.lines_by_second, begin, end, std::max<size_t>(layout.width - 2, 10));
   char title[96];
   snprintf(title, sizeof(title), "lines a second, at most %.2f",
            *std::max_element(values.begin(), values.end()));
-  lines->push_back(Paint(Colour::kBold, title, layout.colour));
+  lines->push_back(InColour(Colour::kBold, title, layout.colour));
   for (const std::string& row : PlotRows(values, kPlotRows, layout.blocks)) {
-    lines->push_back(" " + Paint(Colour::kCyan, row, layout.colour));
+    lines->push_back(" " + InColour(Colour::kCyan, row, layout.colour));
   }
   const std::string first = FormatClock(report.begin);
   const std::string last = FormatClock(report.end);
@@ -112,7 +112,7 @@ std::vector<std::string> StatsLines(const StatsReport& report, const StatsLayout
   char heading[128];
   snprintf(heading, sizeof(heading), "%-*s%10s %10s %12s", static_cast<int>(kNameWidth), "",
            "lines", "lines/s", "bytes/s");
-  lines.push_back(Paint(Colour::kBold, heading, layout.colour));
+  lines.push_back(InColour(Colour::kBold, heading, layout.colour));
   lines.push_back(Row("all", report.amounts.all, Seconds(report)));
   AddTable(report, layout, "category", report.amounts.categories, &lines);
   AddTable(report, layout, "level", report.amounts.levels, &lines);

@@ -14,8 +14,8 @@ struct StatsReport {
   Moment begin;
   Moment end;
   LogAmounts amounts;
-  std::map<int64_t, uint64_t> linesBySecond;
-  bool ownProcesses = false;  // the processes may still run, and have names then
+  std::map<int64_t, uint64_t> lines_by_second;
+  bool own_processes = false;  // the processes may still run, and have names then
 };
 
 struct StatsLayout {

@@ -35,7 +35,7 @@ std::vector<std::pair<std::string, int>> LevelsOf(const TWDbgLogCfg& record, boo
 Json::Value ProcessesJson(const RecordSegment& segment) {
   Json::Value list(Json::arrayValue);
   for (const LibraryUser& user : LibraryUsers(segment.id)) {
-    if (!user.hasRecord) continue;
+    if (!user.has_record) continue;
     Json::Value process;
     process["pid"] = static_cast<Json::Int64>(user.process.pid);
     process["name"] = user.process.name;
@@ -90,7 +90,7 @@ void PrintLevels(const TWDbgLogCfg& record, bool all) {
   const auto levels = LevelsOf(record, all);
   const size_t others = LOG_CATEG_COUNT - levels.size();
   for (const auto& [name, level] : levels) {
-    printf("%-15s%s\n", name.c_str(), Paint(ColourOf(level), LevelWords(level), colour).c_str());
+    printf("%-15s%s\n", name.c_str(), InColour(ColourOf(level), LevelWords(level), colour).c_str());
   }
   if (others > 0) printf("%zu %s at notice\n", others, others == 1 ? "category" : "categories");
 }

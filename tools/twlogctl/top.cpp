@@ -29,11 +29,11 @@ constexpr milliseconds kFrame(100);
 class Top {
  public:
   Top(std::string path, TopTerminal* terminal, TopSignals* signals)
-      : m_path(std::move(path)),
-        m_terminal(terminal),
-        m_signals(signals),
-        m_selector(LogFilter(), Now(), false),
-        m_tail(m_path) {}
+      : path_(std::move(path)),
+        terminal_(terminal),
+        signals_(signals),
+        selector_(LogFilter(), Now(), false),
+        tail_(path_) {}
 
   // Results: the signal that ended it, or 0.
   int Run();
@@ -45,43 +45,43 @@ class Top {
   int TakeSignals();
   short Wait();
 
-  std::string m_path;
-  TopTerminal* m_terminal;
-  TopSignals* m_signals;
-  LogSelector m_selector;
-  LogTail m_tail;
-  TopModel m_model;
-  Clock::time_point m_read;
-  bool m_due = true;  // the log is to be looked at
+  std::string path_;
+  TopTerminal* terminal_;
+  TopSignals* signals_;
+  LogSelector selector_;
+  LogTail tail_;
+  TopModel model_;
+  Clock::time_point read_;
+  bool due_ = true;  // the log is to be looked at
 };
 
 void Top::Read() {
   const Moment now = Now();
-  m_selector.Advance(now);
-  m_tail.Poll([&](std::string_view text, bool continues) {
-    m_selector.Take(text, continues, [&](const LogMessage& message) { m_model.Add(message, now); });
+  selector_.Advance(now);
+  tail_.Poll([&](std::string_view text, bool continues) {
+    selector_.Take(text, continues, [&](const LogMessage& message) { model_.Add(message, now); });
   });
-  m_model.Refresh(now);
-  m_read = Clock::now();
+  model_.Refresh(now);
+  read_ = Clock::now();
 }
 
 void Top::Draw() {
-  const int error = m_tail.Error();
-  DrawTop(m_model, error == 0 ? m_path : m_path + ": " + std::strerror(error));
+  const int error = tail_.Error();
+  DrawTop(model_, error == 0 ? path_ : path_ + ": " + std::strerror(error));
 }
 
 bool Top::TakeKeys() {
-  for (TopKey key = TopKey::kNone; m_terminal->TakeKey(&key);) {
-    if (!m_model.Press(key, CategoryRows())) return false;
+  for (TopKey key = TopKey::kNone; terminal_->TakeKey(&key);) {
+    if (!model_.Press(key, CategoryRows())) return false;
   }
   return true;
 }
 
 // Results: a signal to end by, or 0.
 int Top::TakeSignals() {
-  for (int signal = m_signals->Take(); signal != 0; signal = m_signals->Take()) {
+  for (int signal = signals_->Take(); signal != 0; signal = signals_->Take()) {
     if (signal != SIGWINCH) return signal;
-    m_terminal->Resize();
+    terminal_->Resize();
   }
   return 0;
 }
@@ -89,20 +89,20 @@ int Top::TakeSignals() {
 // Keys and signals count at once; the log is looked at once a frame at most. Results: what poll
 // says of the keyboard.
 short Top::Wait() {
-  const auto since = std::chrono::duration_cast<milliseconds>(Clock::now() - m_read);
+  const auto since = std::chrono::duration_cast<milliseconds>(Clock::now() - read_);
   const bool early = since < kFrame;
-  const milliseconds left = (early ? kFrame : m_tail.Patience()) - since;
+  const milliseconds left = (early ? kFrame : tail_.Patience()) - since;
   struct pollfd fds[] = {{STDIN_FILENO, POLLIN, 0},
-                         {m_signals->Descriptor(), POLLIN, 0},
-                         {early ? -1 : m_tail.Descriptor(), POLLIN, 0}};
+                         {signals_->Descriptor(), POLLIN, 0},
+                         {early ? -1 : tail_.Descriptor(), POLLIN, 0}};
   const int ready = poll(fds, 3, static_cast<int>(std::max(left, milliseconds(0)).count()));
-  m_due = !early && (ready == 0 || fds[2].revents != 0);
+  due_ = !early && (ready == 0 || fds[2].revents != 0);
   return fds[0].revents;
 }
 
 int Top::Run() {
   for (;;) {
-    if (m_due) Read();
+    if (due_) Read();
     Draw();
     const short keyboard = Wait();
     if (const int signal = TakeSignals()) return signal;
@@ -132,10 +132,10 @@ int RunTop(const std::string& path) {
 
 }  // namespace
 
-void AddTop(CLI::App* app, int* exitCode) {
+void AddTop(CLI::App* app, int* exit_code) {
   auto options = std::make_shared<LogOptions>();
   CLI::App* top =
       app->add_subcommand("top", "Show levels and log on the screen, and change levels.");
   AddSourceOptions(top, options.get());
-  top->callback([=] { *exitCode = RunTop(FollowedPath(*options)); });
+  top->callback([=] { *exit_code = RunTop(FollowedPath(*options)); });
 }

@@ -20,9 +20,9 @@ LogAmount AmountIn(const NamedAmounts& amounts, LOG_CATEG category) {
 
 }  // namespace
 
-TopModel::TopModel() : m_recent(kRateSpan) {
+TopModel::TopModel() : recent_(kRateSpan) {
   for (int category = 0; category < LOG_CATEG_COUNT; ++category) {
-    m_order.push_back(static_cast<LOG_CATEG>(category));
+    order_.push_back(static_cast<LOG_CATEG>(category));
   }
 }
 
@@ -31,53 +31,53 @@ std::chrono::seconds TopModel::RateSpan() {
 }
 
 void TopModel::Add(const LogMessage& message, Moment now) {
-  m_recent.Add(message, now);
+  recent_.Add(message, now);
   const LogLine* begin = message.line;
   const auto category = ParseCategory(begin != nullptr ? begin->category : "");
-  if (category) m_lines[*category] += AmountOf(message).lines;
+  if (category) lines_[*category] += AmountOf(message).lines;
   const std::string name(begin != nullptr ? begin->category : "");
   const int level = begin != nullptr ? LevelNumber(begin->level) : -1;
   for (std::string_view rest = message.text; !rest.empty();) {
     const std::string_view line = rest.substr(0, rest.find('\n'));
-    m_log.push_back({EscapeControls(line), level, name, m_logged++});
-    if (m_log.size() > kKeptLines) m_log.pop_front();
+    log_.push_back({EscapeControls(line), level, name, logged_++});
+    if (log_.size() > kKeptLines) log_.pop_front();
     rest.remove_prefix(std::min(rest.size(), line.size() + 1));
   }
 }
 
 void TopModel::Refresh(Moment now) {
-  m_record.Refresh();
-  m_recent.Advance(now);
-  m_amounts = m_recent.Amounts();
-  if (m_sorted) Sort();
+  record_.Refresh();
+  recent_.Advance(now);
+  amounts_ = recent_.Amounts();
+  if (sorted_) Sort();
 }
 
 LogAmount TopModel::Total() const {
-  return m_amounts.all;
+  return amounts_.all;
 }
 
 std::vector<TopModel::Row> TopModel::Rows() const {
   std::vector<Row> rows;
-  for (const LOG_CATEG category : m_order) {
-    rows.push_back({category, m_record.Level(category), AmountIn(m_amounts.categories, category),
-                    m_lines[category]});
+  for (const LOG_CATEG category : order_) {
+    rows.push_back({category, record_.Level(category), AmountIn(amounts_.categories, category),
+                    lines_[category]});
   }
   return rows;
 }
 
 std::string TopModel::Only() const {
-  return m_only ? Enum2String(m_order[m_selected]) : "";
+  return only_ ? Enum2String(order_[selected_]) : "";
 }
 
 const std::string& TopModel::Note() const {
-  return m_refusal.empty() ? m_record.Note() : m_refusal;
+  return refusal_.empty() ? record_.Note() : refusal_;
 }
 
 std::vector<const TopModel::Line*> TopModel::LastLines(size_t count) const {
   const std::string only = Only();
   std::vector<const Line*> lines;
-  for (auto line = m_log.rbegin(); line != m_log.rend() && lines.size() < count; ++line) {
-    if (m_held && line->number >= m_heldAt) continue;
+  for (auto line = log_.rbegin(); line != log_.rend() && lines.size() < count; ++line) {
+    if (held_ && line->number >= held_at_) continue;
     if (only.empty() || line->category == only) lines.push_back(&*line);
   }
   std::reverse(lines.begin(), lines.end());
@@ -85,35 +85,35 @@ std::vector<const TopModel::Line*> TopModel::LastLines(size_t count) const {
 }
 
 void TopModel::Select(LOG_CATEG category) {
-  m_selected =
-      static_cast<size_t>(std::find(m_order.begin(), m_order.end(), category) - m_order.begin());
+  selected_ =
+      static_cast<size_t>(std::find(order_.begin(), order_.end(), category) - order_.begin());
 }
 
 // The selection stays on its category, and the categories that are silent in their order.
 void TopModel::Sort() {
-  const LOG_CATEG selected = m_order[m_selected];
-  std::sort(m_order.begin(), m_order.end());
-  if (m_sorted) {
-    std::stable_sort(m_order.begin(), m_order.end(), [this](LOG_CATEG a, LOG_CATEG b) {
-      return AmountIn(m_amounts.categories, a).lines > AmountIn(m_amounts.categories, b).lines;
+  const LOG_CATEG selected = order_[selected_];
+  std::sort(order_.begin(), order_.end());
+  if (sorted_) {
+    std::stable_sort(order_.begin(), order_.end(), [this](LOG_CATEG a, LOG_CATEG b) {
+      return AmountIn(amounts_.categories, a).lines > AmountIn(amounts_.categories, b).lines;
     });
   }
   Select(selected);
 }
 
 void TopModel::Move(int64_t rows) {
-  const auto last = static_cast<int64_t>(m_order.size()) - 1;
-  m_selected =
-      static_cast<size_t>(std::clamp<int64_t>(static_cast<int64_t>(m_selected) + rows, 0, last));
+  const auto last = static_cast<int64_t>(order_.size()) - 1;
+  selected_ =
+      static_cast<size_t>(std::clamp<int64_t>(static_cast<int64_t>(selected_) + rows, 0, last));
 }
 
 void TopModel::SetLevel(int level) {
-  if (!m_record.SetLevel(m_order[m_selected], level)) m_refusal = "refused: " + m_record.Note();
+  if (!record_.SetLevel(order_[selected_], level)) refusal_ = "refused: " + record_.Note();
 }
 
 // A record may hold numbers that are no level; the first key brings them back among the levels.
 void TopModel::ChangeLevel(int change) {
-  const int level = m_record.Level(m_order[m_selected]) + change;
+  const int level = record_.Level(order_[selected_]) + change;
   SetLevel(std::clamp<int>(level, LOG_LEVEL_ALARM, LOG_LEVEL_DEBUG3));
 }
 
@@ -149,23 +149,23 @@ bool TopModel::PressChanging(TopKey key) {
 
 void TopModel::PressViewing(TopKey key) {
   if (key == TopKey::kSort) {
-    m_sorted = !m_sorted;
+    sorted_ = !sorted_;
     Sort();
   } else if (key == TopKey::kOnly) {
-    m_only = !m_only;
+    only_ = !only_;
   } else if (key == TopKey::kHold) {
-    m_held = !m_held;
-    m_heldAt = m_logged;
+    held_ = !held_;
+    held_at_ = logged_;
   } else if (key == TopKey::kHelp) {
-    m_help = true;
+    help_ = true;
   }
 }
 
 bool TopModel::Press(TopKey key, size_t page) {
   if (key == TopKey::kNone) return true;
-  m_refusal.clear();
-  if (m_help) {
-    m_help = false;
+  refusal_.clear();
+  if (help_) {
+    help_ = false;
     return true;
   }
   if (key == TopKey::kLeave) return false;

@@ -62,10 +62,10 @@ class TopModel {
   // The last lines of the log, `count` at most, the oldest first.
   std::vector<const Line*> LastLines(size_t count) const;
 
-  size_t Selected() const { return m_selected; }
-  bool Sorted() const { return m_sorted; }
-  bool Held() const { return m_held; }
-  bool Help() const { return m_help; }
+  size_t Selected() const { return selected_; }
+  bool Sorted() const { return sorted_; }
+  bool Held() const { return held_; }
+  bool Help() const { return help_; }
 
   // The only category whose lines are shown; empty for all.
   std::string Only() const;
@@ -83,20 +83,20 @@ class TopModel {
   void Sort();
   void Select(LOG_CATEG category);
 
-  TopRecord m_record;
-  SlidingCounter m_recent;
-  LogAmounts m_amounts;  // of m_recent
-  std::array<uint64_t, LOG_CATEG_COUNT> m_lines = {};
-  std::vector<LOG_CATEG> m_order;
-  size_t m_selected = 0;  // in m_order
-  std::deque<Line> m_log;
-  uint64_t m_logged = 0;
-  uint64_t m_heldAt = 0;
-  std::string m_refusal;
-  bool m_sorted = false;
-  bool m_held = false;
-  bool m_help = false;
-  bool m_only = false;
+  TopRecord record_;
+  SlidingCounter recent_;
+  LogAmounts amounts_;  // of recent_
+  std::array<uint64_t, LOG_CATEG_COUNT> lines_ = {};
+  std::vector<LOG_CATEG> order_;
+  size_t selected_ = 0;  // in order_
+  std::deque<Line> log_;
+  uint64_t logged_ = 0;
+  uint64_t held_at_ = 0;
+  std::string refusal_;
+  bool sorted_ = false;
+  bool held_ = false;
+  bool help_ = false;
+  bool only_ = false;
 };
 
 #endif  // TARNWICK_TOOLS_TWLOGCTL_TOP_MODEL_H_

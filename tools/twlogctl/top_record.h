@@ -19,15 +19,13 @@ class TopRecord {
   bool SetLevel(LOG_CATEG category, int level);
 
   // How it stands, in a few words.
-  const std::string& Note() const { return m_note; }
+  const std::string& Note() const { return note_; }
 
  private:
-  bool Attach(int id, int flags);
-
-  AttachedRecord m_record;
-  int m_id = -1;
-  bool m_writable = false;
-  std::string m_note;
+  AttachedRecord record_;
+  int id_ = -1;
+  bool writable_ = false;
+  std::string note_;
 };
 
 #endif  // TARNWICK_TOOLS_TWLOGCTL_TOP_RECORD_H_

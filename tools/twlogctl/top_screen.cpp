@@ -6,8 +6,8 @@
 #include <cstdio>
 #include <cwchar>
 
-#include "tools/common/amounts.h"
 #include "tools/common/terminal.h"
+#include "tools/common/units.h"
 #include "tools/twlogctl/report.h"
 
 namespace {

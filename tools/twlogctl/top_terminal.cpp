@@ -69,12 +69,12 @@ bool MovesTheCursor() {
 
 }  // namespace
 
-TopSignals::TopSignals() : m_fd(OpenSignals()) {}
+TopSignals::TopSignals() : fd_(OpenSignals()) {}
 
 int TopSignals::Take() {
   struct signalfd_siginfo info;
-  return read(m_fd.Get(), &info, sizeof(info)) == sizeof(info) ? static_cast<int>(info.ssi_signo)
-                                                               : 0;
+  return read(fd_.Get(), &info, sizeof(info)) == sizeof(info) ? static_cast<int>(info.ssi_signo)
+                                                              : 0;
 }
 
 void TopSignals::EndBy(int signal) {
@@ -92,7 +92,7 @@ bool TopTerminal::Open() {
   // Not initscr, which ends the program when it fails.
   SCREEN* const screen = newterm(nullptr, stdout, stdin);
   if (screen == nullptr) return false;
-  m_screen = screen;
+  screen_ = screen;
   cbreak();
   noecho();
   nonl();
@@ -106,9 +106,9 @@ bool TopTerminal::Open() {
 }
 
 TopTerminal::~TopTerminal() {
-  if (m_screen == nullptr) return;
+  if (screen_ == nullptr) return;
   endwin();
-  delscreen(static_cast<SCREEN*>(m_screen));
+  delscreen(static_cast<SCREEN*>(screen_));
 }
 
 void TopTerminal::Resize() {

@@ -14,7 +14,7 @@ class TopSignals {
  public:
   TopSignals();
 
-  int Descriptor() const { return m_fd.Get(); }
+  int Descriptor() const { return fd_.Get(); }
 
   // Results: the next signal that came; 0 when there is none.
   int Take();
@@ -23,7 +23,7 @@ class TopSignals {
   static void EndBy(int signal);
 
  private:
-  tarnwick::UniqueFd m_fd;
+  tarnwick::UniqueFd fd_;
 };
 
 // The screen, put back as it was when this goes.
@@ -45,7 +45,7 @@ class TopTerminal {
   bool TakeKey(TopKey* key);
 
  private:
-  void* m_screen = nullptr;
+  void* screen_ = nullptr;
 };
 
 #endif  // TARNWICK_TOOLS_TWLOGCTL_TOP_TERMINAL_H_

@@ -36,19 +36,19 @@ void TellWhenLocked(const char* path) {
   Complain(std::string("waits for the lock of ") + path + "; \"twlogctl doctor\" tells who has it");
 }
 
-// The log's end before a line is written, so that the line can be looked for behind it. The library
+// The log's end before a line is written, so that the line can be looked for after it. The library
 // does not say whether it has written one.
 class LogEnd {
  public:
-  explicit LogEnd(const char* path) : m_path(path) { m_known = stat(path, &m_state) == 0; }
+  explicit LogEnd(const char* path) : path_(path) { known_ = stat(path, &state_) == 0; }
 
   // A rotation in between leaves the line in the new file, or in the old one under another name.
   bool Has(const std::string& line) const {
-    const tarnwick::UniqueFd fd = OpenRegularFile(m_path);
+    const tarnwick::UniqueFd fd = OpenRegularFile(path_);
     struct stat now = {};
     if (!fd.Valid() || fstat(fd.Get(), &now) != 0) return false;
-    const bool sameFile = m_known && now.st_ino == m_state.st_ino && now.st_dev == m_state.st_dev;
-    const off_t start = sameFile && now.st_size >= m_state.st_size ? m_state.st_size : 0;
+    const bool same_file = known_ && now.st_ino == state_.st_ino && now.st_dev == state_.st_dev;
+    const off_t start = same_file && now.st_size >= state_.st_size ? state_.st_size : 0;
     return ReadFrom(fd.Get(), start).find(line) != std::string::npos;
   }
 
@@ -64,9 +64,9 @@ class LogEnd {
     return text;
   }
 
-  const char* m_path;
-  struct stat m_state = {};
-  bool m_known = false;
+  const char* path_;
+  struct stat state_ = {};
+  bool known_ = false;
 };
 
 // Results: false when the line is not in the log afterwards.
@@ -114,8 +114,8 @@ int WriteText(const WriteOptions& options) {
   // An empty text is a line as well.
   std::istringstream text(options.text.empty() ? "\n" : options.text);
   unsigned written = 0;
-  const bool fromInput = options.text == "-";
-  const bool done = WriteLines(options, fromInput ? std::cin : text, &written);
+  const bool from_input = options.text == "-";
+  const bool done = WriteLines(options, from_input ? std::cin : text, &written);
   if (options.json) {
     Json::Value line;
     line["written"] = written;

@@ -1,5 +1,5 @@
 #!/bin/sh
-# A reply with 100 header lines of its own.
+# A response with 100 header lines of its own.
 text=finished
 i=0
 while [ "$i" -lt 100 ]; do

@@ -1,6 +1,6 @@
 #!/usr/bin/perl
 # Twenty lines, each sent on its own, without a length: the server sends chunks to a client of
-# HTTP/1.1 and closes behind the last line for one of HTTP/1.0.
+# HTTP/1.1 and closes after the last line for one of HTTP/1.0.
 use strict;
 use warnings;
 

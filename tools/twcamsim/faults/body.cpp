@@ -1,4 +1,4 @@
-// Faults of what the answer says.
+// Faults of what the response says.
 #include <fmt/format.h>
 
 #include "tools/twcamsim/faults.h"
@@ -73,8 +73,8 @@ void BigBody(Response* response, const FaultContext& context) {
   SetJson(response, "{\"success\":true,\"filler\":\"" + std::string(size, 'x') + "\"}");
 }
 
-void ExtraBytes(Wire* wire, const FaultContext&) {
-  wire->push_back({Action::kSend, Part::kBody, "HTTP/1.1 200 OK\r\nX-Extra: 1\r\n\r\n", {}});
+void ExtraBytes(Steps* steps, const FaultContext&) {
+  steps->push_back({Action::kSend, Part::kBody, "HTTP/1.1 200 OK\r\nX-Extra: 1\r\n\r\n", {}});
 }
 
 std::vector<FaultType> XmlFaults() {
@@ -87,7 +87,7 @@ std::vector<FaultType> XmlFaults() {
            [](Response* response, const FaultContext&) {
              SetXml(response, "<?xml version=\"1.0\"?>\n<reply><preset>7</reply>\n");
            }),
-      Make("html-page", "a page for people, in place of the answer",
+      Make("html-page", "a page for people, in place of the response",
            [](Response* response, const FaultContext&) {
              SetBody(response, "text/html",
                      "<!doctype html><html><head><title>Camera</title><body><p>Please log in<br>");
@@ -123,7 +123,7 @@ std::vector<FaultType> JsonFaults() {
 
 std::vector<FaultType> ByteFaults() {
   return {
-      Make("empty-body", "an answer without a body",
+      Make("empty-body", "a response without a body",
            [](Response* response, const FaultContext&) {
              response->body.clear();
              response->more = nullptr;
@@ -133,7 +133,7 @@ std::vector<FaultType> ByteFaults() {
            [](Response* response, const FaultContext&) {
              response->body.insert(0, "\xef\xbb\xbf");
            }),
-      Make("wrong-type", "the answer with that Content-Type",
+      Make("wrong-type", "the response with that Content-Type",
            [](Response* response, const FaultContext& context) {
              response->Set("Content-Type", context.Text(0));
            },
@@ -152,7 +152,7 @@ std::vector<FaultType> BodyFaults() {
     for (FaultType& type : part()) types.push_back(std::move(type));
   }
   FaultHooks extra;
-  extra.wire = ExtraBytes;
-  types.push_back({"extra-bytes", kGroup, {}, "more bytes behind the body than announced", extra});
+  extra.steps = ExtraBytes;
+  types.push_back({"extra-bytes", kGroup, {}, "more bytes after the body than announced", extra});
   return types;
 }

@@ -1,4 +1,4 @@
-// Faults of the connection: before, instead of and in the middle of an answer.
+// Faults of the connection: before, instead of and in the middle of a response.
 #include "tools/twcamsim/faults.h"
 
 namespace {
@@ -15,51 +15,51 @@ FaultHooks OnBehaviour(void (*hook)(Behaviour*, const FaultContext&)) {
   return hooks;
 }
 
-FaultHooks OnWire(void (*hook)(Wire*, const FaultContext&)) {
+FaultHooks OnSteps(void (*hook)(Steps*, const FaultContext&)) {
   FaultHooks hooks;
-  hooks.wire = hook;
+  hooks.steps = hook;
   return hooks;
 }
 
 constexpr char kGroup[] = "connection";
 
-// Keeps the first `bytes` of what `part` and all behind it send, and ends the connection there.
-void CutBehind(Wire* wire, size_t first, size_t bytes, Action end) {
-  for (size_t i = first; i < wire->size(); ++i) {
-    WireStep& step = (*wire)[i];
+// Keeps the first `bytes` of what `part` and all after it send, and ends the connection there.
+void CutBehind(Steps* steps, size_t first, size_t bytes, Action end) {
+  for (size_t i = first; i < steps->size(); ++i) {
+    Step& step = (*steps)[i];
     if (step.bytes.size() > bytes) {
       step.bytes.resize(bytes);
-      wire->resize(i + 1);
+      steps->resize(i + 1);
       break;
     }
     bytes -= step.bytes.size();
   }
-  wire->push_back({end, Part::kBody, "", {}});
+  steps->push_back({end, Part::kBody, "", {}});
 }
 
-size_t BytesFrom(const Wire& wire, size_t first) {
+size_t BytesFrom(const Steps& steps, size_t first) {
   size_t bytes = 0;
-  for (size_t i = first; i < wire.size(); ++i) bytes += wire[i].bytes.size();
+  for (size_t i = first; i < steps.size(); ++i) bytes += steps[i].bytes.size();
   return bytes;
 }
 
 // -1 stands for a point that the seed chooses, before the end.
-void CutBody(Wire* wire, const FaultContext& context) {
-  const size_t first = FindPart(*wire, Part::kBlank) + 1;
-  const size_t all = first < wire->size() ? BytesFrom(*wire, first) : 0;
+void CutBody(Steps* steps, const FaultContext& context) {
+  const size_t first = FindPart(*steps, Part::kBlank) + 1;
+  const size_t all = first < steps->size() ? BytesFrom(*steps, first) : 0;
   const int64_t asked = context.Number(0);
   const size_t bytes =
       asked >= 0 ? static_cast<size_t>(asked) : static_cast<size_t>(context.random->Below(all));
-  CutBehind(wire, std::min(first, wire->size()), bytes, Action::kClose);
+  CutBehind(steps, std::min(first, steps->size()), bytes, Action::kClose);
 }
 
-void CutHead(Wire* wire, const FaultContext& context) {
-  const size_t blank = std::min(FindPart(*wire, Part::kBlank) + 1, wire->size());
-  const size_t head = BytesFrom(*wire, 0) - BytesFrom(*wire, blank);
+void CutHead(Steps* steps, const FaultContext& context) {
+  const size_t blank = std::min(FindPart(*steps, Part::kBlank) + 1, steps->size());
+  const size_t head = BytesFrom(*steps, 0) - BytesFrom(*steps, blank);
   const int64_t asked = context.Number(0);
   const size_t bytes = asked >= 0 ? static_cast<size_t>(asked)
                                   : 1 + static_cast<size_t>(context.random->Below(head - 2));
-  CutBehind(wire, 0, bytes, Action::kClose);
+  CutBehind(steps, 0, bytes, Action::kClose);
 }
 
 std::vector<FaultType> EarlyFaults() {
@@ -72,7 +72,7 @@ std::vector<FaultType> EarlyFaults() {
       {"black-hole",
        kGroup,
        {},
-       "connections get no answer at all: the accept queue is kept full, so SYNs are dropped",
+       "connections get no response at all: the accept queue is kept full, so SYNs are dropped",
        OnBehaviour(
            [](Behaviour* to, const FaultContext&) { to->listening = Listening::kBlackHole; })},
       {"slow-accept",
@@ -112,7 +112,7 @@ std::vector<FaultType> RequestFaults() {
       {"close-after-request",
        kGroup,
        {},
-       "reads the request and closes without an answer",
+       "reads the request and closes without a response",
        OnBehaviour(
            [](Behaviour* to, const FaultContext&) { to->after_request = AfterRequest::kClose; })},
       {"reset-after-request",
@@ -142,27 +142,27 @@ std::vector<FaultType> CutFaults() {
       {"reset-at",
        kGroup,
        {{"BYTES", "0", 0, kMostBytes}},
-       "resets the connection behind so many bytes of output",
+       "resets the connection after so many bytes of output",
        OnBehaviour([](Behaviour* to, const FaultContext& context) {
          LimitOutput(to, context.Number(0), true);
        })},
       {"cut-at",
        kGroup,
        {{"BYTES", "0", 0, kMostBytes}},
-       "closes the connection behind so many bytes of output",
+       "closes the connection after so many bytes of output",
        OnBehaviour([](Behaviour* to, const FaultContext& context) {
          LimitOutput(to, context.Number(0), false);
        })},
       {"cut-head",
        kGroup,
        {{"BYTES", "-1", -1, kMostAtOnce}},
-       "closes behind so many bytes of the head; -1: where the seed says",
-       OnWire(CutHead)},
+       "closes after so many bytes of the head; -1: where the seed says",
+       OnSteps(CutHead)},
       {"cut-body",
        kGroup,
        {{"BYTES", "-1", -1, kMostAtOnce}},
-       "closes behind so many bytes of the body; -1: where the seed says",
-       OnWire(CutBody)},
+       "closes after so many bytes of the body; -1: where the seed says",
+       OnSteps(CutBody)},
   };
 }
 

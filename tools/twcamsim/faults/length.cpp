@@ -8,58 +8,58 @@ namespace {
 constexpr char kLength[] = "Content-Length";
 constexpr int64_t kMostBytes = int64_t{1} << 40;
 
-// A length that chunks make superfluous would be none.
+// A chunked response has no Content-Length that could be wrong.
 void WholeBody(Response* response, const FaultContext&) {
   response->chunked = false;
 }
 
-FaultType Make(const char* name, const char* meaning, void (*hook)(Wire*, const FaultContext&),
+FaultType Make(const char* name, const char* meaning, void (*hook)(Steps*, const FaultContext&),
                std::vector<ArgumentRule> rules = {}) {
   FaultHooks hooks;
   hooks.response = WholeBody;
-  hooks.wire = hook;
+  hooks.steps = hook;
   return {name, "length", std::move(rules), meaning, hooks};
 }
 
-int64_t BodySize(const Wire& wire) {
-  const size_t body = FindPart(wire, Part::kBody);
-  return body < wire.size() ? static_cast<int64_t>(wire[body].bytes.size()) : 0;
+int64_t BodySize(const Steps& steps) {
+  const size_t body = FindPart(steps, Part::kBody);
+  return body < steps.size() ? static_cast<int64_t>(steps[body].bytes.size()) : 0;
 }
 
-void SetLength(Wire* wire, const std::string& value) {
-  SetWireHeader(wire, kLength, value);
+void SetLength(Steps* steps, const std::string& value) {
+  SetHeader(steps, kLength, value);
 }
 
-// Behind a body that is shorter than announced, a client can only wait; the connection closes so
+// After a body that is shorter than announced, a client can only wait; the connection closes so
 // that the wait has an end.
-void CloseBehind(Wire* wire) {
-  SetWireHeader(wire, "Connection", "close");
-  wire->push_back({Action::kClose, Part::kBody, "", {}});
+void CloseAfterBody(Steps* steps) {
+  SetHeader(steps, "Connection", "close");
+  steps->push_back({Action::kClose, Part::kBody, "", {}});
 }
 
-void TooLong(Wire* wire, const FaultContext& context) {
-  SetLength(wire, std::to_string(BodySize(*wire) + context.Number(0)));
-  CloseBehind(wire);
+void TooLong(Steps* steps, const FaultContext& context) {
+  SetLength(steps, std::to_string(BodySize(*steps) + context.Number(0)));
+  CloseAfterBody(steps);
 }
 
-void TooShort(Wire* wire, const FaultContext& context) {
-  SetLength(wire, std::to_string(std::max<int64_t>(BodySize(*wire) - context.Number(0), 0)));
-  CloseBehind(wire);
+void TooShort(Steps* steps, const FaultContext& context) {
+  SetLength(steps, std::to_string(std::max<int64_t>(BodySize(*steps) - context.Number(0), 0)));
+  CloseAfterBody(steps);
 }
 
-void Missing(Wire* wire, const FaultContext&) {
-  RemoveWireHeader(wire, kLength);
-  CloseBehind(wire);
+void Missing(Steps* steps, const FaultContext&) {
+  RemoveHeader(steps, kLength);
+  CloseAfterBody(steps);
 }
 
-void Double(Wire* wire, const FaultContext& context) {
-  const std::string second = std::to_string(BodySize(*wire) + context.Number(0));
-  SetLength(wire, std::to_string(BodySize(*wire)) + "\r\nContent-Length: " + second);
+void Double(Steps* steps, const FaultContext& context) {
+  const std::string second = std::to_string(BodySize(*steps) + context.Number(0));
+  SetLength(steps, std::to_string(BodySize(*steps)) + "\r\nContent-Length: " + second);
 }
 
-void Huge(Wire* wire, const FaultContext&) {
-  SetLength(wire, "99999999999999999999");
-  CloseBehind(wire);
+void Huge(Steps* steps, const FaultContext&) {
+  SetLength(steps, "99999999999999999999");
+  CloseAfterBody(steps);
 }
 
 }  // namespace
@@ -74,13 +74,13 @@ std::vector<FaultType> LengthFaults() {
       Make("length-double", "two Content-Length lines, the second larger by so many bytes", Double,
            {{"BYTES", "10", 0, kMostBytes}}),
       Make("length-negative", "Content-Length is -1",
-           [](Wire* wire, const FaultContext&) { SetLength(wire, "-1"); }),
+           [](Steps* steps, const FaultContext&) { SetLength(steps, "-1"); }),
       Make("length-zero", "Content-Length is 0 in front of a body",
-           [](Wire* wire, const FaultContext&) { SetLength(wire, "0"); }),
+           [](Steps* steps, const FaultContext&) { SetLength(steps, "0"); }),
       Make("length-huge", "Content-Length is a number of 20 digits", Huge),
       Make("length-text", "Content-Length is no number",
-           [](Wire* wire, const FaultContext&) { SetLength(wire, "many"); }),
+           [](Steps* steps, const FaultContext&) { SetLength(steps, "many"); }),
       Make("length-empty", "Content-Length has no value",
-           [](Wire* wire, const FaultContext&) { SetLength(wire, ""); }),
+           [](Steps* steps, const FaultContext&) { SetLength(steps, ""); }),
   };
 }

@@ -1,4 +1,4 @@
-// Faults of timing: answers that come late, slowly or never.
+// Faults of timing: responses that come late, slowly or never.
 #include "tools/twcamsim/faults.h"
 
 namespace {
@@ -9,10 +9,10 @@ constexpr int64_t kMostMs = 3600000;
 constexpr int64_t kMostBytes = INT32_MAX;
 const ArgumentRule kSpan = {"MS", "0", 0, kMostMs};  // 0: for good
 
-FaultType OnWire(const char* name, const char* meaning, void (*hook)(Wire*, const FaultContext&),
-                 std::vector<ArgumentRule> rules) {
+FaultType OnSteps(const char* name, const char* meaning, void (*hook)(Steps*, const FaultContext&),
+                  std::vector<ArgumentRule> rules) {
   FaultHooks hooks;
-  hooks.wire = hook;
+  hooks.steps = hook;
   return {name, "timing", std::move(rules), meaning, hooks};
 }
 
@@ -24,69 +24,70 @@ FaultType OnBehaviour(const char* name, const char* meaning,
   return {name, "timing", std::move(rules), meaning, hooks};
 }
 
-WireStep Wait(int64_t ms) {
+Step Wait(int64_t ms) {
   return {ms == 0 ? Action::kStall : Action::kPause, Part::kWait, "", milliseconds(ms)};
 }
 
-void InsertAt(Wire* wire, size_t index, const WireStep& step) {
-  wire->insert(wire->begin() + static_cast<Wire::difference_type>(std::min(index, wire->size())),
-               step);
+void InsertAt(Steps* steps, size_t index, const Step& step) {
+  steps->insert(
+      steps->begin() + static_cast<Steps::difference_type>(std::min(index, steps->size())), step);
 }
 
-// Waits behind the first `bytes` of the step at `index`.
-void WaitInside(Wire* wire, size_t index, size_t bytes, const WireStep& wait) {
-  if (index >= wire->size()) return;
-  WireStep rest = (*wire)[index];
+// Waits after the first `bytes` of the step at `index`.
+void WaitInside(Steps* steps, size_t index, size_t bytes, const Step& wait) {
+  if (index >= steps->size()) return;
+  Step rest = (*steps)[index];
   bytes = std::min(bytes, rest.bytes.size());
   rest.bytes.erase(0, bytes);
-  (*wire)[index].bytes.resize(bytes);
-  InsertAt(wire, index + 1, wait);
-  InsertAt(wire, index + 2, rest);
+  (*steps)[index].bytes.resize(bytes);
+  InsertAt(steps, index + 1, wait);
+  InsertAt(steps, index + 2, rest);
 }
 
-void StallInBody(Wire* wire, const FaultContext& context) {
-  const size_t body = FindPart(*wire, Part::kBody);
+void StallInBody(Steps* steps, const FaultContext& context) {
+  const size_t body = FindPart(*steps, Part::kBody);
   const size_t bytes = static_cast<size_t>(context.Number(0));
-  if (body == wire->size()) {  // an endless body, or none
-    wire->push_back(Wait(context.Number(1)));
+  if (body == steps->size()) {  // an endless body, or none
+    steps->push_back(Wait(context.Number(1)));
     return;
   }
-  WaitInside(wire, body, bytes, Wait(context.Number(1)));
+  WaitInside(steps, body, bytes, Wait(context.Number(1)));
 }
 
 std::vector<FaultType> StallFaults() {
   return {
-      OnWire("stall-before-status", "waits in front of the status line (0: for good)",
-             [](Wire* wire, const FaultContext& context) {
-               InsertAt(wire, 0, Wait(context.Number(0)));
-             },
-             {kSpan}),
-      OnWire("stall-in-status", "waits behind 8 bytes of the status line (0: for good)",
-             [](Wire* wire, const FaultContext& context) {
-               WaitInside(wire, 0, 8, Wait(context.Number(0)));
-             },
-             {kSpan}),
-      OnWire("stall-after-status", "waits behind the status line (0: for good)",
-             [](Wire* wire, const FaultContext& context) {
-               InsertAt(wire, 1, Wait(context.Number(0)));
-             },
-             {kSpan}),
-      OnWire("stall-in-head", "waits in front of the blank line (0: for good)",
-             [](Wire* wire, const FaultContext& context) {
-               InsertAt(wire, FindPart(*wire, Part::kBlank), Wait(context.Number(0)));
-             },
-             {kSpan}),
-      OnWire("stall-after-head", "waits behind the head (0: for good)",
-             [](Wire* wire, const FaultContext& context) {
-               InsertAt(wire, FindPart(*wire, Part::kBlank) + 1, Wait(context.Number(0)));
-             },
-             {kSpan}),
-      OnWire("stall-in-body", "waits behind so many bytes of the body (0: for good)", StallInBody,
-             {{"BYTES", "1", 0, kMostBytes}, kSpan}),
-      OnWire(
-          "stall-at-end", "keeps the connection open behind the answer and sends nothing more",
-          [](Wire* wire, const FaultContext& context) { wire->push_back(Wait(context.Number(0))); },
-          {kSpan}),
+      OnSteps("stall-before-status", "waits in front of the status line (0: for good)",
+              [](Steps* steps, const FaultContext& context) {
+                InsertAt(steps, 0, Wait(context.Number(0)));
+              },
+              {kSpan}),
+      OnSteps("stall-in-status", "waits after 8 bytes of the status line (0: for good)",
+              [](Steps* steps, const FaultContext& context) {
+                WaitInside(steps, 0, 8, Wait(context.Number(0)));
+              },
+              {kSpan}),
+      OnSteps("stall-after-status", "waits after the status line (0: for good)",
+              [](Steps* steps, const FaultContext& context) {
+                InsertAt(steps, 1, Wait(context.Number(0)));
+              },
+              {kSpan}),
+      OnSteps("stall-in-head", "waits in front of the blank line (0: for good)",
+              [](Steps* steps, const FaultContext& context) {
+                InsertAt(steps, FindPart(*steps, Part::kBlank), Wait(context.Number(0)));
+              },
+              {kSpan}),
+      OnSteps("stall-after-head", "waits after the head (0: for good)",
+              [](Steps* steps, const FaultContext& context) {
+                InsertAt(steps, FindPart(*steps, Part::kBlank) + 1, Wait(context.Number(0)));
+              },
+              {kSpan}),
+      OnSteps("stall-in-body", "waits after so many bytes of the body (0: for good)", StallInBody,
+              {{"BYTES", "1", 0, kMostBytes}, kSpan}),
+      OnSteps("stall-at-end", "keeps the connection open after the response and sends nothing more",
+              [](Steps* steps, const FaultContext& context) {
+                steps->push_back(Wait(context.Number(0)));
+              },
+              {kSpan}),
   };
 }
 
@@ -99,7 +100,7 @@ std::vector<FaultType> PaceFaults() {
                   },
                   {{"BYTES", "1", 1, kMostBytes}, {"MS", "50", 0, kMostMs}}),
       OnBehaviour(
-          "stall-after-request", "reads the request and never answers",
+          "stall-after-request", "reads the request and never responds",
           [](Behaviour* to, const FaultContext&) { to->after_request = AfterRequest::kStall; }, {}),
   };
 }

@@ -24,12 +24,13 @@ void Show(Behaviour* to, const FaultContext&) {
 
 std::vector<FaultType> HandshakeFaults() {
   return {
-      Make("tls-stall", "accepts TCP and never answers the handshake", Open<TlsOpening::kStall>),
-      Make("tls-garbage", "answers the handshake with bytes that are no TLS",
+      Make("tls-stall", "accepts TCP and never responds to the handshake",
+           Open<TlsOpening::kStall>),
+      Make("tls-garbage", "responds to the handshake with bytes that are no TLS",
            Open<TlsOpening::kGarbage>),
       Make("tls-plain", "serves HTTP without TLS on the port of TLS", Open<TlsOpening::kPlain>),
-      Make("tls-close", "closes behind the client's first message", Open<TlsOpening::kClose>),
-      Make("tls-reset", "resets behind the client's first message", Open<TlsOpening::kReset>),
+      Make("tls-close", "closes after the client's first message", Open<TlsOpening::kClose>),
+      Make("tls-reset", "resets after the client's first message", Open<TlsOpening::kReset>),
       Make("tls-cut", "closes in the middle of its own part of the handshake",
            Open<TlsOpening::kCut>),
       Make("tls-alert", "refuses the handshake with that alert (40: handshake_failure)",

@@ -1,21 +1,21 @@
-// A camera's CGI programs, which answer with lines of text; in the open, behind Basic, behind
+// A camera's CGI programs, which respond with lines of text; without credentials, with Basic, with
 // Digest.
+#include "tools/twcamsim/echo.h"
 #include "tools/twcamsim/profile.h"
-#include "tools/twcamsim/tell.h"
 
 namespace {
 
 class CgiService : public Profile {
  public:
-  Response Answer(const Exchange& exchange) override {
+  Response Respond(const Exchange& exchange) override {
     const std::string& path = exchange.request.path;
     if (path == "/info.cgi") {
       return MakeResponse(200, "text/plain", "camera=north gate\nmodel=TW-1\npresets=4\n");
     }
     if (path == "/set.cgi") return MakeResponse(200, "text/plain", "ok\n");
-    if (path == "/text.cgi") return TellAsText(exchange);
+    if (path == "/text.cgi") return EchoAsText(exchange);
     if (path == "/cookie.cgi") {
-      Response response = TellAsText(exchange);
+      Response response = EchoAsText(exchange);
       response.Set("Set-Cookie", "session=42; Path=/; HttpOnly");
       return response;
     }
@@ -37,7 +37,7 @@ std::vector<ProfileType> CgiProfiles() {
        "a cookie",
        {},
        MakeCgi},
-      {"cgi-basic", "basic", "the same behind a login by Basic", {}, MakeCgi},
-      {"cgi-digest", "digest", "the same behind a login by Digest", {}, MakeCgi},
+      {"cgi-basic", "basic", "the same with Basic authentication", {}, MakeCgi},
+      {"cgi-digest", "digest", "the same with Digest authentication", {}, MakeCgi},
   };
 }

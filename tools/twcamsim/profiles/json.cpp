@@ -1,9 +1,9 @@
-// A JSON service, as the one-call helpers talk to it: "success" in each answer, by the path.
+// A JSON service, as the one-call helpers talk to it: "success" in each response, by the path.
 #include <json/value.h>
 
 #include "tools/common/json_output.h"
+#include "tools/twcamsim/echo.h"
 #include "tools/twcamsim/profile.h"
-#include "tools/twcamsim/tell.h"
 
 namespace {
 
@@ -27,27 +27,27 @@ Json::Value Refusal(int code) {
   return value;
 }
 
-Response Reply(int status, const Json::Value& value) {
+Response JsonResponse(int status, const Json::Value& value) {
   return MakeResponse(status, "application/json", CompactJson(value));
 }
 
 class JsonService : public Profile {
  public:
-  Response Answer(const Exchange& exchange) override {
+  Response Respond(const Exchange& exchange) override {
     const std::string& path = exchange.request.path;
-    if (path == "/info.json") return Reply(200, Info());
-    if (path == "/echo.json" || path == "/") return TellAsJson(exchange);
-    if (path == "/refused.json") return Reply(200, Refusal(105));
+    if (path == "/info.json") return JsonResponse(200, Info());
+    if (path == "/echo.json" || path == "/") return EchoAsJson(exchange);
+    if (path == "/refused.json") return JsonResponse(200, Refusal(105));
     if (path == "/missing.json") return MakeResponse(200, "application/json", R"({"data":1})");
     if (path == "/text.json") {
       return MakeResponse(200, "application/json", R"({"success":"yes"})");
     }
     if (path == "/login.json") {
-      Response response = Reply(200, Success(true));
+      Response response = JsonResponse(200, Success(true));
       response.Set("Set-Cookie", "session=" + exchange.random->Hex(8) + "; Path=/");
       return response;
     }
-    return Reply(404, Refusal(404));
+    return JsonResponse(404, Refusal(404));
   }
 };
 

@@ -18,7 +18,7 @@ class LivePictures : public Profile {
  public:
   LivePictures(int64_t rate, int64_t count) : rate_(rate), count_(count) {}
 
-  Response Answer(const Exchange& exchange) override {
+  Response Respond(const Exchange& exchange) override {
     const std::string& path = exchange.request.path;
     if (path != "/" && path != "/live.mjpg") {
       return MakeResponse(404, "text/plain", "the pictures are /live.mjpg\n");
@@ -55,7 +55,7 @@ ProfileType MultipartProfile() {
   return {"multipart",
           "none",
           "JPEGs without an end at /live.mjpg (multipart/x-mixed-replace)",
-          {{"rate", "COUNT", "pictures a second; the standard is 5"},
-           {"frames", "COUNT", "ends behind so many; the standard, 0, is never"}},
+          {{"rate", "COUNT", "pictures a second; the default is 5"},
+           {"frames", "COUNT", "ends after so many; the default, 0, is never"}},
           MakePictures};
 }

@@ -1,4 +1,4 @@
-// Plays back what was recorded: the n-th answer to the n-th request, with its delays.
+// Plays back what was recorded: the n-th response to the n-th request, with its delays.
 #include <algorithm>
 #include <atomic>
 
@@ -12,29 +12,29 @@ using std::chrono::milliseconds;
 
 constexpr int64_t kLargeBody = 64 << 20;  // nobody keeps more than that
 
-void AddWait(int64_t ms, Wire* wire) {
-  if (ms > 0) wire->push_back({Action::kPause, Part::kBody, "", milliseconds(ms)});
+void AddWait(int64_t ms, Steps* steps) {
+  if (ms > 0) steps->push_back({Action::kPause, Part::kBody, "", milliseconds(ms)});
 }
 
-void AddEnd(const RecordedExchange& exchange, Wire* wire) {
-  const auto add = [wire](Action action) { wire->push_back({action, Part::kBody, "", {}}); };
+void AddEnd(const RecordedExchange& exchange, Steps* steps) {
+  const auto add = [steps](Action action) { steps->push_back({action, Part::kBody, "", {}}); };
   if (exchange.end == "kept") return;
-  AddWait(exchange.endDelayMs, wire);
+  AddWait(exchange.end_delay_ms, steps);
   if (exchange.end == "close" || exchange.end == "tls") add(Action::kClose);
   if (exchange.end == "reset" || exchange.end == "refused") add(Action::kReset);
   if (exchange.end == "silent" || exchange.end == "unreachable") add(Action::kStall);
 }
 
-Wire StepsOf(const RecordedExchange& exchange) {
-  Wire wire;
+Steps StepsOf(const RecordedExchange& exchange) {
+  Steps steps;
   size_t at = 0;
   for (const RecordedPiece& piece : exchange.pieces) {
-    AddWait(piece.delayMs, &wire);
-    wire.push_back({Action::kSend, Part::kBody, exchange.response.substr(at, piece.bytes), {}});
+    AddWait(piece.delay_ms, &steps);
+    steps.push_back({Action::kSend, Part::kBody, exchange.response.substr(at, piece.bytes), {}});
     at += piece.bytes;
   }
-  AddEnd(exchange, &wire);
-  return wire;
+  AddEnd(exchange, &steps);
+  return steps;
 }
 
 class Recording : public Profile {
@@ -45,7 +45,7 @@ class Recording : public Profile {
 
   bool WantsTls() const override { return exchanges_[0].tls; }
 
-  // Without a connection there was nothing to answer; the endpoint then has none either.
+  // Without a connection there was nothing to respond to; the endpoint then has none either.
   std::string OwnFault() const override {
     const std::string& end = exchanges_[0].end;
     if (!std::all_of(exchanges_.begin(), exchanges_.end(),
@@ -57,7 +57,7 @@ class Recording : public Profile {
     return end == "tls" ? "tls-close" : "";
   }
 
-  Response Answer(const Exchange& exchange) override {
+  Response Respond(const Exchange& exchange) override {
     if (exchange.source) CountUpload(exchange.request, 0, *exchange.source);
     Response response;
     response.raw = true;
@@ -73,7 +73,7 @@ class Recording : public Profile {
 std::unique_ptr<Profile> MakeRecording(const ProfileOptions& options, std::string* error) {
   const auto found = options.find("dir");
   if (found == options.end()) {
-    *error = "dir=DIR is missing: the folder of the recording";
+    *error = "dir=DIR is missing: the directory of the recording";
     return nullptr;
   }
   std::vector<RecordedExchange> exchanges;
@@ -91,8 +91,8 @@ ProfileType ReplayProfile() {
   return {
       "replay",
       "none",
-      "plays a recording of twhttp --record back: the n-th answer to the n-th request, whatever "
+      "plays a recording of twhttp --record back: the n-th response to the n-th request, whatever "
       "it asks, with its delays",
-      {{"dir", "DIR", "the folder of the recording"}},
+      {{"dir", "DIR", "the directory of the recording"}},
       MakeRecording};
 }

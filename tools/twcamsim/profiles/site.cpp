@@ -1,13 +1,13 @@
-// A whole camera: information, commands, services and an upload, in the open, below /basic behind
-// Basic and below /digest behind Digest.
+// A whole camera: information, commands, services and an upload, without credentials, below /basic
+// with Basic and below /digest with Digest.
 #include <fcntl.h>
 #include <fmt/format.h>
 
 #include <mutex>
 
 #include "tools/common/private_file.h"
+#include "tools/twcamsim/echo.h"
 #include "tools/twcamsim/profile.h"
-#include "tools/twcamsim/tell.h"
 #include "tools/twcamsim/upload_counter.h"
 
 namespace {
@@ -18,10 +18,11 @@ bool StartsWith(const std::string& text, const std::string& start) {
   return text.compare(0, start.size(), start) == 0;
 }
 
-// The path below the folder that stands for a login.
+// The path below the directory that stands for a style of authentication.
 std::string Below(const std::string& path) {
-  for (const char* folder : {"/basic", "/digest"}) {
-    if (StartsWith(path, std::string(folder) + "/")) return path.substr(std::string(folder).size());
+  for (const char* directory : {"/basic", "/digest"}) {
+    if (StartsWith(path, std::string(directory) + "/"))
+      return path.substr(std::string(directory).size());
   }
   return path;
 }
@@ -40,12 +41,12 @@ class Site : public Profile {
     return "";
   }
 
-  Response Answer(const Exchange& exchange) override {
+  Response Respond(const Exchange& exchange) override {
     const std::string path = Below(exchange.request.path);
     if (path == "/info.json") return MakeResponse(200, "application/json", kInfo);
-    if (path == "/json.cgi" || path == "/") return TellAsJson(exchange);
-    if (path == "/text.cgi") return TellAsText(exchange);
-    if (path == "/xml.cgi") return TellAsXml(exchange);
+    if (path == "/json.cgi" || path == "/") return EchoAsJson(exchange);
+    if (path == "/text.cgi") return EchoAsText(exchange);
+    if (path == "/xml.cgi") return EchoAsXml(exchange);
     if (path == "/count.cgi") return Count(exchange);
     if (path == "/command.sh") return Command(exchange.request);
     return MakeResponse(404, "text/plain", "not found\n");
@@ -91,7 +92,7 @@ ProfileType SiteProfile() {
   return {"site",
           "none",
           "a whole camera: /info.json, /json.cgi, /text.cgi, /xml.cgi, /count.cgi and /command.sh; "
-          "the same below /basic and /digest with a login",
+          "the same below /basic and /digest with credentials",
           {{"posted", "FILE", "keeps the form last posted to command.sh there"}},
           MakeSite};
 }

@@ -11,7 +11,7 @@ class Snapshots : public Profile {
  public:
   Snapshots(int columns, int rows) : columns_(columns), rows_(rows) {}
 
-  Response Answer(const Exchange& exchange) override {
+  Response Respond(const Exchange& exchange) override {
     const std::string& path = exchange.request.path;
     if (path != "/" && path != "/snapshot.jpg") {
       return MakeResponse(404, "text/plain", "the picture is /snapshot.jpg\n");
@@ -42,7 +42,7 @@ ProfileType SnapshotProfile() {
   return {"snapshot",
           "none",
           "a JPEG at /snapshot.jpg, another one each time",
-          {{"width", "PIXELS", "the picture's width; the standard is 320"},
-           {"height", "PIXELS", "its height; the standard is 240"}},
+          {{"width", "PIXELS", "the picture's width; the default is 320"},
+           {"height", "PIXELS", "its height; the default is 240"}},
           MakeSnapshots};
 }

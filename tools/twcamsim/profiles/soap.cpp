@@ -45,7 +45,7 @@ Response GoTo(const std::string& text) {
 
 class SoapDevice : public Profile {
  public:
-  Response Answer(const Exchange& exchange) override {
+  Response Respond(const Exchange& exchange) override {
     const Request& request = exchange.request;
     if (request.method != "POST") return MakeResponse(405, "text/plain", "POST an envelope\n");
     if (request.body.empty()) return Fault("Sender", "The body is empty.");

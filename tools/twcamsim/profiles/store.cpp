@@ -11,7 +11,7 @@
 namespace {
 
 constexpr char kType[] = "application/xml; charset=UTF-8";
-constexpr char kFolder[] = "/presets";
+constexpr char kDirectory[] = "/presets";
 constexpr size_t kMostDocuments = 10000;
 
 Response Document(int status, const std::string& text) {
@@ -31,12 +31,12 @@ class XmlStore : public Profile {
  public:
   XmlStore() : documents_{{"1", Preset(10)}, {"2", Preset(20)}, {"7", Preset(70)}} {}
 
-  Response Answer(const Exchange& exchange) override {
+  Response Respond(const Exchange& exchange) override {
     const Request& request = exchange.request;
     const std::string& path = request.path;
     const std::lock_guard<std::mutex> lock(mutex_);
-    if (path == kFolder || path == std::string(kFolder) + "/") return Folder(request);
-    const std::string start = std::string(kFolder) + "/";
+    if (path == kDirectory || path == std::string(kDirectory) + "/") return Directory(request);
+    const std::string start = std::string(kDirectory) + "/";
     if (path.compare(0, start.size(), start) != 0) {
       return Problem(404, "The documents are below /presets.");
     }
@@ -44,16 +44,16 @@ class XmlStore : public Profile {
   }
 
  private:
-  Response Folder(const Request& request) {
+  Response Directory(const Request& request) {
     if (request.method == "GET" || request.method == "HEAD") return List();
-    if (request.method != "POST") return Problem(405, "The folder takes GET and POST.");
+    if (request.method != "POST") return Problem(405, "The directory takes GET and POST.");
     if (!ParseXmlRequest(request.body).well_formed) return Problem(400, "That is no XML.");
     if (documents_.size() >= kMostDocuments) return Problem(507, "The store is full.");
     while (documents_.count(std::to_string(next_)) > 0) ++next_;
     const std::string name = std::to_string(next_++);
     documents_[name] = request.body;
     Response response = Document(201, request.body);
-    response.Set("Location", std::string(kFolder) + "/" + name);
+    response.Set("Location", std::string(kDirectory) + "/" + name);
     return response;
   }
 
@@ -78,8 +78,8 @@ class XmlStore : public Profile {
   Response List() {
     std::string text = "<?xml version=\"1.0\"?>\n<presets>\n";
     for (const auto& [name, document] : documents_) {
-      text += fmt::format("  <document href=\"{}/{}\" bytes=\"{}\"/>\n", kFolder, EscapeXml(name),
-                          document.size());
+      text += fmt::format("  <document href=\"{}/{}\" bytes=\"{}\"/>\n", kDirectory,
+                          EscapeXml(name), document.size());
     }
     return Document(200, text + "</presets>\n");
   }

@@ -14,7 +14,7 @@ class UploadSink : public Profile {
     return request.method == "POST" || request.method == "PUT";
   }
 
-  Response Answer(const Exchange& exchange) override {
+  Response Respond(const Exchange& exchange) override {
     if (!exchange.source) return MakeResponse(405, "text/plain", "POST a clip\n");
     if (exchange.request.Length() == 0) return MakeResponse(200, "text/plain", "0 full\n");
     const UploadCount count = CountUpload(exchange.request, most_, *exchange.source);
@@ -34,10 +34,11 @@ std::unique_ptr<Profile> MakeSink(const ProfileOptions& options, std::string* er
 }  // namespace
 
 ProfileType UploadProfile() {
-  return {"upload",
-          "none",
-          "takes a streamed upload at any path, whatever length it announces, and answers with its "
-          "count of bytes when the closing boundary came, or the peer closed its direction",
-          {{"after", "BYTES", "answers behind so many bytes at the latest"}},
-          MakeSink};
+  return {
+      "upload",
+      "none",
+      "takes a streamed upload at any path, whatever length it announces, and responds with its "
+      "count of bytes when the closing boundary came, or the peer closed its direction",
+      {{"after", "BYTES", "responds after so many bytes at the latest"}},
+      MakeSink};
 }
