@@ -11,7 +11,7 @@
 
 namespace {
 
-using Clients = std::vector<std::unique_ptr<ClientProbe>>;
+using Clients = std::vector<std::unique_ptr<ExposedClient>>;
 
 struct Memory {
   size_t heap = 0;      // bytes that are allocated
@@ -58,7 +58,7 @@ constexpr size_t kMostHeap = 68 << 10;
 
 TEST(IdleClient, TakesItsBufferAndLittleElse) {
   const Memory memory = PerFurtherClient(
-      [](Clients* clients) { clients->push_back(std::make_unique<ClientProbe>(80)); });
+      [](Clients* clients) { clients->push_back(std::make_unique<ExposedClient>(80)); });
   Record(memory);
   ::testing::Test::RecordProperty("object", std::to_string(sizeof(TWHttpClient)));
   ::testing::Test::RecordProperty("socket", std::to_string(sizeof(TWSocket)));
@@ -68,7 +68,7 @@ TEST(IdleClient, TakesItsBufferAndLittleElse) {
 TEST(IdleClient, TakesNoMoreAfterASmallGet) {
   RepeatingPeer server(Exchange("HTTP/1.1 200 OK\r\nContent-Length: 16\r\n\r\n{\"success\":true}"));
   const Memory memory = PerFurtherClient([&server](Clients* clients) {
-    clients->push_back(std::make_unique<ClientProbe>(server.Port()));
+    clients->push_back(std::make_unique<ExposedClient>(server.Port()));
     std::string body;
     EXPECT_EQ(clients->back()->SendRequestByGet(), HTTP_RET_OK);
     EXPECT_EQ(clients->back()->ReadBody(body), HTTP_RET_OK);

@@ -89,7 +89,7 @@ TEST_P(Certificates, DoNotMatterToTheClientsOwnSocket) {
   ScriptedPeer peer({Serve(GetParam(), accepted)});
   Outcome outcome;
   RunOnSmallStack(kSmallStack, [&] {
-    ClientProbe client(peer.Port(), Https());
+    ExposedClient client(peer.Port(), Https());
     outcome = OutcomeOf(client, client.SendRequestByGet());
     outcome.text = ReadBody(client);
   });
@@ -103,7 +103,7 @@ TEST_P(Certificates, DoNotMatterToLibcurlUnverified) {
   ScriptedPeer peer({Serve(GetParam(), accepted)});
   int result = -1;
   RunOnSmallStack(kSmallStack, [&] {
-    result = ClientProbe(peer.Port(), Https()).SendRequestByCurl(HTTP_METHOD_GET, false, 5);
+    result = ExposedClient(peer.Port(), Https()).SendRequestByCurl(HTTP_METHOD_GET, false, 5);
   });
   EXPECT_EQ(result, accepted ? HTTP_RET_OK : HTTP_RET_IO_ERROR);
 }
@@ -112,7 +112,7 @@ TEST_P(Certificates, AreRefusedByLibcurlVerifying) {
   ScriptedPeer peer({Serve(GetParam(), false)});
   int result = -1;
   RunOnSmallStack(kSmallStack, [&] {
-    result = ClientProbe(peer.Port(), Https()).SendRequestByCurl(HTTP_METHOD_GET, true, 5);
+    result = ExposedClient(peer.Port(), Https()).SendRequestByCurl(HTTP_METHOD_GET, true, 5);
   });
   EXPECT_EQ(result, GetParam().too_long ? HTTP_RET_IO_ERROR : HTTP_RET_CERT_ERROR);
 }

@@ -166,7 +166,7 @@ TEST_P(ChallengeLoops, EndAfterOneAuthorizationPerCall) {
     settings.user = "user";
     settings.password = "pass";
     settings.basic_auth = test.basic_first;
-    ClientProbe client(peer.Port(), settings);
+    ExposedClient client(peer.Port(), settings);
     for (int i = 0; i < test.calls; ++i) {
       outcome = OutcomeOf(client, client.SendRequest(HTTP_METHOD_GET, ""));
     }
@@ -191,7 +191,7 @@ TEST_P(CurlChallenges, EndAsTheTableSays) {
     ClientSettings settings;
     settings.user = "user";
     settings.password = "pass";
-    result = ClientProbe(peer.Port(), settings).SendReqByXMLGet(5);
+    result = ExposedClient(peer.Port(), settings).SendReqByXMLGet(5);
   });
   EXPECT_EQ(result, test.result);
   peer.Finish();

@@ -50,7 +50,7 @@ void PlayGet(const ChallengeCase& test) {
   ScriptedPeer peer(RefuseOnce(test, ExpectedGet(test, "").size()));
   Outcome outcome;
   RunOnSmallStack(kSmallStack, [&] {
-    ClientProbe client(peer.Port(), SettingsOf(test));
+    ExposedClient client(peer.Port(), SettingsOf(test));
     const int result = client.SendRequest(HTTP_METHOD_GET, "");
     outcome = OutcomeOf(client, result);
     if (outcome.status == 200) outcome.text = ReadBody(client);
@@ -68,7 +68,7 @@ void PlayPost(const ChallengeCase& test) {
   ScriptedPeer peer(RefuseOnce(test, ExpectedPost(test, "").size()));
   Outcome outcome;
   RunOnSmallStack(kSmallStack, [&] {
-    ClientProbe client(peer.Port(), SettingsOf(test));
+    ExposedClient client(peer.Port(), SettingsOf(test));
     std::string response;
     const int result = client.SendAuthReqBySocketPost(kSoapBody, response);
     outcome = OutcomeOf(client, result, response);

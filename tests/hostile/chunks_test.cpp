@@ -94,7 +94,7 @@ const ChunkRow kChunks[] = {
 };
 
 // A GET, and the whole body after it.
-Outcome GetAndReadBody(ClientProbe& client) {
+Outcome GetAndReadBody(ExposedClient& client) {
   EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
   std::string body;
   const int result = client.ReadBody(body);
@@ -102,7 +102,7 @@ Outcome GetAndReadBody(ClientProbe& client) {
 }
 
 // A request that the caller has written, and the whole response to it.
-Outcome GetResponse(ClientProbe& client) {
+Outcome GetResponse(ExposedClient& client) {
   const std::string request = "GET /own HTTP/1.1\r\n\r\n";
   client.m_pSocket->Connect();
   client.m_pSocket->WriteData(request.data(), static_cast<int>(request.size()));
@@ -111,7 +111,7 @@ Outcome GetResponse(ClientProbe& client) {
 }
 
 // A form, and the whole body after it.
-Outcome PostAndReadBody(ClientProbe& client) {
+Outcome PostAndReadBody(ExposedClient& client) {
   EXPECT_EQ(client.SendRequestBySocketPost("a=1"), HTTP_RET_OK);
   std::string body;
   const int result = client.ReadBody(body);
@@ -119,20 +119,20 @@ Outcome PostAndReadBody(ClientProbe& client) {
 }
 
 // A GET, read by the caller in pieces, which leaves the chunks as they are.
-Outcome GetInPieces(ClientProbe& client) {
+Outcome GetInPieces(ExposedClient& client) {
   EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
   return OutcomeOf(client, 0, ReadBody(client));
 }
 
 Outcome CurlToText(int port) {
-  ClientProbe client(port);
+  ExposedClient client(port);
   const int result = client.SendRequestByCurl(HTTP_METHOD_GET, true, 10);
   return OutcomeOf(client, result, client.m_strCurlText);
 }
 
 // The text is what the file holds.
 Outcome CurlToFile(int port) {
-  ClientProbe client(port);
+  ExposedClient client(port);
   const UniqueFile file(tmpfile());
   client.SetCurlRespFile(file.get());
   const int result = client.SendRequestByCurl(HTTP_METHOD_GET, true, 10);
@@ -144,7 +144,7 @@ Outcome CurlToFile(int port) {
 
 // The text is what was collected for the document.
 Outcome XmlGet(int port) {
-  ClientProbe client(port);
+  ExposedClient client(port);
   const int result = client.SendReqByXMLGet(10);
   const std::string text = client.m_pRespBuf == nullptr
                                ? std::string()
@@ -152,7 +152,7 @@ Outcome XmlGet(int port) {
   return OutcomeOf(client, result, text);
 }
 
-std::vector<ResponseScenario> SocketTable(Outcome (*operation)(ClientProbe&)) {
+std::vector<ResponseScenario> SocketTable(Outcome (*operation)(ExposedClient&)) {
   std::vector<ResponseScenario> table;
   for (const ChunkRow& row : kChunks) {
     table.push_back({row.name, kHead + row.chunks, operation, Success(row.body)});
@@ -230,14 +230,14 @@ Outcome JsonGet(int port) {
 }
 
 Outcome Soap(int port) {
-  ClientProbe client(port);
+  ExposedClient client(port);
   std::string response = "untouched";
   const int result = client.SendReqBySocketPost("<a/>", response);
   return OutcomeOf(client, result, response);
 }
 
 Outcome XmlSoap(int port) {
-  ClientProbe client(port);
+  ExposedClient client(port);
   xmlDoc untouched;
   xmlDoc* doc = &untouched;
   const int result = client.SendReqByXMLSocketPost("<a/>", doc);

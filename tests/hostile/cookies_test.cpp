@@ -149,12 +149,12 @@ std::string CookieLine(const CookieCase& test) {
 
 struct NextRequest {
   const char* name;
-  void (*send)(ClientProbe&);
+  void (*send)(ExposedClient&);
   std::string (*expected)(const CookieCase& test, int port);
 };
 
 const NextRequest kGet = {
-    "Get", [](ClientProbe& client) { EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK); },
+    "Get", [](ExposedClient& client) { EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK); },
     [](const CookieCase& test, int) {
       const std::string request =
           "GET /a.cgi HTTP/1.0\r\nUser-Agent: Quenrith Tarnwick\r\n" + CookieLine(test) + "\r\n";
@@ -163,7 +163,7 @@ const NextRequest kGet = {
 
 const NextRequest kFormPost = {
     "FormPost",
-    [](ClientProbe& client) { EXPECT_EQ(client.SendRequestBySocketPost("a=1"), HTTP_RET_OK); },
+    [](ExposedClient& client) { EXPECT_EQ(client.SendRequestBySocketPost("a=1"), HTTP_RET_OK); },
     [](const CookieCase& test, int) {
       return "POST /a.cgi HTTP/1.1\r\nHost: 127.0.0.1\r\n" + CookieLine(test) +
              "Content-Type: application/x-www-form-urlencoded; charset=utf-8\r\n"
@@ -171,7 +171,7 @@ const NextRequest kFormPost = {
     }};
 
 const NextRequest kUpload = {
-    "Upload", [](ClientProbe& client) { EXPECT_EQ(client.OpenRawDataUpload(), HTTP_RET_OK); },
+    "Upload", [](ExposedClient& client) { EXPECT_EQ(client.OpenRawDataUpload(), HTTP_RET_OK); },
     [](const CookieCase& test, int port) {
       return "POST /a.cgi HTTP/1.1\r\nHost: 127.0.0.1:" + IntToString(port) + "\r\n" +
              CookieLine(test) +
@@ -183,7 +183,7 @@ const NextRequest kUpload = {
 
 const NextRequest kCurlGet = {
     "CurlGet",
-    [](ClientProbe& client) {
+    [](ExposedClient& client) {
       EXPECT_EQ(client.SendRequestByCurl(HTTP_METHOD_GET, true, 5), HTTP_RET_OK);
     },
     [](const CookieCase& test, int port) {
@@ -203,7 +203,7 @@ void ExpectNextRequest(const CookieCase& test, const NextRequest& next) {
   ScriptedPeer peer(
       {Exchange(test.status + test.lines + "\r\n"), {ExpectBytes(length), Send(kOk), Close()}});
   RunOnSmallStack(kSmallStack, [&] {
-    ClientProbe client(peer.Port());
+    ExposedClient client(peer.Port());
     client.SetCookie(kOldCookie);
     EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
     EXPECT_EQ(client.m_result, test.response);

@@ -42,7 +42,7 @@ struct Expected {
 struct ExchangeCase {
   std::string name;
   std::vector<std::string> responses;
-  Outcome (*operation)(ClientProbe& client);
+  Outcome (*operation)(ExposedClient& client);
   std::function<Expected(const std::vector<Cut>& responses, bool buffered)> rule;
   std::string request_mark = "";  // what the request ends with, when it is no whole request
   size_t first_cut = 0;           // the responses before this one come whole
@@ -142,7 +142,7 @@ inline void RunAll(const ExchangeCase& exchange, End end, bool buffered, std::ve
   RunOnSmallStack(kSmallStack, [&] {
     for (Run& run : *runs) {
       log.Clear();
-      ClientProbe client(peer->Port(), settings);
+      ExposedClient client(peer->Port(), settings);
       run.outcome = exchange.operation(client);
       for (const std::string& line : HttpLog(log)) run.log.push_back(line);
     }

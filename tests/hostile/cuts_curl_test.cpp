@@ -12,17 +12,17 @@ using namespace tarnwick;
 
 namespace {
 
-Outcome CurlGet(ClientProbe& client) {
+Outcome CurlGet(ExposedClient& client) {
   const int result = client.SendRequestByCurl(HTTP_METHOD_GET, false, 5);
   return OutcomeOf(client, result, client.m_strCurlText);
 }
 
-Outcome CurlPost(ClientProbe& client) {
+Outcome CurlPost(ExposedClient& client) {
   const int result = client.SendRequestByCurl(HTTP_METHOD_POST, false, 5);
   return OutcomeOf(client, result, client.m_strCurlText);
 }
 
-Outcome CurlToFile(ClientProbe& client) {
+Outcome CurlToFile(ExposedClient& client) {
   const UniqueFile file(tmpfile());
   client.SetCurlRespFile(file.get());
   const int result = client.SendRequestByCurl(HTTP_METHOD_GET, false, 5);
@@ -32,11 +32,11 @@ Outcome CurlToFile(ClientProbe& client) {
   return OutcomeOf(client, result, content);
 }
 
-Outcome LoginByCurl(ClientProbe& client) {
+Outcome LoginByCurl(ExposedClient& client) {
   return OutcomeOf(client, client.SendRequestByPost("?"));
 }
 
-Outcome HttpsJson(ClientProbe& client) {
+Outcome HttpsJson(ExposedClient& client) {
   Json::Value value = "untouched";
   const int result = SendHttpsGet("127.0.0.1", client.m_port, "a.cgi", value, 5);
   return OneCall(result, result == 0 && value.isObject() ? value["id"].asString() : "none");
@@ -44,7 +44,7 @@ Outcome HttpsJson(ClientProbe& client) {
 
 // The outcome of an XML request, with what was collected for a document.
 template <typename Request>
-Outcome XmlRequest(ClientProbe& client, Request request) {
+Outcome XmlRequest(ExposedClient& client, Request request) {
   xmlDoc* doc = xmlParseMemory("<a/>", 4);
   const int result = request(doc);
   xmlFreeDoc(doc);
@@ -54,19 +54,19 @@ Outcome XmlRequest(ClientProbe& client, Request request) {
   return OutcomeOf(client, result, text);
 }
 
-Outcome XmlGet(ClientProbe& client) {
+Outcome XmlGet(ExposedClient& client) {
   return XmlRequest(client, [&](xmlDoc*) { return client.SendReqByXMLGet(5); });
 }
 
-Outcome XmlPost(ClientProbe& client) {
+Outcome XmlPost(ExposedClient& client) {
   return XmlRequest(client, [&](xmlDoc* doc) { return client.SendReqByXMLPost(doc); });
 }
 
-Outcome XmlPut(ClientProbe& client) {
+Outcome XmlPut(ExposedClient& client) {
   return XmlRequest(client, [&](xmlDoc* doc) { return client.SendReqByXMLPut(doc); });
 }
 
-Outcome XmlDelete(ClientProbe& client) {
+Outcome XmlDelete(ExposedClient& client) {
   return XmlRequest(client, [&](xmlDoc*) { return client.SendReqByXMLDelete(); });
 }
 

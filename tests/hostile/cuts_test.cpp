@@ -13,40 +13,40 @@ namespace {
 
 // What the clients do.
 
-Outcome GetAndReadBody(ClientProbe& client) {
+Outcome GetAndReadBody(ExposedClient& client) {
   EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
   std::string body;
   const int result = client.ReadBody(body);
   return OutcomeOf(client, result, body);
 }
 
-Outcome LoginAndReadBody(ClientProbe& client) {
+Outcome LoginAndReadBody(ExposedClient& client) {
   EXPECT_EQ(client.SendRequest(HTTP_METHOD_GET, ""), HTTP_RET_OK);
   std::string body;
   const int result = client.ReadBody(body);
   return OutcomeOf(client, result, body);
 }
 
-Outcome PostAndReadBody(ClientProbe& client) {
+Outcome PostAndReadBody(ExposedClient& client) {
   EXPECT_EQ(client.SendRequestBySocketPost("a=1&b=2"), HTTP_RET_OK);
   std::string body;
   const int result = client.ReadBody(body);
   return OutcomeOf(client, result, body);
 }
 
-Outcome Soap(ClientProbe& client) {
+Outcome Soap(ExposedClient& client) {
   std::string response = "untouched";
   const int result = client.SendReqBySocketPost("<a/>", response);
   return OutcomeOf(client, result, response);
 }
 
-Outcome SoapWithLogin(ClientProbe& client) {
+Outcome SoapWithLogin(ExposedClient& client) {
   std::string response = "untouched";
   const int result = client.SendAuthReqBySocketPost("<a/>", response);
   return OutcomeOf(client, result, response);
 }
 
-Outcome XmlSoap(ClientProbe& client) {
+Outcome XmlSoap(ExposedClient& client) {
   xmlDoc untouched;
   xmlDoc* doc = &untouched;
   const int result = client.SendReqByXMLSocketPost("<a/>", doc);
@@ -56,21 +56,21 @@ Outcome XmlSoap(ClientProbe& client) {
   return OutcomeOf(client, result, parsed ? "a document" : "none");
 }
 
-Outcome Upload(ClientProbe& client) {
+Outcome Upload(ExposedClient& client) {
   EXPECT_EQ(client.OpenRawDataUpload(), HTTP_RET_OK);
   EXPECT_EQ(client.WriteData("data, to the end.", 17), 17);
   const std::string response = client.GetResp();
   return OutcomeOf(client, 0, response);
 }
 
-Outcome JsonGet(ClientProbe& client) {
+Outcome JsonGet(ExposedClient& client) {
   Json::Value value = "untouched";
   const int result = SendHttpGet("127.0.0.1", client.m_port, "a.cgi", value, 5, true);
   // A part of a document may leave a part of its values.
   return OneCall(result, result == 0 ? value["id"].asString() : "none");
 }
 
-Outcome OneCallPost(ClientProbe& client) {
+Outcome OneCallPost(ExposedClient& client) {
   return {SendHttpPost("127.0.0.1", client.m_port, "a.cgi", "a=1", "s=1", 5), 0, 0, ""};
 }
 

@@ -146,7 +146,7 @@ struct TlsRun {
   std::vector<std::string> log = {};
 };
 
-Outcome GetAndReadBody(ClientProbe& client) {
+Outcome GetAndReadBody(ExposedClient& client) {
   const int sent = client.SendRequestByGet();
   if (sent != HTTP_RET_OK) return OutcomeOf(client, sent, "not sent");
   std::string body;
@@ -169,7 +169,7 @@ void RunAll(const TlsCutCase& test, std::vector<TlsRun>* runs) {
   RunOnSmallStack(kSmallStack, [&] {
     for (TlsRun& run : *runs) {
       log.Clear();
-      ClientProbe client(peer.Port(), settings);
+      ExposedClient client(peer.Port(), settings);
       run.outcome = GetAndReadBody(client);
       run.log = HttpLog(log);
     }

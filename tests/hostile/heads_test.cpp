@@ -32,7 +32,7 @@ std::string NameOf(HTTP_MAP_KEY key) {
 }
 
 // What the head left in the client: "name=value" each.
-std::string Kept(const ClientProbe& client) {
+std::string Kept(const ExposedClient& client) {
   std::string kept;
   for (const auto& [key, value] : client.m_mapContent) kept += NameOf(key) + "=" + value + "|";
   if (!client.m_strCookie.empty()) kept += "cookie=" + client.m_strCookie + "|";
@@ -44,13 +44,13 @@ std::string Kept(const ClientProbe& client) {
 }
 
 // A GET; the text is what its head left.
-Outcome Head(ClientProbe& client) {
+Outcome Head(ExposedClient& client) {
   const int result = client.SendRequestByGet();
   return OutcomeOf(client, result, Kept(client));
 }
 
 // A GET; the text is what is left on the connection after the head.
-Outcome Rest(ClientProbe& client) {
+Outcome Rest(ExposedClient& client) {
   const int result = client.SendRequestByGet();
   return OutcomeOf(client, result, ReadBody(client));
 }
@@ -209,7 +209,7 @@ const ResponseScenario kHeadTable[] = {
 // Heads without an end come over plain connections alone: the bytes after them are counted, and
 // the client may not keep any.
 Outcome GetAndCount(int port) {
-  ClientProbe client(port);
+  ExposedClient client(port);
   const int result = client.SendRequestByGet();
   char piece[8192];
   size_t total = 0;
@@ -218,33 +218,33 @@ Outcome GetAndCount(int port) {
 }
 
 Outcome FormPost(int port) {
-  ClientProbe client(port);
+  ExposedClient client(port);
   const int result = client.SendRequestBySocketPost("a=1");
   return OutcomeOf(client, result);
 }
 
 Outcome Soap(int port) {
-  ClientProbe client(port);
+  ExposedClient client(port);
   std::string response = "untouched";
   const int result = client.SendReqBySocketPost("<a/>", response);
   return OutcomeOf(client, result, response);
 }
 
 Outcome SoapWithLogin(int port) {
-  ClientProbe client(port);
+  ExposedClient client(port);
   std::string response = "untouched";
   const int result = client.SendAuthReqBySocketPost("<a/>", response);
   return OutcomeOf(client, result, response);
 }
 
 Outcome CurlGet(int port) {
-  ClientProbe client(port);
+  ExposedClient client(port);
   const int result = client.SendRequestByCurl(HTTP_METHOD_GET, true, 20);
   return OutcomeOf(client, result, client.m_strCurlText);
 }
 
 Outcome CurlGetToFile(int port) {
-  ClientProbe client(port);
+  ExposedClient client(port);
   const UniqueFile file(tmpfile());
   client.SetCurlRespFile(file.get());
   const int result = client.SendRequestByCurl(HTTP_METHOD_GET, true, 20);
@@ -252,13 +252,13 @@ Outcome CurlGetToFile(int port) {
 }
 
 Outcome CurlPost(int port) {
-  ClientProbe client(port);
+  ExposedClient client(port);
   const int result = client.SendRequestByPost("?");
   return OutcomeOf(client, result);
 }
 
 Outcome XmlGet(int port) {
-  ClientProbe client(port);
+  ExposedClient client(port);
   const int result = client.SendReqByXMLGet(20);
   return OutcomeOf(client, result, client.m_pRespBuf != nullptr ? client.m_pRespBuf : "");
 }

@@ -169,7 +169,7 @@ inline Step SendWhileRead(const std::string& bytes, size_t piece = std::string::
 struct ResponseScenario {
   std::string name;
   std::string response;
-  std::function<Outcome(ClientProbe&)> operation;
+  std::function<Outcome(ExposedClient&)> operation;
   Outcome expected;
   std::vector<std::string> log = {};
 
@@ -217,7 +217,7 @@ inline void RunInEachWay(const ResponseScenario& scenario) {
     settings.https = delivery.tls;
     settings.buffered = delivery.buffered;
     const auto operation = [&](int port) {
-      ClientProbe client(port, settings);
+      ExposedClient client(port, settings);
       return scenario.operation(client);
     };
     const Script script = {ExpectRequest(),

@@ -97,21 +97,21 @@ const LengthRow kLengths[] = {
     {"ABodyWithAZeroByte", Length("4"), "<a\0b"s, "4", "<a", CURLE_OK, "<a\0b"s},
 };
 
-Outcome GetAndReadBody(ClientProbe& client) {
+Outcome GetAndReadBody(ExposedClient& client) {
   EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
   std::string body;
   const int result = client.ReadBody(body);
   return OutcomeOf(client, result, Content(client, HTTP_CONTENT_LENGTH) + ": " + body);
 }
 
-Outcome Soap(ClientProbe& client) {
+Outcome Soap(ExposedClient& client) {
   std::string response = kFails;
   const int result = client.SendReqBySocketPost("<a/>", response);
   return OutcomeOf(client, result, response);
 }
 
 // The text tells whether there is a document.
-Outcome XmlSoap(ClientProbe& client) {
+Outcome XmlSoap(ExposedClient& client) {
   xmlDoc untouched;
   xmlDoc* doc = &untouched;
   const int result = client.SendReqByXMLSocketPost("<a/>", doc);
@@ -122,7 +122,7 @@ Outcome XmlSoap(ClientProbe& client) {
 }
 
 Outcome CurlGet(int port) {
-  ClientProbe client(port);
+  ExposedClient client(port);
   const int result = client.SendRequestByCurl(HTTP_METHOD_GET, true, 10);
   return OutcomeOf(client, result, client.m_strCurlText);
 }
@@ -248,7 +248,7 @@ const Scenario kJsonTable[] = {
 
 // A SOAP response of more than a mebibyte is read as it comes, and whole.
 Outcome SoapOfAnySize(int port) {
-  ClientProbe client(port);
+  ExposedClient client(port);
   return Soap(client);
 }
 

@@ -65,7 +65,7 @@ std::string Nested(const std::string& open, const std::string& close, int levels
 }
 
 void ParseXml(const std::string& text) {
-  ClientProbe client;
+  ExposedClient client;
   client.m_pRespBuf = strdup(text.c_str());
   client.m_respLen = static_cast<unsigned int>(text.size());
   xmlDoc* doc = nullptr;
@@ -130,7 +130,7 @@ const StackCase kStacks[] = {
      32,
      {SendThenClose(kOk)},
      [](int port) {
-       ClientProbe client(port);
+       ExposedClient client(port);
        client.m_pSocket->Connect();
        client.GetResp();
      }},
@@ -141,7 +141,7 @@ const StackCase kStacks[] = {
     {"OpenRawDataUpload",
      32,
      {{DiscardUntilEnd()}},
-     [](int port) { ClientProbe(port).OpenRawDataUpload(); }},
+     [](int port) { ExposedClient(port).OpenRawDataUpload(); }},
     {"SendHttpGet", 32, {Exchange(kOk)}, Run("json_get")},
     {"SendHttpPost", 32, {Exchange(kOk)}, Run("json_post")},
     {"SendRequestByGetToAHostName", 32, {Exchange(kOk)}, ToAName("get_body")},

@@ -69,7 +69,7 @@ ClientSettings Settings(bool buffered, bool https = false) {
 }
 
 Outcome GetAndReadBody(int port, const ClientSettings& settings) {
-  ClientProbe client(port, settings);
+  ExposedClient client(port, settings);
   const int sent = client.SendRequestByGet();
   if (sent != HTTP_RET_OK) return OutcomeOf(client, sent, "not sent");
   std::string body;
@@ -96,7 +96,7 @@ Outcome WithoutATimeout(int port) {
 }
 
 Outcome SoapOf(int port, size_t size) {
-  ClientProbe client(port, Settings(true));
+  ExposedClient client(port, Settings(true));
   std::string response = "untouched";
   const int result = client.SendReqBySocketPost(std::string(size, 'x'), response);
   return OutcomeOf(client, result, response);
@@ -116,14 +116,14 @@ Outcome LargeSoap(int port) {
 }
 
 Outcome LargeForm(int port) {
-  ClientProbe client(port, Settings(true));
+  ExposedClient client(port, Settings(true));
   const int result = client.SendRequestBySocketPost(std::string(kLarge, 'x'));
   return OutcomeOf(client, result);
 }
 
 // The text tells how much of the upload was taken.
 Outcome UploadOver(int port, bool https) {
-  ClientProbe client(port, Settings(true, https));
+  ExposedClient client(port, Settings(true, https));
   const int result = client.OpenRawDataUpload();
   const std::string data(kLarge, 'x');
   const int written = client.WriteData(data.data(), static_cast<int>(data.size()));
@@ -150,7 +150,7 @@ Outcome Form(int port) {
 }
 
 Outcome Curl(int port) {
-  ClientProbe client(port);
+  ExposedClient client(port);
   const int result = client.SendRequestByCurl(HTTP_METHOD_GET, true, kTimeout);
   return OutcomeOf(client, result, client.m_strCurlText);
 }
@@ -163,12 +163,12 @@ Outcome CurlOfASlowBody(int port) {
 }
 
 Outcome CurlPost(int port) {
-  ClientProbe client(port);
+  ExposedClient client(port);
   return OutcomeOf(client, client.SendRequestByPost("?"));
 }
 
 Outcome XmlGet(int port) {
-  ClientProbe client(port);
+  ExposedClient client(port);
   const int result = client.SendReqByXMLGet(kTimeout);
   return OutcomeOf(client, result, client.m_pRespBuf != nullptr ? client.m_pRespBuf : "");
 }

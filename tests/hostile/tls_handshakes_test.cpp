@@ -306,7 +306,7 @@ TEST_P(TlsHandshakesOfLibcurl, FailTheRequest) {
   RunOnSmallStack(kSmallStack, [&] {
     ClientSettings settings;
     settings.https = true;
-    ClientProbe client(peer.Port(), settings);
+    ExposedClient client(peer.Port(), settings);
     EXPECT_EQ(client.SendRequestByCurl(HTTP_METHOD_GET, false, 5), HTTP_RET_IO_ERROR);
     EXPECT_EQ(client.m_result, HTTP_RET_IO_ERROR);
     EXPECT_EQ(client.m_strCurlText, "");

@@ -114,7 +114,7 @@ TEST_P(TlsStallsOfLibcurl, EndWithTheTimeLimit) {
   RunOnSmallStack(kSmallStack, [&] {
     ClientSettings settings;
     settings.https = true;
-    ClientProbe client(peer.Port(), settings);
+    ExposedClient client(peer.Port(), settings);
     EXPECT_EQ(client.SendRequestByCurl(HTTP_METHOD_GET, false, 1), HTTP_RET_IO_ERROR);
   });
   EXPECT_THAT(HttpLog(log),

@@ -41,7 +41,7 @@ Outcome GetOverTls(int port, int timeout) {
   ClientSettings settings;
   settings.https = true;
   settings.timeout = timeout;
-  ClientProbe client(port, settings);
+  ExposedClient client(port, settings);
   Outcome outcome = OutcomeOf(client, client.SendRequestByGet());
   char piece[4096];
   int count = -1;

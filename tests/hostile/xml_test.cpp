@@ -346,7 +346,7 @@ TEST_P(Xml, OfASoapResponseIsParsedOrNotAsTheTableSays) {
   RunOnSmallStack(kSmallStack, [&] {
     xmlSetGenericErrorFunc(nullptr, SayNothing);
     xmlDoc* doc = nullptr;
-    ClientProbe client(peer.Port());
+    ExposedClient client(peer.Port());
     EXPECT_EQ(client.SendReqByXMLSocketPost("<q/>", doc), HTTP_RET_OK);
     EXPECT_EQ(client.m_result, HTTP_RET_OK);
     Take(doc, GetParam().parsed == Parsed::kByBoth || GetParam().parsed == Parsed::kBySoapAlone);
@@ -361,7 +361,7 @@ TEST_P(Xml, OfAResponseToAnXmlGetIsParsedOrNotAsTheTableSays) {
   RunOnSmallStack(kSmallStack, [&] {
     xmlSetGenericErrorFunc(nullptr, SayNothing);
     xmlDoc* doc = nullptr;
-    ClientProbe client(peer.Port());
+    ExposedClient client(peer.Port());
     EXPECT_EQ(client.SendReqByXMLGet(20), HTTP_RET_OK);
     EXPECT_EQ(client.GetResponseXML(doc), parsed);
     EXPECT_EQ(client.m_pRespBuf, nullptr);

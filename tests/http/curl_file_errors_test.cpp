@@ -71,7 +71,7 @@ TEST(ResponseFile, AnErrorFlagOfBeforeDoesNotFailATransferThatIsWhole) {
   FILE* const write_only = fdopen(fd, "we");
   EXPECT_EQ(fgetc(write_only), EOF);
   ASSERT_NE(ferror(write_only), 0);
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   LogCapture log;
   EXPECT_EQ(Fetch(client, write_only), HTTP_RET_OK);
   EXPECT_EQ(Fetch(client, write_only), HTTP_RET_OK);
@@ -87,7 +87,7 @@ TEST(ResponseFile, ADiskThatWasFullOnceFailsThatTransferAlone) {
   ScriptedPeer peer({Exchange(kOk), Exchange(kOk), Exchange(kOk)});
   FileInMemory space;
   FILE* const file = fopen("/dev/full", "we");
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   EXPECT_EQ(Fetch(client, file), HTTP_RET_IO_ERROR);
   ASSERT_GE(dup3(fileno(space.Stream()), fileno(file), O_CLOEXEC), 0);  // space again
   EXPECT_EQ(Fetch(client, file), HTTP_RET_OK);
@@ -99,7 +99,7 @@ TEST(ResponseFile, ADiskThatWasFullOnceFailsThatTransferAlone) {
 TEST(ResponseFile, AHeaderLineThatWasLostFailsTheTransferThoughAllElseWasWritten) {
   ScriptedPeer peer({Exchange(kOk), Exchange(kOk)});
   FailingStream file({1});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   LogCapture log;
   EXPECT_EQ(Fetch(client, file.Stream()), HTTP_RET_IO_ERROR);
   EXPECT_EQ(file.Written(), "\r\nbody");
@@ -112,7 +112,7 @@ TEST(ResponseFile, AHeaderLineThatWasLostFailsTheTransferThoughAllElseWasWritten
 TEST(ResponseFile, AFailureOfItsLastFlushFailsTheTransferAlsoAfterAnEarlierOne) {
   ScriptedPeer peer({Exchange(kOk), Exchange(kOk), Exchange(kOk)});
   FailingStream file({3, 6});  // a write for each header line and one for the body
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   EXPECT_EQ(Fetch(client, file.Stream()), HTTP_RET_IO_ERROR);
   EXPECT_EQ(Fetch(client, file.Stream()), HTTP_RET_IO_ERROR);
   EXPECT_EQ(Fetch(client, file.Stream()), HTTP_RET_OK);
@@ -121,7 +121,7 @@ TEST(ResponseFile, AFailureOfItsLastFlushFailsTheTransferAlsoAfterAnEarlierOne) 
 TEST(ResponseFile, AFailedTransferOrAnotherStatusIsToldAsSuchWhateverTheFile) {
   ScriptedPeer peer({Exchange("HTTP/1.1 404 No\r\nContent-Length: 4\r\n\r\ngone")});
   FailingStream file({1});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   LogCapture log;
   EXPECT_EQ(Fetch(client, file.Stream()), HTTP_RET_IO_ERROR);
   EXPECT_EQ(log.Messages(),

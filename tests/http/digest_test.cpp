@@ -34,10 +34,10 @@ DIGEST_ACCESS_AUTH SampleLogin() {
 }
 
 // A client with a challenge to answer.
-class Challenged : public ClientProbe {
+class Challenged : public ExposedClient {
  public:
   explicit Challenged(const std::string& challenge, const std::string& path = "cgi/a?x=1")
-      : ClientProbe(80, {path, HTTP_VERSION_1_1, "u", "p"}) {
+      : ExposedClient(80, {path, HTTP_VERSION_1_1, "u", "p"}) {
     m_strAuthenticate = challenge;
   }
 
@@ -60,7 +60,7 @@ std::string Ha2() {
 }  // namespace
 
 TEST(GenBasicAccessAuth, TheLineIsTheBase64OfUserColonPasswordWithoutACrlf) {
-  ClientProbe client(80, {"", HTTP_VERSION_NONE, "u", "p"});
+  ExposedClient client(80, {"", HTTP_VERSION_NONE, "u", "p"});
   EXPECT_EQ(client.GenBasicAccessAuth(), "Authorization: Basic dTpw");
 }
 
@@ -106,7 +106,7 @@ TEST(GenDigestAccessAuth, AnEmptyPathHasTheUriOfASlash) {
 }
 
 TEST(GenBasicAccessAuth, LongAndEmptyCredentialsAreEncodedWhole) {
-  ClientProbe client(80);
+  ExposedClient client(80);
   EXPECT_EQ(client.GenBasicAccessAuth(), "Authorization: Basic Og==");
   client.m_strUser = "Aladdin";
   client.m_strPassword = "open sesame";
@@ -116,14 +116,14 @@ TEST(GenBasicAccessAuth, LongAndEmptyCredentialsAreEncodedWhole) {
 }
 
 TEST(GenBasicAccessAuth, ItThrowsALogicErrorWhenTheEncoderHasNoMemory) {
-  ClientProbe client(80, {"", HTTP_VERSION_NONE, "u", "p"});
+  ExposedClient client(80, {"", HTTP_VERSION_NONE, "u", "p"});
   Faults faults;
   faults.FailFrom(Call::kMalloc, 1);
   EXPECT_THROW(client.GenBasicAccessAuth(), std::logic_error);
 }
 
 TEST(GenBasicAccessAuth, TheEncodingBufferIsFreedAndTheClientUnchanged) {
-  ClientProbe client(80, {"a", HTTP_VERSION_NONE, "u", "p"});
+  ExposedClient client(80, {"a", HTTP_VERSION_NONE, "u", "p"});
   client.m_strAuthorization = "kept";
   LogCapture log;
   client.GenBasicAccessAuth();

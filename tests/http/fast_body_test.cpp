@@ -274,11 +274,11 @@ TEST(IdleClient, KeepsFewPagesResidentAfterASmallGet) {
   GTEST_SKIP() << "the sanitizer's memory is not the library's";
 #endif
   RepeatingPeer server(Exchange("HTTP/1.0 200 OK\r\nContent-Type: text/plain\r\n\r\nsmall"));
-  std::vector<std::unique_ptr<ClientProbe>> clients;
+  std::vector<std::unique_ptr<ExposedClient>> clients;
   malloc_trim(0);
   const size_t before = ResidentKilobytes();
   for (int i = 0; i < 200; ++i) {
-    clients.push_back(std::make_unique<ClientProbe>(server.Port()));
+    clients.push_back(std::make_unique<ExposedClient>(server.Port()));
     ASSERT_EQ(clients.back()->SendRequestByGet(), HTTP_RET_OK);
   }
   EXPECT_LT(ResidentKilobytes(), before + 200 * 24);

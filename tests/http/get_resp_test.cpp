@@ -14,7 +14,7 @@ using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 
 // Connects and writes a request, as a caller does who builds it himself.
-void WriteOwnRequest(ClientProbe& client) {
+void WriteOwnRequest(ExposedClient& client) {
   const std::string request = "GET /own HTTP/1.1\r\n\r\n";
   ASSERT_EQ(client.m_pSocket->Connect(), 0);
   ASSERT_EQ(client.m_pSocket->WriteData(request.data(), static_cast<int>(request.size())),
@@ -23,7 +23,7 @@ void WriteOwnRequest(ClientProbe& client) {
 
 std::string GetRespOf(const std::string& response, const Transport& transport = {false, true}) {
   const auto peer = NewPeer(transport, {Exchange(response)});
-  ClientProbe client(peer->Port(), SettingsOf(transport));
+  ExposedClient client(peer->Port(), SettingsOf(transport));
   WriteOwnRequest(client);
   return client.GetResp();
 }
@@ -47,7 +47,7 @@ TEST(GetResp, ChunkedWithACapitalIsNotDecoded) {
 TEST(GetResp, AStatusThatIsNo2xxReturnsTheErrorTextAndLeavesTheBody) {
   for (const char* status : {"404 No", "302 Found", "401 No", "414 Long", "500 Oops", "199 x"}) {
     ScriptedPeer peer({Exchange("HTTP/1.1 "s + status + "\r\n\r\nunread")});
-    ClientProbe client(peer.Port());
+    ExposedClient client(peer.Port());
     WriteOwnRequest(client);
     EXPECT_EQ(client.GetResp(), kErrorText) << status;
     EXPECT_EQ(ReadBody(client), "unread");
@@ -72,7 +72,7 @@ TEST(GetResp, ItServesAfterAnUpload) {
   ForEachTransport([](const Transport& transport) {
     const auto peer = NewPeer(transport, {{ExpectUntil("\r\n\r\n"), ExpectExactly("multipart"),
                                            Send(Chunked(kWikipedia)), Close()}});
-    ClientProbe client(peer->Port(), SettingsOf(transport));
+    ExposedClient client(peer->Port(), SettingsOf(transport));
     ASSERT_EQ(client.OpenRawDataUpload(), HTTP_RET_OK);
     EXPECT_EQ(client.WriteData("multipart", 9), 9);
     EXPECT_EQ(client.GetResp(), "Wikipedia");
@@ -82,7 +82,7 @@ TEST(GetResp, ItServesAfterAnUpload) {
 TEST(GetResp, AfterASenderThatHasReadTheHeadItReturnsTheErrorText) {
   ForEachTransport([](const Transport& transport) {
     const auto peer = NewPeer(transport, {Exchange(Plain("body")), Exchange(Plain("body"))});
-    ClientProbe client(peer->Port(), SettingsOf(transport));
+    ExposedClient client(peer->Port(), SettingsOf(transport));
     EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
     EXPECT_EQ(client.GetResp(), kErrorText);
     EXPECT_EQ(client.SendRequestBySocketPost("a=1"), HTTP_RET_OK);
@@ -91,15 +91,15 @@ TEST(GetResp, AfterASenderThatHasReadTheHeadItReturnsTheErrorText) {
 }
 
 TEST(GetResp, WithoutAConnectionItReturnsTheErrorText) {
-  ClientProbe without_socket;
+  ExposedClient without_socket;
   EXPECT_EQ(without_socket.GetResp(), kErrorText);
-  ClientProbe unconnected(1);
+  ExposedClient unconnected(1);
   EXPECT_EQ(unconnected.GetResp(), kErrorText);
 }
 
 TEST(GetResp, TheHeadIsKeptAsAfterASender) {
   ScriptedPeer peer({Exchange("HTTP/1.1 206 Part\r\nContent-Type: text/x\r\n\r\nbody")});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   WriteOwnRequest(client);
   EXPECT_EQ(client.GetResp(), "body");
   EXPECT_EQ(client.m_statusCode, 206);
@@ -136,7 +136,7 @@ TEST(GetResp, AReadErrorReturnsTheErrorTextAndALine) {
   const int head_size = static_cast<int>(head.size());
   for (const std::string& response : {Plain("part"), Chunked("9\r\npart")}) {
     ScriptedPeer peer({Exchange(response)});
-    ClientProbe client(peer.Port(), SettingsOf({false, false}));
+    ExposedClient client(peer.Port(), SettingsOf({false, false}));
     WriteOwnRequest(client);
     LogCapture log;
     log.SetLevel(kHttpCategory, 6);

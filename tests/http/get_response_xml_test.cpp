@@ -19,7 +19,7 @@ using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 
 // Sends GETs that collect these bodies.
-void Collect(ClientProbe& client, const std::vector<std::string>& bodies) {
+void Collect(ExposedClient& client, const std::vector<std::string>& bodies) {
   for (const std::string& body : bodies) {
     ScriptedPeer peer({Exchange(Response(body))});
     client.m_port = peer.Port();
@@ -30,7 +30,7 @@ void Collect(ClientProbe& client, const std::vector<std::string>& bodies) {
 }  // namespace
 
 TEST(GetResponseXML, TwoGetsInARowLeaveBothBodiesWhichTogetherAreNoDocument) {
-  ClientProbe client(80);
+  ExposedClient client(80);
   Collect(client, {"<a/>", "<b/>"});
   EXPECT_EQ(Collected(client), "<a/><b/>");
   xmlDoc* doc = nullptr;
@@ -44,7 +44,7 @@ TEST(GetResponseXML, TwoGetsInARowLeaveBothBodiesWhichTogetherAreNoDocument) {
 }
 
 TEST(GetResponseXML, ASecondCallFindsNothingAndLeavesTheDocument) {
-  ClientProbe client(80);
+  ExposedClient client(80);
   Collect(client, {"<a>text</a>"});
   OwnedDoc response;
   LogCapture log;
@@ -66,7 +66,7 @@ TEST(GetResponseXML, ASecondCallFindsNothingAndLeavesTheDocument) {
 TEST(GetResponseXML, EachSendersResponseIsCollected) {
   for (const Sender& sender : Senders()) {
     ScriptedPeer peer({Exchange(Response("<of>" + std::string(sender.name) + "</of>"))});
-    ClientProbe client(peer.Port(), WithCredentials("127.0.0.1"));
+    ExposedClient client(peer.Port(), WithCredentials("127.0.0.1"));
     EXPECT_EQ(Send(sender, client), HTTP_RET_OK);
     OwnedDoc response;
     EXPECT_TRUE(client.GetResponseXML(response.doc));
@@ -77,7 +77,7 @@ TEST(GetResponseXML, EachSendersResponseIsCollected) {
 }
 
 TEST(GetResponseXML, AResponseOfManyPiecesIsCollectedWhole) {
-  ClientProbe client(80);
+  ExposedClient client(80);
   const std::string body = DocumentOf(300000);
   Collect(client, {body});
   EXPECT_TRUE(Collected(client) == body);
@@ -86,7 +86,7 @@ TEST(GetResponseXML, AResponseOfManyPiecesIsCollectedWhole) {
 }
 
 TEST(GetResponseXML, ABodyThatIsNoXmlIsANullDocumentAndIsEmptied) {
-  ClientProbe client(80);
+  ExposedClient client(80);
   Collect(client, {"no xml"});
   OwnedDoc earlier("<e/>");
   xmlDoc* doc = earlier.doc;
@@ -98,13 +98,13 @@ TEST(GetResponseXML, ABodyThatIsNoXmlIsANullDocumentAndIsEmptied) {
 }
 
 TEST(GetResponseXML, AResponseThatNobodyFetchesIsFreedWithTheClient) {
-  ClientProbe client(80);
+  ExposedClient client(80);
   Collect(client, {"<a/>"});
   EXPECT_EQ(Collected(client), "<a/>");
 }
 
 TEST(GetResponseXML, WithoutMemoryForTheDocumentItIsNone) {
-  ClientProbe client(80);
+  ExposedClient client(80);
   Collect(client, {"<a/>"});
   xmlDoc* doc = nullptr;
   {
@@ -116,7 +116,7 @@ TEST(GetResponseXML, WithoutMemoryForTheDocumentItIsNone) {
 }
 
 TEST(GetResponseXML, AfterAnAllocationFailedThereIsNothingToParse) {
-  ClientProbe client(80);
+  ExposedClient client(80);
   {
     Faults faults;
     faults.FailFrom(Call::kMalloc, 1).FailFrom(Call::kRealloc, 1);
@@ -131,7 +131,7 @@ TEST(GetResponseXML, AfterAnAllocationFailedThereIsNothingToParse) {
 }
 
 TEST(GetResponseXML, AfterALostResponseTheNextParseSeesNoUnsetByte) {
-  ClientProbe client(80);
+  ExposedClient client(80);
   Collect(client, {"<a/>"});
   const std::unique_ptr<char, decltype(&free)> lost(client.m_pRespBuf, &free);
   {

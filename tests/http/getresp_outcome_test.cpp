@@ -26,7 +26,7 @@ void ExpectOutcome(TWHttpClient& client, int result, int status) {
 
 TEST(GetRespOutcome, OfAFreshClientsUploadIsTheResponses) {
   ScriptedPeer peer({Upload("HTTP/1.1 200 OK\r\n\r\ntaken")});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   EXPECT_EQ(UploadWith(client), "taken");
   ExpectOutcome(client, HTTP_RET_OK, 200);
 }
@@ -34,7 +34,7 @@ TEST(GetRespOutcome, OfAFreshClientsUploadIsTheResponses) {
 TEST(GetRespOutcome, OfARefusedUploadIsTheRefusal) {
   ScriptedPeer peer(
       {Exchange("HTTP/1.1 200 OK\r\n\r\nfine"), Upload("HTTP/1.1 400 Bad Request\r\n\r\nreason")});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
   ExpectOutcome(client, HTTP_RET_OK, 200);
   EXPECT_EQ(UploadWith(client), kErrorText);
@@ -49,7 +49,7 @@ TEST(GetRespOutcome, OfAnUploadAfterAnEarlier404IsTheUploads) {
         tls ? std::make_unique<TlsScriptedPeer>(scripts) : std::make_unique<ScriptedPeer>(scripts);
     ClientSettings settings;
     settings.https = tls;
-    ClientProbe client(peer->Port(), settings);
+    ExposedClient client(peer->Port(), settings);
     EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
     ExpectOutcome(client, HTTP_RET_BAD_RESPONSE, 404);
     EXPECT_EQ(UploadWith(client), "taken");
@@ -59,7 +59,7 @@ TEST(GetRespOutcome, OfAnUploadAfterAnEarlier404IsTheUploads) {
 
 TEST(GetRespOutcome, OfAnUploadThatIsNotAnsweredIsAnIoError) {
   ScriptedPeer peer({Exchange("HTTP/1.1 200 OK\r\n\r\nfine"), Upload("")});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
   EXPECT_EQ(UploadWith(client), kErrorText);
   ExpectOutcome(client, HTTP_RET_IO_ERROR, 0);
@@ -67,14 +67,14 @@ TEST(GetRespOutcome, OfAnUploadThatIsNotAnsweredIsAnIoError) {
 
 TEST(GetRespOutcome, OfAnUploadThatAsksForCredentialsIsUnauthorized) {
   ScriptedPeer peer({Upload("HTTP/1.1 401 No\r\nWWW-Authenticate: Basic x\r\n\r\n")});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   EXPECT_EQ(UploadWith(client), kErrorText);
   ExpectOutcome(client, HTTP_RET_UNAUTHORIZED, 401);
 }
 
 TEST(GetRespOutcome, BeforeItIsCalledTheEarlierResponseIsKept) {
   ScriptedPeer peer({Exchange("HTTP/1.1 302 Found\r\n\r\n"), Upload("HTTP/1.1 200 OK\r\n\r\n")});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
   EXPECT_EQ(client.OpenRawDataUpload(), HTTP_RET_OK);
   ExpectOutcome(client, HTTP_RET_REDIRECT, 302);
@@ -89,14 +89,14 @@ TEST(GetRespOutcome, OfABodyThatBreaksOffIsItsHeads) {
   ClientSettings settings;
   settings.timeout = 1;
   settings.buffered = false;
-  ClientProbe client(peer.Port(), settings);
+  ExposedClient client(peer.Port(), settings);
   EXPECT_EQ(UploadWith(client), kErrorText);
   ExpectOutcome(client, HTTP_RET_OK, 200);
   peer.Finish();
 }
 
 TEST(GetRespOutcome, WithoutASocketIsAnIoError) {
-  ClientProbe client;
+  ExposedClient client;
   EXPECT_EQ(client.GetResp(), kErrorText);
   ExpectOutcome(client, HTTP_RET_IO_ERROR, 0);
 }

@@ -33,10 +33,10 @@ struct ClientSettings {
 };
 
 // A client that shows its fields.
-class ClientProbe : public TWHttpClient {
+class ExposedClient : public TWHttpClient {
  public:
-  ClientProbe() = default;
-  explicit ClientProbe(int port, const ClientSettings& s = {})
+  ExposedClient() = default;
+  explicit ExposedClient(int port, const ClientSettings& s = {})
       : TWHttpClient(s.host, port, s.path, s.user, s.password, s.timeout, s.https, s.buffered,
                      s.encode_query, s.basic_auth, s.version, s.keep) {}
 
@@ -66,9 +66,9 @@ class ClientProbe : public TWHttpClient {
 };
 
 // A client that has sent a GET to a peer which answered with `response` and closed.
-inline std::unique_ptr<ClientProbe> ClientAfter(const std::string& response) {
+inline std::unique_ptr<ExposedClient> ClientAfter(const std::string& response) {
   ScriptedPeer peer({Exchange(response)});
-  auto client = std::make_unique<ClientProbe>(peer.Port());
+  auto client = std::make_unique<ExposedClient>(peer.Port());
   EXPECT_EQ(client->SendRequestByGet(), HTTP_RET_OK);
   return client;
 }

@@ -59,34 +59,34 @@ static_assert(sizeof(SSLSocket) ==
               (sizeof(TWSocket) + sizeof(void*) - 1) / sizeof(void*) * sizeof(void*) +
                   2 * sizeof(void*));
 
-constexpr Field kClientFields[] = {TEST_FIELD(ClientProbe, m_pSocket),
-                                   TEST_FIELD(ClientProbe, m_mapContent),
-                                   TEST_FIELD(ClientProbe, m_connState),
-                                   TEST_FIELD(ClientProbe, m_bHttps),
-                                   TEST_FIELD(ClientProbe, m_bEncodeQuery),
-                                   TEST_FIELD(ClientProbe, m_result),
-                                   TEST_FIELD(ClientProbe, m_bBasicAuth),
-                                   TEST_FIELD(ClientProbe, m_statusCode),
-                                   TEST_FIELD(ClientProbe, m_port),
-                                   TEST_FIELD(ClientProbe, m_strHost),
-                                   TEST_FIELD(ClientProbe, m_strPath),
-                                   TEST_FIELD(ClientProbe, m_strUser),
-                                   TEST_FIELD(ClientProbe, m_strPassword),
-                                   TEST_FIELD(ClientProbe, m_strCookie),
-                                   TEST_FIELD(ClientProbe, m_strAuthenticate),
-                                   TEST_FIELD(ClientProbe, m_strAuthorization),
-                                   TEST_FIELD(ClientProbe, m_strTransferEncoding),
-                                   TEST_FIELD(ClientProbe, m_strEncodeKeep),
-                                   TEST_FIELD(ClientProbe, m_strCurlText),
-                                   TEST_FIELD(ClientProbe, m_pRespBuf),
-                                   TEST_FIELD(ClientProbe, m_respLen),
-                                   TEST_FIELD(ClientProbe, m_httpVersion),
-                                   TEST_FIELD(ClientProbe, m_pCurlRespFile)};
+constexpr Field kClientFields[] = {TEST_FIELD(ExposedClient, m_pSocket),
+                                   TEST_FIELD(ExposedClient, m_mapContent),
+                                   TEST_FIELD(ExposedClient, m_connState),
+                                   TEST_FIELD(ExposedClient, m_bHttps),
+                                   TEST_FIELD(ExposedClient, m_bEncodeQuery),
+                                   TEST_FIELD(ExposedClient, m_result),
+                                   TEST_FIELD(ExposedClient, m_bBasicAuth),
+                                   TEST_FIELD(ExposedClient, m_statusCode),
+                                   TEST_FIELD(ExposedClient, m_port),
+                                   TEST_FIELD(ExposedClient, m_strHost),
+                                   TEST_FIELD(ExposedClient, m_strPath),
+                                   TEST_FIELD(ExposedClient, m_strUser),
+                                   TEST_FIELD(ExposedClient, m_strPassword),
+                                   TEST_FIELD(ExposedClient, m_strCookie),
+                                   TEST_FIELD(ExposedClient, m_strAuthenticate),
+                                   TEST_FIELD(ExposedClient, m_strAuthorization),
+                                   TEST_FIELD(ExposedClient, m_strTransferEncoding),
+                                   TEST_FIELD(ExposedClient, m_strEncodeKeep),
+                                   TEST_FIELD(ExposedClient, m_strCurlText),
+                                   TEST_FIELD(ExposedClient, m_pRespBuf),
+                                   TEST_FIELD(ExposedClient, m_respLen),
+                                   TEST_FIELD(ExposedClient, m_httpVersion),
+                                   TEST_FIELD(ExposedClient, m_pCurlRespFile)};
 static_assert(StandInOrder(kVtable, kClientFields));
 
 // libcurl's callbacks see the buffer and its length as one record.
-static_assert(offsetof(ClientProbe, m_respLen) ==
-              offsetof(ClientProbe, m_pRespBuf) + sizeof(char*));
+static_assert(offsetof(ExposedClient, m_respLen) ==
+              offsetof(ExposedClient, m_pRespBuf) + sizeof(char*));
 
 // The level record: one byte, three reserved ones and 74 words leave no room for anything else.
 static_assert(std::is_standard_layout_v<TWDbgLogCfg>);

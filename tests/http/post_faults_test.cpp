@@ -189,7 +189,7 @@ TEST(UploadFaults, AFailingSocketResolutionConnectOrWriteLeavesTheClientIdle) {
   const ServerProcess server({{RespondWith(kChunks)}});
   for (const Call call : {Call::kSocket, Call::kGetaddrinfo, Call::kConnect, Call::kWrite}) {
     const DescriptorGuard guard;
-    ClientProbe client(server.Port());
+    ExposedClient client(server.Port());
     Faults faults;
     faults.FailFrom(call, 1);
     EXPECT_EQ(client.OpenRawDataUpload(), HTTP_RET_IO_ERROR) << CallName(call);
@@ -244,7 +244,7 @@ TEST(PostFaults, WhicheverCallOfTheLogFailsTheResultsAreTheSame) {
   for (const Call call : {Call::kOpen, Call::kFopen, Call::kFlock, Call::kLocaltimeR}) {
     Faults faults;
     faults.FailFrom(call, 1);
-    ClientProbe client(server.Port());
+    ExposedClient client(server.Port());
     std::string response;
     EXPECT_EQ(client.SendReqBySocketPost("x", response), HTTP_RET_OK) << CallName(call);
     EXPECT_EQ(response, "<a>text</a>");

@@ -54,14 +54,14 @@ inline std::ostream& operator<<(std::ostream& out, const SoapOutcome& outcome) {
 
 inline SoapOutcome SoapOf(const std::string& response, const ClientSettings& settings = {}) {
   ScriptedPeer peer({Exchange(response)});
-  ClientProbe client(peer.Port(), settings);
+  ExposedClient client(peer.Port(), settings);
   SoapOutcome outcome;
   outcome.result = client.SendReqBySocketPost("x", outcome.response);
   outcome.kept = client.m_result;
   return outcome;
 }
 
-inline SoapOutcome AuthOf(ClientProbe& client) {
+inline SoapOutcome AuthOf(ExposedClient& client) {
   SoapOutcome outcome;
   outcome.result = client.SendAuthReqBySocketPost("x", outcome.response);
   outcome.kept = client.m_result;

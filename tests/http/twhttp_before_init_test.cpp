@@ -16,7 +16,7 @@ constexpr char kPlainResponse[] = "HTTP/1.1 200 OK\r\nContent-Length: 4\r\n\r\nb
 // Before Init every operation fails with its own failure value.
 
 TEST(TWHttpClientBeforeInit, TheForwardsFail) {
-  ClientProbe client;
+  ExposedClient client;
   char buf[8] = "kept";
   for (const int state : {0, 1, 2}) {
     client.m_connState = state;
@@ -32,7 +32,7 @@ TEST(TWHttpClientBeforeInit, TheForwardsFail) {
 }
 
 TEST(TWHttpClientBeforeInit, TheRequestsFail) {
-  ClientProbe client;
+  ExposedClient client;
   EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_IO_ERROR);
   EXPECT_EQ(client.SendRequest(HTTP_METHOD_GET, "?"), HTTP_RET_IO_ERROR);
   EXPECT_EQ(client.SendRequest(HTTP_METHOD_POST, "?"), HTTP_RET_IO_ERROR);
@@ -42,7 +42,7 @@ TEST(TWHttpClientBeforeInit, TheRequestsFail) {
 }
 
 TEST(TWHttpClientBeforeInit, TheParsersFail) {
-  ClientProbe client;
+  ExposedClient client;
   EXPECT_EQ(client.CheckHttpResponse(), HTTP_RET_NOT_READY);
   EXPECT_EQ(client.CheckContentType(), HTTP_RET_IO_ERROR);
   client.m_connState = 1;
@@ -50,7 +50,7 @@ TEST(TWHttpClientBeforeInit, TheParsersFail) {
 }
 
 TEST(TWHttpClientBeforeInit, TheAccessorsWork) {
-  ClientProbe client;
+  ExposedClient client;
   std::string text;
   EXPECT_EQ(client.SetCookie("s=1"), 0);
   EXPECT_EQ(client.GetCookie(text), 0);

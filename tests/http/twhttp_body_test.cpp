@@ -38,7 +38,7 @@ Body BodyOf(TWHttpClient& client) {
 // The body that ReadBody returns after a GET.
 Body BodyOfResponse(const std::string& response, const Transport& transport = {false, true}) {
   const auto peer = NewPeer(transport, {Exchange(response)});
-  ClientProbe client(peer->Port(), SettingsOf(transport));
+  ExposedClient client(peer->Port(), SettingsOf(transport));
   EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
   return BodyOf(client);
 }
@@ -58,7 +58,7 @@ TEST(ReadBody, ItServesAfterEachSenderThatReadsTheHead) {
     for (const std::string& response : {Plain("Wikipedia"), Chunked(kWikipedia)}) {
       EXPECT_EQ(BodyOfResponse(response, transport), (Body{HTTP_RET_OK, "Wikipedia"}));
       const auto peer = NewPeer(transport, {Exchange(response), Exchange(response)});
-      ClientProbe client(peer->Port(), SettingsOf(transport));
+      ExposedClient client(peer->Port(), SettingsOf(transport));
       EXPECT_EQ(client.SendRequest(HTTP_METHOD_GET, "?"), HTTP_RET_OK);
       EXPECT_EQ(BodyOf(client), (Body{HTTP_RET_OK, "Wikipedia"}));
       EXPECT_EQ(client.SendRequestBySocketPost("a=1"), HTTP_RET_OK);
@@ -79,7 +79,7 @@ TEST(ReadBody, AfterAChallengeItReturnsTheSecondBody) {
       {{ExpectRequest(), Send("HTTP/1.1 401 No\r\nWWW-Authenticate: Basic x\r\n\r\nfirst"),
         DiscardUntilEnd()},
        Exchange(Plain("second"))});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   EXPECT_EQ(client.SendRequest(HTTP_METHOD_GET, "?"), HTTP_RET_OK);
   EXPECT_EQ(BodyOf(client), (Body{HTTP_RET_OK, "second"}));
 }
@@ -89,9 +89,9 @@ TEST(ReadBody, TheBodyOfAFailureIsReadAsWell) {
 }
 
 TEST(ReadBody, WithoutAHeadItIsAnIoError) {
-  ClientProbe without_socket;
+  ExposedClient without_socket;
   EXPECT_EQ(BodyOf(without_socket), (Body{HTTP_RET_IO_ERROR, ""}));
-  ClientProbe unconnected(1);
+  ExposedClient unconnected(1);
   EXPECT_EQ(BodyOf(unconnected), (Body{HTTP_RET_IO_ERROR, ""}));
   EXPECT_EQ(BodyOfResponse("HTTP/1.1 200 OK\r\nContent-Type:\r\n\r\nbody"),
             (Body{HTTP_RET_IO_ERROR, ""}));
@@ -99,7 +99,7 @@ TEST(ReadBody, WithoutAHeadItIsAnIoError) {
 
 TEST(ReadBody, WithoutAHeadTheChunkedCodingOfAnEarlierResponseDoesNotMakeItSucceed) {
   ScriptedPeer peer({Exchange(Chunked(kWikipedia)), RequestThenClose()});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
   EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
   EXPECT_EQ(client.m_result, HTTP_RET_IO_ERROR);
@@ -143,7 +143,7 @@ TEST(ReadBody, BodiesAroundThePieceOf8192BytesArriveWhole) {
 TEST(ReadBody, AReadErrorIsAnIoErrorWithWhatCameBefore) {
   ForEachTransport([](const Transport& transport) {
     const auto peer = NewPeer(transport, {Exchange(Plain("part"))});
-    ClientProbe client(peer->Port(), SettingsOf(transport));
+    ExposedClient client(peer->Port(), SettingsOf(transport));
     EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
     LogCapture log;
     {
@@ -176,7 +176,7 @@ TEST(ReadBody, AChunkedResponseSplitAtAnyByteHasTheSameBody) {
   for (size_t split = first; split < response.size(); ++split) {
     for (const bool buffered : {false, true}) {
       ScriptedPeer peer({ExchangeInPieces({response.substr(0, split), response.substr(split)})});
-      ClientProbe client(peer.Port(), SettingsOf({false, buffered}));
+      ExposedClient client(peer.Port(), SettingsOf({false, buffered}));
       EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
       EXPECT_EQ(BodyOf(client), (Body{HTTP_RET_OK, "Wikipedia"})) << split;
       peer.Finish();  // the client stays open for the line that it does not read
@@ -196,7 +196,7 @@ TEST(ReadBody, AChunkedResponseReadInPiecesOfAnySizeHasTheSameBody) {
 TEST(ReadBody, AChunkedResponseThatComesByteByByteHasTheSameBody) {
   ForEachTransport([](const Transport& transport) {
     const auto peer = NewPeer(transport, {ExchangeByteByByte(Chunked(kWikipedia))});
-    ClientProbe client(peer->Port(), SettingsOf(transport));
+    ExposedClient client(peer->Port(), SettingsOf(transport));
     EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
     EXPECT_EQ(BodyOf(client), (Body{HTTP_RET_OK, "Wikipedia"}));
     peer->Finish();  // the client stays open for the line that it does not read
@@ -245,7 +245,7 @@ TEST(ReadBody, AChunkSizeLineEndsAfter8192Bytes) {
 TEST(ReadBody, TrailerLinesAreLeftOnTheConnection) {
   ForEachTransport([](const Transport& transport) {
     const auto peer = NewPeer(transport, {Exchange(Chunked("1\r\nW\r\n0\r\nX: y\r\n\r\n"))});
-    ClientProbe client(peer->Port(), SettingsOf(transport));
+    ExposedClient client(peer->Port(), SettingsOf(transport));
     EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
     EXPECT_EQ(BodyOf(client), (Body{HTTP_RET_OK, "W"}));
     EXPECT_EQ(ReadBody(client), "X: y\r\n\r\n");
@@ -255,7 +255,7 @@ TEST(ReadBody, TrailerLinesAreLeftOnTheConnection) {
 TEST(ReadBody, ATransferEncodingStaysForALaterResponseWithoutOne) {
   ScriptedPeer peer({Exchange(Chunked(kWikipedia)), Exchange(Plain("3\r\nabc\r\n0\r\n\r\n")),
                      Exchange(Plain("hello"))});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   std::vector<std::string> bodies;
   for (int i = 0; i < 3; ++i) {
     EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
@@ -267,7 +267,7 @@ TEST(ReadBody, ATransferEncodingStaysForALaterResponseWithoutOne) {
 TEST(ReadBody, AReadErrorInTheMiddleOfAChunkIsAnIoErrorWithWhatCameBefore) {
   ForEachTransport([](const Transport& transport) {
     const auto peer = NewPeer(transport, {Exchange(Chunked("9\r\npart"))});
-    ClientProbe client(peer->Port(), SettingsOf(transport));
+    ExposedClient client(peer->Port(), SettingsOf(transport));
     EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
     LogCapture log;
     {
@@ -285,7 +285,7 @@ TEST(ReadBody, AReadErrorInTheMiddleOfAChunkIsAnIoErrorWithWhatCameBefore) {
 TEST(ReadBody, AReadErrorInPlaceOfAChunkSizeEndsTheBodyWithSuccess) {
   ForEachTransport([](const Transport& transport) {
     const auto peer = NewPeer(transport, {Exchange(Chunked("4\r\nWiki\r\n"))});
-    ClientProbe client(peer->Port(), SettingsOf(transport));
+    ExposedClient client(peer->Port(), SettingsOf(transport));
     EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
     LogCapture log;
     log.SetLevel(kHttpCategory, 5);
@@ -301,7 +301,7 @@ TEST(ReadBody, AResetInTheMiddleOfAChunkIsAnErrorUnlessAReadHasGivenBytesBefore)
   for (const bool buffered : {false, true}) {
     const Flag head_read;
     ScriptedPeer peer({{ExpectRequest(), Send(Chunked("9\r\npa")), WaitFor(head_read), Reset()}});
-    ClientProbe client(peer.Port(), SettingsOf({false, buffered}));
+    ExposedClient client(peer.Port(), SettingsOf({false, buffered}));
     EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
     head_read.Set();
     peer.Finish();

@@ -25,7 +25,7 @@ TEST(SendRequestByCurl, AGetSetsItsOptionsInOrder) {
   settings.user = "u";
   settings.password = "p";
   settings.host = "cam";
-  ClientProbe client(8080, settings);
+  ExposedClient client(8080, settings);
   Faults faults;
   faults.FailFrom(Call::kCurlEasyPerform, 1);
   client.SendRequestByCurl(HTTP_METHOD_GET, true, 17);
@@ -48,7 +48,7 @@ TEST(SendRequestByCurl, AGetSetsItsOptionsInOrder) {
 }
 
 TEST(SendRequestByCurl, APostWithoutVerificationIntoAFileSetsItsOptionsInOrder) {
-  ClientProbe client(8080, {"a=1&b=2"});
+  ExposedClient client(8080, {"a=1&b=2"});
   FileInMemory file;
   client.SetCurlRespFile(file.Stream());
   client.SetCookie("s=1");
@@ -75,7 +75,7 @@ TEST(SendRequestByCurl, APostWithoutVerificationIntoAFileSetsItsOptionsInOrder) 
 }
 
 TEST(SendRequestByCurl, AnotherMethodPostsWithoutAContentLengthOfItsOwn) {
-  ClientProbe client(80, {"a=1"});
+  ExposedClient client(80, {"a=1"});
   Faults faults;
   faults.FailFrom(Call::kCurlEasyPerform, 1);
   client.SendRequestByCurl(kPut, true, 1);
@@ -86,7 +86,7 @@ TEST(SendRequestByCurl, AnotherMethodPostsWithoutAContentLengthOfItsOwn) {
 }
 
 TEST(SendRequestByCurl, APostToAnEmptyHostHasTheUrlOfTheSchemeAlone) {
-  ClientProbe client(80, {"a=1"});
+  ExposedClient client(80, {"a=1"});
   client.m_strHost = "";
   Faults faults;
   faults.FailFrom(Call::kCurlEasyPerform, 1);
@@ -95,7 +95,7 @@ TEST(SendRequestByCurl, APostToAnEmptyHostHasTheUrlOfTheSchemeAlone) {
 }
 
 TEST(SendRequestByCurl, NoVersionAndNoAuthenticationSchemeIsSet) {
-  ClientProbe client(80, {"a", HTTP_VERSION_1_0});
+  ExposedClient client(80, {"a", HTTP_VERSION_1_0});
   Faults faults;
   faults.FailFrom(Call::kCurlEasyPerform, 1);
   client.SendRequestByCurl(HTTP_METHOD_GET, true, 1);
@@ -110,7 +110,7 @@ TEST(SendRequestByCurl, EachRefusedOptionEndsTheRequestAsAnIoError) {
                                 CURLOPT_USERAGENT, CURLOPT_HTTPHEADER};
   for (const CURLoption option : options) {
     SCOPED_TRACE(option);
-    ClientProbe client(80);
+    ExposedClient client(80);
     LogCapture log;
     Faults faults;
     faults.FailCurlOption(option, CURLE_OUT_OF_MEMORY);
@@ -128,7 +128,7 @@ TEST(SendRequestByCurl, EachRefusedFileOptionAndPostFieldsToo) {
                                 CURLOPT_WRITEDATA, CURLOPT_POSTFIELDS};
   for (const CURLoption option : options) {
     SCOPED_TRACE(option);
-    ClientProbe client(80);
+    ExposedClient client(80);
     FileInMemory file;
     client.SetCurlRespFile(file.Stream());
     LogCapture log;
@@ -149,7 +149,7 @@ TEST(SetCurlSSLOpt, ARefusalIsLoggedAtDebugBeforeTheErrorLine) {
       {CURLOPT_SSL_VERIFYPEER, "Failed to set CURLOPT_SSL_VERIFYPEER\n"},
       {CURLOPT_SSL_VERIFYHOST, "Failed to set CURLOPT_SSL_VERIFYHOST\n"}};
   for (const auto& [option, message] : table) {
-    ClientProbe client(80);
+    ExposedClient client(80);
     LogCapture log;
     Faults faults;
     faults.FailCurlOption(option, CURLE_OUT_OF_MEMORY);
@@ -167,7 +167,7 @@ TEST(SetCurlCallbackOpt, ARefusalIsLoggedAtErrorBeforeTheErrorLine) {
       {CURLOPT_WRITEFUNCTION, "Failed set CURLOPT_WRITEFUNCTION\n"},
       {CURLOPT_WRITEDATA, "Failed to CURLOPT_WRITEDATA\n"}};
   for (const auto& [option, message] : table) {
-    ClientProbe client(80);
+    ExposedClient client(80);
     LogCapture log;
     Faults faults;
     faults.FailCurlOption(option, CURLE_OUT_OF_MEMORY);
@@ -181,7 +181,7 @@ TEST(SetCurlCallbackOpt, ARefusalIsLoggedAtErrorBeforeTheErrorLine) {
 
 TEST(SendRequestByCurl, EachHeaderWithoutMemoryEndsTheRequest) {
   const int failures = ForEachFailingCall(Call::kCurlSlistAppend, [](Faults& faults) {
-    ClientProbe client(80, {"a=1"});
+    ExposedClient client(80, {"a=1"});
     client.SetCookie("s=1");
     faults.FailFrom(Call::kCurlEasyPerform, 1);
     EXPECT_EQ(client.SendRequestByCurl(HTTP_METHOD_POST, true, 1), HTTP_RET_IO_ERROR);
@@ -193,7 +193,7 @@ TEST(SendRequestByCurl, EachHeaderWithoutMemoryEndsTheRequest) {
 }
 
 TEST(SendRequestByCurl, TheHandleIsReleasedBeforeTheHeaderList) {
-  ClientProbe client(80);
+  ExposedClient client(80);
   std::string order;
   Faults faults;
   faults.FailFrom(Call::kCurlEasyPerform, 1)
@@ -205,7 +205,7 @@ TEST(SendRequestByCurl, TheHandleIsReleasedBeforeTheHeaderList) {
 
 TEST(SendRequestByCurl, BelowDebugOnlyRefusedOptionsAreLogged) {
   LogCapture log(1);
-  ClientProbe client(80);
+  ExposedClient client(80);
   Faults faults;
   faults.FailFrom(Call::kCurlEasyPerform, 1);
   client.SendRequestByCurl(HTTP_METHOD_GET, true, 1);
@@ -221,7 +221,7 @@ TEST(SendRequestByCurl, EachFailingCallOfLibcurlIsAnIoErrorAndReleasesTheHandle)
   for (const Call call : {Call::kCurlEasySetopt, Call::kCurlEasyPerform, Call::kCurlEasyGetinfo}) {
     for (const TW_HTTP_METHOD method : {HTTP_METHOD_GET, HTTP_METHOD_POST}) {
       ForEachFailingCall(call, [&](Faults& faults) {
-        ClientProbe client(server.Port());
+        ExposedClient client(server.Port());
         const int result = client.SendRequestByCurl(method, false, 10);
         EXPECT_EQ(result, faults.Struck() ? HTTP_RET_IO_ERROR : HTTP_RET_OK);
         EXPECT_EQ(client.m_result, result);

@@ -32,7 +32,7 @@ UrlAndBody SplitOf(const std::string& path, const std::string& separators) {
   ClientSettings settings;
   settings.path = path;
   settings.host = "h";
-  ClientProbe client(80, settings);
+  ExposedClient client(80, settings);
   Faults faults;
   faults.FailFrom(Call::kCurlEasyPerform, 1);
   client.SendRequestByPost(separators);
@@ -50,7 +50,7 @@ ClientSettings WithCredentials(HTTP_VERSION version = HTTP_VERSION_NONE) {
 
 int ResultOfResponse(const std::string& response) {
   ScriptedPeer peer({Exchange(response)});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   const int result = client.SendRequestByPost("?");
   EXPECT_EQ(client.m_result, result);
   EXPECT_EQ(client.m_connState, result == HTTP_RET_OK ? 1 : 0);
@@ -84,7 +84,7 @@ TEST(SendRequestByPost, A302OrA404IsAnIoErrorAndA200OrA299IsOk) {
 }
 
 TEST(SendRequestByPost, LibcurlCode60IsAnIoErrorToo) {
-  ClientProbe client(80);
+  ExposedClient client(80);
   Faults faults;
   faults.FailNth(Call::kCurlEasyPerform, 1, 0, 60);
   EXPECT_EQ(client.SendRequestByPost("?"), HTTP_RET_IO_ERROR);
@@ -102,7 +102,7 @@ TEST(SendRequestByPost, ASeparatorAtEitherEndAndNoSeparators) {
 }
 
 TEST(SendRequestByPost, AnEmptyHostLeavesSchemeAndPathAlone) {
-  ClientProbe client(80, {"x/y?a"});
+  ExposedClient client(80, {"x/y?a"});
   client.m_strHost = "";
   Faults faults;
   faults.FailFrom(Call::kCurlEasyPerform, 1);
@@ -112,7 +112,7 @@ TEST(SendRequestByPost, AnEmptyHostLeavesSchemeAndPathAlone) {
 
 TEST(SendRequestByPost, TheOptionsAreSetInOrder) {
   for (const HTTP_VERSION version : {HTTP_VERSION_NONE, HTTP_VERSION_1_0, HTTP_VERSION_1_1}) {
-    ClientProbe client(80, WithCredentials(version));
+    ExposedClient client(80, WithCredentials(version));
     Faults faults;
     faults.FailFrom(Call::kCurlEasyPerform, 1);
     client.SendRequestByPost("?");
@@ -133,7 +133,7 @@ TEST(SendRequestByPost, TheOptionsAreSetInOrder) {
 }
 
 TEST(SendRequestByPost, AVersionThatIsNotKnownIsNotHandedOn) {
-  ClientProbe client(80, WithCredentials(static_cast<HTTP_VERSION>(3)));
+  ExposedClient client(80, WithCredentials(static_cast<HTTP_VERSION>(3)));
   Faults faults;
   faults.FailFrom(Call::kCurlEasyPerform, 1);
   client.SendRequestByPost("?");
@@ -152,7 +152,7 @@ TEST(SendRequestByPost, EachRefusedOptionHasItsLineAndEndsTheRequest) {
       {CURLOPT_HTTPAUTH, "Failed to set auth, return value=27\n"},
       {CURLOPT_WRITEFUNCTION, "Failed to set WRITEFUNCTION, return value=27\n"}};
   for (const auto& [option, message] : table) {
-    ClientProbe client(port.Port(), WithCredentials(HTTP_VERSION_1_1));
+    ExposedClient client(port.Port(), WithCredentials(HTTP_VERSION_1_1));
     LogCapture log;
     Faults faults;
     faults.FailCurlOption(option, CURLE_OUT_OF_MEMORY);
@@ -166,7 +166,7 @@ TEST(SendRequestByPost, EachRefusedOptionHasItsLineAndEndsTheRequest) {
 }
 
 TEST(SendRequestByPost, WithoutAHandleTheResultStaysAndALineIsLogged) {
-  ClientProbe client(80);
+  ExposedClient client(80);
   client.m_result = HTTP_RET_REDIRECT;
   LogCapture log;
   Faults faults;
@@ -179,7 +179,7 @@ TEST(SendRequestByPost, WithoutAHandleTheResultStaysAndALineIsLogged) {
 
 TEST(SendRequestByPost, AFailedTransferIsLoggedAtDebug) {
   const ClosedPort port;
-  ClientProbe client(port.Port());
+  ExposedClient client(port.Port());
   LogCapture log;
   EXPECT_EQ(client.SendRequestByPost("?"), HTTP_RET_IO_ERROR);
   EXPECT_THAT(log.Lines(),
@@ -197,7 +197,7 @@ TEST(SendRequestByPost, AnotherStatusIsLoggedAtDebug) {
 
 TEST(SendRequestByPost, AStatusThatCannotBeReadIsLoggedAsZero) {
   ScriptedPeer peer({Exchange(kOk)});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   LogCapture log;
   Faults faults;
   faults.FailNth(Call::kCurlEasyGetinfo, 1);
@@ -217,7 +217,7 @@ TEST(SendRequestByPost, TheRequestIsAPlainFormWithoutAnyOfTheClientsHeaders) {
   ScriptedPeer peer({Exchange(kOk)});
   ClientSettings settings = WithCredentials();
   settings.https = true;  // is ignored on this path
-  ClientProbe client(peer.Port(), settings);
+  ExposedClient client(peer.Port(), settings);
   client.SetCookie("s=1");
   EXPECT_EQ(client.SendRequestByPost("?"), HTTP_RET_OK);
   EXPECT_THAT(peer.Received(0),
@@ -229,7 +229,7 @@ TEST(SendRequestByPost, TheRequestIsAPlainFormWithoutAnyOfTheClientsHeaders) {
 
 TEST(SendRequestByPost, AnEmptyBodyIsPosted) {
   ScriptedPeer peer({Exchange(kOk)});
-  ClientProbe client(peer.Port(), {"x.cgi"});
+  ExposedClient client(peer.Port(), {"x.cgi"});
   EXPECT_EQ(client.SendRequestByPost("?"), HTTP_RET_OK);
   EXPECT_THAT(peer.Received(0), AllOf(StartsWith("POST /x.cgi HTTP/1.1\r\n"),
                                       HasSubstr("\r\nContent-Length: 0\r\n")));
@@ -237,7 +237,7 @@ TEST(SendRequestByPost, AnEmptyBodyIsPosted) {
 
 TEST(SendRequestByPost, TheChosenVersionIsSent) {
   ScriptedPeer peer({Exchange("HTTP/1.0 200 OK\r\nContent-Length: 0\r\n\r\n")});
-  ClientProbe client(peer.Port(), WithCredentials(HTTP_VERSION_1_0));
+  ExposedClient client(peer.Port(), WithCredentials(HTTP_VERSION_1_0));
   EXPECT_EQ(client.SendRequestByPost("?"), HTTP_RET_OK);
   EXPECT_THAT(peer.Received(0), StartsWith("POST /x.cgi HTTP/1.0\r\n"));
 }
@@ -250,7 +250,7 @@ TEST(SendRequestByPost, AChallengeOfDigestOrBasicIsAnswered) {
     ScriptedPeer peer({Exchange("HTTP/1.1 401 No\r\nConnection: close\r\nWWW-Authenticate: " +
                                 std::string(challenge) + "\r\nContent-Length: 0\r\n\r\n"),
                        Exchange(kOk)});
-    ClientProbe client(peer.Port(), WithCredentials());
+    ExposedClient client(peer.Port(), WithCredentials());
     EXPECT_EQ(client.SendRequestByPost("?"), HTTP_RET_OK);
     EXPECT_THAT(peer.Received(1), AllOf(HasSubstr(authorization), EndsWith("\r\n\r\na=1")));
   }
@@ -261,13 +261,13 @@ TEST(SendRequestByPost, ANonceThatIsAlwaysStaleIsAskedFor30TimesAtMost) {
       "HTTP/1.1 401 No\r\nConnection: close\r\nContent-Length: 0\r\n"
       "WWW-Authenticate: Digest realm=\"r\", nonce=\"n\", stale=true\r\n\r\n";
   ScriptedPeer peer(std::vector<Script>(31, Exchange(refusal)));
-  ClientProbe client(peer.Port(), WithCredentials());
+  ExposedClient client(peer.Port(), WithCredentials());
   EXPECT_EQ(client.SendRequestByPost("?"), HTTP_RET_IO_ERROR);
 }
 
 TEST(SendRequestByPost, TheBodyOfTheResponseIsThrownAway) {
   ScriptedPeer peer({Exchange(kOk)});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   client.m_strCurlText = "old";
   testing::internal::CaptureStdout();
   EXPECT_EQ(client.SendRequestByPost("?"), HTTP_RET_OK);
@@ -281,7 +281,7 @@ TEST(SendRequestByPost, EachFailingCallOfLibcurlIsAnIoErrorAndReleasesTheHandle)
   RepeatingPeer server(Exchange(kOk));
   for (const Call call : {Call::kCurlEasySetopt, Call::kCurlEasyPerform, Call::kCurlEasyGetinfo}) {
     ForEachFailingCall(call, [&](Faults& faults) {
-      ClientProbe client(server.Port(), {"x"});
+      ExposedClient client(server.Port(), {"x"});
       const int result = client.SendRequestByPost("?");
       EXPECT_EQ(result, faults.Struck() ? HTTP_RET_IO_ERROR : HTTP_RET_OK);
       EXPECT_EQ(client.m_result, result);

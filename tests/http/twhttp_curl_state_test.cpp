@@ -16,26 +16,26 @@ constexpr char kByCurl[] =
     "HTTP/1.1 200 OK\r\nContent-Type: text/b\r\nContent-Length: 2\r\n"
     "Set-Cookie: s=2; Path=/\r\n\r\n{}";
 
-using Request = std::function<int(ClientProbe&)>;
+using Request = std::function<int(ExposedClient&)>;
 
 // Each request through libcurl that needs no document.
 const Request kRequests[] = {
-    [](ClientProbe& client) { return client.SendRequestByCurl(HTTP_METHOD_GET, true, 10); },
-    [](ClientProbe& client) { return client.SendRequestByPost("?"); },
-    [](ClientProbe& client) { return client.SendReqByXMLGet(10); },
-    [](ClientProbe& client) { return client.SendReqByXMLDelete(); },
+    [](ExposedClient& client) { return client.SendRequestByCurl(HTTP_METHOD_GET, true, 10); },
+    [](ExposedClient& client) { return client.SendRequestByPost("?"); },
+    [](ExposedClient& client) { return client.SendReqByXMLGet(10); },
+    [](ExposedClient& client) { return client.SendReqByXMLDelete(); },
 };
 
 class CurlState : public ::testing::TestWithParam<size_t> {
  protected:
-  int Send(ClientProbe& client) { return kRequests[GetParam()](client); }
+  int Send(ExposedClient& client) { return kRequests[GetParam()](client); }
 };
 INSTANTIATE_TEST_SUITE_P(Request, CurlState, ::testing::Range<size_t>(0, std::size(kRequests)));
 
 // A GET over the socket, then a request through libcurl that is answered by `response`.
 void ExpectHeadStays(const std::string& response, const Request& send) {
   ScriptedPeer peer({Exchange(kFirst), Exchange(response)});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   ASSERT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
   send(client);
   EXPECT_EQ(client.m_statusCode, 206);
@@ -47,17 +47,17 @@ void ExpectHeadStays(const std::string& response, const Request& send) {
 }
 
 TEST_P(CurlState, AResponseLeavesWhatTheSocketsHeadHasLeft) {
-  ExpectHeadStays(kByCurl, [this](ClientProbe& client) { return Send(client); });
+  ExpectHeadStays(kByCurl, [this](ExposedClient& client) { return Send(client); });
 }
 
 TEST_P(CurlState, AFailureLeavesWhatTheSocketsHeadHasLeft) {
   ExpectHeadStays("HTTP/1.1 500 No\r\nContent-Length: 0\r\n\r\n",
-                  [this](ClientProbe& client) { return Send(client); });
+                  [this](ExposedClient& client) { return Send(client); });
 }
 
 TEST_P(CurlState, ASuccessClosesTheSocketsHeadForReading) {
   ScriptedPeer peer({Exchange(kFirst), Exchange(kByCurl)});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   ASSERT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
   EXPECT_EQ(Content(client, HTTP_CONTENT_TYPE), "text/a");
   EXPECT_EQ(Send(client), HTTP_RET_OK);
@@ -69,7 +69,7 @@ TEST_P(CurlState, ASuccessClosesTheSocketsHeadForReading) {
 
 TEST_P(CurlState, TheResultIsTheLastRequestsAndTheStatusTheSockets) {
   ScriptedPeer peer({Exchange("HTTP/1.1 404 No\r\n\r\n"), Exchange(kByCurl)});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   ASSERT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
   EXPECT_EQ(Send(client), HTTP_RET_OK);
   int status = 0;

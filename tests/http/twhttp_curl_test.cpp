@@ -22,7 +22,7 @@ constexpr char kOk[] = "HTTP/1.1 200 OK\r\nContent-Length: 4\r\n\r\nbody";
 // The outcome of a request whose peer answers with `response`.
 int ResultOfResponse(const std::string& response, TW_HTTP_METHOD method = HTTP_METHOD_GET) {
   ScriptedPeer peer({Exchange(response)});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   const int result = client.SendRequestByCurl(method, true, 10);
   EXPECT_EQ(client.m_result, result);
   EXPECT_EQ(client.m_connState, result == HTTP_RET_OK ? 1 : 0);
@@ -37,7 +37,7 @@ std::string Response(const std::string& status) {
 
 TEST(SendRequestByCurl, AGetWithAnEmptyHostHasTheUrlOfSchemeAndPathAlone) {
   for (const bool https : {false, true}) {
-    ClientProbe client(80);
+    ExposedClient client(80);
     client.m_strHost = "";
     client.m_strPath = "x/y";
     client.m_bHttps = https;
@@ -50,7 +50,7 @@ TEST(SendRequestByCurl, AGetWithAnEmptyHostHasTheUrlOfSchemeAndPathAlone) {
 
 TEST(SendRequestByCurl, APostSendsThePathAsItsBodyToTheHostAlone) {
   ScriptedPeer peer({Exchange(kOk)});
-  ClientProbe client(peer.Port(), {"a=1"});
+  ExposedClient client(peer.Port(), {"a=1"});
   Faults faults;
   EXPECT_EQ(client.SendRequestByCurl(HTTP_METHOD_POST, true, 10), HTTP_RET_OK);
   EXPECT_EQ(faults.OptionGiven(CURLOPT_URL).text, "http://127.0.0.1");
@@ -69,7 +69,7 @@ TEST(SendRequestByCurl, A302OrA404IsAnIoErrorAndA200OrA299IsOk) {
 
 TEST(SendRequestByCurl, LibcurlCode60IsACertificateErrorAndAnyOtherAnIoError) {
   for (const int code : {60, 1, 6, 7, 28, 35, 51, 52, 56, 59, 61, 77}) {
-    ClientProbe client(80);
+    ExposedClient client(80);
     Faults faults;
     faults.FailNth(Call::kCurlEasyPerform, 1, 0, code);
     const int expected = code == 60 ? HTTP_RET_CERT_ERROR : HTTP_RET_IO_ERROR;
@@ -85,7 +85,7 @@ TEST(SendRequestByCurl, TheResponseFileGetsHeadersAndBodyWithoutStatusAndTransfe
       {Exchange("HTTP/1.1 200 OK\r\nServer: s\r\nTransfer-Encoding: chunked\r\n"
                 "Content-Type: text/plain\r\n\r\n3\r\nabc\r\n2\r\nde\r\n0\r\n\r\n")});
   FileInMemory file;
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   client.SetCurlRespFile(file.Stream());
   client.m_strCurlText = "old";
   EXPECT_EQ(client.SendRequestByCurl(HTTP_METHOD_GET, true, 10), HTTP_RET_OK);
@@ -111,7 +111,7 @@ TEST(TWCurlInit, AFailedInitialisationIsLoggedAndTriedAgainByTheNextCall) {
 }
 
 TEST(SendRequestByCurl, AFailedInitialisationLeavesTheResultAndAFailedHandleToo) {
-  ClientProbe client(80);
+  ExposedClient client(80);
   client.m_result = HTTP_RET_REDIRECT;
   client.m_strCurlText = "old";
   LogCapture log;
@@ -126,7 +126,7 @@ TEST(SendRequestByCurl, AFailedInitialisationLeavesTheResultAndAFailedHandleToo)
 }
 
 TEST(SendRequestByCurl, AFailedTransferIsLoggedAtDebug) {
-  ClientProbe client(80);
+  ExposedClient client(80);
   LogCapture log;
   Faults faults;
   faults.FailNth(Call::kCurlEasyPerform, 1, 0, 60);
@@ -146,7 +146,7 @@ TEST(SendRequestByCurl, AnotherStatusIsLoggedAtDebug) {
 
 TEST(SendRequestByCurl, AStatusThatCannotBeReadIsLoggedAsZero) {
   ScriptedPeer peer({Exchange(kOk)});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   LogCapture log;
   Faults faults;
   faults.FailNth(Call::kCurlEasyGetinfo, 1);
@@ -169,7 +169,7 @@ TEST(SendRequestByCurl, TheBoundariesOfSuccessAre200And299) {
 
 TEST(SendRequestByCurl, ANon2xxResponseLeavesTheStateAndKeepsTheBody) {
   ScriptedPeer peer({Exchange("HTTP/1.1 404 No\r\nContent-Length: 4\r\n\r\ngone")});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   client.m_connState = 2;
   EXPECT_EQ(client.SendRequestByCurl(HTTP_METHOD_GET, true, 10), HTTP_RET_IO_ERROR);
   EXPECT_EQ(client.m_connState, 2);
@@ -178,7 +178,7 @@ TEST(SendRequestByCurl, ANon2xxResponseLeavesTheStateAndKeepsTheBody) {
 
 TEST(SendRequestByCurl, ACutBodyIsKeptThoughTheTransferFailed) {
   ScriptedPeer peer({Exchange("HTTP/1.1 200 OK\r\nContent-Length: 9\r\n\r\nhalf")});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   EXPECT_EQ(client.SendRequestByCurl(HTTP_METHOD_GET, true, 10), HTTP_RET_IO_ERROR);
   EXPECT_EQ(client.m_strCurlText, "half");
 }
@@ -189,7 +189,7 @@ TEST(SendRequestByCurl, TheRequestCarriesCredentialsAgentHeadersAndCookie) {
   settings.path = "x?y=1";
   settings.user = "u";
   settings.password = "p";
-  ClientProbe client(peer.Port(), settings);
+  ExposedClient client(peer.Port(), settings);
   client.SetCookie("s=1");
   EXPECT_EQ(client.SendRequestByCurl(HTTP_METHOD_GET, true, 10), HTTP_RET_OK);
   EXPECT_EQ(client.m_strCurlText, "body");
@@ -204,7 +204,7 @@ TEST(SendRequestByCurl, TheRequestCarriesCredentialsAgentHeadersAndCookie) {
 TEST(SendRequestByCurl, NothingSurvivesFromOneRequestToTheNext) {
   ScriptedPeer peer({Exchange("HTTP/1.1 200 OK\r\nSet-Cookie: c=1\r\n\r\nfirst"),
                      Exchange("HTTP/1.1 200 OK\r\nContent-Length: 6\r\n\r\nsecond")});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   EXPECT_EQ(client.SendRequestByCurl(HTTP_METHOD_GET, true, 10), HTTP_RET_OK);
   EXPECT_EQ(client.SendRequestByCurl(HTTP_METHOD_GET, true, 10), HTTP_RET_OK);
   EXPECT_EQ(client.m_strCurlText, "second");
@@ -214,7 +214,7 @@ TEST(SendRequestByCurl, NothingSurvivesFromOneRequestToTheNext) {
 
 TEST(SendRequestByCurl, ANullFileSwitchesBackToMemory) {
   ScriptedPeer peer({Exchange(kOk)});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   client.SetCurlRespFile(stdout);
   client.SetCurlRespFile(nullptr);
   EXPECT_EQ(client.SendRequestByCurl(HTTP_METHOD_GET, true, 10), HTTP_RET_OK);
@@ -225,7 +225,7 @@ TEST(SendRequestByCurl, TheFileIsWrittenFromItsPositionAndStaysOpen) {
   ScriptedPeer peer({Exchange(kOk), Exchange(kOk)});
   FileInMemory file;
   fputs("before|", file.Stream());
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   client.SetCurlRespFile(file.Stream());
   EXPECT_EQ(client.SendRequestByCurl(HTTP_METHOD_GET, true, 10), HTTP_RET_OK);
   EXPECT_EQ(client.SendRequestByCurl(HTTP_METHOD_GET, true, 10), HTTP_RET_OK);
@@ -237,7 +237,7 @@ TEST(SendRequestByCurl, TheFileIsWrittenFromItsPositionAndStaysOpen) {
 TEST(SendRequestByCurl, AFileThatTakesNothingFailsTheTransfer) {
   ScriptedPeer peer({{ExpectRequest(), Send(kOk), DiscardUntilEnd()}});
   FILE* file = fopen("/dev/null", "re");
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   client.SetCurlRespFile(file);
   EXPECT_EQ(client.SendRequestByCurl(HTTP_METHOD_GET, true, 10), HTTP_RET_IO_ERROR);
   fclose(file);
@@ -246,7 +246,7 @@ TEST(SendRequestByCurl, AFileThatTakesNothingFailsTheTransfer) {
 TEST(SendRequestByCurl, AFileOnAFullDiskIsAnIoErrorThoughStdioTookTheBytes) {
   ScriptedPeer peer({Exchange(kOk)});
   FILE* file = fopen("/dev/full", "we");
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   client.SetCurlRespFile(file);
   LogCapture log;
   EXPECT_EQ(client.SendRequestByCurl(HTTP_METHOD_GET, true, 10), HTTP_RET_IO_ERROR);
@@ -258,7 +258,7 @@ TEST(SendRequestByCurl, AFileOnAFullDiskIsAnIoErrorThoughStdioTookTheBytes) {
 TEST(SendRequestByCurl, ItsTimeoutLimitsTheWholeTransfer) {
   ScriptedPeer peer({{ExpectRequest(), Send("HTTP/1.1 200 OK\r\nContent-Length: 9\r\n\r\nhalf"),
                       DiscardUntilEnd()}});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   LogCapture log;
   EXPECT_EQ(client.SendRequestByCurl(HTTP_METHOD_GET, true, 1), HTTP_RET_IO_ERROR);
   EXPECT_THAT(log.Messages(), ElementsAre("Failed to make http connection, return value=28\n"));
@@ -266,7 +266,7 @@ TEST(SendRequestByCurl, ItsTimeoutLimitsTheWholeTransfer) {
 
 TEST(SendRequestByCurl, ARefusedConnectionIsAnIoErrorWithoutADescriptorLeft) {
   const ClosedPort port;
-  ClientProbe client(port.Port());
+  ExposedClient client(port.Port());
   client.SendRequestByCurl(HTTP_METHOD_GET, true, 5);  // libcurl's own lasting descriptors
   const DescriptorGuard guard;
   EXPECT_EQ(client.SendRequestByCurl(HTTP_METHOD_GET, true, 5), HTTP_RET_IO_ERROR);
@@ -274,7 +274,7 @@ TEST(SendRequestByCurl, ARefusedConnectionIsAnIoErrorWithoutADescriptorLeft) {
 
 TEST(SendRequestByCurl, ItNeverTouchesTheSocket) {
   ScriptedPeer peer({Exchange(kOk)});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   Faults faults;
   EXPECT_EQ(client.SendRequestByCurl(HTTP_METHOD_GET, true, 10), HTTP_RET_OK);
   EXPECT_EQ(faults.Count(Call::kConnect), 0);

@@ -20,7 +20,7 @@ TEST(SendRequestByCurlTls, ATrustedAuthorityIsVerified) {
   const TrustedAuthority trusted(peer.CaFile());
   ClientSettings settings;
   settings.https = true;
-  ClientProbe client(peer.Port(), settings);
+  ExposedClient client(peer.Port(), settings);
   EXPECT_EQ(client.SendRequestByCurl(HTTP_METHOD_GET, true, 10), HTTP_RET_OK);
   EXPECT_EQ(client.m_strCurlText, "body");
   EXPECT_THAT(peer.Received(0), StartsWith("GET /a.cgi HTTP/1.1\r\n"));
@@ -34,7 +34,7 @@ TEST(SendRequestByCurlTls, AnUnknownAuthorityIsACertificateError) {
   const TrustedAuthority trusted(other.CaFile());
   ClientSettings settings;
   settings.https = true;
-  ClientProbe client(peer.Port(), settings);
+  ExposedClient client(peer.Port(), settings);
   EXPECT_EQ(client.SendRequestByCurl(HTTP_METHOD_GET, true, 10), HTTP_RET_CERT_ERROR);
   EXPECT_EQ(client.m_result, HTTP_RET_CERT_ERROR);
 }
@@ -48,7 +48,7 @@ TEST(SendRequestByCurlTls, AnExpiredCertificateOrAnotherHostsIsACertificateError
     const TrustedAuthority trusted(peer.CaFile());
     ClientSettings settings;
     settings.https = true;
-    ClientProbe client(peer.Port(), settings);
+    ExposedClient client(peer.Port(), settings);
     EXPECT_EQ(client.SendRequestByCurl(HTTP_METHOD_GET, true, 10), HTTP_RET_CERT_ERROR);
   }
 }
@@ -59,7 +59,7 @@ TEST(SendRequestByCurlTls, WithoutVerificationAnyCertificateIsTaken) {
   TlsScriptedPeer peer({Exchange(kOk)}, tls);
   ClientSettings settings;
   settings.https = true;
-  ClientProbe client(peer.Port(), settings);
+  ExposedClient client(peer.Port(), settings);
   EXPECT_EQ(client.SendRequestByCurl(HTTP_METHOD_GET, false, 10), HTTP_RET_OK);
   EXPECT_EQ(client.m_strCurlText, "body");
 }
@@ -68,7 +68,7 @@ TEST(SendRequestByCurlTls, APeerThatSpeaksNoTlsIsAnIoError) {
   ScriptedPeer peer({{ExpectBytes(1), Send("HTTP/1.1 400 No\r\n\r\n"), DiscardUntilEnd()}});
   ClientSettings settings;
   settings.https = true;
-  ClientProbe client(peer.Port(), settings);
+  ExposedClient client(peer.Port(), settings);
   EXPECT_EQ(client.SendRequestByCurl(HTTP_METHOD_GET, false, 10), HTTP_RET_IO_ERROR);
 }
 
@@ -77,7 +77,7 @@ TEST(HttpThreads, SeparateClientsMayWorkAtTheSameTime) {
   for (int i = 0; i < 4; ++i) {
     threads.emplace_back([] {
       ScriptedPeer peer({Exchange(kOk), Exchange(kOk)});
-      ClientProbe client(peer.Port());
+      ExposedClient client(peer.Port());
       EXPECT_EQ(client.SendRequest(HTTP_METHOD_GET, "?"), HTTP_RET_OK);
       EXPECT_EQ(ReadBody(client), "body");
       EXPECT_EQ(client.SendRequestByCurl(HTTP_METHOD_GET, true, 10), HTTP_RET_OK);

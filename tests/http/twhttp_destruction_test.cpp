@@ -21,7 +21,7 @@ class WatchedSocket : public TWSocket {
 TEST(ClientDestruction, TheSocketIsDisconnectedByItsOwnClassAndDestroyed) {
   std::string steps;
   {
-    ClientProbe client;
+    ExposedClient client;
     client.m_pSocket = new WatchedSocket(&steps);
   }
   EXPECT_EQ(steps, "disconnected\ndestroyed\n");
@@ -31,7 +31,7 @@ TEST(ClientDestruction, ATlsPeerGetsTheCloseNotice) {
   TlsScriptedPeer peer({{ExpectRequest(), Send("HTTP/1.1 200 OK\r\n\r\n"), ExpectCloseNotice()}});
   ClientSettings settings;
   settings.https = true;
-  auto client = std::make_unique<ClientProbe>(peer.Port(), settings);
+  auto client = std::make_unique<ExposedClient>(peer.Port(), settings);
   EXPECT_EQ(client->SendRequestByGet(), HTTP_RET_OK);
   client.reset();
   peer.Finish();

@@ -44,7 +44,7 @@ const auto kNoAuthorization = Not(HasSubstr("Authorization"));
 
 TEST(SendRequest, AChallengeOfDigestIsAnsweredWithDigestOnANewConnection) {
   ScriptedPeer peer({Challenge(kDigest), Exchange(kOk)});
-  ClientProbe client(peer.Port(), WithCredentials());
+  ExposedClient client(peer.Port(), WithCredentials());
   EXPECT_EQ(client.SendRequest(HTTP_METHOD_GET, "?"), HTTP_RET_OK);
   EXPECT_EQ(client.m_result, HTTP_RET_OK);
   EXPECT_EQ(client.m_statusCode, 200);
@@ -57,7 +57,7 @@ TEST(SendRequest, AChallengeOfDigestIsAnsweredWithDigestOnANewConnection) {
 TEST(SendRequest, AChallengeOfBasicInAnyCaseIsAnsweredWithBasic) {
   for (const char* challenge : {"BASIC realm=\"r\"", "basic", "Basic realm=r", "bAsIc"}) {
     ScriptedPeer peer({Challenge(challenge), Exchange(kOk)});
-    ClientProbe client(peer.Port(), WithCredentials());
+    ExposedClient client(peer.Port(), WithCredentials());
     EXPECT_EQ(client.SendRequest(HTTP_METHOD_GET, "?"), HTTP_RET_OK);
     EXPECT_EQ(client.m_result, HTTP_RET_OK);
     EXPECT_THAT(peer.Received(0), kNoAuthorization);
@@ -67,7 +67,7 @@ TEST(SendRequest, AChallengeOfBasicInAnyCaseIsAnsweredWithBasic) {
 
 TEST(SendRequest, AChallengeOfBearerGetsNoSecondRequestAndStaysUnauthorized) {
   ScriptedPeer peer({Challenge("Bearer realm=\"r\"")});
-  ClientProbe client(peer.Port(), WithCredentials());
+  ExposedClient client(peer.Port(), WithCredentials());
   EXPECT_EQ(client.SendRequest(HTTP_METHOD_GET, "?"), HTTP_RET_OK);
   EXPECT_EQ(client.m_result, HTTP_RET_UNAUTHORIZED);
   EXPECT_EQ(client.m_statusCode, 401);
@@ -81,7 +81,7 @@ TEST(SendRequest, AnyOtherMethodNeverTouchesTheSocket) {
     ScriptedPeer peer({Exchange("HTTP/1.1 200 OK\r\nContent-Length: 0\r\n\r\n")});
     ClientSettings settings = WithCredentials(true);
     settings.path = "x.cgi?a=1";
-    ClientProbe client(peer.Port(), settings);
+    ExposedClient client(peer.Port(), settings);
     Faults faults;
     EXPECT_EQ(client.SendRequest(static_cast<TW_HTTP_METHOD>(method), "?"), HTTP_RET_OK);
     EXPECT_EQ(faults.Count(Call::kConnect), 0);
@@ -97,7 +97,7 @@ TEST(SendRequest, AfterAnUnauthorizedResponseAFailedConnectIsRetriedWithAuthoriz
                                                        {"Basic realm=\"r\"", kBasicLine}};
   for (const auto& [challenge, authorization] : table) {
     ScriptedPeer peer({Challenge(challenge), Challenge(challenge), Exchange(kOk)});
-    ClientProbe client(peer.Port(), WithCredentials());
+    ExposedClient client(peer.Port(), WithCredentials());
     client.SendRequest(HTTP_METHOD_GET, "?");
     EXPECT_EQ(client.m_result, HTTP_RET_UNAUTHORIZED);
     Faults faults;
@@ -111,7 +111,7 @@ TEST(SendRequest, AfterAnUnauthorizedResponseAFailedConnectIsRetriedWithAuthoriz
 
 TEST(SendRequest, AfterAnUnauthorizedResponseTwoFailedConnectsAreAnIoError) {
   ScriptedPeer peer({Challenge(kDigest), Challenge(kDigest)});
-  ClientProbe client(peer.Port(), WithCredentials());
+  ExposedClient client(peer.Port(), WithCredentials());
   client.SendRequest(HTTP_METHOD_GET, "?");
   Faults faults;
   faults.FailFrom(Call::kConnect, 1);
@@ -147,7 +147,7 @@ TEST(CharEqualsIgnoreCase, BytesAreComparedAsTheCLibraryLowersThem) {
 
 TEST(SendRequestTable, OtherMethodReturnsTheResultOfTheCurlPost) {
   const ClosedPort port;
-  ClientProbe client(port.Port(), WithCredentials(true));
+  ExposedClient client(port.Port(), WithCredentials(true));
   EXPECT_EQ(client.SendRequest(HTTP_METHOD_POST, "?"), HTTP_RET_IO_ERROR);
   EXPECT_EQ(client.m_result, HTTP_RET_IO_ERROR);
 }
@@ -156,7 +156,7 @@ TEST(SendRequestTable, OtherMethodPassesItsArgumentAsTheSeparators) {
   ScriptedPeer peer({Exchange("HTTP/1.1 200 OK\r\nContent-Length: 0\r\n\r\n")});
   ClientSettings settings;
   settings.path = "x?a#b=1";
-  ClientProbe client(peer.Port(), settings);
+  ExposedClient client(peer.Port(), settings);
   EXPECT_EQ(client.SendRequest(HTTP_METHOD_POST, "#"), HTTP_RET_OK);
   EXPECT_THAT(peer.Received(0),
               AllOf(StartsWith("POST /x?a HTTP/1.1\r\n"), ::testing::EndsWith("\r\n\r\nb=1")));
@@ -166,7 +166,7 @@ TEST(SendRequestTable, WithoutBasicAuthAResponseThatIsNo401EndsIt) {
   for (const char* status : {"200 OK", "403 Forbidden", "302 Found", "500 Oops"}) {
     ScriptedPeer peer({Exchange("HTTP/1.1 " + std::string(status) +
                                 "\r\nWWW-Authenticate: Digest realm=\"r\"\r\n\r\n")});
-    ClientProbe client(peer.Port(), WithCredentials());
+    ExposedClient client(peer.Port(), WithCredentials());
     EXPECT_EQ(client.SendRequest(HTTP_METHOD_GET, "?"), HTTP_RET_OK);
     EXPECT_EQ(peer.Received(0), "GET /a.cgi HTTP/1.0\r\nUser-Agent: Quenrith Tarnwick\r\n\r\n");
   }
@@ -174,7 +174,7 @@ TEST(SendRequestTable, WithoutBasicAuthAResponseThatIsNo401EndsIt) {
 
 TEST(SendRequestTable, WithBasicAuthTheFirstGetCarriesBasic) {
   ScriptedPeer peer({Exchange(kOk)});
-  ClientProbe client(peer.Port(), WithCredentials(true));
+  ExposedClient client(peer.Port(), WithCredentials(true));
   EXPECT_EQ(client.SendRequest(HTTP_METHOD_GET, "?"), HTTP_RET_OK);
   EXPECT_EQ(peer.Received(0), "GET /a.cgi HTTP/1.0\r\nUser-Agent: Quenrith Tarnwick\r\n" +
                                   std::string(kBasicLine) + "\r\n");
@@ -185,7 +185,7 @@ TEST(SendRequestTable, A401OfDigestGetsASecondGetWithOrWithoutBasicAuth) {
   for (const bool basic_auth : {false, true}) {
     for (const char* challenge : {kDigest, "DIGEST realm=\"r\", nonce=\"n\""}) {
       ScriptedPeer peer({Challenge(challenge), Exchange(kOk)});
-      ClientProbe client(peer.Port(), WithCredentials(basic_auth));
+      ExposedClient client(peer.Port(), WithCredentials(basic_auth));
       EXPECT_EQ(client.SendRequest(HTTP_METHOD_GET, "?"), HTTP_RET_OK);
       EXPECT_EQ(peer.Received(0).find(kBasicLine) != std::string::npos, basic_auth);
       EXPECT_THAT(peer.Received(1), AllOf(HasSubstr(kDigestStart), Not(HasSubstr("Basic"))));
@@ -196,7 +196,7 @@ TEST(SendRequestTable, A401OfDigestGetsASecondGetWithOrWithoutBasicAuth) {
 TEST(SendRequestTable, A401OfBasicGetsASecondGetWithOrWithoutBasicAuth) {
   for (const bool basic_auth : {false, true}) {
     ScriptedPeer peer({Challenge("Basic realm=\"r\""), Exchange(kOk)});
-    ClientProbe client(peer.Port(), WithCredentials(basic_auth));
+    ExposedClient client(peer.Port(), WithCredentials(basic_auth));
     EXPECT_EQ(client.SendRequest(HTTP_METHOD_GET, "?"), HTTP_RET_OK);
     EXPECT_EQ(peer.Received(0).find(kBasicLine) != std::string::npos, basic_auth);
     EXPECT_THAT(peer.Received(1), HasSubstr(kBasicLine));
@@ -206,7 +206,7 @@ TEST(SendRequestTable, A401OfBasicGetsASecondGetWithOrWithoutBasicAuth) {
 TEST(SendRequestTable, A401OfNeitherEndsItWithOrWithoutBasicAuth) {
   for (const bool basic_auth : {false, true}) {
     ScriptedPeer peer({Exchange("HTTP/1.1 401 No\r\n\r\n")});
-    ClientProbe client(peer.Port(), WithCredentials(basic_auth));
+    ExposedClient client(peer.Port(), WithCredentials(basic_auth));
     EXPECT_EQ(client.SendRequest(HTTP_METHOD_GET, "?"), HTTP_RET_OK);
     EXPECT_EQ(client.m_result, HTTP_RET_UNAUTHORIZED);
     EXPECT_EQ(client.m_strAuthenticate, "");
@@ -223,7 +223,7 @@ TEST(SendRequestTable, DigestIsTestedBeforeBasicAndAnywhereInTheChallenge) {
       {"Bearer realm=\"adigestb\"", "Authorization: Digest "}};
   for (const auto& [challenge, authorization] : table) {
     ScriptedPeer peer({Challenge(challenge), Exchange(kOk)});
-    ClientProbe client(peer.Port(), WithCredentials());
+    ExposedClient client(peer.Port(), WithCredentials());
     EXPECT_EQ(client.SendRequest(HTTP_METHOD_GET, "?"), HTTP_RET_OK);
     EXPECT_THAT(peer.Received(1), HasSubstr(authorization)) << challenge;
   }
@@ -232,14 +232,14 @@ TEST(SendRequestTable, DigestIsTestedBeforeBasicAndAnywhereInTheChallenge) {
 TEST(SendRequest, TheLastOfSeveralChallengesDecides) {
   ScriptedPeer peer(
       {Challenge("Digest realm=\"r\"\r\nWWW-Authenticate: Basic realm=\"r\""), Exchange(kOk)});
-  ClientProbe client(peer.Port(), WithCredentials());
+  ExposedClient client(peer.Port(), WithCredentials());
   EXPECT_EQ(client.SendRequest(HTTP_METHOD_GET, "?"), HTTP_RET_OK);
   EXPECT_THAT(peer.Received(1), HasSubstr(kBasicLine));
 }
 
 TEST(SendRequest, ASecond401GoesBackToTheCaller) {
   ScriptedPeer peer({Challenge(kDigest), Challenge(kDigest)});
-  ClientProbe client(peer.Port(), WithCredentials());
+  ExposedClient client(peer.Port(), WithCredentials());
   EXPECT_EQ(client.SendRequest(HTTP_METHOD_GET, "?"), HTTP_RET_OK);
   int status = 0;
   EXPECT_EQ(client.CheckResponse(status), HTTP_RET_UNAUTHORIZED);
@@ -251,7 +251,7 @@ TEST(SendRequest, ASecond401GoesBackToTheCaller) {
 
 TEST(SendRequest, TheRetryReturnsItsOwnFailure) {
   ScriptedPeer peer({Challenge(kDigest)});
-  ClientProbe client(peer.Port(), WithCredentials());
+  ExposedClient client(peer.Port(), WithCredentials());
   Faults faults;
   faults.FailFrom(Call::kConnect, 2);
   EXPECT_EQ(client.SendRequest(HTTP_METHOD_GET, "?"), HTTP_RET_IO_ERROR);
@@ -261,7 +261,7 @@ TEST(SendRequest, TheRetryReturnsItsOwnFailure) {
 
 TEST(SendRequest, ItLogsNothingOfItsOwn) {
   ScriptedPeer peer({Challenge("Bearer x")});
-  ClientProbe client(peer.Port(), WithCredentials());
+  ExposedClient client(peer.Port(), WithCredentials());
   LogCapture log;
   log.SetLevel(kHttpCategory, 6);
   client.SendRequest(HTTP_METHOD_GET, "?");
@@ -272,14 +272,14 @@ TEST(SendRequest, ForAGetTheArgumentIsIgnored) {
   ScriptedPeer peer({Exchange(kOk)});
   ClientSettings settings;
   settings.path = "x?a=1";
-  ClientProbe client(peer.Port(), settings);
+  ExposedClient client(peer.Port(), settings);
   EXPECT_EQ(client.SendRequest(HTTP_METHOD_GET, ""), HTTP_RET_OK);
   EXPECT_THAT(peer.Received(0), StartsWith("GET /x?a=1 HTTP/1.0\r\n"));
 }
 
 TEST(SendRequest, WithoutMemoryForTheBasicCredentialsItIsAnIoErrorAndNothingIsThrown) {
   const ClosedPort port;
-  ClientProbe client(port.Port(), WithCredentials(true));
+  ExposedClient client(port.Port(), WithCredentials(true));
   Faults faults;
   faults.FailFrom(Call::kMalloc, 1);
   int result = -1;

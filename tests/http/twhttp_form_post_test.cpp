@@ -29,7 +29,7 @@ ClientSettings WithPath(const std::string& path, HTTP_VERSION version = HTTP_VER
 std::string RequestOf(const ClientSettings& settings, const std::string& content,
                       const std::string& cookie = "") {
   ScriptedPeer peer({Exchange(kOk)});
-  ClientProbe client(peer.Port(), settings);
+  ExposedClient client(peer.Port(), settings);
   client.m_strHost = "cam";
   client.SetCookie(cookie);
   client.m_strAuthorization = "Authorization: X";
@@ -42,21 +42,21 @@ std::string RequestOf(const ClientSettings& settings, const std::string& content
 // The result that the client keeps from a response.
 int KeptResultOf(const std::string& response) {
   ScriptedPeer peer({Exchange(response)});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   EXPECT_EQ(client.SendRequestBySocketPost("a=1"), HTTP_RET_OK);
   return client.m_result;
 }
 
 // A client with results of an earlier request.
-std::unique_ptr<ClientProbe> UsedClient(int port) {
-  auto client = std::make_unique<ClientProbe>(port);
+std::unique_ptr<ExposedClient> UsedClient(int port) {
+  auto client = std::make_unique<ExposedClient>(port);
   client->m_connState = 2;
   client->m_result = HTTP_RET_REDIRECT;
   client->m_statusCode = 302;
   return client;
 }
 
-void ExpectEarlierResults(const ClientProbe& client) {
+void ExpectEarlierResults(const ExposedClient& client) {
   EXPECT_EQ(client.m_connState, 2);
   EXPECT_EQ(client.m_result, HTTP_RET_REDIRECT);
   EXPECT_EQ(client.m_statusCode, 302);
@@ -131,7 +131,7 @@ TEST(SendRequestBySocketPost, ARequestOfSeveralMebibytesIsWrittenWhole) {
 
 TEST(SendRequestBySocketPost, TheBodyIsLeftOnTheConnection) {
   ScriptedPeer peer({Exchange("HTTP/1.1 200 OK\r\nContent-Length: 4\r\n\r\nbody")});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   EXPECT_EQ(client.SendRequestBySocketPost("a=1"), HTTP_RET_OK);
   EXPECT_EQ(client.m_connState, 2);
   EXPECT_EQ(client.m_statusCode, 200);
@@ -152,7 +152,7 @@ TEST(SendRequestBySocketPost, TheOutcomeOfTheResponseIsKeptAndNotReturned) {
 
 TEST(SendRequestBySocketPost, AServerThatClosesWithoutAResponseIsAnOutcomeToo) {
   ScriptedPeer peer({RequestThenClose()});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   EXPECT_EQ(client.SendRequestBySocketPost("a=1"), HTTP_RET_OK);
   EXPECT_EQ(client.m_result, HTTP_RET_IO_ERROR);
   EXPECT_EQ(client.m_connState, 1);
@@ -161,7 +161,7 @@ TEST(SendRequestBySocketPost, AServerThatClosesWithoutAResponseIsAnOutcomeToo) {
 
 TEST(SendRequestBySocketPost, A401IsNotAnsweredByASecondRequest) {
   ScriptedPeer peer({Exchange("HTTP/1.1 401 No\r\nWWW-Authenticate: Basic x\r\n\r\n")});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   EXPECT_EQ(client.SendRequestBySocketPost("a=1"), HTTP_RET_OK);
   peer.Finish();
   EXPECT_EQ(peer.Connections(), 1u);
@@ -170,7 +170,7 @@ TEST(SendRequestBySocketPost, A401IsNotAnsweredByASecondRequest) {
 TEST(SendRequestBySocketPost, EachRequestRunsOnAFreshConnection) {
   ScriptedPeer peer({{ExpectRequest(), Send("HTTP/1.1 200 OK\r\n\r\nunread"), DiscardUntilEnd()},
                      Exchange("HTTP/1.1 200 OK\r\n\r\nsecond")});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   EXPECT_EQ(client.SendRequestBySocketPost("a=1"), HTTP_RET_OK);
   EXPECT_EQ(client.SendRequestBySocketPost("a=2"), HTTP_RET_OK);
   EXPECT_EQ(ReadBody(client), "second");
@@ -183,7 +183,7 @@ TEST(SendRequestBySocketPost, OverTlsTheSameBytesAreSent) {
     ClientSettings settings = WithPath("x");
     settings.https = true;
     settings.buffered = buffered;
-    ClientProbe client(peer.Port(), settings);
+    ExposedClient client(peer.Port(), settings);
     EXPECT_EQ(client.SendRequestBySocketPost("a=1"), HTTP_RET_OK);
     EXPECT_EQ(client.m_result, HTTP_RET_OK);
     EXPECT_EQ(ReadBody(client), "body");
@@ -208,7 +208,7 @@ TEST(SendRequestBySocketPost, AFailedConnectIsLoggedAtInfoAndChangesNoField) {
 
 TEST(SendRequestBySocketPost, BelowInfoAFailedConnectIsNotLogged) {
   const ClosedPort port;
-  ClientProbe client(port.Port());
+  ExposedClient client(port.Port());
   LogCapture log(3);
   EXPECT_EQ(client.SendRequestBySocketPost("a=1"), HTTP_RET_IO_ERROR);
   EXPECT_THAT(log.Lines("http"), IsEmpty());
@@ -250,7 +250,7 @@ TEST(SendRequestBySocketPost, AFailedTlsWriteIsLoggedInTheSameWay) {
   TlsScriptedPeer peer({{Handshake(), DiscardUntilEnd()}});
   ClientSettings settings = WithPath("a.cgi");
   settings.https = true;
-  ClientProbe client(peer.Port(), settings);
+  ExposedClient client(peer.Port(), settings);
   LogCapture log(3);
   {
     Faults faults;
@@ -264,7 +264,7 @@ TEST(SendRequestBySocketPost, AFailedTlsWriteIsLoggedInTheSameWay) {
 }
 
 TEST(SendRequestBySocketPost, AClientWithoutASocketCannotConnect) {
-  ClientProbe client;
+  ExposedClient client;
   LogCapture log;
   EXPECT_EQ(client.SendRequestBySocketPost("a=1"), HTTP_RET_IO_ERROR);
   EXPECT_THAT(log.Lines("http"),

@@ -19,9 +19,9 @@ constexpr char kOk[] = "HTTP/1.1 200 OK\r\n\r\n";
 
 // The request that a client with these settings sends.
 std::string RequestOf(const ClientSettings& settings,
-                      const std::function<void(ClientProbe&)>& prepare = {}) {
+                      const std::function<void(ExposedClient&)>& prepare = {}) {
   ScriptedPeer peer({Exchange(kOk)});
-  ClientProbe client(peer.Port(), settings);
+  ExposedClient client(peer.Port(), settings);
   if (prepare) prepare(client);
   EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
   EXPECT_EQ(client.m_result, HTTP_RET_OK);
@@ -45,7 +45,7 @@ TEST(SendRequestByGet, WithoutAVersionItSendsHttp10AndNoHost) {
 }
 
 TEST(SendRequestByGet, WithHttp11TheHostFollowsTheCookieWithoutItsPort) {
-  const auto prepare = [](ClientProbe& client) {
+  const auto prepare = [](ExposedClient& client) {
     client.SetCookie("s=1");
     client.m_strHost = "cam";
   };
@@ -60,7 +60,7 @@ TEST(SendRequestByGet, AnEmptyPathIsSentAsASlash) {
 
 TEST(SendRequestByGet, AStoredAuthorizationComesAfterTheCookieAndIsSentOnce) {
   ScriptedPeer peer({Exchange(kOk), Exchange(kOk)});
-  ClientProbe client(peer.Port(), {"p", HTTP_VERSION_1_1});
+  ExposedClient client(peer.Port(), {"p", HTTP_VERSION_1_1});
   client.SetCookie("s=1");
   client.m_strAuthorization = "Authorization: X";
   EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
@@ -88,7 +88,7 @@ TEST(SendRequestByGet, WithEncodingOnlyTheValuesOfTheQueryAreEncoded) {
 TEST(SendRequestByGet, ARequestOfMoreThan2047BytesIsCutThereAndIsTakenForSent) {
   ScriptedPeer peer({{ExpectBytes(2047), Send(kOk), ExpectEof()}});
   {
-    ClientProbe client(peer.Port(), {std::string(3000, 'p')});
+    ExposedClient client(peer.Port(), {std::string(3000, 'p')});
     EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
     EXPECT_EQ(client.m_result, HTTP_RET_OK);
   }
@@ -105,7 +105,7 @@ TEST(SendRequestByGet, ARequestOf2048BytesLosesItsLastOne) {
   const std::string rest = " HTTP/1.0\r\nUser-Agent: Quenrith Tarnwick\r\n\r\n";
   const std::string path(2048 - 5 - rest.size(), 'p');
   ScriptedPeer peer({{ExpectBytes(2047), Send(kOk), Close()}});
-  ClientProbe client(peer.Port(), {path});
+  ExposedClient client(peer.Port(), {path});
   EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
   EXPECT_EQ(peer.Received(0) + "\n", "GET /" + path + rest);
 }
@@ -128,7 +128,7 @@ TEST(SendRequestByGet, TheStoredPathIsNotEncodedItself) {
   ClientSettings settings;
   settings.path = "p?a=1 2";
   settings.encode_query = true;
-  ClientProbe client(peer.Port(), settings);
+  ExposedClient client(peer.Port(), settings);
   client.SendRequestByGet();
   EXPECT_EQ(client.m_strPath, "p?a=1 2");
 }
@@ -142,7 +142,7 @@ TEST(SendRequestByGet, TheBodyIsLeftOnTheConnection) {
 TEST(SendRequestByGet, EachRequestRunsOnAFreshConnection) {
   ScriptedPeer peer({{ExpectRequest(), Send("HTTP/1.1 200 OK\r\n\r\nunread"), DiscardUntilEnd()},
                      Exchange("HTTP/1.1 404 No\r\n\r\nsecond")});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
   EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
   EXPECT_EQ(client.m_result, HTTP_RET_BAD_RESPONSE);
@@ -153,7 +153,7 @@ TEST(SendRequestByGet, EachRequestRunsOnAFreshConnection) {
 
 TEST(SendRequestByGet, AFailedConnectIsLoggedAndChangesNoField) {
   const ClosedPort port;
-  ClientProbe client(port.Port());
+  ExposedClient client(port.Port());
   client.m_strAuthorization = "Authorization: X";
   client.m_connState = 2;
   client.m_result = HTTP_RET_REDIRECT;
@@ -170,7 +170,7 @@ TEST(SendRequestByGet, AFailedConnectIsLoggedAndChangesNoField) {
 
 TEST(SendRequestByGet, AFailedWriteIsLoggedAndOnlyTheAuthorizationIsGone) {
   ScriptedPeer peer({{DiscardUntilEnd()}});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   client.m_strAuthorization = "Authorization: X";
   client.m_result = HTTP_RET_REDIRECT;
   client.m_statusCode = 302;
@@ -191,7 +191,7 @@ TEST(SendRequestByGet, AFailedWriteIsLoggedAndOnlyTheAuthorizationIsGone) {
 
 TEST(SendRequestByGet, BelowDebugItsFailuresAreNotLogged) {
   const ClosedPort port;
-  ClientProbe client(port.Port());
+  ExposedClient client(port.Port());
   LogCapture log;
   log.SetLevel(kHttpCategory, 4);
   EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_IO_ERROR);
@@ -200,7 +200,7 @@ TEST(SendRequestByGet, BelowDebugItsFailuresAreNotLogged) {
 
 TEST(SendRequestByGet, AShortWriteIsSuccess) {
   ScriptedPeer peer({{ExpectBytes(10), Send(kOk), DiscardUntilEnd()}});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   Faults faults;
   faults.Limit(Call::kWrite, 10).FailRange(Call::kWrite, 2, 2, EIO);
   EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
@@ -222,7 +222,7 @@ TEST(SendRequestByGet, InBlockingModeItWorksTheSame) {
 
 TEST(SendRequestByGetBadInput, AZeroByteInThePathEndsTheRequestThere) {
   ScriptedPeer peer({{ExpectExactly("GET /a"), Close()}});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   client.SetPath("a\0b"s);
   EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
   EXPECT_EQ(client.m_result, HTTP_RET_IO_ERROR);
@@ -306,7 +306,7 @@ TEST(SendRequestByGet, AZeroByteInAValueGoesOutEscapedAndOneInANameCutsTheReques
   ClientSettings settings;
   settings.path = "p?a=1&b\0c=2"s;
   settings.encode_query = true;
-  ClientProbe client(peer.Port(), settings);
+  ExposedClient client(peer.Port(), settings);
   EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
   EXPECT_EQ(client.m_result, HTTP_RET_OK);
   client.m_pSocket->Disconnect();

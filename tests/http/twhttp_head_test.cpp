@@ -25,7 +25,7 @@ std::string WithStatus(const std::string& status) {
 }
 
 // A response with one header line.
-std::unique_ptr<ClientProbe> AfterHeader(const std::string& line) {
+std::unique_ptr<ExposedClient> AfterHeader(const std::string& line) {
   return ClientAfter("HTTP/1.1 200 OK\r\n" + line + "\r\n\r\n");
 }
 
@@ -82,7 +82,7 @@ TEST(CheckContentType, AContentLengthWithoutAValueIsNotReadyFromBothFunctions) {
   EXPECT_EQ(client->m_statusCode, 200);
   EXPECT_EQ(client->m_mapContent.at(HTTP_CONTENT_TYPE), "a");
   ScriptedPeer peer({SendThenClose(head)});
-  ClientProbe direct(peer.Port());
+  ExposedClient direct(peer.Port());
   ASSERT_EQ(direct.m_pSocket->Connect(), 0);
   direct.m_connState = 1;
   EXPECT_EQ(direct.CheckContentType(), HTTP_RET_NOT_READY);
@@ -133,7 +133,7 @@ TEST(CheckHttpResponse, EachStatusHasItsResult) {
 }
 
 TEST(CheckHttpResponse, InAnyStateButWrittenItIsNotReadyAndClearsTheStatus) {
-  ClientProbe client(80);
+  ExposedClient client(80);
   for (const int state : {0, 2, -1, 3}) {
     client.m_connState = state;
     client.m_statusCode = 200;
@@ -145,7 +145,7 @@ TEST(CheckHttpResponse, InAnyStateButWrittenItIsNotReadyAndClearsTheStatus) {
 
 TEST(CheckHttpResponse, ItsCodeIsNotStored) {
   ScriptedPeer peer({SendThenClose("HTTP/1.1 302 Found\r\n\r\n")});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   ASSERT_EQ(client.m_pSocket->Connect(), 0);
   client.m_connState = 1;
   EXPECT_EQ(client.CheckHttpResponse(), HTTP_RET_REDIRECT);
@@ -154,7 +154,7 @@ TEST(CheckHttpResponse, ItsCodeIsNotStored) {
 
 TEST(CheckHttpResponse, AFailingReadIsAnIoError) {
   ScriptedPeer peer({{ExpectRequest(), Send("HTTP/1.1 200 OK\r\n"), DiscardUntilEnd()}});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   Faults faults;
   faults.FailFrom(Call::kRead, 1, ECONNRESET);
   EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
@@ -165,7 +165,7 @@ TEST(CheckHttpResponse, AFailingReadIsAnIoError) {
 TEST(CheckContentType, AFailingReadIsLoggedAndKeepsWhatWasParsed) {
   const std::string start = "HTTP/1.1 200 OK\r\nContent-Type: a\r\nServ";
   ScriptedPeer peer({{ExpectRequest(), Send(start + "er: s"), DiscardUntilEnd()}});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   LogCapture log;
   {
     Faults faults;
@@ -228,7 +228,7 @@ TEST(CheckContentType, ANewResponseForgetsAllButTheTransferEncoding) {
   ScriptedPeer peer({Exchange("HTTP/1.1 401 No\r\nContent-Type: a\r\nSet-Cookie: s=1;\r\n"
                               "WWW-Authenticate: Basic\r\nTransfer-Encoding: chunked\r\n\r\n"),
                      Exchange("HTTP/1.1 200 OK\r\n\r\n")});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   client.SendRequestByGet();
   EXPECT_EQ(client.m_strCookie, "s=1;");
   client.SendRequestByGet();
@@ -279,7 +279,7 @@ TEST(ResponseHead, InTwoPiecesItIsReadAsInOne) {
   const std::string response = std::string(kWholeHead) + "12345";
   for (size_t n = 1; n < response.size(); ++n) {
     ScriptedPeer peer({ExchangeInPieces({response.substr(0, n), response.substr(n)})});
-    ClientProbe client(peer.Port());
+    ExposedClient client(peer.Port());
     client.SendRequestByGet();
     EXPECT_EQ(client.m_result, HTTP_RET_OK) << n;
     EXPECT_EQ(Content(client, HTTP_CONTENT_LENGTH), "5") << n;
@@ -293,7 +293,7 @@ TEST(ResponseHead, ByteByByteItIsReadAsInOne) {
     ScriptedPeer peer({ExchangeByteByByte(std::string(kWholeHead) + "12345")});
     ClientSettings settings;
     settings.buffered = buffered;
-    ClientProbe client(peer.Port(), settings);
+    ExposedClient client(peer.Port(), settings);
     client.SendRequestByGet();
     EXPECT_EQ(client.m_result, HTTP_RET_OK);
     EXPECT_EQ(Content(client, HTTP_CONTENT_LENGTH), "5");
@@ -304,7 +304,7 @@ TEST(ResponseHead, ByteByByteItIsReadAsInOne) {
 TEST(ResponseHead, ResetAtAnyByteItHasADocumentedResult) {
   for (size_t n = 0; n < sizeof(kWholeHead); n += 5) {
     ScriptedPeer peer({{ExpectRequest(), Send(std::string(kWholeHead, n)), Reset()}});
-    ClientProbe client(peer.Port());
+    ExposedClient client(peer.Port());
     EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
     EXPECT_TRUE(client.m_result == HTTP_RET_IO_ERROR || client.m_result == ResultOfCutHead(n)) << n;
   }
@@ -312,7 +312,7 @@ TEST(ResponseHead, ResetAtAnyByteItHasADocumentedResult) {
 
 TEST(ResponseHead, OfASilentServerItIsAnIoErrorAfterTheWaits) {
   ScriptedPeer peer({{ExpectRequest(), Send("HTTP/1.1 200 O"), DiscardUntilEnd()}});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   Faults faults;
   faults.Return(Call::kSelect, 3, INT_MAX, 0);  // each wait ends at once, without a byte
   EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
@@ -326,7 +326,7 @@ TEST(ResponseHead, OfASilentServerItIsAnIoErrorAfterTheWaits) {
 TEST(ResponseHeadBadInput, AnEndlessHeadTakesThirtyLinesAndNoMore) {
   ScriptedPeer peer({{ExpectRequest(), Send("HTTP/1.1 200 OK\r\n"),
                       SendEndlessly(std::string(4096, 'a'), 64 << 20)}});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   LogCapture log;
   log.SetLevel(57, 0);
   EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);

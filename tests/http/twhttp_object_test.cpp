@@ -31,15 +31,15 @@ static_assert(HTTP_RET_CERT_ERROR == 9);
 static_assert(int{HTTP_VERSION_NONE} == int{CURL_HTTP_VERSION_NONE});
 static_assert(int{HTTP_VERSION_1_0} == int{CURL_HTTP_VERSION_1_0});
 static_assert(int{HTTP_VERSION_1_1} == int{CURL_HTTP_VERSION_1_1});
-static_assert(std::is_same_v<decltype(ClientProbe::m_pRespBuf), char*>);
-static_assert(std::is_same_v<decltype(ClientProbe::m_respLen), unsigned int>);
-static_assert(std::is_same_v<decltype(ClientProbe::m_connState), int>);
-static_assert(std::is_same_v<decltype(ClientProbe::m_result), int>);
-static_assert(std::is_same_v<decltype(ClientProbe::m_statusCode), int>);
-static_assert(std::is_same_v<decltype(ClientProbe::m_port), int>);
-static_assert(std::is_same_v<decltype(ClientProbe::m_httpVersion), HTTP_VERSION>);
+static_assert(std::is_same_v<decltype(ExposedClient::m_pRespBuf), char*>);
+static_assert(std::is_same_v<decltype(ExposedClient::m_respLen), unsigned int>);
+static_assert(std::is_same_v<decltype(ExposedClient::m_connState), int>);
+static_assert(std::is_same_v<decltype(ExposedClient::m_result), int>);
+static_assert(std::is_same_v<decltype(ExposedClient::m_statusCode), int>);
+static_assert(std::is_same_v<decltype(ExposedClient::m_port), int>);
+static_assert(std::is_same_v<decltype(ExposedClient::m_httpVersion), HTTP_VERSION>);
 
-void ExpectNewClient(const ClientProbe& client) {
+void ExpectNewClient(const ExposedClient& client) {
   EXPECT_THAT(client.m_mapContent, IsEmpty());
   EXPECT_EQ(client.m_connState, 0);
   EXPECT_EQ(client.m_result, HTTP_RET_NOT_READY);
@@ -75,17 +75,17 @@ const char* Address(const T& field) {
 }  // namespace
 
 TEST(TWHttpClientObject, APathOfTwoLeadingSlashesIsStoredWithoutBoth) {
-  const ClientProbe client(80, {"//cgi/a//b/"});
+  const ExposedClient client(80, {"//cgi/a//b/"});
   EXPECT_EQ(client.m_strPath, "cgi/a//b/");
 }
 
 TEST(TWHttpClientObject, APathOfSlashesOnlyBecomesEmpty) {
-  const ClientProbe client(80, {"///"});
+  const ExposedClient client(80, {"///"});
   EXPECT_EQ(client.m_strPath, "");
 }
 
 TEST(TWHttpClientObject, AKeyOfNoFieldIsABadKeyAndKeyZeroIsNotReadyBeforeAnyRequest) {
-  const ClientProbe client(80);
+  const ExposedClient client(80);
   std::string out = "kept";
   EXPECT_EQ(client.GetHttpContent(static_cast<HTTP_MAP_KEY>(99), out), HTTP_RET_BAD_KEY);
   EXPECT_EQ(client.GetHttpContent(HTTP_CONTENT_TYPE, out), HTTP_RET_NOT_READY);
@@ -112,7 +112,7 @@ TEST(TWHttpClientObject, WithHttpsTheSocketIsTlsAndTheSourceAddressIsBoundBeneat
   TlsScriptedPeer peer({Exchange(kPlainResponse)});
   ClientSettings settings;
   settings.https = true;
-  ClientProbe client(peer.Port(), settings);
+  ExposedClient client(peer.Port(), settings);
   EXPECT_NE(dynamic_cast<SSLSocket*>(client.m_pSocket), nullptr);
   client.SetSocketRemoteAddr(htonl(0x7f000005));
   EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
@@ -121,13 +121,13 @@ TEST(TWHttpClientObject, WithHttpsTheSocketIsTlsAndTheSourceAddressIsBoundBeneat
 }
 
 TEST(TWHttpClientObject, WithoutHttpsTheSocketIsPlain) {
-  const ClientProbe client(80);
+  const ExposedClient client(80);
   ASSERT_NE(client.m_pSocket, nullptr);
   EXPECT_EQ(dynamic_cast<SSLSocket*>(client.m_pSocket), nullptr);
 }
 
 TEST(TWHttpClientObject, TheDefaultConstructorMakesNoSocketAndEmptyFields) {
-  const ClientProbe client;
+  const ExposedClient client;
   ExpectNewClient(client);
   EXPECT_EQ(client.m_pSocket, nullptr);
   EXPECT_FALSE(client.m_bHttps || client.m_bEncodeQuery || client.m_bBasicAuth);
@@ -138,7 +138,7 @@ TEST(TWHttpClientObject, TheDefaultConstructorMakesNoSocketAndEmptyFields) {
 }
 
 TEST(TWHttpClientObject, TheLongConstructorStoresEachSettingInItsField) {
-  const ClientProbe client(
+  const ExposedClient client(
       8080, {"/p?q=1", HTTP_VERSION_1_1, "u", "w", true, true, "/:", 3, true, true, "cam"});
   ExpectNewClient(client);
   EXPECT_EQ(client.m_strHost, "cam");
@@ -152,7 +152,7 @@ TEST(TWHttpClientObject, TheLongConstructorStoresEachSettingInItsField) {
 }
 
 TEST(TWHttpClientObject, InitStoresTheSameSettingsAsTheLongConstructor) {
-  ClientProbe client;
+  ExposedClient client;
   client.Init("//p", "cam", 81, "u", "w", 3, true, false, true, HTTP_VERSION_1_0, "k", false);
   ExpectNewClient(client);
   EXPECT_NE(client.m_pSocket, nullptr);
@@ -168,7 +168,7 @@ TEST(TWHttpClientObject, InitStoresTheSameSettingsAsTheLongConstructor) {
 }
 
 TEST(TWHttpClientObject, InitResetsOutcomeCookieAndCurlOutputWithoutFreeing) {
-  ClientProbe client;
+  ExposedClient client;
   char* lost = static_cast<char*>(malloc(8));
   client.m_pRespBuf = lost;
   client.m_respLen = 7;
@@ -183,7 +183,7 @@ TEST(TWHttpClientObject, InitResetsOutcomeCookieAndCurlOutputWithoutFreeing) {
 }
 
 TEST(TWHttpClientObject, ASecondInitDoesNotReleaseTheFirstSocket) {
-  ClientProbe client(80);
+  ExposedClient client(80);
   TWSocket* first = client.m_pSocket;
   client.Init("p", "h", 1, "", "", 1, true, false, false, HTTP_VERSION_NONE, "", false);
   EXPECT_NE(client.m_pSocket, first);
@@ -196,13 +196,13 @@ TEST(TWHttpClientObject, TheSocketGetsHostPortTimeoutAndReadAhead) {
   LogCapture log;
   ClientSettings settings;
   settings.timeout = 0;
-  ClientProbe client(port.Port(), settings);
+  ExposedClient client(port.Port(), settings);
   EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_IO_ERROR);
   EXPECT_THAT(log.Messages(), ::testing::Contains("Socket connect timeout (0)\n"));
 }
 
 TEST(TWHttpClientObject, SetPathStripsLeadingSlashes) {
-  ClientProbe client(80);
+  ExposedClient client(80);
   client.SetPath("//x/y");
   EXPECT_EQ(client.m_strPath, "x/y");
   client.SetPath("/");
@@ -210,7 +210,7 @@ TEST(TWHttpClientObject, SetPathStripsLeadingSlashes) {
 }
 
 TEST(TWHttpClientObject, CookieAndTransferEncodingAreReadBack) {
-  ClientProbe client(80);
+  ExposedClient client(80);
   EXPECT_EQ(client.SetCookie("s=1"), 0);
   std::string cookie;
   EXPECT_EQ(client.GetCookie(cookie), 0);
@@ -220,7 +220,7 @@ TEST(TWHttpClientObject, CookieAndTransferEncodingAreReadBack) {
 }
 
 TEST(TWHttpClientObject, CheckResponseReturnsTheLastResultAndStatus) {
-  ClientProbe client(80);
+  ExposedClient client(80);
   client.m_result = HTTP_RET_REDIRECT;
   client.m_statusCode = 302;
   int status = 0;
@@ -237,7 +237,7 @@ TEST(TWHttpClientObject, ANegativeKeyIsABadKey) {
 }
 
 TEST(TWHttpClientObject, TheKeyIsTestedBeforeTheState) {
-  ClientProbe client(80);
+  ExposedClient client(80);
   client.m_connState = 1;
   client.m_mapContent[HTTP_CONTENT_TYPE] = "x";
   std::string out;
@@ -250,7 +250,7 @@ TEST(TWHttpClientObject, TheKeyIsTestedBeforeTheState) {
 
 TEST(TWHttpClientObject, ReadDataAndWriteDataAreRefusedUntilTheHeadIsRead) {
   ScriptedPeer peer({{ExpectExactly("ping"), Send("pong"), Close()}});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   ASSERT_EQ(client.m_pSocket->Connect(), 0);
   char buf[8] = "";
   for (const int state : {0, 1}) {
@@ -266,7 +266,7 @@ TEST(TWHttpClientObject, ReadDataAndWriteDataAreRefusedUntilTheHeadIsRead) {
 
 TEST(TWHttpClientObject, LineReadingPushBackAndTheReadinessProbeNeedNoState) {
   ScriptedPeer peer({SendThenClose("line\r\nrest")});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   ASSERT_EQ(client.m_pSocket->Connect(), 0);
   EXPECT_TRUE(client.HasDataToRead(5));
   char buf[16] = "";
@@ -283,7 +283,7 @@ TEST(TWHttpClientObject, TheDestructorFreesTheBufferAndClosesTheConnectionButNoF
   ScriptedPeer peer({{ExpectRequest(), Send("HTTP/1.1 200 OK\r\n\r\n"), ExpectEof()}});
   FILE* file = tmpfile();
   {
-    ClientProbe client(peer.Port());
+    ExposedClient client(peer.Port());
     client.SetCurlRespFile(file);
     client.m_pRespBuf = static_cast<char*>(malloc(4));
     client.SendRequestByGet();
@@ -294,7 +294,7 @@ TEST(TWHttpClientObject, TheDestructorFreesTheBufferAndClosesTheConnectionButNoF
 }
 
 TEST(TWHttpClientObject, TheFieldsStandInTheOrderThatOtherProgramsCountOn) {
-  const ClientProbe c;
+  const ExposedClient c;
   const std::vector<const char*> places = {Address(c.m_pSocket),
                                            Address(c.m_mapContent),
                                            Address(c.m_connState),
@@ -323,7 +323,7 @@ TEST(TWHttpClientObject, TheFieldsStandInTheOrderThatOtherProgramsCountOn) {
 }
 
 TEST(TWHttpClientObject, BufferAndLengthAreOneRecordForTheCurlCallbacks) {
-  ClientProbe client;
+  ExposedClient client;
   auto* record = reinterpret_cast<CurlMemBuffer*>(&client.m_pRespBuf);
   EXPECT_EQ(Address(client.m_respLen) - Address(client.m_pRespBuf),
             Address(record->size) - Address(record->data));

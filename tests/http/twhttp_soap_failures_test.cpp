@@ -18,7 +18,7 @@ const SoapOutcome kNothingRead = {HTTP_RET_IO_ERROR, "old", HTTP_RET_OK};
 
 TEST(SendReqBySocketPost, AFailedConnectIsLoggedAndChangesNoField) {
   const ClosedPort port;
-  ClientProbe client(port.Port());
+  ExposedClient client(port.Port());
   client.m_strAuthorization = "Authorization: X";
   client.m_result = HTTP_RET_REDIRECT;
   std::string response = "old";
@@ -33,7 +33,7 @@ TEST(SendReqBySocketPost, AFailedConnectIsLoggedAndChangesNoField) {
 }
 
 TEST(SendReqBySocketPost, AClientWithoutASocketCannotConnect) {
-  ClientProbe client;
+  ExposedClient client;
   std::string response = "old";
   EXPECT_EQ(client.SendReqBySocketPost("x", response), HTTP_RET_IO_ERROR);
   EXPECT_EQ(response, "old");
@@ -42,7 +42,7 @@ TEST(SendReqBySocketPost, AClientWithoutASocketCannotConnect) {
 TEST(SendReqBySocketPost, AWriteThatFailsOrTakesNothingIsLogged) {
   for (const long written : {-1, 0}) {
     ScriptedPeer peer({{DiscardUntilEnd()}});
-    ClientProbe client(peer.Port());
+    ExposedClient client(peer.Port());
     client.m_strAuthorization = "Authorization: X";
     client.m_result = HTTP_RET_REDIRECT;
     std::string response = "old";
@@ -66,7 +66,7 @@ TEST(SendReqBySocketPost, AReadThatFailsOrDeliversNothingIsLogged) {
     ScriptedPeer peer({Exchange(Announcing("9", ""))});
     ClientSettings settings;
     settings.buffered = buffered;
-    ClientProbe client(peer.Port(), settings);
+    ExposedClient client(peer.Port(), settings);
     std::string response = "old";
     LogCapture log;
     EXPECT_EQ(client.SendReqBySocketPost("x", response), HTTP_RET_IO_ERROR);
@@ -82,7 +82,7 @@ TEST(SendReqBySocketPost, AReadErrorInPlaceOfTheBodyIsLogged) {
   ScriptedPeer peer({{ExpectRequest(), Send(head + "body"), DiscardUntilEnd()}});
   ClientSettings settings;
   settings.buffered = false;  // a read for each byte of the head, so the next one is the body's
-  ClientProbe client(peer.Port(), settings);
+  ExposedClient client(peer.Port(), settings);
   std::string response = "old";
   LogCapture log;
   {
@@ -98,7 +98,7 @@ TEST(SendReqBySocketPost, AReadErrorInPlaceOfTheBodyIsLogged) {
 
 TEST(SendReqBySocketPost, WithoutMemoryForTheRequestALineNamesItsLengthAndOne) {
   ScriptedPeer peer({{ExpectEof()}});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   std::string response = "old";
   LogCapture log(3);
   {
@@ -129,7 +129,7 @@ TEST(SendReqBySocketPost, WithoutMemoryForTheRestOfTheResponseNoneOfItIsReturned
   for (const Call call : {Call::kMalloc, Call::kRealloc}) {
     ForEachFailingCall(call, [&](Faults& faults) {
       ScriptedPeer peer({{SendEndlessly(Soap(body), body.size())}});
-      ClientProbe client(peer.Port());
+      ExposedClient client(peer.Port());
       std::string response = "old";
       log.Clear();
       const int result = client.SendReqBySocketPost("x", response);
@@ -143,7 +143,7 @@ TEST(SendReqBySocketPost, WithoutMemoryForTheRestOfTheResponseNoneOfItIsReturned
 
 TEST(SendReqBySocketPost, TheLineOfALaterPieceNamesTheAnnouncedLengthAndOne) {
   ScriptedPeer peer({{ExpectRequest(), SendEndlessly(Soap(std::string(3 * kMebibyte, 'b')), 1)}});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   std::string response = "old";
   LogCapture log(3);
   {

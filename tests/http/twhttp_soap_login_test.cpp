@@ -15,9 +15,9 @@ using ::testing::IsEmpty;
 
 TEST(SendAuthReqBySocketPost, AChallengeOfDigestIsAnsweredWithDigestAfterTheType) {
   ScriptedPeer peer({Exchange(Unauthorized(kDigest, "no")), Exchange(Soap("second"))});
-  ClientProbe client(peer.Port(), WithCredentials());
+  ExposedClient client(peer.Port(), WithCredentials());
   EXPECT_EQ(AuthOf(client), (SoapOutcome{HTTP_RET_OK, "second", HTTP_RET_OK}));
-  ClientProbe same(1, WithCredentials());
+  ExposedClient same(1, WithCredentials());
   same.m_strAuthenticate = kDigest;
   EXPECT_EQ(peer.Received(0), RequestText("", "x"));
   EXPECT_EQ(peer.Received(1), RequestText(same.GenDigestAccessAuth("POST", "") + "\r\n", "x"));
@@ -26,7 +26,7 @@ TEST(SendAuthReqBySocketPost, AChallengeOfDigestIsAnsweredWithDigestAfterTheType
 
 TEST(SendAuthReqBySocketPost, ARetryThatCannotConnectLeavesTheBodyOfThe401) {
   ScriptedPeer peer({Exchange(Unauthorized(kDigest, "denied"))});
-  ClientProbe client(peer.Port(), WithCredentials());
+  ExposedClient client(peer.Port(), WithCredentials());
   Faults faults;
   faults.FailFrom(Call::kConnect, 2);
   EXPECT_EQ(AuthOf(client), (SoapOutcome{HTTP_RET_IO_ERROR, "denied", HTTP_RET_UNAUTHORIZED}));
@@ -44,7 +44,7 @@ TEST(SendAuthReqBySocketPost, AResponseThatIsNo401EndsIt) {
         {Exchange(Soap("body", std::string(status) + "\r\nWWW-Authenticate: " + kDigest))});
     ClientSettings settings = WithCredentials();
     settings.basic_auth = true;  // plays no part here
-    ClientProbe client(peer.Port(), settings);
+    ExposedClient client(peer.Port(), settings);
     EXPECT_EQ(AuthOf(client), (SoapOutcome{expected, "body", expected}));
     EXPECT_EQ(peer.Received(0), RequestText("", "x"));
   }
@@ -53,7 +53,7 @@ TEST(SendAuthReqBySocketPost, AResponseThatIsNo401EndsIt) {
 TEST(SendAuthReqBySocketPost, AChallengeOfBasicInAnyCaseIsAnsweredWithBasic) {
   for (const char* challenge : {"Basic realm=\"r\"", "BASIC", "x bAsIc"}) {
     ScriptedPeer peer({Exchange(Unauthorized(challenge, "no")), Exchange(Soap("second"))});
-    ClientProbe client(peer.Port(), WithCredentials());
+    ExposedClient client(peer.Port(), WithCredentials());
     EXPECT_EQ(AuthOf(client), (SoapOutcome{HTTP_RET_OK, "second", HTTP_RET_OK}));
     EXPECT_EQ(peer.Received(1), RequestText("Authorization: Basic dTpw\r\n", "x"));
   }
@@ -62,7 +62,7 @@ TEST(SendAuthReqBySocketPost, AChallengeOfBasicInAnyCaseIsAnsweredWithBasic) {
 TEST(SendAuthReqBySocketPost, DigestIsTestedBeforeBasicAndAnywhereInTheChallenge) {
   for (const char* challenge : {"Digest realm=\"basic\"", "Basic realm=\"dIgEsT\""}) {
     ScriptedPeer peer({Exchange(Unauthorized(challenge, "no")), Exchange(Soap("second"))});
-    ClientProbe client(peer.Port(), WithCredentials());
+    ExposedClient client(peer.Port(), WithCredentials());
     EXPECT_EQ(AuthOf(client).result, HTTP_RET_OK);
     EXPECT_THAT(peer.Received(1), HasSubstr("utf-8\r\nAuthorization: Digest username=\"u\""));
   }
@@ -70,7 +70,7 @@ TEST(SendAuthReqBySocketPost, DigestIsTestedBeforeBasicAndAnywhereInTheChallenge
 
 TEST(SendAuthReqBySocketPost, AChallengeOfNeitherGetsNoSecondRequest) {
   ScriptedPeer peer({Exchange(Unauthorized("Bearer x", "no"))});
-  ClientProbe client(peer.Port(), WithCredentials());
+  ExposedClient client(peer.Port(), WithCredentials());
   EXPECT_EQ(AuthOf(client), (SoapOutcome{HTTP_RET_UNAUTHORIZED, "no", HTTP_RET_UNAUTHORIZED}));
   peer.Finish();
   EXPECT_EQ(peer.Connections(), 1u);
@@ -79,7 +79,7 @@ TEST(SendAuthReqBySocketPost, AChallengeOfNeitherGetsNoSecondRequest) {
 TEST(SendAuthReqBySocketPost, A401WithoutABodyIsAnsweredToo) {
   for (const char* challenge : {kDigest, "Basic x"}) {
     ScriptedPeer peer({Exchange(Unauthorized(challenge, "")), Exchange(Soap("second"))});
-    ClientProbe client(peer.Port(), WithCredentials());
+    ExposedClient client(peer.Port(), WithCredentials());
     EXPECT_EQ(AuthOf(client), (SoapOutcome{HTTP_RET_OK, "second", HTTP_RET_OK}));
     EXPECT_EQ(peer.Connections(), 2u);
   }
@@ -87,14 +87,14 @@ TEST(SendAuthReqBySocketPost, A401WithoutABodyIsAnsweredToo) {
 
 TEST(SendAuthReqBySocketPost, A401WithoutABodyAndWithoutAKnownSchemeIsAnIoError) {
   ScriptedPeer peer({Exchange(Unauthorized("Bearer x", ""))});
-  ClientProbe client(peer.Port(), WithCredentials());
+  ExposedClient client(peer.Port(), WithCredentials());
   EXPECT_EQ(AuthOf(client), (SoapOutcome{HTTP_RET_IO_ERROR, "old", HTTP_RET_UNAUTHORIZED}));
 }
 
 TEST(SendAuthReqBySocketPost, ASecond401GoesBackToTheCaller) {
   ScriptedPeer peer(
       {Exchange(Unauthorized(kDigest, "first")), Exchange(Unauthorized(kDigest, "second"))});
-  ClientProbe client(peer.Port(), WithCredentials());
+  ExposedClient client(peer.Port(), WithCredentials());
   EXPECT_EQ(AuthOf(client), (SoapOutcome{HTTP_RET_UNAUTHORIZED, "second", HTTP_RET_UNAUTHORIZED}));
   peer.Finish();
   EXPECT_EQ(peer.Connections(), 2u);
@@ -105,13 +105,13 @@ TEST(SendAuthReqBySocketPost, AnUnreadFirstBodyIsClosedWithItsConnection) {
       {{ExpectRequest(), Send("HTTP/1.1 401 No\r\nWWW-Authenticate: Basic x\r\n\r\nunread"),
         DiscardUntilEnd()},
        Exchange(Soap("second"))});
-  ClientProbe client(peer.Port(), WithCredentials());
+  ExposedClient client(peer.Port(), WithCredentials());
   EXPECT_EQ(AuthOf(client), (SoapOutcome{HTTP_RET_OK, "second", HTTP_RET_OK}));
 }
 
 TEST(SendAuthReqBySocketPost, AfterAnEarlier401AFailedConnectIsRetriedWithTheCredentials) {
   ScriptedPeer peer({Exchange(Soap("late"))});
-  ClientProbe client(peer.Port(), WithCredentials());
+  ExposedClient client(peer.Port(), WithCredentials());
   client.m_result = HTTP_RET_UNAUTHORIZED;
   client.m_strAuthenticate = " Basic x";
   Faults faults;
@@ -121,7 +121,7 @@ TEST(SendAuthReqBySocketPost, AfterAnEarlier401AFailedConnectIsRetriedWithTheCre
 }
 
 TEST(SendAuthReqBySocketPost, AnEmptyBodyIsAnErrorBeforeAndAfterA401) {
-  ClientProbe client(1, WithCredentials());
+  ExposedClient client(1, WithCredentials());
   std::string response = "old";
   LogCapture log;
   Faults faults;
@@ -137,7 +137,7 @@ TEST(SendAuthReqBySocketPost, AnEmptyBodyIsAnErrorBeforeAndAfterA401) {
 
 TEST(SendAuthReqBySocketPost, ItLogsNothingOfItsOwn) {
   ScriptedPeer peer({Exchange(Unauthorized(kDigest, "")), Exchange(Unauthorized(kDigest, ""))});
-  ClientProbe client(peer.Port(), WithCredentials());
+  ExposedClient client(peer.Port(), WithCredentials());
   LogCapture log;
   log.SetLevel(kHttpCategory, 6);
   AuthOf(client);

@@ -50,7 +50,7 @@ TEST(SendReqBySocketPost, TheAuthorizationIsBetweenTypeAndLengthAndIsSentOnce) {
   ScriptedPeer peer({Exchange(Soap("ok"))});
   ClientSettings settings;
   settings.path = "soap/svc";
-  ClientProbe client(peer.Port(), settings);
+  ExposedClient client(peer.Port(), settings);
   client.m_strHost = "cam";
   client.m_strAuthorization = "Authorization: X";
   std::string response = "old";
@@ -65,7 +65,7 @@ TEST(SendReqBySocketPost, TheAuthorizationIsBetweenTypeAndLengthAndIsSentOnce) {
 
 TEST(SendReqBySocketPost, AnEmptyBodyIsAnErrorAndOpensNoConnection) {
   ScriptedPeer peer({});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   std::string response = "old";
   LogCapture log;
   Faults faults;
@@ -86,7 +86,7 @@ TEST(SendReqBySocketPost, TheBodyOfA500IsReadAndOnlyTheVariantWithCredentialsRet
   EXPECT_EQ(SoapOf(Soap(body, "500 Oops")),
             (SoapOutcome{HTTP_RET_OK, body, HTTP_RET_BAD_RESPONSE}));
   ScriptedPeer peer({Exchange(Soap(body, "500 Oops"))});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   EXPECT_EQ(AuthOf(client), (SoapOutcome{HTTP_RET_BAD_RESPONSE, body, HTTP_RET_BAD_RESPONSE}));
 }
 
@@ -98,7 +98,7 @@ TEST(SendReqBySocketPost, Http11IsSentWhateverTheVersionAndNeitherCookieNorCrede
     ClientSettings settings = WithCredentials();
     settings.version = static_cast<HTTP_VERSION>(version);
     settings.basic_auth = true;
-    ClientProbe client(peer.Port(), settings);
+    ExposedClient client(peer.Port(), settings);
     client.SetCookie("s=1");
     std::string response;
     EXPECT_EQ(client.SendReqBySocketPost("<e/>", response), HTTP_RET_OK);
@@ -109,7 +109,7 @@ TEST(SendReqBySocketPost, Http11IsSentWhateverTheVersionAndNeitherCookieNorCrede
 TEST(SendReqBySocketPost, AnEnvelopeOfSeveralMebibytesIsSentWhole) {
   const std::string body(3 * kMebibyte, 'e');
   ScriptedPeer peer({Exchange(Soap("ok"))});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   std::string response;
   EXPECT_EQ(client.SendReqBySocketPost(body, response), HTTP_RET_OK);
   EXPECT_TRUE(peer.Received(0) == RequestText("", body));
@@ -120,7 +120,7 @@ TEST(SendReqBySocketPost, AfterAZeroByteNothingOfTheBodyIsSent) {
                            "Content-Length: 4\r\n\r\nab";
   ScriptedPeer peer({{ExpectUntil("\r\n\r\nab"), Send(Soap("ok")), DiscardUntilEnd()}});
   {
-    ClientProbe client(peer.Port());
+    ExposedClient client(peer.Port());
     std::string response;
     client.SendReqBySocketPost("ab\0c"s, response);
   }
@@ -132,7 +132,7 @@ TEST(SendReqBySocketPost, AfterAZeroByteNothingOfTheBodyIsSent) {
 
 TEST(SendReqBySocketPost, AShortWriteIsSuccess) {
   ScriptedPeer peer({{ExpectBytes(10), Send(Soap("ok")), DiscardUntilEnd()}});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   std::string response;
   {
     Faults faults;
@@ -150,7 +150,7 @@ TEST(SendReqBySocketPost, EveryTransportCarriesTheSameExchange) {
     EXPECT_EQ(SoapOf(Soap("words"), settings), (SoapOutcome{HTTP_RET_OK, "words", HTTP_RET_OK}));
     TlsScriptedPeer peer({Exchange(Soap("words"))});
     settings.https = true;
-    ClientProbe client(peer.Port(), settings);
+    ExposedClient client(peer.Port(), settings);
     std::string response;
     EXPECT_EQ(client.SendReqBySocketPost("x", response), HTTP_RET_OK);
     EXPECT_EQ(response, "words");
@@ -162,7 +162,7 @@ TEST(SendReqBySocketPost, EveryTransportCarriesTheSameExchange) {
 
 TEST(SendReqBySocketPost, TheStateAndTheResultAreThoseOfTheHead) {
   ScriptedPeer peer({Exchange(Soap("ok", "302 Found"))});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   std::string response;
   EXPECT_EQ(client.SendReqBySocketPost("x", response), HTTP_RET_OK);
   EXPECT_EQ(client.m_connState, 2);
@@ -172,7 +172,7 @@ TEST(SendReqBySocketPost, TheStateAndTheResultAreThoseOfTheHead) {
 
 TEST(SendReqBySocketPost, BytesAfterTheAnnouncedLengthStayUnread) {
   ScriptedPeer peer({Exchange(Announcing("3", "abcdef"))});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   std::string response = "a longer text than the new one";
   EXPECT_EQ(client.SendReqBySocketPost("x", response), HTTP_RET_OK);
   EXPECT_EQ(response, "abc");
@@ -231,7 +231,7 @@ TEST(SendReqBySocketPost, ADirectReadIsNotRepeated) {
   ScriptedPeer peer({{ExpectRequest(), Send(head + "abc"), DiscardUntilEnd()}});
   ClientSettings settings;
   settings.buffered = false;
-  ClientProbe client(peer.Port(), settings);
+  ExposedClient client(peer.Port(), settings);
   std::string response;
   {
     Faults faults;
@@ -244,7 +244,7 @@ TEST(SendReqBySocketPost, ADirectReadIsNotRepeated) {
 
 TEST(SendReqBySocketPost, ABufferedResponseInPiecesArrivesWhole) {
   ScriptedPeer peer({ExchangeByteByByte(Soap("in pieces"))});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   std::string response;
   EXPECT_EQ(client.SendReqBySocketPost("x", response), HTTP_RET_OK);
   EXPECT_EQ(response, "in pieces");
@@ -281,7 +281,7 @@ TEST(SendReqBySocketPost, ALengthThatDoesNotFitIsAnErrorAndTakesNoMemory) {
         std::string(30, '9'), "-"s + std::string(30, '9'), "-4294967292"s}) {
     ScriptedPeer peer({Exchange(Announcing(length, "body"))});
     EXPECT_EQ(InLittleMemory([&] {
-                ClientProbe client(peer.Port());
+                ExposedClient client(peer.Port());
                 std::string response = "old";
                 const int result = client.SendReqBySocketPost("x", response);
                 EXPECT_EQ(response, "old");
@@ -298,7 +298,7 @@ TEST(SendReqBySocketPost, MemoryGrowsWithWhatArrivesAndNotWithWhatIsAnnounced) {
   for (const char* announced : {"536870912", "2147483646"}) {
     ScriptedPeer peer({Exchange(Announcing(announced, body))});
     EXPECT_EQ(InLittleMemory([&] {
-                ClientProbe client(peer.Port());
+                ExposedClient client(peer.Port());
                 std::string response;
                 const int result = client.SendReqBySocketPost("x", response);
                 EXPECT_TRUE(response == body) << response.size();

@@ -25,7 +25,7 @@ struct OwnedDoc {
 // The text of the document that a response's body returns; "(null)" for no document.
 std::string XmlTextOf(const std::string& body) {
   ScriptedPeer peer({Exchange(Soap(body))});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   OwnedDoc response;
   EXPECT_EQ(client.SendReqByXMLSocketPost("x", response.doc), HTTP_RET_OK);
   return response.doc != nullptr ? response.Text() : "(null)";
@@ -35,7 +35,7 @@ std::string XmlTextOf(const std::string& body) {
 
 TEST(SendReqByXMLSocketPost, ABodyThatIsNoXmlIsANullDocumentAndOk) {
   ScriptedPeer peer({Exchange(Soap("<a>no end"))});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   OwnedDoc earlier;
   earlier.doc = xmlNewDoc(BAD_CAST "1.0");
   xmlDoc* doc = earlier.doc;  // overwritten, not freed
@@ -56,7 +56,7 @@ TEST(SendReqByXMLSocketPost, CarriageReturnsAndLineFeedsAreRemovedEverywhere) {
 
 TEST(SendReqByXMLSocketPost, AFaultWithStatus500IsADocument) {
   ScriptedPeer peer({Exchange(Soap("<fault>f</fault>", "500 Oops"))});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   OwnedDoc response;
   EXPECT_EQ(client.SendReqByXMLSocketPost("x", response.doc), HTTP_RET_OK);
   EXPECT_EQ(client.m_result, HTTP_RET_BAD_RESPONSE);
@@ -67,7 +67,7 @@ TEST(SendReqByXMLSocketPost, AFaultWithStatus500IsADocument) {
 
 TEST(SendReqByXMLSocketPost, AFailureLeavesTheDocument) {
   const ClosedPort port;
-  ClientProbe client(port.Port());
+  ExposedClient client(port.Port());
   OwnedDoc earlier;
   earlier.doc = xmlNewDoc(BAD_CAST "1.0");
   xmlDoc* doc = earlier.doc;
@@ -79,7 +79,7 @@ TEST(SendReqByXMLSocketPost, AFailureLeavesTheDocument) {
 
 TEST(SendReqByXMLSocketPost, A401IsNotAnswered) {
   ScriptedPeer peer({Exchange(Unauthorized(kDigest, "<no/>"))});
-  ClientProbe client(peer.Port(), WithCredentials());
+  ExposedClient client(peer.Port(), WithCredentials());
   OwnedDoc response;
   EXPECT_EQ(client.SendReqByXMLSocketPost("x", response.doc), HTTP_RET_OK);
   EXPECT_EQ(client.m_result, HTTP_RET_UNAUTHORIZED);

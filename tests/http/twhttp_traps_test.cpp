@@ -50,7 +50,7 @@ TEST(ReadBody, AfterAHeadOfExactly30LinesAChunkedBodyIsEmpty) {
 
 TEST(SendReqBySocketPost, AfterAHeadOfExactly30LinesTheResponseBeginsWithTheEmptyLine) {
   ScriptedPeer peer({Exchange(HeadOf(30, "Content-Length: 5") + "<a/>\n")});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   std::string response;
   EXPECT_EQ(client.SendReqBySocketPost("x", response), HTTP_RET_OK);
   EXPECT_EQ(response, "\r\n<a/");
@@ -60,7 +60,7 @@ TEST(SendAuthReqBySocketPost, TheLastOfSeveralChallengesDecides) {
   ScriptedPeer peer({Exchange("HTTP/1.1 401 No\r\nWWW-Authenticate: Digest realm=\"r\"\r\n"
                               "WWW-Authenticate: Basic realm=\"r\"\r\n\r\n"),
                      Exchange(kPage)});
-  ClientProbe client(peer.Port(), WithCredentials());
+  ExposedClient client(peer.Port(), WithCredentials());
   std::string response;
   EXPECT_EQ(client.SendAuthReqBySocketPost("x", response), HTTP_RET_OK);
   EXPECT_THAT(peer.Received(1), HasSubstr("\r\nAuthorization: Basic "));
@@ -68,7 +68,7 @@ TEST(SendAuthReqBySocketPost, TheLastOfSeveralChallengesDecides) {
 
 TEST(SendRequestBySocketPost, OfAPeerThatKeepsTheConnectionTheBodyIsReadAndThenThreeWaitsFail) {
   ScriptedPeer peer({AnswerAndKeep(kPage)});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   ASSERT_EQ(client.SendRequestBySocketPost(""), HTTP_RET_OK);
   std::string body;
   {
@@ -85,7 +85,7 @@ TEST(SendRequestBySocketPost, WithHttp10TheRequestAsksForNoConnectionAndTheClose
   ScriptedPeer peer({Exchange(kPage)});
   ClientSettings settings;
   settings.version = HTTP_VERSION_1_0;
-  ClientProbe client(peer.Port(), settings);
+  ExposedClient client(peer.Port(), settings);
   ASSERT_EQ(client.SendRequestBySocketPost(""), HTTP_RET_OK);
   std::string body;
   EXPECT_EQ(client.ReadBody(body), HTTP_RET_OK);
@@ -95,7 +95,7 @@ TEST(SendRequestBySocketPost, WithHttp10TheRequestAsksForNoConnectionAndTheClose
 
 TEST(GetResp, AfterAnUploadAPeerThatKeepsTheConnectionReturnsTheErrorText) {
   ScriptedPeer peer({AnswerAndKeep(kPage)});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   ASSERT_EQ(client.OpenRawDataUpload(), HTTP_RET_OK);
   EXPECT_TRUE(client.HasDataToRead(10));
   {
@@ -112,7 +112,7 @@ TEST(GetResp, AfterAnUploadAPeerThatKeepsTheConnectionReturnsTheErrorText) {
 TEST(GetResp, AfterAnUploadASecondResponseIsInTheBodyOfTheFirst) {
   const std::string second = "HTTP/1.1 400 Bad Request\r\nConnection: close\r\n\r\n";
   ScriptedPeer peer({{ExpectUntil("\r\n\r\n"), Send(kPage), Send(second), Close()}});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   ASSERT_EQ(client.OpenRawDataUpload(), HTTP_RET_OK);
   EXPECT_EQ(client.GetResp(), "page" + second);
 }
@@ -141,7 +141,7 @@ TEST(SendRequestByCurlTls, AServerThatTakesHttp2GetsIt) {
   ClientSettings settings;
   settings.https = true;
   settings.version = HTTP_VERSION_1_0;
-  ClientProbe client(peer.Port(), settings);
+  ExposedClient client(peer.Port(), settings);
   EXPECT_EQ(client.SendRequestByCurl(HTTP_METHOD_GET, false, 10), HTTP_RET_IO_ERROR);
   EXPECT_THAT(peer.Received(0), StartsWith(begin));
 }

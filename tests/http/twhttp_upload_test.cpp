@@ -32,7 +32,7 @@ void ExpectHead(const ClientSettings& settings, const std::string& cookie,
                 const std::string& cookie_line) {
   ScriptedPeer peer({{ExpectUntil("\r\n\r\n"), ExpectEof()}});
   {
-    ClientProbe client(peer.Port(), settings);
+    ExposedClient client(peer.Port(), settings);
     client.m_strHost = "cam";
     client.SetCookie(cookie);
     client.m_strAuthorization = "Authorization: X";
@@ -89,7 +89,7 @@ TEST(OpenRawDataUpload, TheCallerStreamsTheBodyAndReadsTheResponse) {
         tls ? std::make_unique<TlsScriptedPeer>(scripts) : std::make_unique<ScriptedPeer>(scripts);
     ClientSettings settings = ForUpload();
     settings.https = tls;
-    ClientProbe client(peer->Port(), settings);
+    ExposedClient client(peer->Port(), settings);
     client.m_strHost = "cam";
     ASSERT_EQ(client.OpenRawDataUpload(), HTTP_RET_OK);
     WriteInPieces(client, data);
@@ -101,7 +101,7 @@ TEST(OpenRawDataUpload, TheCallerStreamsTheBodyAndReadsTheResponse) {
 TEST(OpenRawDataUpload, DestroyingTheClientEndsTheUpload) {
   ScriptedPeer peer({{ExpectUntil("\r\n\r\n"), ExpectExactly("part"), ExpectEof()}});
   {
-    ClientProbe client(peer.Port());
+    ExposedClient client(peer.Port());
     ASSERT_EQ(client.OpenRawDataUpload(), HTTP_RET_OK);
     EXPECT_EQ(client.WriteData("part", 4), 4);
   }
@@ -110,7 +110,7 @@ TEST(OpenRawDataUpload, DestroyingTheClientEndsTheUpload) {
 
 TEST(OpenRawDataUpload, ASecondUploadRunsOnAFreshConnection) {
   ScriptedPeer peer({{ExpectUntil("\r\n\r\n"), ExpectEof()}, {ExpectUntil("\r\n\r\n")}});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   EXPECT_EQ(client.OpenRawDataUpload(), HTTP_RET_OK);
   EXPECT_EQ(client.OpenRawDataUpload(), HTTP_RET_OK);
   peer.Finish();
@@ -119,7 +119,7 @@ TEST(OpenRawDataUpload, ASecondUploadRunsOnAFreshConnection) {
 
 TEST(OpenRawDataUpload, ItReadsNothingAndKeepsTheLastResponse) {
   ScriptedPeer peer({{ExpectUntil("\r\n\r\n"), StallUntilFinish()}});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   client.m_result = HTTP_RET_REDIRECT;
   client.m_statusCode = 302;
   EXPECT_EQ(client.OpenRawDataUpload(), HTTP_RET_OK);
@@ -131,7 +131,7 @@ TEST(OpenRawDataUpload, ItReadsNothingAndKeepsTheLastResponse) {
 TEST(OpenRawDataUpload, AFailedConnectIsLoggedAtErrorAndLeavesTheState) {
   const ClosedPort port;
   for (const int state : {0, 1, 2}) {
-    ClientProbe client(port.Port());
+    ExposedClient client(port.Port());
     client.m_connState = state;
     LogCapture log(3);
     EXPECT_EQ(client.OpenRawDataUpload(), HTTP_RET_IO_ERROR);
@@ -144,7 +144,7 @@ TEST(OpenRawDataUpload, AFailedConnectIsLoggedAtErrorAndLeavesTheState) {
 TEST(OpenRawDataUpload, AWriteThatFailsOrTakesNothingIsLoggedAtErrorAndLeavesTheState) {
   for (const long written : {-1, 0}) {
     ScriptedPeer peer({{DiscardUntilEnd()}});
-    ClientProbe client(peer.Port());
+    ExposedClient client(peer.Port());
     client.m_connState = 1;
     LogCapture log(3);
     {
@@ -162,7 +162,7 @@ TEST(OpenRawDataUpload, AWriteThatFailsOrTakesNothingIsLoggedAtErrorAndLeavesThe
 
 TEST(OpenRawDataUpload, AShortWriteIsSuccess) {
   ScriptedPeer peer({{DiscardUntilEnd()}});
-  ClientProbe client(peer.Port());
+  ExposedClient client(peer.Port());
   Faults faults;
   faults.Limit(Call::kWrite, 10).FailRange(Call::kWrite, 2, 2, EIO);
   EXPECT_EQ(client.OpenRawDataUpload(), HTTP_RET_OK);
@@ -175,7 +175,7 @@ TEST(OpenRawDataUpload, AFailedTlsWriteIsLoggedInTheSameWay) {
   TlsScriptedPeer peer({{Handshake(), DiscardUntilEnd()}});
   ClientSettings settings = ForUpload();
   settings.https = true;
-  ClientProbe client(peer.Port(), settings);
+  ExposedClient client(peer.Port(), settings);
   LogCapture log(3);
   {
     Faults faults;
@@ -188,7 +188,7 @@ TEST(OpenRawDataUpload, AFailedTlsWriteIsLoggedInTheSameWay) {
 }
 
 TEST(OpenRawDataUpload, AClientWithoutASocketCannotConnect) {
-  ClientProbe client;
+  ExposedClient client;
   LogCapture log(3);
   EXPECT_EQ(client.OpenRawDataUpload(), HTTP_RET_IO_ERROR);
   EXPECT_THAT(log.Lines("http"),
@@ -197,7 +197,7 @@ TEST(OpenRawDataUpload, AClientWithoutASocketCannotConnect) {
 
 TEST(OpenRawDataUpload, WithTheCategoryOffNothingIsLogged) {
   const ClosedPort port;
-  ClientProbe client(port.Port());
+  ExposedClient client(port.Port());
   LogCapture log;
   log.SetLevel(kHttpCategory, 0);
   EXPECT_EQ(client.OpenRawDataUpload(), HTTP_RET_IO_ERROR);

@@ -19,7 +19,7 @@ TEST(XmlSenders, AStatusFrom200To299IsOkAndAnyOtherALineAndAnIoError) {
   for (const Sender& sender : Senders()) {
     for (const int status : {200, 299, 300, 302, 401, 404, 500}) {
       ScriptedPeer peer({Exchange(Response("<b/>", std::to_string(status) + " x"))});
-      ClientProbe client(peer.Port(), WithCredentials("127.0.0.1"));
+      ExposedClient client(peer.Port(), WithCredentials("127.0.0.1"));
       LogCapture log;
       const bool good = status <= 299;
       EXPECT_EQ(Send(sender, client), good ? HTTP_RET_OK : HTTP_RET_IO_ERROR) << status;
@@ -41,7 +41,7 @@ TEST(XmlSenders, AFailedTransferIsLoggedAndAnIoErrorWhateverTheCode) {
   for (const Sender& sender : Senders()) {
     for (const int code : {7, 28, 60}) {
       const DescriptorGuard guard;
-      ClientProbe client(80, WithCredentials());
+      ExposedClient client(80, WithCredentials());
       client.m_connState = 2;
       LogCapture log;
       Faults faults;
@@ -62,7 +62,7 @@ TEST(XmlSenders, AFailedTransferIsLoggedAndAnIoErrorWhateverTheCode) {
 TEST(XmlSenders, AStatusThatCannotBeReadIsLoggedAsZero) {
   for (const Sender& sender : Senders()) {
     ScriptedPeer peer({Exchange(Response("<b/>"))});
-    ClientProbe client(peer.Port(), WithCredentials("127.0.0.1"));
+    ExposedClient client(peer.Port(), WithCredentials("127.0.0.1"));
     LogCapture log;
     Faults faults;
     faults.FailNth(Call::kCurlEasyGetinfo, 1);
@@ -76,7 +76,7 @@ TEST(XmlSenders, AStatusThatCannotBeReadIsLoggedAsZero) {
 
 TEST(XmlSenders, WithoutAHandleTheResultStaysAndALineIsLogged) {
   for (const Sender& sender : Senders()) {
-    ClientProbe client(80, WithCredentials());
+    ExposedClient client(80, WithCredentials());
     client.m_result = HTTP_RET_REDIRECT;
     LogCapture log;
     Faults faults;
@@ -92,7 +92,7 @@ TEST(XmlSenders, WithoutAHandleTheResultStaysAndALineIsLogged) {
 TEST(XmlSenders, WithoutMemoryForTheHeadersTheRequestEndsWithALine) {
   for (const Sender* sender : {&kPost, &kPut}) {
     for (const int nth : {1, 2}) {
-      ClientProbe client(80, WithCredentials());
+      ExposedClient client(80, WithCredentials());
       LogCapture log;
       Faults faults;
       faults.FailNth(Call::kCurlSlistAppend, nth);
@@ -108,7 +108,7 @@ TEST(XmlSenders, WithoutMemoryForTheHeadersTheRequestEndsWithALine) {
 }
 
 TEST(SendReqByXMLPut, WithoutATemporaryFileALineIsLogged) {
-  ClientProbe client(80, WithCredentials());
+  ExposedClient client(80, WithCredentials());
   LogCapture log;
   Faults faults;
   faults.FailNth(Call::kTmpfile, 1);
@@ -121,7 +121,7 @@ TEST(SendReqByXMLPut, WithoutATemporaryFileALineIsLogged) {
 
 TEST(SendReqByXMLPut, ADocumentThatCannotBeWrittenIsLoggedAndTheFileClosed) {
   const DescriptorGuard guard;
-  ClientProbe client(80, WithCredentials());
+  ExposedClient client(80, WithCredentials());
   FILE* full = fopen("/dev/full", "w+e");
   LogCapture log;
   Faults faults;
@@ -136,7 +136,7 @@ TEST(SendReqByXMLPut, ADocumentThatCannotBeWrittenIsLoggedAndTheFileClosed) {
 TEST(SendReqByXMLPut, TheFileIsClosedAndGoneAfterwards) {
   const DescriptorGuard guard;
   ScriptedPeer peer({Exchange(Response("<ok/>"))});
-  ClientProbe client(peer.Port(), WithCredentials("127.0.0.1"));
+  ExposedClient client(peer.Port(), WithCredentials("127.0.0.1"));
   {
     Faults faults;
     EXPECT_EQ(Send(kPut, client), HTTP_RET_OK);
@@ -148,7 +148,7 @@ TEST(SendReqByXMLPut, TheFileIsClosedAndGoneAfterwards) {
 
 TEST(XmlSenders, WithoutMemoryForTheDocumentsTextNothingElseIsSent) {
   for (const Sender* sender : {&kPost, &kPut}) {
-    ClientProbe client(80, WithCredentials());
+    ExposedClient client(80, WithCredentials());
     OwnedDoc document("<r><a>1</a></r>");
     Faults faults;
     faults.FailFrom(Call::kCurlEasyPerform, 1);
@@ -167,7 +167,7 @@ TEST(XmlSenders, WithoutMemoryForTheDocumentsTextNothingElseIsSent) {
 TEST(XmlSenders, BelowDebugNothingIsLogged) {
   LogCapture log(4);
   for (const Sender& sender : Senders()) {
-    ClientProbe client(80, WithCredentials());
+    ExposedClient client(80, WithCredentials());
     Faults faults;
     faults.FailFrom(Call::kCurlEasyPerform, 1);
     EXPECT_EQ(Send(sender, client), HTTP_RET_IO_ERROR);

@@ -17,7 +17,7 @@ TEST(SendReqByXMLPut, AnyNegativeResultOfWritingTheDocumentIsAFailure) {
   xmlDoc* doc = owner.get();
   for (const long result : {-1, -2, -1547}) {
     const DescriptorGuard guard;  // the temporary file is closed
-    ClientProbe client(80);
+    ExposedClient client(80);
     LogCapture log;
     Faults faults;
     faults.FailNth(Call::kXmlDocDump, 1, 0, result);

@@ -53,7 +53,7 @@ std::string RefusalOf(const Sender& sender, CURLoption option) {
 // What a peer that answers with `response` receives.
 std::string RequestOf(const Sender& sender, const std::string& response = Response("<ok/>")) {
   ScriptedPeer peer({Exchange(response)});
-  ClientProbe client(peer.Port(), WithCredentials("127.0.0.1"));
+  ExposedClient client(peer.Port(), WithCredentials("127.0.0.1"));
   EXPECT_EQ(Send(sender, client), HTTP_RET_OK);
   EXPECT_EQ(client.m_result, HTTP_RET_OK);
   EXPECT_EQ(client.m_connState, 1);
@@ -62,7 +62,7 @@ std::string RequestOf(const Sender& sender, const std::string& response = Respon
 
 // The fields of a POST whose document has this text.
 std::string PostFieldsOf(const std::string& text) {
-  ClientProbe client(80, WithCredentials());
+  ExposedClient client(80, WithCredentials());
   OwnedDoc document(text);
   Faults faults;
   faults.FailFrom(Call::kCurlEasyPerform, 1);
@@ -74,7 +74,7 @@ std::string PostFieldsOf(const std::string& text) {
 
 TEST(XmlSenders, WithAnEmptyHostTheUrlIsTheSchemeAlone) {
   for (const Sender& sender : Senders()) {
-    ClientProbe client(80, WithCredentials(""));
+    ExposedClient client(80, WithCredentials(""));
     Faults faults;
     faults.FailFrom(Call::kCurlEasyPerform, 1);
     Send(sender, client);
@@ -83,7 +83,7 @@ TEST(XmlSenders, WithAnEmptyHostTheUrlIsTheSchemeAlone) {
 }
 
 TEST(SendReqByXMLPost, WithANullDocumentNoHandleIsMadeAndTheResultStays) {
-  ClientProbe client(80);
+  ExposedClient client(80);
   client.m_result = HTTP_RET_REDIRECT;
   xmlDoc* none = nullptr;
   LogCapture log;
@@ -96,7 +96,7 @@ TEST(SendReqByXMLPost, WithANullDocumentNoHandleIsMadeAndTheResultStays) {
 }
 
 TEST(SendReqByXMLPut, WithANullDocumentEveryOptionIsSetBeforeTheErrorIsStored) {
-  ClientProbe client(80);
+  ExposedClient client(80);
   client.m_result = HTTP_RET_REDIRECT;
   xmlDoc* none = nullptr;
   LogCapture log;
@@ -115,7 +115,7 @@ TEST(SendReqByXMLPut, WithANullDocumentEveryOptionIsSetBeforeTheErrorIsStored) {
 TEST(SendReqByXMLPost, OfADocumentOf10000BytesTheFirst8191AreSent) {
   const std::string text = DocumentOf(10000);
   ScriptedPeer peer({Exchange(Response("<ok/>"))});
-  ClientProbe client(peer.Port(), WithCredentials("127.0.0.1"));
+  ExposedClient client(peer.Port(), WithCredentials("127.0.0.1"));
   OwnedDoc document(text);
   EXPECT_EQ(client.SendReqByXMLPost(document.doc), HTTP_RET_OK);
   const std::string request = peer.Received(0);
@@ -126,7 +126,7 @@ TEST(SendReqByXMLPost, OfADocumentOf10000BytesTheFirst8191AreSent) {
 TEST(XmlSenders, A204WithoutABodyIsSuccessAndNothingToParse) {
   for (const Sender& sender : Senders()) {
     ScriptedPeer peer({Exchange("HTTP/1.1 204 No Content\r\n\r\n")});
-    ClientProbe client(peer.Port(), WithCredentials("127.0.0.1"));
+    ExposedClient client(peer.Port(), WithCredentials("127.0.0.1"));
     EXPECT_EQ(Send(sender, client), HTTP_RET_OK) << sender.name;
     xmlDoc* doc = nullptr;
     EXPECT_FALSE(client.GetResponseXML(doc));
@@ -137,7 +137,7 @@ TEST(XmlSenders, A204WithoutABodyIsSuccessAndNothingToParse) {
 
 TEST(XmlSenders, TheOptionsAreSetInOrder) {
   for (const Sender& sender : Senders()) {
-    ClientProbe client(80, WithCredentials());
+    ExposedClient client(80, WithCredentials());
     Faults faults;
     faults.FailFrom(Call::kCurlEasyPerform, 1);
     Send(sender, client);
@@ -150,7 +150,7 @@ TEST(XmlSenders, CredentialsUrlAndCollectionAreTheSameForAll) {
     ClientSettings settings = WithCredentials();
     settings.https = true;  // is ignored here
     settings.version = HTTP_VERSION_1_0;
-    ClientProbe client(443, settings);
+    ExposedClient client(443, settings);
     Faults faults;
     faults.FailFrom(Call::kCurlEasyPerform, 1);
     Send(sender, client);
@@ -165,7 +165,7 @@ TEST(XmlSenders, CredentialsUrlAndCollectionAreTheSameForAll) {
 }
 
 TEST(SendReqByXMLGet, TheTimeoutAndBothSchemesAreSet) {
-  ClientProbe client(80, WithCredentials());
+  ExposedClient client(80, WithCredentials());
   Faults faults;
   faults.FailFrom(Call::kCurlEasyPerform, 1);
   client.SendReqByXMLGet(7);
@@ -174,7 +174,7 @@ TEST(SendReqByXMLGet, TheTimeoutAndBothSchemesAreSet) {
 }
 
 TEST(SendReqByXMLPost, TheDocumentIsHandedOnIndentedWithTwoHeaders) {
-  ClientProbe client(80, WithCredentials());
+  ExposedClient client(80, WithCredentials());
   Faults faults;
   faults.FailFrom(Call::kCurlEasyPerform, 1);
   Send(kPost, client);
@@ -191,7 +191,7 @@ TEST(SendReqByXMLPost, DocumentsAroundTheLimitAreSentWholeOrCutAt8191) {
 }
 
 TEST(SendReqByXMLPut, TheFileHoldsTheDocumentAndItsSizeIsHandedOn) {
-  ClientProbe client(80, WithCredentials());
+  ExposedClient client(80, WithCredentials());
   std::string content;
   Faults faults;
   faults.FailFrom(Call::kCurlEasyPerform, 1).Before(Call::kCurlEasyPerform, [&](int) {
@@ -212,7 +212,7 @@ TEST(SendReqByXMLPut, TheFileHoldsTheDocumentAndItsSizeIsHandedOn) {
 }
 
 TEST(SendReqByXMLDelete, TheMethodIsHandedOn) {
-  ClientProbe client(80, WithCredentials());
+  ExposedClient client(80, WithCredentials());
   Faults faults;
   faults.FailFrom(Call::kCurlEasyPerform, 1);
   client.SendReqByXMLDelete();
@@ -223,7 +223,7 @@ TEST(XmlSenders, EachRefusedOptionHasItsLineAndEndsTheRequest) {
   for (const Sender& sender : Senders()) {
     for (const CURLoption option : sender.options) {
       const DescriptorGuard guard;
-      ClientProbe client(80, WithCredentials());
+      ExposedClient client(80, WithCredentials());
       LogCapture log;
       Faults faults;
       faults.FailCurlOption(option, CURLE_OUT_OF_MEMORY);
@@ -274,7 +274,7 @@ TEST(SendReqByXMLDelete, TheRequestHasNoBody) {
 
 TEST(SendReqByXMLPut, ADocumentOfSeveralMebibytesIsSentWhole) {
   ScriptedPeer peer({Exchange(Response("<ok/>"))});
-  ClientProbe client(peer.Port(), WithCredentials("127.0.0.1"));
+  ExposedClient client(peer.Port(), WithCredentials("127.0.0.1"));
   const std::string text = DocumentOf(3 << 20);
   OwnedDoc document(text);
   EXPECT_EQ(client.SendReqByXMLPut(document.doc), HTTP_RET_OK);
@@ -288,7 +288,7 @@ TEST(SendReqByXMLPut, ADocumentThatTheDiskDoesNotTakeIsNotSent) {
     const rlimit nothing = {0, 0};
     setrlimit(RLIMIT_FSIZE, &nothing);
     signal(SIGXFSZ, SIG_IGN);
-    ClientProbe client(peer.Port());
+    ExposedClient client(peer.Port());
     OwnedDoc document("<r/>");
     return client.SendReqByXMLPut(document.doc);
   });
@@ -303,7 +303,7 @@ TEST(SendReqByXMLGet, AChallengeOfDigestOrBasicIsAnswered) {
     ScriptedPeer peer({Exchange("HTTP/1.1 401 No\r\nConnection: close\r\nWWW-Authenticate: "s +
                                 challenge + "\r\nContent-Length: 0\r\n\r\n"),
                        Exchange(Response("<ok/>"))});
-    ClientProbe client(peer.Port(), WithCredentials("127.0.0.1"));
+    ExposedClient client(peer.Port(), WithCredentials("127.0.0.1"));
     EXPECT_EQ(client.SendReqByXMLGet(7), HTTP_RET_OK);
     EXPECT_THAT(peer.Received(1), HasSubstr(authorization));
     EXPECT_EQ(Collected(client), "<ok/>");
@@ -312,7 +312,7 @@ TEST(SendReqByXMLGet, AChallengeOfDigestOrBasicIsAnswered) {
 
 TEST(SendReqByXMLGet, TheTimeoutEndsATransferThatStalls) {
   ScriptedPeer peer({{ExpectRequest(), StallUntilFinish()}});
-  ClientProbe client(peer.Port(), WithCredentials("127.0.0.1"));
+  ExposedClient client(peer.Port(), WithCredentials("127.0.0.1"));
   LogCapture log;
   EXPECT_EQ(client.SendReqByXMLGet(1), HTTP_RET_IO_ERROR);
   EXPECT_THAT(log.Messages(), ElementsAre("Failed to make http connection, return value=28\n"));
@@ -321,7 +321,7 @@ TEST(SendReqByXMLGet, TheTimeoutEndsATransferThatStalls) {
 TEST(XmlSenders, TheDocumentIsOnlyRead) {
   for (const Sender* sender : {&kPost, &kPut}) {
     ScriptedPeer peer({Exchange(Response("<ok/>"))});
-    ClientProbe client(peer.Port(), WithCredentials("127.0.0.1"));
+    ExposedClient client(peer.Port(), WithCredentials("127.0.0.1"));
     OwnedDoc document("<r><a>1</a></r>");
     xmlDoc* doc = document.doc;
     EXPECT_EQ(sender->send(client, doc), HTTP_RET_OK);

@@ -32,27 +32,27 @@ inline std::string DocumentOf(size_t size) {
 
 struct Sender {
   const char* name;
-  int (*send)(ClientProbe&, xmlDoc*&);
+  int (*send)(ExposedClient&, xmlDoc*&);
   std::vector<CURLoption> options;
 };
 
 inline const std::vector<Sender>& Senders() {
   static const std::vector<Sender> senders = {
       {"SendReqByXMLGet",
-       [](ClientProbe& c, xmlDoc*&) { return c.SendReqByXMLGet(7); },
+       [](ExposedClient& c, xmlDoc*&) { return c.SendReqByXMLGet(7); },
        {CURLOPT_TIMEOUT, CURLOPT_USERNAME, CURLOPT_PASSWORD, CURLOPT_URL, CURLOPT_HTTPAUTH,
         CURLOPT_WRITEFUNCTION, CURLOPT_WRITEDATA}},
       {"SendReqByXMLPost",
-       [](ClientProbe& c, xmlDoc*& doc) { return c.SendReqByXMLPost(doc); },
+       [](ExposedClient& c, xmlDoc*& doc) { return c.SendReqByXMLPost(doc); },
        {CURLOPT_USERNAME, CURLOPT_PASSWORD, CURLOPT_URL, CURLOPT_HTTPHEADER, CURLOPT_POSTFIELDS,
         CURLOPT_WRITEFUNCTION, CURLOPT_WRITEDATA}},
       {"SendReqByXMLPut",
-       [](ClientProbe& c, xmlDoc*& doc) { return c.SendReqByXMLPut(doc); },
+       [](ExposedClient& c, xmlDoc*& doc) { return c.SendReqByXMLPut(doc); },
        {CURLOPT_USERNAME, CURLOPT_PASSWORD, CURLOPT_URL, CURLOPT_HTTPHEADER, CURLOPT_READFUNCTION,
         CURLOPT_WRITEFUNCTION, CURLOPT_UPLOAD, kPutOption, CURLOPT_READDATA,
         CURLOPT_INFILESIZE_LARGE, CURLOPT_WRITEDATA}},
       {"SendReqByXMLDelete",
-       [](ClientProbe& c, xmlDoc*&) { return c.SendReqByXMLDelete(); },
+       [](ExposedClient& c, xmlDoc*&) { return c.SendReqByXMLDelete(); },
        {CURLOPT_USERNAME, CURLOPT_PASSWORD, CURLOPT_URL, CURLOPT_CUSTOMREQUEST,
         CURLOPT_WRITEFUNCTION, CURLOPT_WRITEDATA}}};
   return senders;
@@ -78,12 +78,12 @@ inline std::string Response(const std::string& body, const std::string& status =
 }
 
 // Sends to a client's peer, with a small document where the sender takes one.
-inline int Send(const Sender& sender, ClientProbe& client) {
+inline int Send(const Sender& sender, ExposedClient& client) {
   OwnedDoc document("<r><a>1</a></r>");
   return sender.send(client, document.doc);
 }
 
-inline std::string Collected(const ClientProbe& client) {
+inline std::string Collected(const ExposedClient& client) {
   return client.m_pRespBuf != nullptr ? std::string(client.m_pRespBuf, client.m_respLen) : "(null)";
 }
 

@@ -21,7 +21,7 @@ constexpr Mode kTls = {true, true};
 
 class ApacheCurl : public ::testing::TestWithParam<bool> {
  protected:
-  std::unique_ptr<ClientProbe> Client(const std::string& path) {
+  std::unique_ptr<ExposedClient> Client(const std::string& path) {
     return NewClient(Apache(), LoginTo(GetParam() ? kTls : kPlain, path));
   }
 

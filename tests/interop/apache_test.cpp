@@ -15,11 +15,11 @@ constexpr char kSoap[] = "<envelope><move pan=\"3\"/></envelope>";
 
 class ApacheTest : public ::testing::TestWithParam<Mode> {
  protected:
-  std::unique_ptr<ClientProbe> Client(const std::string& path) {
+  std::unique_ptr<ExposedClient> Client(const std::string& path) {
     return NewClient(Apache(), LoginTo(GetParam(), path));
   }
 
-  std::unique_ptr<ClientProbe> ModernClient(const std::string& path) {
+  std::unique_ptr<ExposedClient> ModernClient(const std::string& path) {
     ClientSettings settings = LoginTo(GetParam(), path);
     settings.version = HTTP_VERSION_1_1;
     return NewClient(Apache(), settings);
@@ -230,7 +230,7 @@ TEST_P(ApacheTest, RespondsToASecondRequestOnTheSameConnection) {
   Worked("GetResp", kApache, "none", GetParam());
   ClientSettings settings = LoginTo(GetParam(), "cgi/cookies.cgi");
   settings.version = HTTP_VERSION_1_1;
-  ClientProbe client(Apache().Port("KEEP_PORT"), settings);
+  ExposedClient client(Apache().Port("KEEP_PORT"), settings);
   ASSERT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
   char body[64];
   ASSERT_EQ(client.ReadData(body, 7), 7);  // "cookie ", all that was announced

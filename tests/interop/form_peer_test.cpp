@@ -37,7 +37,7 @@ TEST_P(KeepingPeer, ClosesAfterTheForm) {
 TEST_P(KeepingPeer, KeepsTheConnectionWhenNothingAsksItToClose) {
   ClientSettings settings = LoginTo(kModes[0], GetParam().form.path);
   settings.version = HTTP_VERSION_1_1;
-  ClientProbe client(GetParam().server().Port("KEEP_PORT"), settings);
+  ExposedClient client(GetParam().server().Port("KEEP_PORT"), settings);
   ASSERT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
   std::string body(std::stoul(Content(client, HTTP_CONTENT_LENGTH)), '\0');
   const int size = static_cast<int>(body.size());

@@ -12,7 +12,7 @@ constexpr char kLighttpd[] = "lighttpd";
 
 class LighttpdTest : public ::testing::TestWithParam<Mode> {
  protected:
-  std::unique_ptr<ClientProbe> Client(const std::string& path) {
+  std::unique_ptr<ExposedClient> Client(const std::string& path) {
     ClientSettings settings = LoginTo(GetParam(), path);
     settings.timeout = 1;
     return NewClient(Lighttpd(), settings);

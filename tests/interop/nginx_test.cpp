@@ -33,11 +33,11 @@ std::string NameOfAccess(const ::testing::TestParamInfo<Access>& test) {
 
 class NginxTest : public ::testing::TestWithParam<Access> {
  protected:
-  std::unique_ptr<ClientProbe> Client(const std::string& path,
-                                      HTTP_VERSION version = HTTP_VERSION_NONE) {
+  std::unique_ptr<ExposedClient> Client(const std::string& path,
+                                        HTTP_VERSION version = HTTP_VERSION_NONE) {
     ClientSettings settings = LoginTo(GetParam().mode, path);
     settings.version = version;
-    return std::make_unique<ClientProbe>(Nginx().Port(GetParam().port), settings);
+    return std::make_unique<ExposedClient>(Nginx().Port(GetParam().port), settings);
   }
 
   void WorkedHere(const std::string& operation, const std::string& login,
@@ -125,7 +125,7 @@ TEST_P(NginxTest, SendsToLibcurl) {
 TEST(NginxStore, TakesAPutAndADelete) {
   WorkedByCurl("SendReqByXMLPut with GetResponseXML", kNginx, "none", false);
   WorkedByCurl("SendReqByXMLDelete", kNginx, "none", false);
-  ClientProbe client(Nginx().Port(), LoginTo(kModes[0], "store/presets/7.xml"));
+  ExposedClient client(Nginx().Port(), LoginTo(kModes[0], "store/presets/7.xml"));
   const std::string file = Nginx().File("www/store/presets/7.xml");
   const xmlChar* text = reinterpret_cast<const xmlChar*>("<preset id=\"7\"/>");
   xmlDoc* doc = xmlReadDoc(text, nullptr, nullptr, 0);
@@ -139,7 +139,7 @@ TEST(NginxStore, TakesAPutAndADelete) {
 }
 
 TEST(NginxStore, ReportsThatThereIsNothingToDelete) {
-  ClientProbe client(Nginx().Port(), LoginTo(kModes[0], "store/nothing.xml"));
+  ExposedClient client(Nginx().Port(), LoginTo(kModes[0], "store/nothing.xml"));
   EXPECT_EQ(client.SendReqByXMLDelete(), HTTP_RET_IO_ERROR);
 }
 

@@ -34,7 +34,7 @@ class TlsServer {
                                         "-cert",
                                         Certificates().File(certificate)};
     command.insert(command.end(), options.begin(), options.end());
-    process_ = std::make_unique<ServerProcess>(command, Log(), input_[0]);
+    process_ = std::make_unique<ServerProgram>(command, Log(), input_[0]);
     AwaitOutput("ACCEPT");
   }
 
@@ -64,7 +64,7 @@ class TlsServer {
   TempDir directory_;
   int port_ = 0;
   int input_[2] = {-1, -1};
-  std::unique_ptr<ServerProcess> process_;
+  std::unique_ptr<ServerProgram> process_;
 };
 
 struct TlsCase {
@@ -101,7 +101,7 @@ TEST_P(SServer, EndsABodyWithACloseNotice) {
   WorkedHere("ReadBody (close notice)");
   TlsServer server("good", {"-WWW", GetParam().option});
   server.Serve("info.txt", std::string(50000, 'x'));
-  ClientProbe client(server.Port(), Settings("info.txt"));
+  ExposedClient client(server.Port(), Settings("info.txt"));
   ASSERT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
   EXPECT_EQ(StatusOf(&client), 200);
   EXPECT_EQ(BodyOf(&client), std::string(50000, 'x'));
@@ -111,7 +111,7 @@ TEST_P(SServer, EndsABodyWithoutACloseNotice) {
   WorkedHere("ReadBody (no close notice)");
   TlsServer server("good", {GetParam().option});
   server.Say("HTTP/1.0 200 OK\r\n\r\nbody");
-  ClientProbe client(server.Port(), Settings("info.txt"));
+  ExposedClient client(server.Port(), Settings("info.txt"));
   ASSERT_EQ(client.SendRequestByGet(), HTTP_RET_OK);
   ASSERT_TRUE(server.AwaitOutput("User-Agent"));
   server.Kill();
@@ -172,7 +172,7 @@ TEST_P(SServerCertificate, IsVerifiedByLibcurl) {
   const TrustedAuthority trusted(Certificates().CaFile());
   AddCertificateRow("SendRequestByCurl, verified", "libcurl", GetParam().one_call == 0);
   AddCertificateRow("SendHttpsGet", "libcurl", GetParam().one_call == 0);
-  ClientProbe client(server_.Port(), Settings());
+  ExposedClient client(server_.Port(), Settings());
   EXPECT_EQ(client.SendRequestByCurl(HTTP_METHOD_GET, true, 10), GetParam().by_curl);
   Json::Value response;
   EXPECT_EQ(SendHttpsGet("127.0.0.1", server_.Port(), "info.json", response, 10),
@@ -182,7 +182,7 @@ TEST_P(SServerCertificate, IsVerifiedByLibcurl) {
 TEST_P(SServerCertificate, DoesNotMatterWithoutVerification) {
   AddCertificateRow("SendRequestByCurl, not verified", "libcurl", true);
   AddCertificateRow("SendRequestByGet", "direct", true);
-  ClientProbe client(server_.Port(), Settings());
+  ExposedClient client(server_.Port(), Settings());
   EXPECT_EQ(client.SendRequestByCurl(HTTP_METHOD_GET, false, 10), HTTP_RET_OK);
   EXPECT_EQ(client.GetCurlText(), "{\"success\":true}");
   EXPECT_EQ(client.SendRequestByGet(), HTTP_RET_OK);

@@ -81,14 +81,14 @@ Response SendOneCall(int port, const PeerCase& c) {
   return {result, value.toStyledString()};
 }
 
-Response WithBody(ClientProbe* client, int sent) {
+Response WithBody(ExposedClient* client, int sent) {
   if (sent != HTTP_RET_OK) return {sent, ""};
   Response response;
   response.result = client->ReadBody(response.text);
   return response;
 }
 
-Response WithDocument(ClientProbe* client, int sent) {
+Response WithDocument(ExposedClient* client, int sent) {
   xmlDoc* doc = nullptr;
   if (!client->GetResponseXML(doc)) return {sent, ""};
   xmlChar* value =
@@ -99,7 +99,7 @@ Response WithDocument(ClientProbe* client, int sent) {
   return response;
 }
 
-Response PutXml(ClientProbe* client) {
+Response PutXml(ExposedClient* client) {
   xmlDoc* doc =
       xmlReadDoc(reinterpret_cast<const xmlChar*>("<preset id=\"7\"/>"), nullptr, nullptr, 0);
   const int sent = client->SendReqByXMLPut(doc);
@@ -107,14 +107,14 @@ Response PutXml(ClientProbe* client) {
   return WithDocument(client, sent);
 }
 
-Response Upload(ClientProbe* client) {
+Response Upload(ExposedClient* client) {
   const int opened = client->OpenRawDataUpload();
   if (opened != HTTP_RET_OK) return {opened, ""};
   client->WriteData(kUploadBody, sizeof(kUploadBody) - 1);  // a server that has refused may be gone
   return {opened, client->GetResp()};
 }
 
-Response Send(ClientProbe* client, Op op) {
+Response Send(ExposedClient* client, Op op) {
   std::string text;
   int result;
   switch (op) {
@@ -168,7 +168,7 @@ void PlayOnce(const WebServer& server, const PeerCase& c, bool buffered) {
     EXPECT_THAT(response.text, HasSubstr(c.expected.text));
     return;
   }
-  ClientProbe client(port, SettingsOf(c, buffered));
+  ExposedClient client(port, SettingsOf(c, buffered));
   const Response response = Send(&client, c.op);
   Outcome came = {response.result, HTTP_RET_OK, 0, "", false};
   came.check = client.CheckResponse(came.status);

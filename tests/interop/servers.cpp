@@ -166,8 +166,9 @@ ClientSettings LoginTo(const Mode& mode, const std::string& path) {
   return settings;
 }
 
-std::unique_ptr<ClientProbe> NewClient(const WebServer& server, const ClientSettings& settings) {
-  return std::make_unique<ClientProbe>(server.Port(settings.https ? "TLS_PORT" : "PORT"), settings);
+std::unique_ptr<ExposedClient> NewClient(const WebServer& server, const ClientSettings& settings) {
+  return std::make_unique<ExposedClient>(server.Port(settings.https ? "TLS_PORT" : "PORT"),
+                                         settings);
 }
 
 std::string BodyOf(TWHttpClient* client) {

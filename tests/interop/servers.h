@@ -7,7 +7,7 @@
 
 #include "tests/http/http_test_util.h"
 #include "tests/interop/compatibility.h"
-#include "tests/interop/server_process.h"
+#include "tests/interop/web_server.h"
 
 // Each starts on the first call and ends with the program.
 WebServer& Apache();
@@ -35,7 +35,7 @@ inline constexpr size_t kLargeFile = 64u << 20;
 ClientSettings LoginTo(const Mode& mode, const std::string& path);
 
 // A client for the server's port of that mode: PORT, or TLS_PORT.
-std::unique_ptr<ClientProbe> NewClient(const WebServer& server, const ClientSettings& settings);
+std::unique_ptr<ExposedClient> NewClient(const WebServer& server, const ClientSettings& settings);
 
 // As ReadBody of the client, which must succeed.
 std::string BodyOf(TWHttpClient* client);

@@ -108,7 +108,7 @@ TEST(Upload, OfOneGibibyteNeedsNoMemory) {
 TEST(Upload, IsRefusedByAStrictServer) {
   AddRow({"OpenRawDataUpload", "Apache httpd", "none", "plain", "buffered",
           "not possible: the server refuses a header name with a blank before its colon (400)"});
-  ClientProbe client(Apache().Port(), LoginTo(kModes[0], "cgi/count.cgi"));
+  ExposedClient client(Apache().Port(), LoginTo(kModes[0], "cgi/count.cgi"));
   ASSERT_EQ(client.OpenRawDataUpload(), HTTP_RET_OK);
   EXPECT_EQ(client.GetResp(), "{\"error\":true}");
   EXPECT_EQ(StatusOf(&client), 400);

@@ -25,43 +25,43 @@ struct WireCase {
   const char* name;  // of the block in the document
   ClientSettings settings;
   const char* challenge;  // what the first request is answered with; null: with success
-  std::function<void(ClientProbe*)> send;
+  std::function<void(ExposedClient*)> send;
 };
 
-void Get(ClientProbe* client) {
+void Get(ExposedClient* client) {
   client->SendRequest(HTTP_METHOD_GET, "");
 }
 
-void GetWithCookie(ClientProbe* client) {
+void GetWithCookie(ExposedClient* client) {
   client->SetCookie("session=42");
   client->SendRequestByGet();
 }
 
-void FormPost(ClientProbe* client) {
+void FormPost(ExposedClient* client) {
   client->SendRequestBySocketPost("pan=3&tilt=-4");
 }
 
-void SoapPost(ClientProbe* client) {
+void SoapPost(ExposedClient* client) {
   std::string response;
   client->SendAuthReqBySocketPost("<envelope/>", response);
 }
 
-void XmlSocketPost(ClientProbe* client) {
+void XmlSocketPost(ExposedClient* client) {
   xmlDoc* doc = nullptr;
   client->SendReqByXMLSocketPost("<envelope/>", doc);
   xmlFreeDoc(doc);
 }
 
-void CurlGet(ClientProbe* client) {
+void CurlGet(ExposedClient* client) {
   client->SetCookie("session=42");
   client->SendRequestByCurl(HTTP_METHOD_GET, true, 10);
 }
 
-void CurlPost(ClientProbe* client) {
+void CurlPost(ExposedClient* client) {
   client->SendRequestByCurl(HTTP_METHOD_POST, true, 10);
 }
 
-void LoginPost(ClientProbe* client) {
+void LoginPost(ExposedClient* client) {
   client->SendRequest(HTTP_METHOD_POST, "?");
 }
 
@@ -72,30 +72,30 @@ void WithDocument(const std::function<void(xmlDoc*&)>& send) {
   xmlFreeDoc(doc);
 }
 
-void XmlGet(ClientProbe* client) {
+void XmlGet(ExposedClient* client) {
   client->SendReqByXMLGet(10);
 }
-void XmlDelete(ClientProbe* client) {
+void XmlDelete(ExposedClient* client) {
   client->SendReqByXMLDelete();
 }
-void XmlPost(ClientProbe* client) {
+void XmlPost(ExposedClient* client) {
   WithDocument([client](xmlDoc*& doc) { client->SendReqByXMLPost(doc); });
 }
-void XmlPut(ClientProbe* client) {
+void XmlPut(ExposedClient* client) {
   WithDocument([client](xmlDoc*& doc) { client->SendReqByXMLPut(doc); });
 }
 
-void Upload(ClientProbe* client) {
+void Upload(ExposedClient* client) {
   client->SetCookie("session=42");
   client->OpenRawDataUpload();
 }
 
-void OneCallGet(ClientProbe* client) {
+void OneCallGet(ExposedClient* client) {
   Json::Value response;
   SendHttpGet(client->m_strHost, client->m_port, client->m_strPath, response, 5, true);
 }
 
-void OneCallPost(ClientProbe* client) {
+void OneCallPost(ExposedClient* client) {
   SendHttpPost(client->m_strHost, client->m_port, client->m_strPath, "pan=3", "session=42", 5);
 }
 
@@ -185,7 +185,7 @@ TEST_P(Wire, CarriesTheDocumentedBytes) {
   const std::vector<Script> scripts = ScriptsFor(GetParam());
   ScriptedPeer peer(scripts);
   {
-    ClientProbe client(peer.Port(), GetParam().settings);
+    ExposedClient client(peer.Port(), GetParam().settings);
     GetParam().send(&client);
   }
   const std::string shown = Shown(peer.Received(scripts.size() - 1), peer.Port());

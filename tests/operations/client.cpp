@@ -23,20 +23,20 @@ bool GoesOn(const OperationSettings& settings, const OperationResult& result) {
 }
 
 // The client's end is a step as well.
-void Destroy(const OperationSettings& settings, std::shared_ptr<ClientProbe> client) {
+void Destroy(const OperationSettings& settings, std::shared_ptr<ExposedClient> client) {
   settings.Step([&] { client.reset(); });
 }
 
 // Sends a request by `send`, and looks at the head of the response.
 template <typename Send>
-OperationResult HeadAfter(const OperationSettings& settings, ClientProbe& client, Send send) {
+OperationResult HeadAfter(const OperationSettings& settings, ExposedClient& client, Send send) {
   OperationResult result;
   settings.Step([&] { result.result = send(client); });
   AskForHead(client, &result);
   return result;
 }
 
-void ReadWholeBody(const OperationSettings& settings, ClientProbe& client,
+void ReadWholeBody(const OperationSettings& settings, ExposedClient& client,
                    OperationResult* result) {
   settings.Step([&] { result->read = client.ReadBody(result->text); });
   ExpectOneOf(result->read, {HTTP_RET_OK, HTTP_RET_IO_ERROR}, "ReadBody", result);
@@ -68,18 +68,18 @@ OperationResult ReadAfterGet(const OperationSettings& settings, Read read) {
 
 }  // namespace
 
-std::shared_ptr<ClientProbe> ClientOf(const OperationSettings& settings) {
-  std::shared_ptr<ClientProbe> client = settings.client;
+std::shared_ptr<ExposedClient> ClientOf(const OperationSettings& settings) {
+  std::shared_ptr<ExposedClient> client = settings.client;
   if (client) {
     client->SetPath(settings.path);
     return client;
   }
-  client = std::make_shared<ClientProbe>(settings.port, settings);
+  client = std::make_shared<ExposedClient>(settings.port, settings);
   if (!settings.cookie.empty()) client->SetCookie(settings.cookie);
   return client;
 }
 
-void AskForHead(ClientProbe& client, OperationResult* result) {
+void AskForHead(ExposedClient& client, OperationResult* result) {
   result->response = client.CheckResponse(result->status);
   result->head = client.m_connState == 2;
   for (const KeptField& field : kKeptFields) {
@@ -102,13 +102,13 @@ OperationResult GetBody(const OperationSettings& settings) {
 }
 
 OperationResult GetData(const OperationSettings& settings) {
-  return ReadAfterGet(settings, [&](ClientProbe& client, OperationResult* result) {
+  return ReadAfterGet(settings, [&](ExposedClient& client, OperationResult* result) {
     ReadPieces(settings, client, result);
   });
 }
 
 OperationResult GetLines(const OperationSettings& settings) {
-  return ReadAfterGet(settings, [&](ClientProbe& client, OperationResult* result) {
+  return ReadAfterGet(settings, [&](ExposedClient& client, OperationResult* result) {
     ReadLines(settings, client, result);
   });
 }
@@ -132,7 +132,7 @@ OperationResult GetTwice(const OperationSettings& settings) {
 
 // Further header lines, and a head where there is none.
 OperationResult GetHeadAgain(const OperationSettings& settings) {
-  return ReadAfterGet(settings, [&](ClientProbe& client, OperationResult* result) {
+  return ReadAfterGet(settings, [&](ExposedClient& client, OperationResult* result) {
     int found = HTTP_RET_OK;
     settings.Step([&] { found = client.CheckContentType(); });
     ExpectOneOf(found, {HTTP_RET_OK, HTTP_RET_NOT_READY, HTTP_RET_IO_ERROR}, "CheckContentType",
@@ -202,7 +202,8 @@ OperationResult SoapXml(const OperationSettings& settings) {
 
 namespace {
 
-void ReadResponse(const OperationSettings& settings, ClientProbe& client, OperationResult* result) {
+void ReadResponse(const OperationSettings& settings, ExposedClient& client,
+                  OperationResult* result) {
   settings.Step([&] { result->text = client.GetResp(); });
   result->has_text = result->text != kErrorText;
   result->read = result->has_text ? HTTP_RET_OK : HTTP_RET_IO_ERROR;
@@ -228,7 +229,7 @@ OperationResult Upload(const OperationSettings& settings) {
 
 // A request that the caller writes, on the connection of the one before, whose body he has read.
 OperationResult SecondRequest(const OperationSettings& settings) {
-  return ReadAfterGet(settings, [&](ClientProbe& client, OperationResult* result) {
+  return ReadAfterGet(settings, [&](ExposedClient& client, OperationResult* result) {
     const size_t length = strtoul(result->Field(HTTP_CONTENT_LENGTH).c_str(), nullptr, 10);
     const size_t most = std::min(settings.most, std::max<size_t>(length, 1));
     std::string& first = result->first;

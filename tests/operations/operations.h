@@ -25,7 +25,7 @@ struct OperationSettings : ClientSettings {
   size_t most = 8 << 20;     // no more reads after so many bytes
   bool read_body = true;     // not the head alone
   bool go_on = false;        // goes on after a step that has failed
-  std::shared_ptr<ClientProbe> client = {};  // is used again, with another path
+  std::shared_ptr<ExposedClient> client = {};  // is used again, with another path
 
   // Runs one step of the library's, when it is set: the steps are all that a fault may strike.
   std::function<void(const std::function<void()>&)> run_step = {};

@@ -50,10 +50,10 @@ OperationResult SocketData(const OperationSettings& settings);
 OperationResult SocketLines(const OperationSettings& settings);
 OperationResult SocketRaw(const OperationSettings& settings);
 
-std::shared_ptr<ClientProbe> ClientOf(const OperationSettings& settings);
+std::shared_ptr<ExposedClient> ClientOf(const OperationSettings& settings);
 
 // Everything that a client tells of a response, beside its body.
-void AskForHead(ClientProbe& client, OperationResult* result);
+void AskForHead(ExposedClient& client, OperationResult* result);
 
 // A document that is freed at the end.
 class OwnedDocument {

@@ -22,7 +22,7 @@ struct Session {
   Endpoints endpoints;
   unsigned thread = 0;
   unsigned log_lines = 0;
-  std::shared_ptr<ClientProbe> again[2];  // plain and TLS, for the whole run
+  std::shared_ptr<ExposedClient> again[2];  // plain and TLS, for the whole run
 };
 
 Outcome RunOperation(const Plan& plan, Session* session);

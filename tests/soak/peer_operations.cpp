@@ -86,7 +86,7 @@ void TakeOneObject(const Plan& plan, Session* session, OperationSettings* settin
   const bool usual = settings->port == (plan.tls ? ports.tls : ports.plain);
   if (!Has(plan, kOneObject) || !usual || settings->timeout == 1) return;
   auto& client = session->again[plan.tls ? 1 : 0];
-  if (!client) client = std::make_shared<ClientProbe>(settings->port, *settings);
+  if (!client) client = std::make_shared<ExposedClient>(settings->port, *settings);
   settings->client = client;
 }
 

@@ -9,7 +9,7 @@
 
 namespace {
 
-using Client = std::unique_ptr<ClientProbe>;
+using Client = std::unique_ptr<ExposedClient>;
 
 ClientSettings At(const std::string& path) {
   ClientSettings settings;
@@ -22,7 +22,7 @@ ClientSettings At(const std::string& path) {
 }
 
 Client NewClient(const TestRun& test, const ClientSettings& settings) {
-  return std::make_unique<ClientProbe>(test.Port(), settings);
+  return std::make_unique<ExposedClient>(test.Port(), settings);
 }
 
 // The client's end is a step of the library's as well.
@@ -35,7 +35,7 @@ void Object(TestRun& test) {
   Client client;
   const ClientSettings settings = At("a path that is longer than a short string");
   const bool made = test.RunMayThrow<std::bad_alloc>(
-      [&] { client = std::make_unique<ClientProbe>(test.Port(), settings); });
+      [&] { client = std::make_unique<ExposedClient>(test.Port(), settings); });
   test.Expect(made == (client != nullptr), "a client is there after an exception");
   if (made) Destroy(test, std::move(client));
 }
@@ -45,7 +45,7 @@ void ObjectForTls(TestRun& test) {
   ClientSettings settings = At("get");
   settings.https = true;
   test.RunMayThrow<std::bad_alloc>(
-      [&] { client = std::make_unique<ClientProbe>(test.Port(), settings); });
+      [&] { client = std::make_unique<ExposedClient>(test.Port(), settings); });
   test.Expect(client != nullptr || test.Struck(), "there is no client");
   if (!client) return;
   // What OpenSSL could not make is missed by the requests, and by nobody before.

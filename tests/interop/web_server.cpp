@@ -1,4 +1,4 @@
-#include "tests/interop/server_process.h"
+#include "tests/interop/web_server.h"
 
 #include <fcntl.h>
 #include <gtest/gtest.h>
@@ -77,19 +77,19 @@ bool WaitUntilTrue(const char* what, const std::function<bool()>& done, int limi
   return true;
 }
 
-ServerProcess::ServerProcess(const std::vector<std::string>& command, const std::string& output,
+ServerProgram::ServerProgram(const std::vector<std::string>& command, const std::string& output,
                              int input) {
   const std::vector<std::string> words = AsPlainUser(command);
   child_ = std::make_unique<Child>([&]() -> int { Execute(words, output, input); });
 }
 
-ServerProcess::~ServerProcess() {
+ServerProgram::~ServerProgram() {
   if (!child_) return;
   kill(child_->Pid(), SIGTERM);
   child_->Wait(seconds(10));
 }
 
-void ServerProcess::Kill() {
+void ServerProgram::Kill() {
   kill(child_->Pid(), SIGKILL);
   child_->Wait(seconds(10));
   child_.reset();
@@ -100,7 +100,7 @@ WebServer::WebServer(const WebServerSetup& setup) : name_(setup.name) {
   WriteFile(File("good.pem"), ReadFile(Certificates().File("good")));
   WriteFile(File("ca.pem"), ReadFile(Certificates().CaFile()));
   const std::vector<std::string> command = FillTemplates(setup);
-  process_ = std::make_unique<ServerProcess>(command, File("output.log"));
+  process_ = std::make_unique<ServerProgram>(command, File("output.log"));
   for (const auto& [port_name, port] : ports_) {
     const int number = port;
     const std::string what = name_ + " accepts on " + port_name;

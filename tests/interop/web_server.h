@@ -1,6 +1,6 @@
 // A server that runs as a process of its own while the object lives.
-#ifndef TARNWICK_TESTS_INTEROP_SERVER_PROCESS_H_
-#define TARNWICK_TESTS_INTEROP_SERVER_PROCESS_H_
+#ifndef TARNWICK_TESTS_INTEROP_WEB_SERVER_H_
+#define TARNWICK_TESTS_INTEROP_WEB_SERVER_H_
 
 #include <functional>
 #include <map>
@@ -14,20 +14,20 @@
 // Calls `done` until it is true; false, with a failed test, when that takes longer than `seconds`.
 bool WaitUntilTrue(const char* what, const std::function<bool()>& done, int seconds = 10);
 
-class ServerProcess {
+class ServerProgram {
  public:
   // Starts `command`, whose output goes into the file `output` and whose standard input is `input`,
   // or nothing for -1. It ends with the test program, whatever happens to that.
   //
   // For the server it looks as if a plain user ran it: the servers of the tests would otherwise
   // change to users that a user namespace does not have.
-  ServerProcess(const std::vector<std::string>& command, const std::string& output, int input = -1);
+  ServerProgram(const std::vector<std::string>& command, const std::string& output, int input = -1);
 
   // Asks it to end, and ends it when it does not.
-  ~ServerProcess();
+  ~ServerProgram();
 
-  ServerProcess(const ServerProcess&) = delete;
-  ServerProcess& operator=(const ServerProcess&) = delete;
+  ServerProgram(const ServerProgram&) = delete;
+  ServerProgram& operator=(const ServerProgram&) = delete;
 
   // Ends it at once, without a chance to say goodbye to its clients.
   void Kill();
@@ -63,7 +63,7 @@ class WebServer {
   std::string name_;
   TempDir directory_;
   std::map<std::string, int> ports_;
-  std::unique_ptr<ServerProcess> process_;
+  std::unique_ptr<ServerProgram> process_;
 };
 
-#endif  // TARNWICK_TESTS_INTEROP_SERVER_PROCESS_H_
+#endif  // TARNWICK_TESTS_INTEROP_WEB_SERVER_H_
