@@ -57,6 +57,9 @@ const char kRefusal[] =
     "HTTP/1.1 401 No\r\nWWW-Authenticate: Digest realm=\"r\", nonce=\"n\", qop=\"auth\"\r\n"
     "Content-Length: 0\r\n\r\n";
 
+// A line for the body that the operations of the table send.
+const Script kLine = {ExpectUntil("<a/>"), Send("hello\n"), Close()};
+
 std::string Nested(const std::string& open, const std::string& close, int levels) {
   std::string text;
   for (int i = 0; i < levels; ++i) text += open;
@@ -118,12 +121,8 @@ const StackCase kStacks[] = {
     {"UrlEncode", 8, {}, [](int) { UrlEncode("a b", "/"); }},
     {"Base64Encode", 8, {}, [](int) { free(Base64Encode("abc")); }},
     {"FormatUtcTimeStamp", 12, {}, [](int) { FormatUtcTimeStamp(0); }},
-    {"ConnectAndReadALine", 16, {SendThenClose("hello\n")}, Run("socket_exchange")},
-    {"ConnectAndReadALineOverTls",
-     32,
-     {SendThenClose("hello\n")},
-     OverTls("socket_exchange"),
-     true},
+    {"ConnectAndReadALine", 16, {kLine}, Run("socket_exchange")},
+    {"ConnectAndReadALineOverTls", 32, {kLine}, OverTls("socket_exchange"), true},
     {"SendRequestByGet", 32, {Exchange(kOk)}, Run("get_body")},
     {"SendRequestWithDigest", 32, {Exchange(kRefusal), Exchange(kOk)}, Run("login_get")},
     {"GetResp",

@@ -1,6 +1,6 @@
 // Each operation that talks with a peer, with the first, second, third ... call of each kind failing.
 // tests/torture makes every call of every library fail, but on amd64 alone: on 32-bit ARM and x86
-// this is the only proof, so every operation of the table stays in it.
+// this is the only proof. Each operation of the table is here, or among those that are left out.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
