@@ -181,7 +181,7 @@ const ChallengeCase kWhole[] = {
     {"OnlyCommas", Line(",,,,,,,,"), {}},
     {"OnlyTheWordDigest", Line("Digest"), Digest("", "")},
     {"OnlyTheWordBasic", Line("Basic"), Basic()},
-    {"WithoutABlankBehindTheColon", "WWW-Authenticate:Basic\r\n", Basic()},
+    {"WithoutABlankAfterTheColon", "WWW-Authenticate:Basic\r\n", Basic()},
     {"DigestInMixedCase", Line("dIgEsT realm=\"r\", nonce=\"n\""), Digest("r", "n")},
     {"NamesInCapitalsAreNotFound", Line("Digest REALM=\"r\", Nonce=\"n\""), Digest("", "")},
     {"NoCommas", Line("Digest realm=\"r\" nonce=\"n\" qop=\"auth\""),

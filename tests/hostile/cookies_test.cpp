@@ -42,8 +42,8 @@ std::string Controls() {
   return controls + "\x7f\x80\xff";
 }
 
-std::string WithZero(const std::string& before, const std::string& behind) {
-  return before + std::string(1, '\0') + behind;
+std::string WithZero(const std::string& before, const std::string& after) {
+  return before + std::string(1, '\0') + after;
 }
 
 // The longest cookie that a header line can hold.
@@ -56,8 +56,8 @@ std::vector<CookieCase> ShapeTable() {
       {"Sound", Cookie("a=1; Path=/"), "a=1;"},
       {"None", "X: y\r\n", ""},
       {"WithoutASemicolon", Cookie("a=1"), ""},
-      {"NothingBehindTheColon", "Set-Cookie:\r\n", "", HTTP_RET_NOT_READY},
-      {"NothingBehindTheColonOfTheSecond", Cookie("a=1;") + "Set-Cookie:\r\n", "a=1;",
+      {"NothingAfterTheColon", "Set-Cookie:\r\n", "", HTTP_RET_NOT_READY},
+      {"NothingAfterTheColonOfTheSecond", Cookie("a=1;") + "Set-Cookie:\r\n", "a=1;",
        HTTP_RET_NOT_READY},
       {"OneBlank", Cookie(""), ""},
       {"OnlyASemicolon", Cookie(";"), ";"},
@@ -97,7 +97,7 @@ std::vector<CookieCase> NumberTable() {
       {"OneByteLonger", "Set-Cookie:c" + LongestCookie() + "\r\n", ""},
       {"64KBWithoutASemicolon", Cookie(std::string(kLongest, 'c')), ""},
       {"64KBBeforeTheSemicolon", Cookie(std::string(kLongest, 'c') + ";"), ""},
-      {"64KBBehindTheSemicolon", Cookie("a=1;" + std::string(kLongest, 'c')), "a=1;"},
+      {"64KBAfterTheSemicolon", Cookie("a=1;" + std::string(kLongest, 'c')), "a=1;"},
       {"64KBOfSemicolons", Cookie(std::string(kLongest, ';')), ";", HTTP_RET_NOT_READY},
       {"64KBOfBlanks", Cookie(std::string(kLongest, ' ') + "a=1;"), "", HTTP_RET_NOT_READY},
       {"TheRestOfALongLineIsALineOfItsOwn",
@@ -108,7 +108,7 @@ std::vector<CookieCase> NumberTable() {
 std::vector<CookieCase> ByteTable() {
   return {
       {"ControlBytes", Cookie(Controls() + ";"), Controls() + ";"},
-      {"ControlBytesBehindTheSemicolon", Cookie("a=1;" + Controls()), "a=1;"},
+      {"ControlBytesAfterTheSemicolon", Cookie("a=1;" + Controls()), "a=1;"},
       {"ACarriageReturnBeforeTheSemicolon", Cookie("a=1\rX; b=2;"), ""},
       {"ACarriageReturnAndAName", Cookie("a=1;\rXY: 1"), "a=1;"},
       {"ALineFeedBeforeTheSemicolon", Cookie("a=1\nX: 1;"), ""},
@@ -116,7 +116,7 @@ std::vector<CookieCase> ByteTable() {
       {"ALineEndAndAHeader", Cookie("a=1;\r\nAuthorization: Basic eA=="), "a=1;"},
       {"AnEmptyLineAndARequest", Cookie("a=1;\r\n\r\nGET /evil HTTP/1.0\r\n\r\n"), "a=1;"},
       {"AZeroByteBeforeTheSemicolon", Cookie(WithZero("a=1", ";")), ""},
-      {"AZeroByteBehindTheSemicolon", Cookie(WithZero("a=1;", "b=2;")), "a=1;"},
+      {"AZeroByteAfterTheSemicolon", Cookie(WithZero("a=1;", "b=2;")), "a=1;"},
       {"AZeroByteInTheName", WithZero("Set-Coo", "kie: a=1;\r\n"), ""},
       {"AZeroByteInPlaceOfTheValue", WithZero("Set-Cookie:", "a=1;\r\n"), "", HTTP_RET_NOT_READY},
       {"PercentSigns", Cookie("a=%s%n%0d%0a;"), "a=%s%n%0d%0a;"},

@@ -56,7 +56,7 @@ const LengthRow kLengths[] = {
     {"ZerosInFront", Length("0004"), "<a/>", "0004", "<a/>", CURLE_OK, "<a/>"},
     {"AThousandZerosInFront", Length(std::string(1000, '0') + "4"), "<a/>",
      std::string(1000, '0') + "4", "<a/>", CURLE_OK, "<a/>"},
-    {"LettersBehind", Length("4 bytes"), "<a/>", "4 bytes", "<a/>", CURLE_OK, "<a/>"},
+    {"LettersAfter", Length("4 bytes"), "<a/>", "4 bytes", "<a/>", CURLE_OK, "<a/>"},
     {"AFraction", Length("4.9"), "<a/>", "4.9", "<a/>", CURLE_OK, "<a/>"},
     {"AList", Length("4, 4"), "<a/>", "4, 4", "<a/>", CURLE_OK, "<a/>"},
     {"NoColon", "Content-Length 4\r\n", "<a/>", "4", "<a/>", CURLE_WEIRD_SERVER_REPLY, ""},
@@ -217,7 +217,7 @@ Outcome JsonGet(int port) {
   return OneCall(result, value.toStyledString());
 }
 
-Script Answer(const std::string& response) {
+Script Respond(const std::string& response) {
   return {ExpectRequest(), SendWhileRead(response), Close()};
 }
 
@@ -226,21 +226,21 @@ const char kJsonShown[] = "{\n\t\"success\" : true\n}\n";
 
 const Scenario kJsonTable[] = {
     {"SmallerThanTheBodyForJson",
-     {Answer(Response(Length("2"), kJson))},
+     {Respond(Response(Length("2"), kJson))},
      JsonGet,
      OneCall(0, kJsonShown)},
     {"LargerThanTheBodyForJson",
-     {Answer(Response(Length("2000"), kJson))},
+     {Respond(Response(Length("2000"), kJson))},
      JsonGet,
      OneCall(0, kJsonShown)},
-    {"NegativeForJson", {Answer(Response(Length("-1"), kJson))}, JsonGet, OneCall(0, kJsonShown)},
+    {"NegativeForJson", {Respond(Response(Length("-1"), kJson))}, JsonGet, OneCall(0, kJsonShown)},
     {"NoValueForJson",
-     {Answer(Response("Content-Length:\r\n", kJson))},
+     {Respond(Response("Content-Length:\r\n", kJson))},
      JsonGet,
      OneCall(-1, "\"untouched\"\n"),
      {"SendHttpGet: Failed to check response[200]: 1\n"}},
     {"NoBodyForJson",
-     {Answer(Response(Length("16"), ""))},
+     {Respond(Response(Length("16"), ""))},
      JsonGet,
      OneCall(-1, "\"untouched\"\n"),
      {"SendHttpGet: Read Buffer Error\n"}},
@@ -256,15 +256,15 @@ const std::string kLarge(3 << 20, 'x');
 
 const Scenario kLargeTable[] = {
     {"ALargeBodyForSoap",
-     {Answer(Response(Length(std::to_string(kLarge.size())), kLarge))},
+     {Respond(Response(Length(std::to_string(kLarge.size())), kLarge))},
      SoapOfAnySize,
      Success(kLarge)},
     {"HalfOfALargeBodyForSoap",
-     {Answer(Response(Length(std::to_string(2 * kLarge.size())), kLarge))},
+     {Respond(Response(Length(std::to_string(2 * kLarge.size())), kLarge))},
      SoapOfAnySize,
      Success(kLarge)},
     {"MuchMoreThanALargeBodyForSoap",
-     {Answer(Response(Length("2147483646"), kLarge))},
+     {Respond(Response(Length("2147483646"), kLarge))},
      SoapOfAnySize,
      Success(kLarge)},
 };

@@ -48,12 +48,12 @@ Step SendSlowly(const std::string& bytes) {
           }};
 }
 
-Script StallBehind(const std::string& bytes) {
+Script StallAfter(const std::string& bytes) {
   return {ExpectRequest(), Send(bytes), StallUntilFinish()};
 }
 
-Script PauseBetween(const std::string& before, const std::string& behind) {
-  return {ExpectRequest(), Send(before), Pause(kLong), SendWhileRead(behind), Close()};
+Script PauseBetween(const std::string& before, const std::string& after) {
+  return {ExpectRequest(), Send(before), Pause(kLong), SendWhileRead(after), Close()};
 }
 
 Script Slowly(const std::string& response) {
@@ -188,54 +188,54 @@ std::string TimedOut(const std::string& function) {
 // Any number of the log stands as N.
 const Scenario kTimings[] = {
     // A stall ends the operation, wherever it comes.
-    Meets("AStallBeforeTheHead", StallBehind(""), Buffered, NoResponse(), {kBodyFailed}),
-    Meets("AStallBeforeTheHeadRead", StallBehind(""), Direct, NoResponse(), {kBodyFailed}),
-    Meets("AStallInTheStatusLine", StallBehind("HTTP/1.1 20"), Buffered, NoResponse(),
+    Meets("AStallBeforeTheHead", StallAfter(""), Buffered, NoResponse(), {kBodyFailed}),
+    Meets("AStallBeforeTheHeadRead", StallAfter(""), Direct, NoResponse(), {kBodyFailed}),
+    Meets("AStallInTheStatusLine", StallAfter("HTTP/1.1 20"), Buffered, NoResponse(),
           {kBodyFailed}),
-    Meets("AStallInTheStatusLineRead", StallBehind("HTTP/1.1 20"), Direct, NoResponse(),
+    Meets("AStallInTheStatusLineRead", StallAfter("HTTP/1.1 20"), Direct, NoResponse(),
           {kBodyFailed}),
-    Meets("AStallInAHeaderLine", StallBehind("HTTP/1.1 200 OK\r\nX: "), Buffered,
+    Meets("AStallInAHeaderLine", StallAfter("HTTP/1.1 200 OK\r\nX: "), Buffered,
           {HTTP_RET_IO_ERROR, HTTP_RET_IO_ERROR, 200, ""}, {kHeadFailed, kBodyFailed}),
-    Meets("AStallInALineEnd", StallBehind("HTTP/1.1 200 OK\r\nX: y\r"), Direct,
+    Meets("AStallInALineEnd", StallAfter("HTTP/1.1 200 OK\r\nX: y\r"), Direct,
           {HTTP_RET_IO_ERROR, HTTP_RET_IO_ERROR, 200, ""}, {kHeadFailed, kBodyFailed}),
-    Meets("AStallBehindTheHead", StallBehind(kHead), Buffered, BodyFailed(""), {kBodyFailed}),
-    Meets("AStallBehindTheHeadRead", StallBehind(kHead), Direct, BodyFailed(""), {kBodyFailed}),
-    Meets("AStallInABody", StallBehind(kHead + "abc"s), Buffered, BodyFailed("abc"), {kBodyFailed}),
-    Meets("AStallInABodyRead", StallBehind(kHead + "abc"s), Direct, BodyFailed("abc"),
+    Meets("AStallAfterTheHead", StallAfter(kHead), Buffered, BodyFailed(""), {kBodyFailed}),
+    Meets("AStallAfterTheHeadRead", StallAfter(kHead), Direct, BodyFailed(""), {kBodyFailed}),
+    Meets("AStallInABody", StallAfter(kHead + "abc"s), Buffered, BodyFailed("abc"), {kBodyFailed}),
+    Meets("AStallInABodyRead", StallAfter(kHead + "abc"s), Direct, BodyFailed("abc"),
           {kBodyFailed}),
 
     // In place of a chunk's size it is taken for the last chunk.
-    Meets("AStallBeforeAChunkSize", StallBehind(kChunkedHead), Buffered, Success("")),
-    Meets("AStallInAChunkSize", StallBehind(kChunkedHead + "3\r\nabc\r\n5"s), Buffered,
+    Meets("AStallBeforeAChunkSize", StallAfter(kChunkedHead), Buffered, Success("")),
+    Meets("AStallInAChunkSize", StallAfter(kChunkedHead + "3\r\nabc\r\n5"s), Buffered,
           Success("abc")),
-    Meets("AStallInAChunkSizeRead", StallBehind(kChunkedHead + "3\r\nabc\r\n5"s), Direct,
+    Meets("AStallInAChunkSizeRead", StallAfter(kChunkedHead + "3\r\nabc\r\n5"s), Direct,
           Success("abc")),
-    Meets("AStallInAChunk", StallBehind(kChunkedHead + "5\r\nabc"s), Buffered, BodyFailed("abc"),
+    Meets("AStallInAChunk", StallAfter(kChunkedHead + "5\r\nabc"s), Buffered, BodyFailed("abc"),
           {kBodyFailed}),
-    Meets("AStallInAChunkRead", StallBehind(kChunkedHead + "5\r\nabc"s), Direct, BodyFailed("abc"),
+    Meets("AStallInAChunkRead", StallAfter(kChunkedHead + "5\r\nabc"s), Direct, BodyFailed("abc"),
           {kBodyFailed}),
-    Meets("AStallBehindAChunk", StallBehind(kChunkedHead + "3\r\nabc"s), Direct, Success("abc")),
+    Meets("AStallAfterAChunk", StallAfter(kChunkedHead + "3\r\nabc"s), Direct, Success("abc")),
 
     // Over TLS.
-    Meets("AStallBeforeTheHeadOverTls", StallBehind(""), DirectOverTls, NoResponse(), {kBodyFailed},
+    Meets("AStallBeforeTheHeadOverTls", StallAfter(""), DirectOverTls, NoResponse(), {kBodyFailed},
           true),
-    Meets("AStallInABodyOverTls", StallBehind(kHead + "abc"s), DirectOverTls, BodyFailed("abc"),
+    Meets("AStallInABodyOverTls", StallAfter(kHead + "abc"s), DirectOverTls, BodyFailed("abc"),
           {kBodyFailed}, true),
 
     // The other readers.
-    Meets("AStallBeforeASoapHead", StallBehind(""), Soap, NoResponse("untouched")),
-    Meets("AStallBeforeASoapBody", StallBehind(kSoapHead), Soap, BodyFailed("untouched"),
+    Meets("AStallBeforeASoapHead", StallAfter(""), Soap, NoResponse("untouched")),
+    Meets("AStallBeforeASoapBody", StallAfter(kSoapHead), Soap, BodyFailed("untouched"),
           {"SendReqBySocketPost: Read data faild.\n"}),
-    Meets("AStallInASoapBody", StallBehind(kSoapHead + "<a/>"s), Soap, Success("<a/>")),
-    Meets("AStallBeforeJson", StallBehind(""), Json, OneCall(-1, "\"untouched\"\n"),
+    Meets("AStallInASoapBody", StallAfter(kSoapHead + "<a/>"s), Soap, Success("<a/>")),
+    Meets("AStallBeforeJson", StallAfter(""), Json, OneCall(-1, "\"untouched\"\n"),
           {"SendHttpGet: Failed to check response[N]: N\n"}),
-    Meets("AStallInJson", StallBehind(kHead + "{\"success\":true}"s), Json,
+    Meets("AStallInJson", StallAfter(kHead + "{\"success\":true}"s), Json,
           OneCall(-1, "\"untouched\"\n"), {"SendHttpGet: Failed to read data: N\n"}),
-    Meets("AStallBehindAForm", StallBehind(""), Form, OneCall(0, "")),
-    Meets("AStallForCurl", StallBehind(""), Curl, NoResponse(), {TimedOut("SendRequestByCurl")}),
-    Meets("AStallInABodyForCurl", StallBehind(kSoapHead + "abc"s), Curl, NoResponse("abc"),
+    Meets("AStallAfterAForm", StallAfter(""), Form, OneCall(0, "")),
+    Meets("AStallForCurl", StallAfter(""), Curl, NoResponse(), {TimedOut("SendRequestByCurl")}),
+    Meets("AStallInABodyForCurl", StallAfter(kSoapHead + "abc"s), Curl, NoResponse("abc"),
           {TimedOut("SendRequestByCurl")}),
-    Meets("AStallInABodyForXml", StallBehind(kSoapHead + "<a>"s), XmlGet, NoResponse("<a>"),
+    Meets("AStallInABodyForXml", StallAfter(kSoapHead + "<a>"s), XmlGet, NoResponse("<a>"),
           {TimedOut("SendReqByXMLGet")}),
     Meets("NoAnswerToAConnect", {}, ToABlackHole,
           {HTTP_RET_IO_ERROR, HTTP_RET_NOT_READY, 0, "not sent"},

@@ -99,7 +99,7 @@ std::vector<HandshakeCase> StageTable() {
           return Concat({AwaitHello(tls), SendRecords(tls, sent)}, steps(tls));
         };
         table.push_back(
-            {std::string(protocol.name) + ending.name + "Behind" + std::to_string(sent) + "Records",
+            {std::string(protocol.name) + ending.name + "After" + std::to_string(sent) + "Records",
              peer, ending.error});
       }
     }
@@ -274,9 +274,9 @@ std::vector<HandshakeCase> SoundTable() {
       sound("Tls13", TLS1_3_VERSION, {}),
       slow("Tls12ByteByByte", TLS1_2_VERSION),
       slow("Tls13ByteByByte", TLS1_3_VERSION),
-      sound("Tls12BehindAWarning", TLS1_2_VERSION, {SendRaw(kWarning)}),
-      sound("Tls12BehindAnEmptyRecord", TLS1_2_VERSION, {SendRaw(RawRecord(kHandshakeRecord, ""))}),
-      sound("Tls12Behind10000HelloRequests", TLS1_2_VERSION,
+      sound("Tls12AfterAWarning", TLS1_2_VERSION, {SendRaw(kWarning)}),
+      sound("Tls12AfterAnEmptyRecord", TLS1_2_VERSION, {SendRaw(RawRecord(kHandshakeRecord, ""))}),
+      sound("Tls12After10000HelloRequests", TLS1_2_VERSION,
             {SendRaw(Repeated(10000, kHelloRequest))}),
   };
 }

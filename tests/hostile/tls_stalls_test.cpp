@@ -38,7 +38,7 @@ std::vector<StallCase> StallTable() {
     const std::string protocol = version == TLS1_2_VERSION ? "Tls12" : "Tls13";
     const size_t records = version == TLS1_2_VERSION ? 7 : 6;
     for (size_t sent = 0; sent < records; ++sent) {
-      const std::string name = protocol + "Behind" + std::to_string(sent) + "Records";
+      const std::string name = protocol + "After" + std::to_string(sent) + "Records";
       table.push_back({name + "ThenEnds", version, sent, false, false});
       table.push_back({name + "ThenGoesOn", version, sent, false, true});
       table.push_back({name + "AndAHalfThenEnds", version, sent, true, false});
@@ -48,7 +48,7 @@ std::vector<StallCase> StallTable() {
   // The handshake has no time limit: these stalls are longer than the socket's.
   const std::chrono::milliseconds longer(1200);
   table.push_back({"LongerThanTheTimeLimitBeforeTheHello", TLS1_3_VERSION, 0, false, true, longer});
-  table.push_back({"LongerThanTheTimeLimitBehindTheHello", TLS1_2_VERSION, 1, false, true, longer});
+  table.push_back({"LongerThanTheTimeLimitAfterTheHello", TLS1_2_VERSION, 1, false, true, longer});
   table.push_back({"LongerThanTheTimeLimitInARecord", TLS1_3_VERSION, 3, true, false, longer});
   return table;
 }
@@ -65,7 +65,7 @@ Script StallingPeer(const StallCase& test, const Flag& stalled, const Flag& go_o
 
 const StallCase kLibcurlStalls[] = {
     {"BeforeTheHello", TLS1_3_VERSION, 0, false, false},
-    {"BehindTheHello", TLS1_2_VERSION, 1, false, false},
+    {"AfterTheHello", TLS1_2_VERSION, 1, false, false},
     {"InARecord", TLS1_3_VERSION, 3, true, false},
 };
 

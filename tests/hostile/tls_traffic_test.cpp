@@ -104,7 +104,7 @@ const std::vector<TrafficCase> kRecords = {
         },
         kUnread, kFailed),
     ServesRecords(
-        "TenThousandEmptyRecordsBehindTheHead",
+        "TenThousandEmptyRecordsAfterTheHead",
         [](ServerTls& tls) {
           return InOrder({Data(tls, kHead), EmptyRecords(tls, 10000)});
         },
@@ -307,8 +307,8 @@ const std::vector<TrafficCase> kEnds = {
         [](const SharedTls& tls) { return Script{SendTlsCloseNotice(tls)}; }, kUnread),
     Ends("WithANoticeInTheStatusLine", "HTTP/1.0 200 O", kNoBody),
     Ends("WithANoticeInAHeader", "HTTP/1.0 200 OK\r\nX: ", kNoBody),
-    Ends("WithANoticeBehindACarriageReturn", "HTTP/1.0 200 OK\r", kUnread),
-    Ends("WithANoticeBehindTheHead", kHead, kNoBody),
+    Ends("WithANoticeAfterACarriageReturn", "HTTP/1.0 200 OK\r", kUnread),
+    Ends("WithANoticeAfterTheHead", kHead, kNoBody),
     Ends("WithANoticeInTheBody", kHead + "bo", Success("bo")),
     Serves(
         "WithoutANoticeInTheBody", TLS1_3_VERSION,
@@ -326,7 +326,7 @@ const std::vector<TrafficCase> kEnds = {
         },
         kNoBody),
     ServesRecords(
-        "WithDataBehindTheNotice",
+        "WithDataAfterTheNotice",
         [](ServerTls& tls) {
           return InOrder({Data(tls, kResponse), tls.Encrypted(kAlertRecord, std::string("\1\0", 2)),
                           Data(tls, "more")});
@@ -346,7 +346,7 @@ const std::vector<TrafficCase> kEnds = {
      },
      kWhole,
      {}},
-    {"WithAResetBehindTheRequest",
+    {"WithAResetAfterTheRequest",
      [] {
        const SharedTls tls = Tls13();
        return Script{FinishHandshake(tls), ExpectTlsRequest(tls), Reset()};

@@ -16,7 +16,7 @@ class BufferedClient : public TWHttpClient {
 };
 
 // The body of a chunk of five bytes with a size line of `length` characters, and one of three.
-std::string BodyBehindLineOf(size_t length) {
+std::string BodyAfterLineOf(size_t length) {
   const std::string line = "5;" + std::string(length - 2, 'x');
   BufferedClient client(line + "\r\nzzzzz\r\n3\r\nabc\r\n0\r\n\r\n");
   std::string body;
@@ -26,16 +26,16 @@ std::string BodyBehindLineOf(size_t length) {
 
 TEST(ChunkLineCut, ALineThatFitsIsTakenWhole) {
   for (size_t length = 2; length <= 8191; length += length < 600 || length > 8100 ? 1 : 97) {
-    ASSERT_EQ(BodyBehindLineOf(length), "zzzzzabc") << length;
+    ASSERT_EQ(BodyAfterLineOf(length), "zzzzzabc") << length;
   }
 }
 
 TEST(ChunkLineCut, OfALongerLineTheRestIsData) {
   // The 8,192nd character is lost; what follows it is the chunk's data.
-  EXPECT_EQ(BodyBehindLineOf(8192), "\r\nzzz");
-  EXPECT_EQ(BodyBehindLineOf(8193), "x\r\nzz");
-  EXPECT_EQ(BodyBehindLineOf(8200), "xxxxx");
-  EXPECT_EQ(BodyBehindLineOf(30000), "xxxxx");
+  EXPECT_EQ(BodyAfterLineOf(8192), "\r\nzzz");
+  EXPECT_EQ(BodyAfterLineOf(8193), "x\r\nzz");
+  EXPECT_EQ(BodyAfterLineOf(8200), "xxxxx");
+  EXPECT_EQ(BodyAfterLineOf(30000), "xxxxx");
 }
 
 }  // namespace

@@ -127,7 +127,7 @@ std::string PlainWholeChunk(const std::string& bytes) {
 }
 
 // What is left on the connection, and how it was read, must be the same too.
-void ExpectTheSameBehind(PieceClient* fast, PieceClient* plain) {
+void ExpectTheSameAfter(PieceClient* fast, PieceClient* plain) {
   EXPECT_EQ(fast->pieces->IsEOF(), plain->pieces->IsEOF());
   EXPECT_EQ(PlainToEnd(fast), PlainToEnd(plain));
   EXPECT_EQ(fast->pieces->calls, plain->pieces->calls);
@@ -143,7 +143,7 @@ TEST(FastBody, OfChunksIsWhatReadsIntoABufferGive) {
     std::string body;
     EXPECT_EQ(fast.ReadBody(body), HTTP_RET_OK);
     EXPECT_TRUE(body == PlainChunks(&plain));
-    ExpectTheSameBehind(&fast, &plain);
+    ExpectTheSameAfter(&fast, &plain);
   }
 }
 
@@ -224,7 +224,7 @@ TEST(FastBody, ToTheEndIsWhatReadsIntoABufferGive) {
     EXPECT_EQ(fast.ReadBody(body), HTTP_RET_OK);
     EXPECT_TRUE(body == text);
     EXPECT_TRUE(PlainToEnd(&plain) == text);
-    ExpectTheSameBehind(&fast, &plain);
+    ExpectTheSameAfter(&fast, &plain);
   }
 }
 

@@ -45,7 +45,7 @@ Body BodyOfResponse(const std::string& response, const Transport& transport = {f
 
 // Makes every read of the body fail once the bytes right after the head have come. A
 // buffered client has it already; a direct one has read just the head.
-void FailReadsBehind(Faults& faults, const Transport& transport) {
+void FailReadsAfter(Faults& faults, const Transport& transport) {
   faults.FailFrom(transport.tls ? Call::kSslRead : Call::kRead, transport.buffered ? 1 : 2);
 }
 
@@ -148,7 +148,7 @@ TEST(ReadBody, AReadErrorIsAnIoErrorWithWhatCameBefore) {
     LogCapture log;
     {
       Faults faults;
-      FailReadsBehind(faults, transport);
+      FailReadsAfter(faults, transport);
       EXPECT_EQ(BodyOf(client), (Body{HTTP_RET_IO_ERROR, "part"}));
     }
     EXPECT_THAT(log.Lines("http"),

@@ -20,7 +20,7 @@ struct ExampleCase {
   const char* program;
   WebServer& (*server)();
   const char* port;
-  std::vector<std::string> arguments;  // behind host and port
+  std::vector<std::string> arguments;  // after host and port
   Matcher<std::string> output;
   int code = 0;
 };

@@ -48,7 +48,7 @@ class Settings : public ::testing::Test {
   }
   ~Settings() override {
     unlink(kPath);
-    for (const int guard : guarded_.behind) EXPECT_EQ(guard, 0x55555555);
+    for (const int guard : guarded_.after) EXPECT_EQ(guard, 0x55555555);
     EXPECT_FALSE(FileExists(kMainLog)) << "nothing of this logs";
   }
 
@@ -64,7 +64,7 @@ class Settings : public ::testing::Test {
 
   struct {
     TWDbgLogCfg record;
-    int behind[64];
+    int after[64];
   } guarded_;
 };
 

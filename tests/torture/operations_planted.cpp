@@ -124,7 +124,7 @@ void ShortRead(TestRun& test) {
 }
 
 // Its thread may be cancelled between the two calls.
-void LostDescriptor(TestRun& test) {
+[[maybe_unused]] void LostDescriptor(TestRun& test) {
   test.Run([] {
     const int fd = open("/dev/null", O_RDONLY | O_CLOEXEC);
     if (fd >= 0) close(fd);
@@ -136,7 +136,7 @@ struct ClosesInItsDestructor {
 };
 
 // A cancel in a destructor ends the process.
-void CancelledDestructor(TestRun& test) {
+[[maybe_unused]] void CancelledDestructor(TestRun& test) {
   test.Run([] { const ClosesInItsDestructor closes; });
 }
 

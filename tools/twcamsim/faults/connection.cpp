@@ -24,7 +24,7 @@ FaultHooks OnSteps(void (*hook)(Steps*, const FaultContext&)) {
 constexpr char kGroup[] = "connection";
 
 // Keeps the first `bytes` of what `part` and all after it send, and ends the connection there.
-void CutBehind(Steps* steps, size_t first, size_t bytes, Action end) {
+void CutAfter(Steps* steps, size_t first, size_t bytes, Action end) {
   for (size_t i = first; i < steps->size(); ++i) {
     Step& step = (*steps)[i];
     if (step.bytes.size() > bytes) {
@@ -50,7 +50,7 @@ void CutBody(Steps* steps, const FaultContext& context) {
   const int64_t asked = context.Number(0);
   const size_t bytes =
       asked >= 0 ? static_cast<size_t>(asked) : static_cast<size_t>(context.random->Below(all));
-  CutBehind(steps, std::min(first, steps->size()), bytes, Action::kClose);
+  CutAfter(steps, std::min(first, steps->size()), bytes, Action::kClose);
 }
 
 void CutHead(Steps* steps, const FaultContext& context) {
@@ -59,7 +59,7 @@ void CutHead(Steps* steps, const FaultContext& context) {
   const int64_t asked = context.Number(0);
   const size_t bytes = asked >= 0 ? static_cast<size_t>(asked)
                                   : 1 + static_cast<size_t>(context.random->Below(head - 2));
-  CutBehind(steps, 0, bytes, Action::kClose);
+  CutAfter(steps, 0, bytes, Action::kClose);
 }
 
 std::vector<FaultType> EarlyFaults() {
