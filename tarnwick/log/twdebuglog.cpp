@@ -49,6 +49,8 @@ constexpr size_t kTagsLength = 127;
 // for a line, which takes 5,000 (./dev cost, amd64). What does not fit is cut.
 class ShortText {
  public:
+  ShortText() : m_length(0) { m_text[0] = '\0'; }
+
   void Add(std::string_view text) {
     m_length += text.copy(m_text + m_length, sizeof(m_text) - m_length);
   }
@@ -73,7 +75,7 @@ class ShortText {
 
  private:
   char m_text[256];
-  size_t m_length = 0;
+  size_t m_length;
 };
 
 // The main thread's id is the process's and is not printed twice.

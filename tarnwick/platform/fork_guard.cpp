@@ -35,11 +35,15 @@ pthread_mutex_t g_fork = PTHREAD_MUTEX_INITIALIZER;
 // How often this thread is in fork(): in a signal handler more than once.
 thread_local int t_forks = 0;
 
-// The files that are open now, and the mutex around a change of the list. It is held for a few
-// instructions; a signal handler that forks in one of them finds a list that can be read.
+// The files that are open now, and the mutex around a change of the list. A fork does not ask for it,
+// since a thread that has it may be in a signal handler that forks as well, and wait for the first
+// fork's end: at each instruction of a change the list can be read.
 ForkClosedFile* g_files = nullptr;
 pthread_mutex_t g_list = PTHREAD_MUTEX_INITIALIZER;
 thread_local bool t_has_list = false;
+
+// Of the fork that has g_fork.
+bool g_lock_is_held = false;
 
 bool g_locks_are_lost = false;
 
@@ -53,15 +57,18 @@ long NanosecondsSince(const struct timespec& start) {
   return (now.tv_sec - start.tv_sec) * 1000000000L + (now.tv_nsec - start.tv_nsec);
 }
 
-void WaitForOtherHolds() {
+// Results: whether a lock of the C library may be held at the fork. A hold that begins later waits for
+// the fork's end, and is counted for a moment before.
+bool WaitForOtherHolds() {
   const NoCancel no_cancel;
   const struct timespec pause = {0, kPauseNs};
   struct timespec start;
   clock_gettime(CLOCK_MONOTONIC, &start);
-  while (!(IsAlone(ForkGuard::kDescriptor) && IsAlone(ForkGuard::kLibraryLock)) &&
-         NanosecondsSince(start) < kLongestWaitNs) {
+  while (!(IsAlone(ForkGuard::kDescriptor) && IsAlone(ForkGuard::kLibraryLock))) {
+    if (NanosecondsSince(start) >= kLongestWaitNs) return g_holds[ForkGuard::kLibraryLock] != 0;
     nanosleep(&pause, nullptr);
   }
+  return t_holds[ForkGuard::kLibraryLock] != 0;
 }
 
 void LockList() {
@@ -79,8 +86,7 @@ void PrepareFork() {
   const ErrnoSaver keeper;
   ++g_forks;
   pthread_mutex_lock(&g_fork);
-  WaitForOtherHolds();
-  if (!t_has_list) pthread_mutex_lock(&g_list);
+  g_lock_is_held = WaitForOtherHolds();
 }
 
 void EndFork() {
@@ -88,7 +94,6 @@ void EndFork() {
     --t_forks;
     return;
   }
-  if (!t_has_list) pthread_mutex_unlock(&g_list);
   pthread_mutex_unlock(&g_fork);
   --g_forks;
   --t_forks;
@@ -111,7 +116,10 @@ namespace {
 // A hold of this thread itself goes on, in a signal handler's child too, and so does its lock.
 void StartChild() {
   CloseFilesInChild();
-  if (g_holds[ForkGuard::kLibraryLock] != 0) g_locks_are_lost = true;
+  if (!t_has_list) g_list = PTHREAD_MUTEX_INITIALIZER;  // another thread may have had it
+  // The fork of a signal handler inside another fork has not waited.
+  const bool inner = t_forks > 1;
+  if (inner ? g_holds[ForkGuard::kLibraryLock] != 0 : g_lock_is_held) g_locks_are_lost = true;
   for (int kind = 0; kind < kKinds; ++kind) g_holds[kind] = t_holds[kind];
   g_forks = 1;
   EndFork();
@@ -202,6 +210,7 @@ void ForkClosedFile::Register() {
   m_next = g_files;
   m_link = &g_files;
   if (m_next != nullptr) m_next->m_link = &m_next;
+  std::atomic_signal_fence(std::memory_order_release);  // a handler may fork here
   g_files = this;
   UnlockList();
 }
