@@ -203,7 +203,7 @@ TEST(CheckContentType, BelowDebugAFailingReadIsNotLogged) {
   EXPECT_THAT(log.Lines("http"), IsEmpty());
 }
 
-TEST(CheckContentType, TheThreeMapHeadersAreTrimmedOfSpacesOnly) {
+TEST(CheckContentType, ContentFieldsAreTrimmedOfSpacesOnly) {
   const auto client =
       AfterHeader("content-type:   a b  \r\nCONTENT-LENGTH: 12 \r\nContent-Range:\tbytes 0-1/2\t");
   EXPECT_EQ(Content(*client, HTTP_CONTENT_TYPE), "a b");
