@@ -27,8 +27,8 @@
 // http connection, return value=28"; at error memory that ran out, an option that libcurl refused
 // to SendRequestByCurl, and a response file that was not written ("CURL Error(23): ..."). At debug2
 // ReadBody and GetResp log the body, at debug3 each header line is logged. The socket adds lines of
-// its own (twsocket.h); of a failed write only the line of WriteFd, in category utils, has the
-// error number. At debug two messages show user and password that libcurl refused to take.
+// its own (twsocket.h); without TLS only the line of WriteFd, in category utils, has the error number
+// of a failed write. At debug two messages show user and password that libcurl refused to take.
 #ifndef TARNWICK_HTTP_TWHTTP_H_
 #define TARNWICK_HTTP_TWHTTP_H_
 

@@ -103,7 +103,7 @@ class Completer {
     }
     const std::vector<std::string> assigned = WordsOf(name, "=");
     const bool assigns = !assigned.empty() && typed.find('=') != std::string::npos;
-    const size_t base = typed.rfind(assigns ? '=' : ',') + 1;  // 0 when there is none
+    const size_t base = typed.rfind(assigns ? '=' : ',') + 1;  // 0 without one
     const char* const end = assigned.empty() || assigns ? "\n" : "=\n";
     for (const std::string& value : assigns ? assigned : WordsOf(name)) {
       if (!StartsWith(value, typed.substr(base))) continue;

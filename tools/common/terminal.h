@@ -17,7 +17,7 @@ bool MayColour(int fd);
 // `text` in that colour, or as it is when `enabled` is false.
 std::string InColour(Colour colour, std::string_view text, bool enabled);
 
-// Columns of the terminal `fd`; 80 when it is none or does not know.
+// The columns of the terminal `fd`; 80 when `fd` is no terminal or its width is unknown.
 int TerminalWidth(int fd);
 
 enum class Backslash { kDoubled, kKept };

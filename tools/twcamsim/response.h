@@ -75,7 +75,7 @@ void SetHeader(Steps* steps, std::string_view name, const std::string& value);
 
 void RemoveHeader(Steps* steps, std::string_view name);
 
-// The index of the first step of `part`; steps.size() when there is none.
+// The index of the first step of `part`; steps.size() without such a step.
 size_t FindPart(const Steps& steps, Part part);
 
 #endif  // TARNWICK_TOOLS_TWCAMSIM_RESPONSE_H_

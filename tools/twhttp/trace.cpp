@@ -33,7 +33,8 @@ Exchange* Trace::Current(int connection) {
   return found ? &exchanges_.back() : nullptr;
 }
 
-// What is sent after a response's first byte begins the next exchange; an interim response is none.
+// What is sent after a response's first byte begins the next exchange. The first byte of an interim
+// response (1xx) is ignored.
 void Trace::Sent(int connection, double begin, double end, std::string_view bytes) {
   Exchange* exchange = Current(connection);
   if (exchange == nullptr || exchange->response.HeadComplete()) {
